@@ -1,0 +1,23 @@
+#pragma once
+
+#include <string>
+
+#include "braxo/lib/exception.h"
+
+namespace LinuxHost {
+
+// A failure of this host: the finished message, and the error number that a numbered kernel call
+// answers for it.
+class HostError : public Braxo::Lib::BraxoException {
+ public:
+  // `code` is a positive error number such as ENOENT.
+  HostError(int code, const std::string& message) : BraxoException(message), errorNumber(code) {}
+
+  // The positive error number.
+  int Code() const { return errorNumber; }
+
+ private:
+  int errorNumber;
+};
+
+}  // namespace LinuxHost
