@@ -1,0 +1,60 @@
+#include "secpolicy/domain/capability_param_rules.h"
+
+#include "braxo/misc/strcat.h"
+#include "secpolicy/domain/rule_steps.h"
+
+namespace SecPolicy {
+namespace {
+
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+
+constexpr std::size_t kTokenCount = 4;
+constexpr std::size_t kTokenCountWithoutSecondParam = 3;
+
+void TakeParamCheck(TeskAccess_CapabilityParamRule& rule, std::queue<std::string>& args,
+                    TeskAccessInterfaceImpl& access) {
+  if (args.size() != kTokenCount && args.size() != kTokenCountWithoutSecondParam) RuleSizeError();
+  rule.paramCheck = TakeToken(args);
+  rule.firstParam = TakeToken(args);
+  if (args.size() > 1) rule.secondParam = TakeToken(args);
+  rule.grant = TakeGrant(args);
+  access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.paramCheck);
+}
+
+}  // namespace
+
+void CapabilityParamRules::AddRule(unsigned int line, const std::string& domainName,
+                                   unsigned int domainId, std::queue<std::string> args,
+                                   TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line, domainName, domainId,
+             [&](TeskAccess_CapabilityParamRule& rule) { TakeParamCheck(rule, args, access); });
+}
+
+void CapabilityParamRules::Set(TeskAccessInterfaceImpl& access) {
+  SetEach(rules, access, &TeskAccessInterfaceImpl::SetCapabilityParamRule);
+}
+
+void CapabilityParamRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImpl& access) {
+  access.GetCapabilityParamRules(domainId, rules);
+}
+
+void CapabilityParamRules::CheckConstraints(const std::string& domainName,
+                                            TeskAccessInterfaceImpl& access) {
+  try {
+    access.CheckCapabilityParamRuleConstraints(domainName, rules);
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    RaiseError(Braxo::Misc::StrCat("Policy constraint error for domain: ", domainName, " : ",
+                                   failure.what()));
+  }
+}
+
+void CapabilityParamRules::PrintRules() {
+  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_CapabilityParamRule& rule) {
+    AppendWord(text, rule.paramCheck);
+    AppendWord(text, rule.firstParam);
+    if (!rule.secondParam.empty()) AppendWord(text, rule.secondParam);
+    AppendGrant(text, rule.grant);
+  });
+}
+
+}  // namespace SecPolicy

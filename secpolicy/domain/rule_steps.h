@@ -1,0 +1,112 @@
+#pragma once
+
+#include <array>
+#include <list>
+#include <queue>
+#include <string>
+#include <utility>
+
+#include "secpolicy/domain/policy_errors.h"
+#include "secpolicy/report.h"
+#include "secpolicy/secpolicy.h"
+
+// The steps that the rule families share; for their .cpp files only.
+namespace SecPolicy {
+
+// A word of a rule line: where it is kept, and the kernel's table that it has to be in.
+template <class Rule>
+struct RuleToken {
+  std::string Rule::*field;
+  TeskCtl::Security::TeskAccess_KeywordType keywords;
+};
+
+// Takes the next word of the line.
+inline std::string TakeToken(std::queue<std::string>& args) {
+  std::string token = std::move(args.front());
+  args.pop();
+  return token;
+}
+
+// Takes the last word of the line, "grant" or "revoke"; throws for any other.
+inline bool TakeGrant(std::queue<std::string>& args) {
+  std::string word = TakeToken(args);
+  return IsGrant(word);
+}
+
+// Fills a record with the line's header and with what `parse` takes from the line, and appends it.
+// A failure becomes a parse error that names the line; nothing is appended then.
+template <class Rule, class Parse>
+void AppendRule(std::list<Rule>& rules, unsigned int line, const std::string& domainName,
+                unsigned int domainId, Parse parse) {
+  try {
+    Rule rule;
+    rule.line = line;
+    rule.domainId = domainId;
+    rule.domainName = domainName;
+    parse(rule);
+    rules.push_back(std::move(rule));
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    RaisePolicyParseError(line, domainName, failure.what());
+  }
+}
+
+// Takes a line of exactly `tokens` and the grant word. The words are checked after all are taken,
+// so a bad grant word is reported before a word that the kernel does not know.
+template <class Rule, std::size_t Count>
+void TakeTokens(Rule& rule, const std::array<RuleToken<Rule>, Count>& tokens,
+                std::queue<std::string>& args, TeskAccessInterfaceImpl& access) {
+  if (args.size() != Count + 1) RuleSizeError();
+  for (const RuleToken<Rule>& token : tokens) rule.*token.field = TakeToken(args);
+  rule.grant = TakeGrant(args);
+  for (const RuleToken<Rule>& token : tokens) {
+    access.ValidateKeyword(token.keywords, rule.*token.field);
+  }
+}
+
+// Hands a copy of every rule to the kernel, in order. A refusal becomes a set error that names the
+// line; the rules before it stay installed.
+template <class Rule>
+void SetEach(const std::list<Rule>& rules, TeskAccessInterfaceImpl& access,
+             void (TeskAccessInterfaceImpl::*set)(Rule rule)) {
+  for (const Rule& rule : rules) {
+    try {
+      (access.*set)(rule);
+    } catch (const Braxo::Lib::BraxoException& failure) {
+      RaisePolicySetError(rule.line, rule.domainName, failure.what());
+    }
+  }
+}
+
+// Appends `word` to a printed rule, behind a blank.
+inline void AppendWord(std::string& text, const std::string& word) {
+  text += ' ';
+  text += word;
+}
+
+inline void AppendGrant(std::string& text, bool grant) {
+  AppendWord(text, grant ? "grant" : "revoke");
+}
+
+// Appends `tokens` and the grant word of `rule` to a printed rule.
+template <class Rule, std::size_t Count>
+void AppendTokens(std::string& text, const Rule& rule,
+                  const std::array<RuleToken<Rule>, Count>& tokens) {
+  for (const RuleToken<Rule>& token : tokens) AppendWord(text, rule.*token.field);
+  AppendGrant(text, rule.grant);
+}
+
+// Prints every rule as a policy line, whose words `appendWords` appends to the keyword, and two
+// empty lines after the last one; nothing when there are no rules.
+template <class Rule, class AppendWords>
+void PrintEach(const std::string& keyword, const std::list<Rule>& rules, AppendWords appendWords) {
+  if (rules.empty()) return;
+  for (const Rule& rule : rules) {
+    std::string text = keyword;
+    appendWords(text, rule);
+    PrintLine(std::move(text));
+  }
+  PrintLine();
+  PrintLine();
+}
+
+}  // namespace SecPolicy

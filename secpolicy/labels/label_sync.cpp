@@ -1,0 +1,62 @@
+#include <string_view>
+#include <unordered_set>
+
+#include "secpolicy/secpolicy.h"
+
+namespace SecPolicy {
+namespace {
+
+using TeskCtl::Security::TESKACCESS_LABEL_DOMAIN;
+
+void Report(const char* heading, const std::vector<std::string>& labels) {
+  if (labels.empty()) return;
+  SecpolicyInfo(heading);
+  for (const std::string& label : labels) SecpolicyInfo(label);
+}
+
+}  // namespace
+
+void SyncLabelsFromPolicy(std::vector<std::string> policyLabels,
+                          std::map<std::string, long> kernelLabels, TeskAccessLabelType type,
+                          TeskAccessInterfaceImpl& access) {
+  const std::vector<std::string> invalid = access.GetInvalidLabels(type);
+  access.RemoveLabels(invalid, type);
+  access.AddLabels(invalid, type);
+  PrintInvalidLabels(invalid, type);
+
+  const std::vector<std::string> obsolete =
+      GetObsoleteLabels(policyLabels, std::move(kernelLabels), type, access);
+  access.RemoveLabels(obsolete, type);
+  PrintObsoleteLabels(obsolete, type);
+
+  access.AddLabels(std::move(policyLabels), type);
+}
+
+std::vector<std::string> GetObsoleteLabels(std::vector<std::string> policyLabels,
+                                           std::map<std::string, long> kernelLabels,
+                                           TeskAccessLabelType type,
+                                           TeskAccessInterfaceImpl& access) {
+  const std::unordered_set<std::string_view> named(policyLabels.begin(), policyLabels.end());
+  std::vector<std::string> obsolete;
+  for (const auto& [label, value] : kernelLabels) {
+    if (type == TESKACCESS_LABEL_DOMAIN && access.IsPrivilegedVm(label)) continue;
+    if (named.contains(label)) continue;
+    if (access.IsPredefinedLabel(label, type)) continue;
+    obsolete.push_back(label);
+  }
+  return obsolete;
+}
+
+void PrintInvalidLabels(std::vector<std::string> labels, TeskAccessLabelType type) {
+  Report(type == TESKACCESS_LABEL_DOMAIN ? "The values of the following domains have been changed:"
+                                         : "The values of the following objects have been changed:",
+         labels);
+}
+
+void PrintObsoleteLabels(std::vector<std::string> labels, TeskAccessLabelType type) {
+  Report(type == TESKACCESS_LABEL_DOMAIN ? "The following domains have been removed:"
+                                         : "The following objects have been removed:",
+         labels);
+}
+
+}  // namespace SecPolicy

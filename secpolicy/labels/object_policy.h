@@ -1,0 +1,23 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "secpolicy/secpolicy.h"
+
+namespace SecPolicy {
+
+// The object names of one load, in the order in which they were read, duplicates included.
+class ObjectPolicy {
+ public:
+  // Appends the names in the object file at `path`. Throws BraxoException when it cannot be opened
+  // and at the first line that is not one name; the names before it are kept.
+  void ParsePolicy(const std::string& path);
+
+  // Makes the kernel's object labels equal to the names. Throws what the kernel throws.
+  void SetObjects(TeskAccessInterfaceImpl& access);
+
+  std::vector<std::string> names;
+};
+
+}  // namespace SecPolicy
