@@ -8,7 +8,26 @@ namespace {
 
 using TeskCtl::Security::TESKACCESS_LABEL_DOMAIN;
 
-void Report(const char* heading, const std::vector<std::string>& labels) {
+using Labels = std::vector<std::string>;
+
+bool IsObsolete(const std::string& label, const std::unordered_set<std::string_view>& named,
+                TeskAccessLabelType type, TeskAccessInterfaceImpl& access) {
+  if (type == TESKACCESS_LABEL_DOMAIN && access.IsPrivilegedVm(label)) return false;
+  if (named.contains(label)) return false;
+  return !access.IsPredefinedLabel(label, type);
+}
+
+Labels FindObsolete(const Labels& policyLabels, const std::map<std::string, long>& kernelLabels,
+                    TeskAccessLabelType type, TeskAccessInterfaceImpl& access) {
+  const std::unordered_set<std::string_view> named(policyLabels.begin(), policyLabels.end());
+  Labels obsolete;
+  for (const auto& [label, value] : kernelLabels) {
+    if (IsObsolete(label, named, type, access)) obsolete.push_back(label);
+  }
+  return obsolete;
+}
+
+void Report(const char* heading, const Labels& labels) {
   if (labels.empty()) return;
   SecpolicyInfo(heading);
   for (const std::string& label : labels) SecpolicyInfo(label);
@@ -19,13 +38,12 @@ void Report(const char* heading, const std::vector<std::string>& labels) {
 void SyncLabelsFromPolicy(std::vector<std::string> policyLabels,
                           std::map<std::string, long> kernelLabels, TeskAccessLabelType type,
                           TeskAccessInterfaceImpl& access) {
-  const std::vector<std::string> invalid = access.GetInvalidLabels(type);
+  const Labels invalid = access.GetInvalidLabels(type);
   access.RemoveLabels(invalid, type);
   access.AddLabels(invalid, type);
   PrintInvalidLabels(invalid, type);
 
-  const std::vector<std::string> obsolete =
-      GetObsoleteLabels(policyLabels, std::move(kernelLabels), type, access);
+  const Labels obsolete = FindObsolete(policyLabels, kernelLabels, type, access);
   access.RemoveLabels(obsolete, type);
   PrintObsoleteLabels(obsolete, type);
 
@@ -36,15 +54,7 @@ std::vector<std::string> GetObsoleteLabels(std::vector<std::string> policyLabels
                                            std::map<std::string, long> kernelLabels,
                                            TeskAccessLabelType type,
                                            TeskAccessInterfaceImpl& access) {
-  const std::unordered_set<std::string_view> named(policyLabels.begin(), policyLabels.end());
-  std::vector<std::string> obsolete;
-  for (const auto& [label, value] : kernelLabels) {
-    if (type == TESKACCESS_LABEL_DOMAIN && access.IsPrivilegedVm(label)) continue;
-    if (named.contains(label)) continue;
-    if (access.IsPredefinedLabel(label, type)) continue;
-    obsolete.push_back(label);
-  }
-  return obsolete;
+  return FindObsolete(policyLabels, kernelLabels, type, access);
 }
 
 void PrintInvalidLabels(std::vector<std::string> labels, TeskAccessLabelType type) {
