@@ -41,7 +41,7 @@ using PathEntries = std::array<TeskAccess_FileRule, 2>;
 
 unsigned int FillPaths(PathEntries& entries, const std::string& path) {
   auto& [written, resolved] = entries;
-  std::snprintf(written.path, sizeof written.path, "%s", path.c_str());
+  static_cast<void>(std::snprintf(written.path, sizeof written.path, "%s", path.c_str()));
   if (Zorvan::Kernel::RealPath(written.path, resolved.path) == 0) return 2;
   SecpolicyInfo("Getting realpath failed: " + path);
   return 1;

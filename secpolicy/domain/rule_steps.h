@@ -20,6 +20,10 @@ struct RuleToken {
   TeskCtl::Security::TeskAccess_KeywordType keywords;
 };
 
+// Spelt out for compilers that do not find it themselves.
+template <class Rule>
+RuleToken(std::string Rule::*, TeskCtl::Security::TeskAccess_KeywordType) -> RuleToken<Rule>;
+
 // Takes the next word of the line.
 inline std::string TakeToken(std::queue<std::string>& args) {
   std::string token = std::move(args.front());

@@ -45,7 +45,7 @@ void AddPolicy(const std::string& path, std::list<TardiskPolicy*>& policies,
     return;
   }
   policies.push_back(policy.get());
-  policy.release();
+  static_cast<void>(policy.release());
   tardisks.remove(tardisk);
 }
 
