@@ -1,0 +1,54 @@
+#include <charconv>
+
+#include "kitlibs/file.h"
+#include "library_call.h"
+#include "root.h"
+#include "secpolicy/policy_root.h"
+#include "secpolicy/secpolicy.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// The library shows domain 0 for every text that is not a number, which is no answer to a misspelt
+// question.
+std::string CheckDomainId(const std::string& text) {
+  unsigned int id = 0;
+  const char* const end = text.data() + text.size();
+  const auto read = std::from_chars(text.data(), end, id);
+  if (read.ec == std::errc() && read.ptr == end) return "";
+  return "'" + text + "' is not the number of a domain; 'secpolicy display' shows the numbers";
+}
+
+std::string Advise() {
+  if (File_IsDirectory(SecPolicy::kTardiskImagesDir)) return AdviseOnPrivilege();
+  return std::string("There is no directory ") + SecPolicy::kTardiskImagesDir +
+         " below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' "
+         "first.";
+}
+
+Action Define(CLI::App& app) {
+  const auto domain = std::make_shared<std::string>();
+  app.add_option("DOMAIN_ID", *domain, "The number of one domain; all domains without it")
+      ->check(CLI::Validator(CheckDomainId, ""));
+  return [domain] {
+    return CallLibrary(
+        "display", "", [&] { SecPolicy::DisplayPolicy(*domain); }, Advise);
+  };
+}
+
+}  // namespace
+
+const Verb kDisplay = {
+    "display", "Show the installed domains, objects and tardisk labels",
+    "Prints what is installed now to standard output: every domain with its rules, written like\n"
+    "the policy lines that made them, the objects with their identifiers, and each tardisk with\n"
+    "its label.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy display                    everything\n"
+    "  secpolicy display 3                  only the domain with the identifier 3\n"
+    "  secpolicy display | grep '^-c'       all capability rules",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,121 @@
+#include "library_call.h"
+
+#include <unistd.h>
+
+#include <cstdlib>
+#include <exception>
+#include <iostream>
+#include <string_view>
+
+#include "braxo/misc/strcat.h"
+#include "error_watch.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// The library's last words before it stops a load, and the domain that each is about.
+struct WellKnownDomain {
+  std::string_view message;
+  std::string_view name;
+};
+
+constexpr WellKnownDomain kWellKnownDomains[] = {
+    {"Failed to fetch domainID for global VM Domain", "globalVMDom"},
+    {"Failed to fetch domainID for IOFilter domain", "ioFilterDom"},
+    {"Failed to fetch domainID for default tar disk domain", "appDom"},
+    {"Failed to fetch domainID for daemon framework domain", "daemonFrameworkDom"},
+};
+
+// What the terminate handler has to know; it cannot be handed anything.
+struct RunningCall {
+  std::string verb;
+  std::string policyDir;
+  const ErrorWatch* errors;
+  std::terminate_handler otherwise;
+};
+
+RunningCall* runningCall = nullptr;
+
+void WriteSummary(const std::string& verb, const std::string& text) {
+  std::cerr << "secpolicy: " << verb << ": " << text << std::endl;
+}
+
+// The library stops a load by rethrowing while no exception is being handled. Whatever else ends
+// the process keeps its usual way, core dump included.
+void OnTerminate() {
+  const RunningCall& running = *runningCall;
+  if (!std::current_exception()) {
+    for (const WellKnownDomain& domain : kWellKnownDomains) {
+      if (running.errors->LastMessage() != domain.message) {
+        continue;
+      }
+      std::cout.flush();
+      WriteSummary(running.verb,
+                   Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
+                                       ", and tardisks and file labels were not loaded. Put a "
+                                       "policy file named ",
+                                       domain.name, " into ", running.policyDir,
+                                       "/domains and run it again."));
+      _exit(kStopped);
+    }
+  }
+  running.otherwise();
+  std::abort();
+}
+
+// Puts OnTerminate in place for the time of one call.
+class TerminateGuard {
+ public:
+  explicit TerminateGuard(RunningCall& running) {
+    runningCall = &running;
+    running.otherwise = std::set_terminate(OnTerminate);
+  }
+  TerminateGuard(const TerminateGuard&) = delete;
+  TerminateGuard& operator=(const TerminateGuard&) = delete;
+  ~TerminateGuard() {
+    std::set_terminate(runningCall->otherwise);
+    runningCall = nullptr;
+  }
+};
+
+std::string ErrorsAbove(std::size_t count) {
+  return std::to_string(count) + (count == 1 ? " error above" : " errors above");
+}
+
+}  // namespace
+
+ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
+                     const std::function<void()>& call,
+                     const std::function<std::string()>& advice) {
+  std::string failure;
+  ErrorWatch errors(std::cerr);
+  RunningCall running{verb, policyDir, &errors, nullptr};
+  const TerminateGuard guard(running);
+  try {
+    call();
+  } catch (const std::exception& raised) {
+    failure = raised.what();
+    if (failure.empty()) {
+      failure = "failed";
+    }
+  }
+  std::cout.flush();
+  if (failure.empty() && errors.Count() == 0) {
+    WriteSummary(verb, "done");
+    return kWell;
+  }
+  std::string summary = failure.empty() ? "failed" : failure;
+  if (errors.Count() > 0) {
+    summary += " (" + ErrorsAbove(errors.Count()) + ")";
+  }
+  const std::string next = advice();
+  WriteSummary(verb, next.empty() ? summary : summary + ". " + next);
+  return kFailed;
+}
+
+ExitCode Refuse(const std::string& verb, const std::string& why) {
+  WriteSummary(verb, why);
+  return kFailed;
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,22 @@
+#pragma once
+
+#include <functional>
+#include <string>
+
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// Makes the library call `call` for the verb `verb` and ends it with one summary line on standard
+// error. An error that the library reports counts as a failure even when the call returns normally.
+// `advice` is asked after a failure for what the user can do about it; it may return nothing.
+//
+// When the library ends the process because a well-known domain is missing under `policyDir`, the
+// summary says so and the process exits with kStopped.
+ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
+                     const std::function<void()>& call, const std::function<std::string()>& advice);
+
+// Prints the summary line of a verb that was not done.
+ExitCode Refuse(const std::string& verb, const std::string& why);
+
+}  // namespace SecPolicyCli

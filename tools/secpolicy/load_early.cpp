@@ -1,0 +1,25 @@
+#include "policy_dir.h"
+#include "secpolicy/policy_root.h"
+#include "secpolicy/secpolicy.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+Action Define(CLI::App& app) {
+  const auto dir = AddPolicyDir(app, SecPolicy::kEarlyPolicyRoot);
+  return [dir] { return LoadFrom("load-early", *dir, SecPolicy::LoadPolicyEarly); };
+}
+
+}  // namespace
+
+const Verb kLoadEarly = {
+    "load-early", "Install the small policy that early boot needs",
+    "Installs the domains of the early policy directory, and the objects and the file labels of\n"
+    "/etc/zorvan/secpolicy. The first failure ends the load.\n"
+    "\n"
+    "Example:\n"
+    "  secpolicy load-early                 what a boot script runs before the first services",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,73 @@
+#include <CLI/App.hpp>
+#include <CLI/Config.hpp>
+#include <CLI/Formatter.hpp>
+#include <exception>
+#include <iostream>
+#include <string>
+
+#include "host/linux/system_log.h"
+#include "root.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr const Verb* kVerbs[] = {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kDisplay, &kSettings};
+
+constexpr char kAbout[] =
+    "Installs a host's security policy from plain-text files and shows what is installed.";
+
+constexpr char kFooter[] =
+    "A first session, as an ordinary user, on a root of your own:\n"
+    "  secpolicy --root ./r boot                        unpack the tardisks and install the "
+    "policy\n"
+    "  secpolicy --root ./r display                     look at what is installed now\n"
+    "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"
+    "  secpolicy --root ./r load-early                  install only what early boot needs\n"
+    "  secpolicy --root ./r settings enforcement appDom permissive\n"
+    "  secpolicy --root ./r restore                     apply the stored level\n"
+    "\n"
+    "'secpolicy VERB --help' explains one verb. The files are described in secpolicy(5).\n"
+    "\n"
+    "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
+    "every host needs is missing.";
+
+int Run(int argc, char** argv) {
+  CLI::App app(kAbout, "secpolicy");
+  std::string root;
+  bool verbose = false;
+  Action action;
+
+  app.require_subcommand(1);
+  app.fallthrough();
+  app.footer(kFooter);
+  app.set_version_flag("--version", "secpolicy " SECPOLICY_VERSION);
+  app.add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
+      ->type_name("DIR");
+  app.add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
+  for (const Verb* verb : kVerbs) {
+    CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
+    subcommand->footer(verb->help);
+    subcommand->parse_complete_callback(
+        [&action, chosen = verb->define(*subcommand)] { action = chosen; });
+  }
+
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error) == 0 ? kWell : kUsage;
+  }
+  try {
+    if (!root.empty()) EnterRoot(root);
+    if (verbose) LinuxHost::ShowInformation();
+    return action();
+  } catch (const std::exception& failure) {
+    std::cerr << "secpolicy: " << failure.what() << std::endl;
+    return kFailed;
+  }
+}
+
+}  // namespace
+}  // namespace SecPolicyCli
+
+int main(int argc, char** argv) { return SecPolicyCli::Run(argc, argv); }

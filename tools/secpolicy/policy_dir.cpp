@@ -1,0 +1,26 @@
+#include "policy_dir.h"
+
+#include "kitlibs/file.h"
+#include "library_call.h"
+#include "root.h"
+
+namespace SecPolicyCli {
+
+std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string& preset) {
+  const auto dir = std::make_shared<std::string>(preset);
+  app.add_option("DIR", *dir, "The policy directory, as seen from the root")->capture_default_str();
+  return dir;
+}
+
+ExitCode LoadFrom(const std::string& verb, const std::string& dir,
+                  void (*load)(const std::string& dir)) {
+  if (!File_IsDirectory(dir.c_str())) {
+    return Refuse(verb, "there is no directory " + dir +
+                            " below this root, so nothing was changed. Name the directory of the "
+                            "policy, or the root that it is in (--root DIR).");
+  }
+  return CallLibrary(
+      verb, dir, [&] { load(dir); }, AdviseOnPrivilege);
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// Adds the argument DIR, a policy directory, to `app`; its value is `preset` when it is not given.
+std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string& preset);
+
+// Loads the policy directory `dir` with `load` for the verb `verb`. A directory that is not there
+// is refused before anything is changed.
+ExitCode LoadFrom(const std::string& verb, const std::string& dir,
+                  void (*load)(const std::string& dir));
+
+}  // namespace SecPolicyCli

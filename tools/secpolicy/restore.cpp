@@ -1,0 +1,28 @@
+#include "library_call.h"
+#include "root.h"
+#include "secpolicy/secpolicy.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+Action Define(CLI::App&) {
+  return [] {
+    return CallLibrary(
+        "restore", "", [] { SecPolicy::RestoreDomainEnforcement(); }, AdviseOnPrivilege);
+  };
+}
+
+}  // namespace
+
+const Verb kRestore = {
+    "restore", "Give every domain its stored enforcement level",
+    "Walks the installed domains and gives each the level that 'settings enforcement' stored for\n"
+    "it. A domain without a stored level keeps the one it has.\n"
+    "\n"
+    "Example:\n"
+    "  secpolicy settings enforcement appDom permissive\n"
+    "  secpolicy restore                    now appDom is permissive",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,66 @@
+#include "root.h"
+
+#include <sched.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <fstream>
+#include <system_error>
+
+namespace SecPolicyCli {
+namespace {
+
+bool rootEntered = false;
+
+[[noreturn]] void RaiseSystemError(const std::string& what) {
+  throw std::system_error(errno, std::generic_category(), what);
+}
+
+void WriteProcFile(const char* path, const std::string& text) {
+  std::ofstream file(path);
+  file << text << std::flush;
+  if (!file) {
+    RaiseSystemError(path);
+  }
+}
+
+// Inside a namespace of its own every user may change the root. The user and the group keep their
+// numbers, so files made below the root belong to who ran the command.
+void EnterUserNamespace() {
+  const std::string user = std::to_string(geteuid());
+  const std::string group = std::to_string(getegid());
+  if (unshare(CLONE_NEWUSER) != 0) {
+    RaiseSystemError("cannot make a user namespace");
+  }
+  WriteProcFile("/proc/self/setgroups", "deny");
+  WriteProcFile("/proc/self/uid_map", user + " " + user + " 1");
+  WriteProcFile("/proc/self/gid_map", group + " " + group + " 1");
+}
+
+}  // namespace
+
+void EnterRoot(const std::string& directory) {
+  if (chdir(directory.c_str()) != 0) {
+    RaiseSystemError(directory);
+  }
+  if (chroot(".") != 0) {
+    if (errno != EPERM) {
+      RaiseSystemError(directory);
+    }
+    EnterUserNamespace();
+    if (chroot(".") != 0) {
+      RaiseSystemError(directory);
+    }
+  }
+  if (chdir("/") != 0) {
+    RaiseSystemError(directory);
+  }
+  rootEntered = true;
+}
+
+std::string AdviseOnPrivilege() {
+  if (rootEntered || geteuid() == 0) return "";
+  return "You are not root: run it as root, or give --root DIR to work below a directory of yours.";
+}
+
+}  // namespace SecPolicyCli

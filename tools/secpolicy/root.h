@@ -1,0 +1,16 @@
+#pragma once
+
+#include <string>
+
+namespace SecPolicyCli {
+
+// Makes `directory` the root directory of this process, for good: every path that the library and
+// the host use is looked up below it. An ordinary user enters it inside a user namespace of its
+// own. Throws std::system_error when that cannot be done.
+void EnterRoot(const std::string& directory);
+
+// What to try after a failure that the rights of the user can explain; nothing for root and for
+// who has entered a root.
+std::string AdviseOnPrivilege();
+
+}  // namespace SecPolicyCli

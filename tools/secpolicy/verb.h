@@ -1,0 +1,35 @@
+#pragma once
+
+#include <CLI/App.hpp>
+#include <functional>
+
+namespace SecPolicyCli {
+
+enum ExitCode : int {
+  kWell = 0,
+  kFailed = 1,
+  kUsage = 2,
+  kStopped = 3  // the library stopped the load: a well-known domain is missing
+};
+
+// What a verb does when the command line has been read and the root has been entered.
+using Action = std::function<ExitCode()>;
+
+// One verb of the command.
+struct Verb {
+  const char* name;
+  const char* summary;  // one line of the list of verbs
+  const char* help;     // what a user has to know, with an example
+
+  // Adds the verb's arguments to `app` and returns its action, which keeps their values.
+  Action (*define)(CLI::App& app);
+};
+
+extern const Verb kBoot;
+extern const Verb kLoad;
+extern const Verb kLoadEarly;
+extern const Verb kRestore;
+extern const Verb kDisplay;
+extern const Verb kSettings;
+
+}  // namespace SecPolicyCli
