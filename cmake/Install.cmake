@@ -1,0 +1,53 @@
+# What a package of this project holds, for one prefix: the libraries and their headers, how other
+# builds find them, the command with its manual pages and completions, and the systemd units.
+include(CMakePackageConfigHelpers)
+
+set(SECPOLICY_HEADERS "${CMAKE_INSTALL_INCLUDEDIR}/libsecpolicy")
+set(SECPOLICY_CMAKE "${CMAKE_INSTALL_LIBDIR}/cmake/secpolicy")
+set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, below the prefix")
+
+# Libraries and headers. A caller's include paths begin at the public header, and at the contract
+# headers that it includes.
+target_include_directories(secpolicy INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
+install(TARGETS secpolicy secpolicyhost host_contract EXPORT secpolicyTargets
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}")
+install(FILES secpolicy/secpolicy.h secpolicy/export.h
+  DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
+install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")
+install(FILES host/linux/mode_param.h DESTINATION "${SECPOLICY_HEADERS}/host/linux")
+
+# For find_package and pkg-config.
+install(EXPORT secpolicyTargets NAMESPACE secpolicy:: DESTINATION "${SECPOLICY_CMAKE}")
+configure_package_config_file(cmake/secpolicyConfig.cmake.in secpolicyConfig.cmake
+  INSTALL_DESTINATION "${SECPOLICY_CMAKE}")
+write_basic_package_version_file(secpolicyConfigVersion.cmake COMPATIBILITY SameMajorVersion)
+install(FILES "${CMAKE_BINARY_DIR}/secpolicyConfig.cmake"
+  "${CMAKE_BINARY_DIR}/secpolicyConfigVersion.cmake" DESTINATION "${SECPOLICY_CMAKE}")
+configure_file(packaging/secpolicy.pc.in secpolicy.pc @ONLY)
+install(FILES "${CMAKE_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+
+# The command.
+install(TARGETS secpolicy_cli)
+install(FILES docs/man/secpolicy.5 DESTINATION "${CMAKE_INSTALL_MANDIR}/man5")
+install(FILES docs/man/secpolicy.8 DESTINATION "${CMAKE_INSTALL_MANDIR}/man8")
+install(FILES completions/secpolicy.bash RENAME secpolicy
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions")
+install(FILES completions/_secpolicy
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
+foreach(unit boot restore load)
+  configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
+  install(FILES "${CMAKE_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
+endforeach()
+install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+
+# `cpack` in the build directory makes a Debian package.
+set(CPACK_GENERATOR DEB)
+set(CPACK_PACKAGE_NAME libsecpolicy)
+set(CPACK_PACKAGE_CONTACT "The libsecpolicy authors")
+set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_PACKAGE_SECTION libs)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+set(CPACK_STRIP_FILES ON)
+include(CPack)

@@ -1,0 +1,42 @@
+# bash completion for secpolicy(8)
+
+_secpolicy() {
+  local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
+  local verbs='boot load load-early restore display settings'
+  local verb='' kind='' word index positional=0
+  for ((index = 1; index < COMP_CWORD; index++)); do
+    word=${COMP_WORDS[index]}
+    if [[ $word == --root ]]; then
+      ((index++))
+    elif [[ $word == -* ]]; then
+      continue
+    elif [[ -z $verb ]]; then
+      verb=$word
+    elif [[ $verb == settings && -z $kind ]]; then
+      kind=$word
+    else
+      ((positional++))
+    fi
+  done
+
+  COMPREPLY=()
+  if [[ $previous == --root ]]; then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -d -- "$current")
+  elif [[ $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
+  elif [[ -z $verb ]]; then
+    mapfile -t COMPREPLY < <(compgen -W "$verbs" -- "$current")
+  elif [[ $verb == load || $verb == load-early ]] && ((positional == 0)); then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -d -- "$current")
+  elif [[ $verb == settings && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'option enforcement' -- "$current")
+  elif [[ $kind == option ]] && ((positional == 0)); then
+    mapfile -t COMPREPLY < <(compgen -W '/UserVars/CheckAccessTemplateEnabled' -- "$current")
+  elif [[ $kind == enforcement ]] && ((positional == 1)); then
+    mapfile -t COMPREPLY < <(compgen -W 'enforcing permissive disabled' -- "$current")
+  fi
+}
+
+complete -F _secpolicy secpolicy
