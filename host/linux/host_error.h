@@ -11,7 +11,7 @@ namespace LinuxHost {
 class HostError : public Braxo::Lib::BraxoException {
  public:
   // `code` is a positive error number such as ENOENT.
-  HostError(int code, const std::string& message) : BraxoException(message), errorNumber(code) {}
+  HostError(int code, const std::string& text) : BraxoException(text), errorNumber(code) {}
 
   // The positive error number.
   int Code() const { return errorNumber; }

@@ -3,33 +3,31 @@
 #include <sys/types.h>
 
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 
+#include "inode_origin.h"
 #include "store.h"
 
 namespace LinuxHost {
 
 class DomainTable;
-class LabelTable;
-class RuleTable;
 class FilePolicyTable;
-
-// Which tardisk an inode came from.
-struct InodeOrigin {
-  dev_t device = 0;
-  ino_t inode = 0;
-  std::string tardisk;  // the bare file name of the tardisk
-};
+class LabelTable;
+class ParameterRuleTable;
+class RuleTable;
+class WorldTable;
 
 // What a kernel with an access-control module keeps: domains, labels, rules, file policies, worlds
 // and inode origins. One database that lives and dies with a boot, shared by all processes: each
 // call is atomic, is seen by the others at once, and outlives its caller. Failures are HostErrors.
-class HostState {
+class HostState : public std::enable_shared_from_this<HostState> {
  public:
   // The calling thread's connection, opened, and the state created with its built-in contents, at
   // first use. The state lies at /run/secpolicy/host.db unless SECPOLICY_HOST_STATE names another
-  // absolute path. The reference holds until the next call of Current().
+  // absolute path. A new connection replaces one whose file is gone, or that a fork left behind.
+  // The reference holds until the next call of Current().
   static HostState& Current();
 
   explicit HostState(const std::string& path);
@@ -41,7 +39,9 @@ class HostState {
   DomainTable& Domains() { return *domains; }
   LabelTable& Labels() { return *labels; }
   RuleTable& Rules() { return *rules; }
+  ParameterRuleTable& ParameterRules() { return *parameterRules; }
   FilePolicyTable& FilePolicies() { return *filePolicies; }
+  WorldTable& Worlds() { return *worlds; }
 
   // Back to the built-in contents, in one step: what a boot starts from.
   void Reset();
@@ -49,8 +49,8 @@ class HostState {
   // Records where inodes came from, all or none; replaces earlier records of the same inodes.
   void RecordOrigins(std::span<const InodeOrigin> origins);
 
-  // The name of the tardisk that the inode came from, empty when it came from none.
-  std::string FindOrigin(dev_t device, ino_t inode);
+  // Where the inode came from; empty when it came from no tardisk.
+  std::optional<InodeOrigin> FindOrigin(dev_t device, ino_t inode);
 
   // The real extended attribute that carries labels on this machine, empty while none is chosen.
   // Answered from memory as long as nothing was committed.
@@ -60,7 +60,8 @@ class HostState {
   // holds.
   const std::string& ChooseLabelAttribute(const std::string& name);
 
-  // Forgets what other processes have changed since it was read. Costs nothing when none did.
+  // Makes the tables forget what other processes have changed since it was read. Looks at the
+  // database only when something was committed since the last call.
   void Refresh();
 
  private:
@@ -68,7 +69,10 @@ class HostState {
   std::unique_ptr<DomainTable> domains;
   std::unique_ptr<LabelTable> labels;
   std::unique_ptr<RuleTable> rules;
+  std::unique_ptr<ParameterRuleTable> parameterRules;
   std::unique_ptr<FilePolicyTable> filePolicies;
+  std::unique_ptr<WorldTable> worlds;
+  bool marked = false;
   Store::CommitMark seen{};
   std::string labelAttribute;
 };

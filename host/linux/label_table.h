@@ -1,15 +1,18 @@
 #pragma once
 
+#include <cstdint>
 #include <map>
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
-#include "store.h"
+#include "text_map.h"
 
 namespace LinuxHost {
 
 class HostState;
+class Transaction;
 
 // The identifier that no label ever has; what a lookup of an unknown label answers.
 constexpr unsigned int kNoLabel = 1;
@@ -18,40 +21,42 @@ constexpr unsigned int kNoLabel = 1;
 constexpr char kUnlabeled[] = "unlabeled";
 constexpr char kDefaultTardiskLabel[] = "tardiskDefault";
 
-// The object labels. Answered from memory as long as no other process has changed them.
+// The object labels, as of the last HostState::Refresh(). Failures are HostErrors.
 class LabelTable {
  public:
   explicit LabelTable(HostState& owner);
 
   // The identifier of the label `name`, kNoLabel when there is none.
-  unsigned int Lookup(const std::string& name);
+  unsigned int Lookup(std::string_view name);
 
-  // The name of the label `id`. Throws HostError when there is none.
+  // The name of the label `id`. Throws when there is none.
   const std::string& Name(unsigned int id);
 
   // True for the labels that are built in.
-  static bool IsPredefined(const std::string& name);
+  static bool IsPredefined(std::string_view name);
 
   // All labels with their identifiers.
   std::map<std::string, long> All();
 
-  // Adds those of `names` that are missing, all or none. Identifiers are never used again within
-  // one state. Throws HostError for a name that cannot be a label.
-  void Add(const std::vector<std::string>& names);
+  // Adds those of `added` that are missing, all or none. Identifiers are never used again within
+  // one state. Throws for a name that cannot be a label.
+  void Add(const std::vector<std::string>& added);
 
-  // Removes labels, and the rules that name them; unknown and predefined ones stay out of it.
-  void Remove(const std::vector<std::string>& names);
+  // Removes labels, and the rules that name them; unknown and predefined ones are left out.
+  void Remove(const std::vector<std::string>& removed);
 
-  // Called by HostState with the version that the state is at now.
+  // The version of the table that the state is at now.
+  std::int64_t Version() const { return version; }
   void Notice(std::int64_t currentVersion);
 
  private:
   void Load();
+  void Commit(Transaction& transaction, int changes);
 
   HostState& state;
   std::int64_t version = 0;
   bool loaded = false;
-  std::unordered_map<std::string, unsigned int> identifiers;
+  TextMap<unsigned int> identifiers;
   std::unordered_map<unsigned int, std::string> names;
 };
 

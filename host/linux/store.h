@@ -20,8 +20,8 @@ namespace LinuxHost {
 struct StoreLayout {
   const char* purpose;         // what it is, in messages: "host state"
   const char* remedy;          // what to do with one that cannot be used, a whole sentence
-  std::int32_t applicationId;  // marks the file as ours
-  std::int32_t version;        // of the schema; a newer one is refused
+  std::int32_t applicationId;  // marks the file as ours; not 0
+  std::int32_t version;        // of the schema; a file of any other one is refused; not 0
   const char* schema;          // SQL statements that fill an empty database
   bool survivesPowerLoss;      // false: survives any death of its users, not of the machine
 };
@@ -38,11 +38,13 @@ class Sql {
   const char* text;
 };
 
+class Store;
+
 // The result rows of one SELECT; frees the statement for its next use when destroyed. At most one
 // for each statement at a time.
 class Rows {
  public:
-  explicit Rows(sqlite3_stmt* running) : statement(running) {}
+  Rows(Store& source, sqlite3_stmt* running) : store(source), statement(running) {}
   Rows(const Rows&) = delete;
   Rows& operator=(const Rows&) = delete;
   ~Rows();
@@ -55,10 +57,11 @@ class Rows {
   std::string Text(int column) const;
 
  private:
+  Store& store;
   sqlite3_stmt* statement;
 };
 
-// One open database. Not shared between threads; useless, and harmless, in a forked child.
+// One open database. Not shared between threads; in a forked child every use fails.
 class Store {
  public:
   // Identifies what has been committed so far, by anyone.
@@ -81,8 +84,7 @@ class Store {
   template <class... Args>
   int Run(Sql sql, const Args&... args) {
     sqlite3_stmt* statement = Prepared(sql);
-    [[maybe_unused]] int index = 0;
-    (BindArgument(statement, ++index, args), ...);
+    BindAll(statement, args...);
     return Execute(statement);
   }
 
@@ -90,38 +92,54 @@ class Store {
   template <class... Args>
   [[nodiscard]] Rows Select(Sql sql, const Args&... args) {
     sqlite3_stmt* statement = Prepared(sql);
-    [[maybe_unused]] int index = 0;
-    (BindArgument(statement, ++index, args), ...);
-    return Rows(statement);
+    BindAll(statement, args...);
+    return Rows(*this, statement);
   }
 
   // The row identifier of the last row inserted through this object.
   std::int64_t LastInsertId() const;
 
-  // Writes the current mark to `*mark` and returns true; false while another process is just
-  // committing. Costs no system call: two equal marks mean that nothing was committed between.
+  // Writes the current mark to `*mark` and returns true; false while it cannot be told. Makes no
+  // system call. Two equal marks mean that nothing was committed between them.
   bool ReadCommitMark(CommitMark* mark) const;
 
  private:
+  friend class Rows;
   friend class Transaction;
 
-  void BindArgument(sqlite3_stmt* statement, int index, std::string_view value);
+  template <class... Args>
+  void BindAll([[maybe_unused]] sqlite3_stmt* statement, const Args&... args) {
+    [[maybe_unused]] int index = 0;
+    (BindOne(statement, ++index, args), ...);
+  }
   template <std::integral Integer>
-  void BindArgument(sqlite3_stmt* statement, int index, Integer value) {
+  void BindOne(sqlite3_stmt* statement, int index, Integer value) {
     BindInteger(statement, index, static_cast<std::int64_t>(value));
   }
+  void BindOne(sqlite3_stmt* statement, int index, std::string_view value) {
+    BindText(statement, index, value);
+  }
   void BindInteger(sqlite3_stmt* statement, int index, std::int64_t value);
+  void BindText(sqlite3_stmt* statement, int index, std::string_view value);
 
   sqlite3_stmt* Prepared(Sql sql);
   int Execute(sqlite3_stmt* statement);
-  void RunScript(const char* script);
-  std::int32_t ReadPragma(const char* pragma);
-  void Open(const StoreLayout& layout);
-  bool IsReady(const StoreLayout& layout);
-  void Create(const StoreLayout& layout);
+  void RunScript(const std::string& script);
+  std::int64_t ReadInteger(const char* query);
+  [[noreturn]] void Fail(int result) const;
+  [[noreturn]] void Refuse(int code, const std::string& reason) const;
 
+  void PrepareFile();
+  void Open();
+  bool IsReady();
+  void Create();
+  void SwitchToWriteAheadLog();
+  void FindCommitHeader();
+  void Close();
+
+  const StoreLayout& layout;
   std::string file;
-  std::string remedy;
+  std::string directory;
   pid_t owner;
   dev_t device = 0;
   ino_t inode = 0;
@@ -142,7 +160,6 @@ class Transaction {
 
  private:
   Store& store;
-  bool open = true;
 };
 
 }  // namespace LinuxHost

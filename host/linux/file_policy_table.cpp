@@ -1,0 +1,145 @@
+#include "file_policy_table.h"
+
+#include <array>
+#include <cerrno>
+
+#include "braxo/misc/strcat.h"
+#include "domain_table.h"
+#include "host_error.h"
+#include "host_state.h"
+#include "world_table.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+struct PermissionLetter {
+  char letter;
+  unsigned int bit;
+};
+constexpr std::array<PermissionLetter, 3> kLetters = {{{'r', 0x1}, {'w', 0x2}, {'x', 0x10}}};
+
+void RequirePath(const std::string& path) {
+  if (path.empty()) throw HostError(EINVAL, "a file policy needs a path");
+  if (path.find('\0') != std::string::npos) {
+    throw HostError(EINVAL, StrCat("path '", path.c_str(), "' goes on after a NUL byte"));
+  }
+  if (path.size() > kMaxPolicyPath) {
+    throw HostError(ENAMETOOLONG, StrCat("path '", path, "' is too long: ", path.size(),
+                                         " bytes, at most ", kMaxPolicyPath));
+  }
+}
+
+void RequirePermission(unsigned int permission) {
+  if ((permission & ~kAllPermissions) != 0) {
+    throw HostError(EINVAL, StrCat("unknown permission bits in ", permission));
+  }
+}
+
+void RequireWorld(int world) {
+  if (world != 0) WorldTable::RequireAlive(world);
+}
+
+}  // namespace
+
+unsigned int ParsePermissions(const std::string& letters) {
+  unsigned int permission = 0;
+  for (const char letter : letters) {
+    unsigned int bit = 0;
+    for (const auto& row : kLetters) {
+      if (row.letter == letter) bit = row.bit;
+    }
+    if (bit == 0 || (permission & bit) != 0) {
+      throw HostError(EINVAL, StrCat("permissions '", letters,
+                                     "' must be letters of \"rwx\", each at most once"));
+    }
+    permission |= bit;
+  }
+  return permission;
+}
+
+std::string FormatPermissions(unsigned int permission) {
+  std::string letters;
+  for (const auto& row : kLetters) {
+    if ((permission & row.bit) != 0) letters += row.letter;
+  }
+  return letters;
+}
+
+FilePolicyTable::FilePolicyTable(HostState& owner) : state(owner) {}
+
+void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
+  Transaction transaction(state.Database());
+  state.Refresh();
+  for (const auto& policy : policies) {
+    if (const auto refusal = DomainRefusal(state, policy.domain)) throw *refusal;
+    RequireWorld(policy.world);
+    RequirePath(policy.path);
+    RequirePermission(policy.permission);
+    state.Database().Run(
+        "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line) "
+        "VALUES (?1, ?2, ?3, ?4, ?5)",
+        policy.domain.id, policy.world, policy.path, policy.permission, policy.line);
+  }
+  transaction.Commit();
+}
+
+void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
+  state.Domains().Get(domainId);
+  const int removed = state.Database().Run(
+      "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
+      path);
+  if (removed == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+}
+
+void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
+                             unsigned int permission) {
+  state.Domains().Get(domainId);
+  RequirePermission(permission);
+  const int updated = state.Database().Run(
+      "UPDATE file_policy SET permission = ?3 WHERE domain_id = ?1 AND path = ?2", domainId, path,
+      permission);
+  if (updated == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+}
+
+void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& newPath) {
+  RequirePath(newPath);
+  const int moved = state.Database().Run(
+      "UPDATE OR REPLACE file_policy SET path = ?2 WHERE path = ?1 AND world <> 0", oldPath,
+      newPath);
+  if (moved == 0) throw HostError(ENOENT, StrCat("no world has a file policy for '", oldPath, "'"));
+}
+
+unsigned int FilePolicyTable::Count(unsigned int domainId) {
+  state.Domains().Get(domainId);
+  Rows rows =
+      state.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
+  rows.Next();
+  return static_cast<unsigned int>(rows.Integer(0));
+}
+
+std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
+  state.Domains().Get(domainId);
+  std::vector<FilePolicy> policies;
+  Rows rows = state.Database().Select(
+      "SELECT world, path, permission, line FROM file_policy WHERE domain_id = ?1 ORDER BY id",
+      domainId);
+  while (rows.Next()) {
+    policies.push_back({.domain = {domainId, {}},
+                        .world = static_cast<int>(rows.Integer(0)),
+                        .path = rows.Text(1),
+                        .permission = static_cast<unsigned int>(rows.Integer(2)),
+                        .line = static_cast<unsigned int>(rows.Integer(3))});
+  }
+  return policies;
+}
+
+Rows FilePolicyTable::Read(unsigned int domainId) {
+  return state.Database().Select(
+      "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
+      "ORDER BY id",
+      domainId);
+}
+
+}  // namespace LinuxHost

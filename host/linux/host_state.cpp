@@ -1,0 +1,200 @@
+#include "host_state.h"
+
+#include <cstdlib>
+
+#include "domain_table.h"
+#include "file_policy_table.h"
+#include "label_table.h"
+#include "parameter_rule_table.h"
+#include "rule_table.h"
+#include "world_table.h"
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kDefaultPath[] = "/run/secpolicy/host.db";
+constexpr char kPathVariable[] = "SECPOLICY_HOST_STATE";
+
+// Rules and policies are read in the order of their `id`, which is that of their installation.
+constexpr char kSchema[] = R"sql(
+CREATE TABLE state (
+  one INTEGER PRIMARY KEY CHECK (one = 1),
+  domain_version INTEGER NOT NULL,
+  label_version INTEGER NOT NULL,
+  label_attribute TEXT NOT NULL
+);
+CREATE TABLE domain (
+  id INTEGER PRIMARY KEY,
+  name TEXT NOT NULL UNIQUE,
+  level TEXT NOT NULL,
+  default_rules INTEGER NOT NULL,
+  created_at_run_time INTEGER NOT NULL
+);
+CREATE TABLE role (name TEXT PRIMARY KEY, domain_id INTEGER NOT NULL) WITHOUT ROWID;
+CREATE TABLE guest_service (
+  domain_id INTEGER NOT NULL,
+  service TEXT NOT NULL,
+  PRIMARY KEY (domain_id, service)
+) WITHOUT ROWID;
+CREATE TABLE label (
+  id INTEGER PRIMARY KEY AUTOINCREMENT CHECK (id BETWEEN 2 AND 4294967295),
+  name TEXT NOT NULL UNIQUE
+);
+CREATE TABLE rule (
+  id INTEGER PRIMARY KEY,
+  domain_id INTEGER NOT NULL,
+  kind TEXT NOT NULL,
+  word1 TEXT NOT NULL,
+  word2 TEXT NOT NULL,
+  word3 TEXT NOT NULL,
+  granted INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  UNIQUE (domain_id, kind, word1, word2, word3)
+);
+CREATE INDEX transition_target ON rule (word2) WHERE kind = 'domain transition';
+CREATE TABLE parameter_rule (
+  id INTEGER PRIMARY KEY,
+  domain_id INTEGER NOT NULL,
+  parameter_check TEXT NOT NULL,
+  first_value INTEGER NOT NULL,
+  last_value INTEGER NOT NULL,
+  first_word TEXT NOT NULL,
+  last_word TEXT NOT NULL,
+  granted INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  UNIQUE (domain_id, parameter_check, first_value, last_value)
+);
+CREATE TABLE file_policy (
+  id INTEGER PRIMARY KEY,
+  domain_id INTEGER NOT NULL,
+  world INTEGER NOT NULL,
+  path TEXT NOT NULL,
+  permission INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  UNIQUE (domain_id, world, path)
+);
+CREATE TABLE world (
+  id INTEGER PRIMARY KEY,
+  started INTEGER NOT NULL,
+  domain_id INTEGER NOT NULL
+);
+CREATE TABLE inode_origin (
+  device INTEGER NOT NULL,
+  inode INTEGER NOT NULL,
+  tardisk TEXT NOT NULL,
+  path TEXT NOT NULL,
+  birth INTEGER NOT NULL,
+  PRIMARY KEY (device, inode)
+) WITHOUT ROWID;
+INSERT INTO state VALUES (1, 1, 1, '');
+INSERT INTO domain VALUES (0, 'hostDom', 'permissive', 0, 0);
+INSERT INTO label VALUES (2, 'unlabeled'), (3, 'tardiskDefault');
+)sql";
+
+constexpr StoreLayout kLayout = {
+    .purpose = "host state",
+    .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
+    .applicationId = 0x5a6f7276,
+    .version = 1,
+    .schema = kSchema,
+    .survivesPowerLoss = false,
+};
+
+std::string WantedPath() {
+  const char* path = secure_getenv(kPathVariable);
+  return path != nullptr && *path != '\0' ? path : kDefaultPath;
+}
+
+}  // namespace
+
+HostState& HostState::Current() {
+  thread_local std::shared_ptr<HostState> current;
+  const std::string path = WantedPath();
+  if (current == nullptr || current->store.Path() != path || !current->store.IsCurrent()) {
+    current.reset();
+    current = std::make_shared<HostState>(path);
+  }
+  return *current;
+}
+
+HostState::HostState(const std::string& path)
+    : store(path, kLayout),
+      domains(std::make_unique<DomainTable>(*this)),
+      labels(std::make_unique<LabelTable>(*this)),
+      rules(std::make_unique<RuleTable>(*this)),
+      parameterRules(std::make_unique<ParameterRuleTable>(*this)),
+      filePolicies(std::make_unique<FilePolicyTable>(*this)),
+      worlds(std::make_unique<WorldTable>(*this)) {
+  Refresh();
+}
+
+HostState::~HostState() = default;
+
+void HostState::Refresh() {
+  // The mark is taken first: what is then read is at least as new.
+  Store::CommitMark now{};
+  const bool told = store.ReadCommitMark(&now);
+  if (told && marked && now == seen) return;
+  Rows rows = store.Select("SELECT domain_version, label_version, label_attribute FROM state");
+  rows.Next();
+  domains->Notice(rows.Integer(0));
+  labels->Notice(rows.Integer(1));
+  labelAttribute = rows.Text(2);
+  marked = told;
+  seen = now;
+}
+
+void HostState::Reset() {
+  Transaction transaction(store);
+  store.Run("DELETE FROM domain");
+  store.Run("DELETE FROM role");
+  store.Run("DELETE FROM guest_service");
+  store.Run("DELETE FROM label");
+  store.Run("DELETE FROM sqlite_sequence");
+  store.Run("DELETE FROM rule");
+  store.Run("DELETE FROM parameter_rule");
+  store.Run("DELETE FROM file_policy");
+  store.Run("DELETE FROM world");
+  store.Run("DELETE FROM inode_origin");
+  store.Run("INSERT INTO domain VALUES (0, 'hostDom', 'permissive', 0, 0)");
+  store.Run("INSERT INTO label VALUES (2, 'unlabeled'), (3, 'tardiskDefault')");
+  // The versions go on, so that every process notices.
+  store.Run(
+      "UPDATE state SET domain_version = domain_version + 1, label_version = label_version + 1, "
+      "label_attribute = ''");
+  transaction.Commit();
+  Refresh();
+}
+
+void HostState::RecordOrigins(std::span<const InodeOrigin> origins) {
+  Transaction transaction(store);
+  for (const auto& origin : origins) {
+    store.Run("INSERT OR REPLACE INTO inode_origin VALUES (?1, ?2, ?3, ?4, ?5)", origin.device,
+              origin.inode, origin.tardisk, origin.path, origin.birth);
+  }
+  transaction.Commit();
+}
+
+std::optional<InodeOrigin> HostState::FindOrigin(dev_t device, ino_t inode) {
+  Rows rows =
+      store.Select("SELECT tardisk, path, birth FROM inode_origin WHERE device = ?1 AND inode = ?2",
+                   device, inode);
+  if (!rows.Next()) return std::nullopt;
+  return InodeOrigin{.device = device,
+                     .inode = inode,
+                     .tardisk = rows.Text(0),
+                     .path = rows.Text(1),
+                     .birth = rows.Integer(2)};
+}
+
+const std::string& HostState::LabelAttribute() {
+  Refresh();
+  return labelAttribute;
+}
+
+const std::string& HostState::ChooseLabelAttribute(const std::string& name) {
+  store.Run("UPDATE state SET label_attribute = ?1 WHERE label_attribute = ''", name);
+  return LabelAttribute();
+}
+
+}  // namespace LinuxHost

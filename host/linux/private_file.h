@@ -1,0 +1,13 @@
+#pragma once
+
+#include <string>
+
+namespace LinuxHost {
+
+// Makes sure that `path` is a regular file in a directory of its own, both of which only this user
+// and the superuser may change; creates the file (mode 0600) and the last directory (0700) when
+// they are missing. `purpose` says in messages what the file is. Throws HostError, changing
+// nothing, when something else is there.
+void PreparePrivateFile(const std::string& path, const std::string& purpose);
+
+}  // namespace LinuxHost

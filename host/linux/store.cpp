@@ -1,0 +1,301 @@
+#include "store.h"
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <cstring>
+#include <vector>
+
+#include "braxo/misc/strcat.h"
+#include "host_error.h"
+#include "private_file.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+constexpr unsigned int kShortWaitMicroseconds = 100;
+constexpr unsigned int kLongWaitMicroseconds = 1000;
+constexpr int kShortWaits = 100;
+constexpr int kWaits = 30'000;
+
+// The first waits are short, since a call holds the database for microseconds; a batch may hold it
+// for a second. Gives up after half a minute.
+int WaitForOthers(void* /*unused*/, int waits) {
+  usleep(waits < kShortWaits ? kShortWaitMicroseconds : kLongWaitMicroseconds);
+  return waits < kWaits ? 1 : 0;
+}
+
+int ErrorNumber(int result) {
+  switch (result & 0xff) {
+    case SQLITE_BUSY:
+    case SQLITE_LOCKED:
+      return EBUSY;
+    case SQLITE_FULL:
+      return ENOSPC;
+    case SQLITE_READONLY:
+      return EROFS;
+    case SQLITE_NOMEM:
+      return ENOMEM;
+    case SQLITE_PERM:
+    case SQLITE_AUTH:
+    case SQLITE_CANTOPEN:
+      return EACCES;
+    default:
+      return EIO;
+  }
+}
+
+bool IsDamaged(int result) {
+  return (result & 0xff) == SQLITE_CORRUPT || (result & 0xff) == SQLITE_NOTADB;
+}
+
+// Connections that a fork left in a child. To close one would act on the parent's files.
+void Abandon(sqlite3* database) {
+  static auto* abandoned = new std::vector<sqlite3*>;
+  abandoned->push_back(database);
+}
+
+// Held while a database is set up, so that one process does it and the others wait.
+class DirectoryLock {
+ public:
+  explicit DirectoryLock(const std::string& directory)
+      : descriptor(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
+    if (descriptor < 0 || flock(descriptor, LOCK_EX) != 0) {
+      const int code = errno;
+      if (descriptor >= 0) close(descriptor);
+      throw HostError(code, StrCat("Unable to lock ", directory, ": ", std::strerror(code)));
+    }
+  }
+  DirectoryLock(const DirectoryLock&) = delete;
+  DirectoryLock& operator=(const DirectoryLock&) = delete;
+  ~DirectoryLock() { close(descriptor); }
+
+ private:
+  int descriptor;
+};
+
+}  // namespace
+
+Rows::~Rows() { sqlite3_reset(statement); }
+
+bool Rows::Next() {
+  const int result = sqlite3_step(statement);
+  if (result == SQLITE_ROW) return true;
+  if (result != SQLITE_DONE) store.Fail(result);
+  return false;
+}
+
+std::int64_t Rows::Integer(int column) const { return sqlite3_column_int64(statement, column); }
+
+std::string Rows::Text(int column) const {
+  const unsigned char* text = sqlite3_column_text(statement, column);
+  if (text == nullptr) return {};
+  return {reinterpret_cast<const char*>(text),
+          static_cast<std::size_t>(sqlite3_column_bytes(statement, column))};
+}
+
+Store::Store(const std::string& path, const StoreLayout& wanted)
+    : layout(wanted), file(path), owner(getpid()) {
+  PreparePrivateFile(file, layout.purpose);
+  const auto slash = file.rfind('/');
+  directory = slash == 0 ? "/" : file.substr(0, slash);
+  try {
+    Open();
+    if (!IsReady()) Create();
+    FindCommitHeader();
+  } catch (...) {
+    Close();
+    throw;
+  }
+}
+
+Store::~Store() { Close(); }
+
+void Store::Close() {
+  if (database == nullptr) return;
+  if (getpid() != owner) {
+    Abandon(database);
+    return;
+  }
+  // The log is found by name: that of a file which is no longer there belongs to another database.
+  if (!IsCurrent()) sqlite3_db_config(database, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+  for (const auto& [text, statement] : statements) sqlite3_finalize(statement);
+  sqlite3_close_v2(database);
+  database = nullptr;
+}
+
+bool Store::IsCurrent() const {
+  struct stat status {};
+  return getpid() == owner && stat(file.c_str(), &status) == 0 && status.st_dev == device &&
+         status.st_ino == inode;
+}
+
+void Store::Open() {
+  const int result =
+      sqlite3_open_v2(file.c_str(), &database,
+                      SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOFOLLOW | SQLITE_OPEN_NOMUTEX, nullptr);
+  if (result != SQLITE_OK) Fail(result);
+  struct stat status {};
+  if (stat(file.c_str(), &status) != 0) Fail(SQLITE_CANTOPEN);
+  device = status.st_dev;
+  inode = status.st_ino;
+  sqlite3_extended_result_codes(database, 1);
+  sqlite3_busy_handler(database, WaitForOthers, nullptr);
+  if (sqlite3_db_readonly(database, "main") == 1) Refuse(EROFS, "cannot be written");
+  RunScript(layout.survivesPowerLoss ? "PRAGMA synchronous = FULL" : "PRAGMA synchronous = OFF");
+}
+
+bool Store::IsReady() {
+  const auto applicationId = ReadInteger("PRAGMA application_id");
+  const auto version = ReadInteger("PRAGMA user_version");
+  if (applicationId == layout.applicationId && version == layout.version) return true;
+  if (applicationId == layout.applicationId) {
+    Refuse(EPROTO, StrCat("has schema ", version, ", this program works with schema ",
+                          layout.version, ": it was made by another version of it"));
+  }
+  if (applicationId != 0 || version != 0 ||
+      ReadInteger("SELECT count(*) FROM sqlite_schema") != 0) {
+    Refuse(EPROTO, "is the database of something else");
+  }
+  return false;
+}
+
+void Store::Create() {
+  const DirectoryLock lock(directory);
+  if (IsReady()) return;
+  SwitchToWriteAheadLog();
+  Transaction transaction(*this);
+  RunScript(StrCat(layout.schema, ";PRAGMA application_id = ", layout.applicationId,
+                   ";PRAGMA user_version = ", layout.version));
+  transaction.Commit();
+}
+
+void Store::SwitchToWriteAheadLog() {
+  sqlite3_stmt* statement = nullptr;
+  int result = sqlite3_prepare_v2(database, "PRAGMA journal_mode = WAL", -1, &statement, nullptr);
+  // While others read the file the engine refuses at once instead of waiting.
+  for (int waits = 0; result == SQLITE_OK || (result & 0xff) == SQLITE_BUSY; ++waits) {
+    sqlite3_reset(statement);
+    result = sqlite3_step(statement);
+    if ((result & 0xff) == SQLITE_BUSY && WaitForOthers(nullptr, waits) == 0) break;
+  }
+  const bool switched =
+      result == SQLITE_ROW &&
+      std::strcmp(reinterpret_cast<const char*>(sqlite3_column_text(statement, 0)), "wal") == 0;
+  sqlite3_finalize(statement);
+  if (result != SQLITE_ROW) Fail(result);
+  if (!switched) Refuse(ENOTSUP, "lies on a file system without shared memory");
+}
+
+// The log's index is a file that every user of the database maps. It begins with two copies of a
+// header that each commit rewrites, and by which the engine itself tells whether its cache is
+// valid; the format is part of the engine's published file formats.
+void Store::FindCommitHeader() {
+  ReadInteger("PRAGMA user_version");
+  sqlite3_file* main = nullptr;
+  if (sqlite3_file_control(database, "main", SQLITE_FCNTL_FILE_POINTER, &main) != SQLITE_OK) return;
+  if (main->pMethods == nullptr || main->pMethods->iVersion < 2) return;
+  constexpr int kRegionSize = 32'768;
+  volatile void* region = nullptr;
+  if (main->pMethods->xShmMap(main, 0, kRegionSize, 0, &region) != SQLITE_OK) return;
+  commitHeader = static_cast<const volatile std::uint32_t*>(region);
+}
+
+bool Store::ReadCommitMark(CommitMark* mark) const {
+  if (commitHeader == nullptr) return false;
+  CommitMark second;
+  for (std::size_t word = 0; word < mark->size(); ++word) (*mark)[word] = commitHeader[word];
+  std::atomic_thread_fence(std::memory_order_acquire);
+  for (std::size_t word = 0; word < second.size(); ++word) {
+    second[word] = commitHeader[mark->size() + word];
+  }
+  return *mark == second;
+}
+
+std::int64_t Store::LastInsertId() const { return sqlite3_last_insert_rowid(database); }
+
+sqlite3_stmt* Store::Prepared(Sql sql) {
+  if (getpid() != owner) {
+    throw HostError(EBADF, StrCat("The ", layout.purpose,
+                                  " was opened before this process was forked: open it again"));
+  }
+  auto& statement = statements[sql.Text()];
+  if (statement != nullptr) return statement;
+  const int result =
+      sqlite3_prepare_v3(database, sql.Text(), -1, SQLITE_PREPARE_PERSISTENT, &statement, nullptr);
+  if (result != SQLITE_OK) Fail(result);
+  return statement;
+}
+
+void Store::BindInteger(sqlite3_stmt* statement, int index, std::int64_t value) {
+  const int result = sqlite3_bind_int64(statement, index, value);
+  if (result != SQLITE_OK) Fail(result);
+}
+
+void Store::BindText(sqlite3_stmt* statement, int index, std::string_view value) {
+  const int result = sqlite3_bind_text64(statement, index, value.empty() ? "" : value.data(),
+                                         value.size(), SQLITE_STATIC, SQLITE_UTF8);
+  if (result != SQLITE_OK) Fail(result);
+}
+
+int Store::Execute(sqlite3_stmt* statement) {
+  const int before = sqlite3_total_changes(database);
+  const int result = sqlite3_step(statement);
+  if (result != SQLITE_DONE) {
+    // Built while the engine still knows what went wrong.
+    try {
+      Fail(result);
+    } catch (const HostError&) {
+      sqlite3_reset(statement);
+      throw;
+    }
+  }
+  sqlite3_reset(statement);
+  return sqlite3_total_changes(database) - before;
+}
+
+void Store::RunScript(const std::string& script) {
+  const int result = sqlite3_exec(database, script.c_str(), nullptr, nullptr, nullptr);
+  if (result != SQLITE_OK) Fail(result);
+}
+
+std::int64_t Store::ReadInteger(const char* query) {
+  sqlite3_stmt* statement = nullptr;
+  int result = sqlite3_prepare_v2(database, query, -1, &statement, nullptr);
+  if (result == SQLITE_OK) result = sqlite3_step(statement);
+  const std::int64_t value = result == SQLITE_ROW ? sqlite3_column_int64(statement, 0) : 0;
+  sqlite3_finalize(statement);
+  if (result != SQLITE_ROW) Fail(result);
+  return value;
+}
+
+void Store::Fail(int result) const {
+  const char* reason = database != nullptr ? sqlite3_errmsg(database) : sqlite3_errstr(result);
+  if (IsDamaged(result)) Refuse(EIO, StrCat("is damaged or no such thing (", reason, ")"));
+  throw HostError(ErrorNumber(result),
+                  StrCat("Unable to use the ", layout.purpose, " ", file, ": ", reason));
+}
+
+void Store::Refuse(int code, const std::string& reason) const {
+  throw HostError(code, StrCat("Unable to use the ", layout.purpose, " ", file, ": it ", reason,
+                               ". ", layout.remedy));
+}
+
+Transaction::Transaction(Store& target) : store(target) { store.Run("BEGIN IMMEDIATE"); }
+
+Transaction::~Transaction() {
+  if (sqlite3_get_autocommit(store.database) == 0) {
+    sqlite3_exec(store.database, "ROLLBACK", nullptr, nullptr, nullptr);
+  }
+}
+
+void Transaction::Commit() { store.Run("COMMIT"); }
+
+}  // namespace LinuxHost
