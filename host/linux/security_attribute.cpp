@@ -1,0 +1,84 @@
+#include "security_attribute.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <sys/xattr.h>
+
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+#include "descriptor.h"
+#include "host_error.h"
+#include "host_state.h"
+#include "zorvan/kernel.h"
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kContractName[] = "zorvan.security";
+constexpr char kPrivilegedName[] = "security.zorvan";
+constexpr char kOrdinaryName[] = "user.zorvan.security";
+
+// Tries it out on a file without a name, which vanishes with its descriptor.
+bool MayWritePrivileged(const char* directory) {
+  const Descriptor file(open(directory, O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
+  const std::uint32_t value = 0;
+  return file.IsOpen() && fsetxattr(file.Number(), kPrivilegedName, &value, sizeof value, 0) == 0;
+}
+
+std::string RecordedOrChosen(HostState& state) {
+  if (!state.LabelAttribute().empty()) return state.LabelAttribute();
+  // Labels are put on the root file system; where that takes no new files, the file system of the
+  // state tells at least what the process may do.
+  const std::string stateDirectory = std::filesystem::path(state.Database().Path()).parent_path();
+  const bool privileged = MayWritePrivileged("/") || MayWritePrivileged(stateDirectory.c_str());
+  return state.ChooseLabelAttribute(privileged ? kPrivilegedName : kOrdinaryName);
+}
+
+// The real name for `name`, or null with errno set as for a name that no file system knows.
+const char* RealName(const char* name) {
+  if (name == nullptr || std::strcmp(name, kContractName) != 0) {
+    errno = name == nullptr ? EFAULT : EOPNOTSUPP;
+    return nullptr;
+  }
+  try {
+    return LabelAttribute().c_str();
+  } catch (const HostError& error) {
+    errno = error.Code();
+    return nullptr;
+  }
+}
+
+}  // namespace
+
+const std::string& LabelAttribute() {
+  // Asked for each labelled file, so answered without a look at the state.
+  static const std::string name = RecordedOrChosen(HostState::Current());
+  return name;
+}
+
+bool CanCarryLabel(mode_t mode) {
+  if (S_ISLNK(mode)) return false;
+  return S_ISREG(mode) || S_ISDIR(mode) || LabelAttribute() == kPrivilegedName;
+}
+
+int GiveFirstLabel(const char* path, std::uint32_t id) {
+  return lsetxattr(path, LabelAttribute().c_str(), &id, sizeof id, 0);
+}
+
+}  // namespace LinuxHost
+
+namespace Zorvan::Kernel {
+
+int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
+  const char* realName = LinuxHost::RealName(name);
+  return realName == nullptr ? -1 : setxattr(path, realName, value, size, flags);
+}
+
+ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
+  const char* realName = LinuxHost::RealName(name);
+  return realName == nullptr ? -1 : getxattr(path, realName, value, size);
+}
+
+}  // namespace Zorvan::Kernel

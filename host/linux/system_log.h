@@ -1,0 +1,17 @@
+#pragma once
+
+#include <string>
+
+// Where this host's log lines go, and what the command may ask of it.
+namespace LinuxHost {
+
+// From now on shows information lines on standard error too, one a line, as they are logged.
+// While they are shown the host takes every line itself: SyslogIsRunning() answers false, and
+// WriteToKlog() hands the line on to a running system log daemon in the form that the library
+// would have given it, else to the kernel log. So each line still reaches the log it belongs to.
+__attribute__((visibility("default"))) void ShowInformation();
+
+// Logs one information line of the host's own, by the same road as those of the library.
+void LogInformation(const std::string& message);
+
+}  // namespace LinuxHost
