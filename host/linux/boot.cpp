@@ -73,6 +73,15 @@ Writer NewWriter() {
 
 std::string_view TextOf(const char* text) { return text == nullptr ? "" : text; }
 
+// Why the last step failed. The library leaves the system's own text out, and tells a malformed
+// archive by an error number of the system, EILSEQ, that would only confuse.
+std::string ReasonOf(archive* handle) {
+  const std::string_view text = TextOf(archive_error_string(handle));
+  const int error = archive_errno(handle);
+  if (error <= 0 || error == EILSEQ) return std::string(text);
+  return StrCat(text, ": ", std::strerror(error));
+}
+
 // The components of `path` that lead somewhere: neither empty ones nor ".".
 std::vector<std::string_view> Components(std::string_view path) {
   std::vector<std::string_view> components;
@@ -104,7 +113,7 @@ class Unpacking {
     while (archive_entry* entry = NextEntry()) Unpack(entry);
     // Attributes of directories are set last, or they would change while the files are written.
     if (archive_write_close(writer.get()) != ARCHIVE_OK) {
-      Fail(archive_errno(writer.get()), TextOf(archive_error_string(writer.get())));
+      Fail(archive_errno(writer.get()), ReasonOf(writer.get()));
     }
   }
 
@@ -117,7 +126,7 @@ class Unpacking {
   }
 
   [[noreturn]] void FailReading() const {
-    Fail(archive_errno(reader.get()), TextOf(archive_error_string(reader.get())));
+    Fail(archive_errno(reader.get()), ReasonOf(reader.get()));
   }
 
   [[noreturn]] void Refuse(std::string_view path, std::string_view reason) const {
@@ -139,8 +148,7 @@ class Unpacking {
     if (IsAlreadyThere(path, entry)) return;
     RefuseUnwanted(path, entry);
     if (archive_read_extract2(reader.get(), entry, writer.get()) != ARCHIVE_OK) {
-      const int error = archive_errno(reader.get());
-      Fail(error, StrCat(path, ": ", TextOf(archive_error_string(reader.get()))));
+      Fail(archive_errno(reader.get()), StrCat(path, ": ", ReasonOf(reader.get())));
     }
     Settle(path);
   }
