@@ -7,7 +7,7 @@ _secpolicy() {
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
     if [[ $word == --root ]]; then
-      ((index++))
+      index=$((index + 1))
     elif [[ $word == -* ]]; then
       continue
     elif [[ -z $verb ]]; then
@@ -15,7 +15,7 @@ _secpolicy() {
     elif [[ $verb == settings && -z $kind ]]; then
       kind=$word
     else
-      ((positional++))
+      positional=$((positional + 1))
     fi
   done
 

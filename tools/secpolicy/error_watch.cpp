@@ -14,9 +14,7 @@ ErrorWatch::ErrorWatch(std::ostream& watched) : stream(watched), target(watched.
 ErrorWatch::~ErrorWatch() { stream.rdbuf(target); }
 
 ErrorWatch::int_type ErrorWatch::overflow(int_type letter) {
-  if (traits_type::eq_int_type(letter, traits_type::eof())) {
-    return traits_type::not_eof(letter);
-  }
+  if (traits_type::eq_int_type(letter, traits_type::eof())) return traits_type::not_eof(letter);
   Note(traits_type::to_char_type(letter));
   return target->sputc(traits_type::to_char_type(letter));
 }

@@ -46,9 +46,7 @@ void OnTerminate() {
   const RunningCall& running = *runningCall;
   if (!std::current_exception()) {
     for (const WellKnownDomain& domain : kWellKnownDomains) {
-      if (running.errors->LastMessage() != domain.message) {
-        continue;
-      }
+      if (running.errors->LastMessage() != domain.message) continue;
       std::cout.flush();
       WriteSummary(running.verb,
                    Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
@@ -95,9 +93,7 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
     call();
   } catch (const std::exception& raised) {
     failure = raised.what();
-    if (failure.empty()) {
-      failure = "failed";
-    }
+    if (failure.empty()) failure = "failed";
   }
   std::cout.flush();
   if (failure.empty() && errors.Count() == 0) {
@@ -105,9 +101,7 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
     return kWell;
   }
   std::string summary = failure.empty() ? "failed" : failure;
-  if (errors.Count() > 0) {
-    summary += " (" + ErrorsAbove(errors.Count()) + ")";
-  }
+  if (errors.Count() > 0) summary += " (" + ErrorsAbove(errors.Count()) + ")";
   const std::string next = advice();
   WriteSummary(verb, next.empty() ? summary : summary + ". " + next);
   return kFailed;

@@ -4,6 +4,7 @@
 #include <exception>
 #include <iostream>
 #include <string>
+#include <vector>
 
 #include "host/linux/system_log.h"
 #include "root.h"
@@ -32,6 +33,18 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
+// The message for a command line that cannot be understood, and where to read on.
+std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
+  std::string command = "secpolicy";
+  for (const CLI::App* verb : app->get_subcommands())
+    command += std::string(" ") + verb->get_name();
+  const std::vector<std::string> unknown = app->remaining();
+  const std::string problem = app->get_subcommands().empty() && !unknown.empty()
+                                  ? "there is no verb or option '" + unknown.front() + "'"
+                                  : error.what();
+  return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
+}
+
 int Run(int argc, char** argv) {
   CLI::App app(kAbout, "secpolicy");
   std::string root;
@@ -41,9 +54,11 @@ int Run(int argc, char** argv) {
   app.require_subcommand(1);
   app.fallthrough();
   app.footer(kFooter);
+  app.failure_message(ExplainUsage);
   app.set_version_flag("--version", "secpolicy " SECPOLICY_VERSION);
-  app.add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
-      ->type_name("DIR");
+  const CLI::Option* const rootOption =
+      app.add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
+          ->type_name("DIR");
   app.add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
   for (const Verb* verb : kVerbs) {
     CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
@@ -58,7 +73,7 @@ int Run(int argc, char** argv) {
     return app.exit(error) == 0 ? kWell : kUsage;
   }
   try {
-    if (!root.empty()) EnterRoot(root);
+    if (rootOption->count() > 0) EnterRoot(root);
     if (verbose) LinuxHost::ShowInformation();
     return action();
   } catch (const std::exception& failure) {

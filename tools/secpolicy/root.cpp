@@ -12,16 +12,16 @@ namespace {
 
 bool rootEntered = false;
 
-[[noreturn]] void RaiseSystemError(const std::string& what) {
-  throw std::system_error(errno, std::generic_category(), what);
+// Copies errno first: putting the text together may change it.
+[[noreturn]] void RaiseSystemError(const char* what, const std::string& object) {
+  const int error = errno;
+  throw std::system_error(error, std::generic_category(), what + object);
 }
 
 void WriteProcFile(const char* path, const std::string& text) {
   std::ofstream file(path);
   file << text << std::flush;
-  if (!file) {
-    RaiseSystemError(path);
-  }
+  if (!file) RaiseSystemError("cannot write ", path);
 }
 
 // Inside a namespace of its own every user may change the root. The user and the group keep their
@@ -30,30 +30,24 @@ void EnterUserNamespace() {
   const std::string user = std::to_string(geteuid());
   const std::string group = std::to_string(getegid());
   if (unshare(CLONE_NEWUSER) != 0) {
-    RaiseSystemError("cannot make a user namespace");
+    RaiseSystemError("cannot enter a root without being root where user namespaces are forbidden",
+                     "");
   }
   WriteProcFile("/proc/self/setgroups", "deny");
   WriteProcFile("/proc/self/uid_map", user + " " + user + " 1");
   WriteProcFile("/proc/self/gid_map", group + " " + group + " 1");
 }
 
+bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
+
 }  // namespace
 
 void EnterRoot(const std::string& directory) {
-  if (chdir(directory.c_str()) != 0) {
-    RaiseSystemError(directory);
-  }
-  if (chroot(".") != 0) {
-    if (errno != EPERM) {
-      RaiseSystemError(directory);
-    }
+  if (chdir(directory.c_str()) != 0) RaiseSystemError("cannot enter the root ", directory);
+  if (!MakeRoot()) {
+    if (errno != EPERM) RaiseSystemError("cannot enter the root ", directory);
     EnterUserNamespace();
-    if (chroot(".") != 0) {
-      RaiseSystemError(directory);
-    }
-  }
-  if (chdir("/") != 0) {
-    RaiseSystemError(directory);
+    if (!MakeRoot()) RaiseSystemError("cannot enter the root ", directory);
   }
   rootEntered = true;
 }

@@ -1,0 +1,69 @@
+# secpolicy boot
+
+load helper
+
+@test "boot of the example ends well" {
+  secpolicy boot
+  exits 0
+  [[ -z $output ]]
+  [[ $stderr == "secpolicy: boot: done" ]]
+}
+
+@test "boot unpacks the tardisks into the root" {
+  boot
+  [[ -x $root/usr/sbin/sshd && -f $root/opt/monitor/etc/agent.conf ]]
+}
+
+@test "boot installs the early and the full policy" {
+  boot
+  [[ -n $(domain_id bootDom) && -n $(domain_id sshDom) && -n $(domain_id plugin-cache) ]]
+}
+
+@test "boot again starts from an empty state" {
+  boot
+  local first
+  first=$("$SECPOLICY" --root "$root" display 2>/dev/null)
+  rm "$policy/domains/plugins/cache"
+  boot
+  [[ -z $(domain_id plugin-cache) ]]
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  [[ $("$SECPOLICY" --root "$root" display 2>/dev/null) == "$first" ]]
+}
+
+@test "files carry the labels that display shows" {
+  boot
+  local id hex attribute
+  id=$("$SECPOLICY" --root "$root" display 2>/dev/null | sed -n 's/^sshProgram (\([0-9]*\))$/\1/p')
+  [[ -n $id ]]
+  hex=$(printf '%02x%02x%02x%02x' $((id & 255)) $((id >> 8 & 255)) $((id >> 16 & 255)) $((id >> 24)))
+  for attribute in security.zorvan user.zorvan.security; do
+    if run getfattr --absolute-names --name "$attribute" --encoding hex "$root/usr/sbin/sshd"; then
+      [[ $output == *"$attribute=0x$hex"* ]] && return 0
+    fi
+  done
+  return 1
+}
+
+@test "boot without tardisks changes nothing and says what to do" {
+  rm -r "$root/tardisks"
+  secpolicy boot
+  exits 1
+  [[ $stderr == "secpolicy: boot: there is no directory /tardisks/ below this root, so nothing was changed. Put the tardisks there, or name the root that they are in (--root DIR)." ]]
+  [[ ! -e $root/run/secpolicy ]]
+}
+
+@test "boot stops at a tardisk that is no archive and names it" {
+  echo "this is no archive" >"$root/tardisks/aaa.tgz"
+  secpolicy boot
+  exits 1
+  [[ ${stderr##*$'\n'} == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: "* ]]
+}
+
+@test "boot without a policy is stopped and says where to put one" {
+  rm -r "$root/etc/zorvan/secpolicy"
+  secpolicy boot
+  exits 3
+  says "Error: Failed to fetch domainID for global VM Domain"
+  ends_with "secpolicy: boot: stopped: there is no domain globalVMDom, and tardisks and file labels were not loaded. Put a policy file named globalVMDom into /etc/zorvan/secpolicy/domains and run it again."
+}

@@ -1,0 +1,54 @@
+# Shared by the tests of the command. SECPOLICY names the command to test.
+
+bats_require_minimum_version 1.5.0
+
+SOURCE=$(cd "$BATS_TEST_DIRNAME/../.." && pwd)
+
+# Every test has a root of its own, with the example host in it.
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/etc/zorvan/secpolicy
+  "$SOURCE/scripts/pack-example" "$root"
+}
+
+# secpolicy ARGUMENT...: runs the command below $root and keeps $status, $output and $stderr.
+secpolicy() {
+  run --separate-stderr "$SECPOLICY" --root "$root" "$@"
+}
+
+boot() {
+  "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err"
+}
+
+# exits STATUS: the latest command ended with it.
+exits() {
+  [[ $status -eq $1 ]] && return
+  printf 'exit status %s instead of %s\n%s\n%s\n' "$status" "$1" "$output" "$stderr"
+  return 1
+}
+
+# says LINE: the latest command wrote this whole line to standard error.
+says() { has_line "$stderr" "$1"; }
+
+# shows LINE: the latest command wrote this whole line to standard output.
+shows() { has_line "$output" "$1"; }
+
+has_line() {
+  local text=$1 line=$2
+  [[ $'\n'$text$'\n' == *$'\n'"$line"$'\n'* ]] && return
+  printf 'no line: %s\nin:\n%s\n' "$line" "$text"
+  return 1
+}
+
+# ends_with LINE: the last line that the latest command wrote to standard error.
+ends_with() {
+  [[ ${stderr##*$'\n'} == "$1" ]] && return
+  printf 'the last line is not: %s\nin:\n%s\n' "$1" "$stderr"
+  return 1
+}
+
+# domain_id NAME: the identifier that display gives the domain.
+domain_id() {
+  "$SECPOLICY" --root "$root" display 2>/dev/null |
+    sed -n "s/^Domain Name: $1 Domain ID :\([0-9]*\) .*/\1/p"
+}

@@ -1,0 +1,67 @@
+# secpolicy --root
+
+load helper
+
+# as_nobody COMMAND...: runs the command as a user without any privilege.
+as_nobody() {
+  setpriv --reuid=65534 --regid=65534 --clear-groups --inh-caps=-all --bounding-set=-all "$@"
+}
+
+@test "a root that is not there is named" {
+  root=$BATS_TEST_TMPDIR/missing
+  secpolicy display
+  exits 1
+  [[ $stderr == "secpolicy: cannot enter the root $root: No such file or directory" ]]
+}
+
+@test "an empty root is not the machine's own" {
+  root=
+  secpolicy display
+  exits 1
+  [[ -z $output ]]
+  [[ $stderr == "secpolicy: cannot enter the root : No such file or directory" ]]
+}
+
+@test "everything stays below the root" {
+  boot
+  [[ -f $root/run/secpolicy/host.db && -d $root/usr/bin ]]
+  [[ ! -e $root/$root ]]
+}
+
+@test "an ordinary user boots and shows a root of its own" {
+  [[ $(id -u) -eq 0 ]] || skip "all tests run as an ordinary user already"
+  as_nobody unshare --user true || skip "this machine allows no user namespaces"
+  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR" "$BATS_TEST_TMPDIR"
+  chown -R 65534:65534 "$root"
+  run --separate-stderr as_nobody "$SECPOLICY" --root "$root" boot
+  exits 0
+  run --separate-stderr as_nobody "$SECPOLICY" --root "$root" display
+  exits 0
+  shows "/tardisks/monitor.tgz (monitorImage)"
+  [[ $(stat -c %u "$root/usr/sbin/sshd") == 65534 ]]
+}
+
+@test "an ordinary user without a root is told what to do" {
+  [[ $(id -u) -eq 0 ]] || skip "needs root to become an ordinary user without a state"
+  run --separate-stderr as_nobody "$SECPOLICY" restore
+  exits 1
+  [[ ${stderr##*$'\n'} == *"You are not root: run it as root, or give --root DIR to work below a directory of yours." ]]
+}
+
+@test "SECPOLICY_HOST_STATE moves the state" {
+  export SECPOLICY_HOST_STATE=/elsewhere/state.db
+  boot
+  [[ -f $root/elsewhere/state.db && ! -e $root/run/secpolicy/host.db ]]
+  secpolicy display
+  exits 0
+  [[ $output == *"Domain Name: sshDom "* ]]
+}
+
+@test "a service uses the runtime interface" {
+  local state=$BATS_TEST_TMPDIR/state/host.db
+  SECPOLICY_HOST_STATE=$state run --separate-stderr "$RUNTIME_EXAMPLE"
+  exits 0
+  [[ $output == "This service runs in hostDom
+job7: /srv/jobs/7 0x3
+job7: /usr/bin/convert 0x11" ]]
+}
