@@ -12,8 +12,10 @@
 namespace SecPolicyTest {
 namespace {
 
-// What readdir may not tell and fstat may not do; read by the definitions below.
+// What is scripted, for the definitions below.
 std::string untypedName;
+std::string repeatedName;
+DIR* repeatNext = nullptr;
 bool attributesUnreadable = false;
 
 template <class Function>
@@ -25,6 +27,9 @@ Function* Original(const char* name) {
 
 UntypedEntry::UntypedEntry(const std::string& name) { untypedName = name; }
 UntypedEntry::~UntypedEntry() { untypedName.clear(); }
+
+RepeatedEntry::RepeatedEntry(const std::string& name) { repeatedName = name; }
+RepeatedEntry::~RepeatedEntry() { repeatedName.clear(); }
 
 UnreadableAttributes::UnreadableAttributes() { attributesUnreadable = true; }
 UnreadableAttributes::~UnreadableAttributes() { attributesUnreadable = false; }
@@ -48,16 +53,28 @@ unsigned int OpenDescriptors() {
 }  // namespace SecPolicyTest
 
 extern "C" __attribute__((visibility("default"))) dirent* readdir(DIR* directory) {
-  static auto* const original = SecPolicyTest::Original<dirent*(DIR*)>("readdir");
+  using namespace SecPolicyTest;
+  static auto* const original = Original<dirent*(DIR*)>("readdir");
+  static dirent repeated;
+  if (repeatNext == directory) {
+    repeatNext = nullptr;
+    return &repeated;
+  }
   dirent* entry = original(directory);
-  if (entry != nullptr && SecPolicyTest::untypedName == entry->d_name) entry->d_type = DT_UNKNOWN;
+  if (entry == nullptr) return nullptr;
+  if (untypedName == entry->d_name) entry->d_type = DT_UNKNOWN;
+  if (repeatedName == entry->d_name) {
+    repeated = *entry;
+    repeatNext = directory;
+  }
   return entry;
 }
 
 extern "C" __attribute__((visibility("default"))) int fstat(int descriptor,
                                                             struct stat* attributes) noexcept {
-  static auto* const original = SecPolicyTest::Original<int(int, struct stat*)>("fstat");
-  if (!SecPolicyTest::attributesUnreadable) return original(descriptor, attributes);
+  using namespace SecPolicyTest;
+  static auto* const original = Original<int(int, struct stat*)>("fstat");
+  if (!attributesUnreadable) return original(descriptor, attributes);
   errno = EIO;
   return -1;
 }

@@ -15,6 +15,16 @@ class UntypedEntry {
   ~UntypedEntry();
 };
 
+// Directory listings yield the entries called `name` twice while the object lives, as they may when
+// their directory changes meanwhile.
+class RepeatedEntry {
+ public:
+  explicit RepeatedEntry(const std::string& name);
+  RepeatedEntry(const RepeatedEntry&) = delete;
+  RepeatedEntry& operator=(const RepeatedEntry&) = delete;
+  ~RepeatedEntry();
+};
+
 // Attributes of open files cannot be read while the object lives.
 class UnreadableAttributes {
  public:
