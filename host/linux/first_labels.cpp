@@ -1,13 +1,17 @@
 #include "first_labels.h"
 
-#include <fts.h>
+#include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstddef>
 #include <cstring>
 #include <memory>
 #include <string>
+#include <string_view>
+#include <vector>
 
 #include "braxo/misc/strcat.h"
 #include "host_error.h"
@@ -19,15 +23,15 @@ namespace {
 
 using Braxo::Misc::StrCat;
 
-struct CloseTree {
-  void operator()(FTS* tree) const { fts_close(tree); }
+struct CloseDirectory {
+  void operator()(DIR* directory) const { closedir(directory); }
 };
-using Tree = std::unique_ptr<FTS, CloseTree>;
+using Directory = std::unique_ptr<DIR, CloseDirectory>;
 
 // Counts what went wrong and keeps the first of it.
 class Failures {
  public:
-  void Add(const char* path, int error) {
+  void Add(std::string_view path, int error) {
     // A file that has gone needs no label.
     if (error == ENOENT) return;
     if (++count > 1) return;
@@ -48,48 +52,103 @@ class Failures {
   std::string first;
 };
 
-// Walks by changing directory, so that neither a link planted on the way nor a path of any length
-// leads it astray.
-Tree OpenTree() {
-  char here[] = ".";
-  char* const roots[] = {here, nullptr};
-  Tree tree(fts_open(roots, FTS_PHYSICAL | FTS_XDEV, nullptr));
-  if (!tree) {
-    throw HostError(errno, StrCat("Unable to walk the root file system: ", std::strerror(errno)));
+// Walks by changing directory, one step at a time and never through a link, so that neither a link
+// planted on the way nor a tree of any depth leads it astray.
+class Walk {
+ public:
+  explicit Walk(std::uint32_t label) : id(label) {}
+
+  void Run() {
+    struct stat status;
+    if (lstat(".", &status) != 0) return failures.Add("/", errno);
+    rootDevice = status.st_dev;
+    Label(".", status);
+    Enter(".");
+    while (!levels.empty()) {
+      if (levels.back().waiting.empty()) {
+        Leave();
+        continue;
+      }
+      const std::string name = std::move(levels.back().waiting.back());
+      levels.back().waiting.pop_back();
+      Enter(name.c_str());
+    }
+    failures.ThrowIfAny();
   }
-  return tree;
-}
 
-bool WasNotReached(const FTSENT& entry) {
-  return entry.fts_info == FTS_DNR || entry.fts_info == FTS_ERR || entry.fts_info == FTS_NS;
-}
+ private:
+  // A directory between the root and where the walk is.
+  struct Level {
+    ino_t inode;
+    std::size_t pathSize;              // of `path` without the directory
+    std::vector<std::string> waiting;  // its directories that are still to be entered
+  };
 
-bool IsLeftAlone(const FTSENT& entry, dev_t rootDevice) {
-  if (entry.fts_statp->st_dev != rootDevice) return true;
-  return entry.fts_level == 1 && entry.fts_info == FTS_D && IsRunningSystem(entry.fts_name);
-}
+  void Label(const char* name, const struct stat& status) {
+    if (!CanCarryLabel(status.st_mode) || GiveFirstLabel(name, id) == 0) return;
+    failures.Add(StrCat(path, "/", name), errno);
+  }
+
+  void Enter(const char* name) {
+    const Directory directory(OpenDirectory(name));
+    struct stat status;
+    if (!directory || fstat(dirfd(directory.get()), &status) != 0 ||
+        fchdir(dirfd(directory.get())) != 0) {
+      return failures.Add(StrCat(path, "/", name), errno);
+    }
+    levels.push_back({.inode = status.st_ino, .pathSize = path.size(), .waiting = {}});
+    if (levels.size() > 1) path.append("/").append(name);
+    LabelEntries(directory.get());
+  }
+
+  static Directory OpenDirectory(const char* name) {
+    const int descriptor = open(name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+    return Directory(descriptor < 0 ? nullptr : fdopendir(descriptor));
+  }
+
+  void LabelEntries(DIR* directory) {
+    errno = 0;
+    while (const dirent* entry = readdir(directory)) {
+      LabelEntry(entry->d_name);
+      errno = 0;
+    }
+    if (errno != 0) failures.Add(path, errno);
+  }
+
+  void LabelEntry(const char* name) {
+    if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) return;
+    struct stat status;
+    if (lstat(name, &status) != 0) return failures.Add(StrCat(path, "/", name), errno);
+    const bool isDirectory = S_ISDIR(status.st_mode);
+    if (status.st_dev != rootDevice) return;
+    if (isDirectory && levels.size() == 1 && IsRunningSystem(name)) return;
+    Label(name, status);
+    if (isDirectory) levels.back().waiting.emplace_back(name);
+  }
+
+  // Back up. A directory that was moved meanwhile has another one above it.
+  void Leave() {
+    path.resize(levels.back().pathSize);
+    levels.pop_back();
+    if (levels.empty()) return;
+    struct stat status;
+    if (chdir("..") == 0 && lstat(".", &status) == 0 && status.st_dev == rootDevice &&
+        status.st_ino == levels.back().inode) {
+      return;
+    }
+    throw HostError(EAGAIN, StrCat("Unable to give all files their first label: ", path,
+                                   "/ changed meanwhile"));
+  }
+
+  const std::uint32_t id;
+  dev_t rootDevice = 0;
+  std::string path;  // of where the walk is, without the slash of the root
+  std::vector<Level> levels;
+  Failures failures;
+};
 
 }  // namespace
 
-void GiveFirstLabels(std::uint32_t id) {
-  const Tree tree = OpenTree();
-  Failures failures;
-  dev_t rootDevice = 0;
-  errno = 0;
-  while (FTSENT* entry = fts_read(tree.get())) {
-    if (entry->fts_level == FTS_ROOTLEVEL) rootDevice = entry->fts_statp->st_dev;
-    if (WasNotReached(*entry)) {
-      failures.Add(entry->fts_path, entry->fts_errno);
-    } else if (IsLeftAlone(*entry, rootDevice)) {
-      fts_set(tree.get(), entry, FTS_SKIP);
-    } else if (entry->fts_info != FTS_DP && CanCarryLabel(entry->fts_statp->st_mode) &&
-               GiveFirstLabel(entry->fts_accpath, id) != 0) {
-      failures.Add(entry->fts_path, errno);
-    }
-    errno = 0;
-  }
-  if (errno != 0) failures.Add("the rest of the tree", errno);
-  failures.ThrowIfAny();
-}
+void GiveFirstLabels(std::uint32_t id) { Walk(id).Run(); }
 
 }  // namespace LinuxHost

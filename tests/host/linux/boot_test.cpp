@@ -2,6 +2,8 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -91,6 +93,53 @@ TEST_F(Boot, LeavesTheRunningSystemWithoutLabel) {
   EXPECT_EQ(BootAnd([] { return Label("/run/service/file"); }), std::strerror(ENODATA));
   EXPECT_EQ(BootAnd([] { return Label("/run"); }), std::strerror(ENODATA));
   EXPECT_EQ(BootAnd([] { return Label("/usr/run/file"); }), "unlabeled");
+}
+
+TEST_F(Boot, LabelsTreesThatNoPathReaches) {
+  scratch.Write("deep/file", "text");
+  ASSERT_EQ(scratch.RunInside([]() -> std::string {
+    // Twice what a path can hold.
+    std::filesystem::current_path("/deep");
+    const std::string name(200, 'd');
+    for (int level = 0; level < 40; ++level) {
+      if (mkdir(name.c_str(), 0755) != 0 || chdir(name.c_str()) != 0) return std::strerror(errno);
+    }
+    close(open("bottom", O_CREAT | O_WRONLY, 0600));
+    return "made";
+  }),
+            "made");
+  EXPECT_EQ(BootAnd([]() -> std::string {
+              std::filesystem::current_path("/deep");
+              const std::string name(200, 'd');
+              for (int level = 0; level < 40; ++level) {
+                if (chdir(name.c_str()) != 0) return std::strerror(errno);
+              }
+              return Label("bottom");
+            }),
+            "unlabeled");
+}
+
+// Sets or clears the flag that keeps even the superuser from changing the file at `path`.
+bool SetImmutable(const std::filesystem::path& path, bool immutable) {
+  const int file = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  int flags = 0;
+  bool done = ioctl(file, FS_IOC_GETFLAGS, &flags) == 0;
+  flags = immutable ? flags | FS_IMMUTABLE_FL : flags & ~FS_IMMUTABLE_FL;
+  done = done && ioctl(file, FS_IOC_SETFLAGS, &flags) == 0;
+  close(file);
+  return done;
+}
+
+TEST_F(Boot, LabelsAllOtherFilesBeforeItFails) {
+  for (const char* path : {"a/file", "b/fixed", "b/other", "c/file"}) scratch.Write(path, "text");
+  const std::filesystem::path fixed = scratch.Root() / "b/fixed";
+  if (!SetImmutable(fixed, true)) GTEST_SKIP() << "no file can be made immutable here";
+  const std::string message = BootAnd();
+  SetImmutable(fixed, false);
+  EXPECT_EQ(message, "Unable to give 1 file its first label: /b/fixed: Operation not permitted");
+  EXPECT_EQ(scratch.RunInside(
+                [] { return Label("/a/file") + " " + Label("/b/other") + " " + Label("/c/file"); }),
+            "unlabeled unlabeled unlabeled");
 }
 
 TEST_F(Boot, LabelsNothingThroughLinks) {
