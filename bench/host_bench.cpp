@@ -1,0 +1,364 @@
+// The library on the Linux host beside bare loops that do only what cannot be left out: the system
+// calls of labelling, one prepared insert for each rule, one write for each line.
+//
+// SECPOLICY_BENCH_DIRS names the directories, separated by colons, in which trees are labelled; the
+// host state lies in the first.
+#include <benchmark/benchmark.h>
+#include <dirent.h>
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "secpolicy/domain/domain_policy.h"
+#include "secpolicy/secpolicy.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+using TeskCtl::Security::TeskAccessInterfaceImpl;
+
+constexpr int kLabels = 1000;
+
+std::string Label(long number) { return "label" + std::to_string(number % kLabels); }
+
+std::vector<fs::path> BenchDirs() {
+  const char* given = std::getenv("SECPOLICY_BENCH_DIRS");
+  std::string rest = given != nullptr ? given : "/dev/shm";
+  std::vector<fs::path> dirs;
+  while (!rest.empty()) {
+    const std::size_t colon = std::min(rest.find(':'), rest.size());
+    dirs.emplace_back(rest.substr(0, colon));
+    rest.erase(0, colon + 1);
+  }
+  return dirs;
+}
+
+// A directory of its own, removed at the end.
+class ScratchDir {
+ public:
+  explicit ScratchDir(const fs::path& parent) {
+    std::string name = (parent / "secpolicy-bench-XXXXXX").string();
+    if (mkdtemp(name.data()) == nullptr) throw std::runtime_error("cannot make " + name);
+    path = name;
+  }
+  ScratchDir(const ScratchDir&) = delete;
+  ScratchDir& operator=(const ScratchDir&) = delete;
+  ~ScratchDir() { fs::remove_all(path); }
+
+  fs::path path;
+};
+
+// A new host state, with the labels that the rules use, in memory as /run is.
+class FreshState {
+ public:
+  FreshState() : dir(BenchDirs().front()) {
+    setenv("SECPOLICY_HOST_STATE", Path().c_str(), 1);
+    std::vector<std::string> labels;
+    for (int i = 0; i < kLabels; ++i) labels.push_back(Label(i));
+    TeskAccessInterfaceImpl access;
+    access.AddLabels(labels, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
+  }
+
+  fs::path Path() const { return dir.path / "host.db"; }
+
+ private:
+  ScratchDir dir;
+};
+
+// ---- Labelling a tree -------------------------------------------------------------------------
+
+constexpr int kDirectories = 1000;
+constexpr int kFilesPerDirectory = 100;
+
+class LabelledTree {
+ public:
+  explicit LabelledTree(const fs::path& parent) : scratch(parent) {
+    const std::uint32_t first = 2;
+    Label(scratch.path, first);
+    for (int i = 0; i < kDirectories; ++i) {
+      const fs::path dir = scratch.path / ("d" + std::to_string(i));
+      fs::create_directory(dir);
+      Label(dir, first);
+      for (int j = 0; j < kFilesPerDirectory; ++j) {
+        const fs::path file = dir / ("file" + std::to_string(j));
+        std::ofstream(file).put('x');
+        Label(file, first);
+      }
+    }
+  }
+  const fs::path& Path() const { return scratch.path; }
+
+  static constexpr char kAttribute[] = "security.zorvan";
+
+ private:
+  static void Label(const fs::path& path, std::uint32_t id) {
+    if (setxattr(path.c_str(), kAttribute, &id, sizeof id, 0) != 0) std::abort();
+  }
+
+  ScratchDir scratch;
+};
+
+void LabelTree(benchmark::State& state, const fs::path& parent) {
+  const FreshState host;
+  static std::map<fs::path, LabelledTree> trees;
+  const fs::path& tree = trees.try_emplace(parent, parent).first->second.Path();
+  TeskAccessInterfaceImpl access;
+  for (auto _ : state) SecPolicy::SetDirLabelRecursive(tree, Label(0), access);
+}
+
+void LabelBare(char* path, std::size_t length, std::uint32_t id) {
+  DIR* const directory = opendir(path);
+  while (const dirent* entry = readdir(directory)) {
+    if (std::strcmp(entry->d_name, ".") == 0 || std::strcmp(entry->d_name, "..") == 0) continue;
+    const std::size_t nameLength = std::strlen(entry->d_name);
+    path[length] = '/';
+    std::memcpy(path + length + 1, entry->d_name, nameLength + 1);
+    setxattr(path, LabelledTree::kAttribute, &id, sizeof id, XATTR_REPLACE);
+    if (entry->d_type == DT_DIR) LabelBare(path, length + 1 + nameLength, id);
+    path[length] = '\0';
+  }
+  closedir(directory);
+}
+
+void LabelTreeBare(benchmark::State& state, const fs::path& parent) {
+  static std::map<fs::path, LabelledTree> trees;
+  const std::string tree = trees.try_emplace(parent, parent).first->second.Path().string();
+  std::array<char, 4096> path{};
+  tree.copy(path.data(), path.size() - 1);
+  std::uint32_t id = 3;
+  for (auto _ : state) LabelBare(path.data(), tree.size(), id);
+}
+
+// ---- Installing rules -------------------------------------------------------------------------
+
+constexpr long kDomains = 100;
+constexpr long kRules = 100'000;
+
+std::vector<std::string> Words(TeskCtl::Security::TeskAccess_KeywordType type) {
+  std::vector<std::string> words;
+  for (const auto& [word, id] : TeskAccessInterfaceImpl().GetKeywordsMap(type)) {
+    words.push_back(word);
+  }
+  return words;
+}
+
+std::string DomainName(long number) { return "domain" + std::to_string(number); }
+
+// Policy files of `domains` domains that hold `rules` rules of all kinds between them.
+class DomainFiles {
+ public:
+  DomainFiles(long domains, long rules) : dir(BenchDirs().front()), data(BenchDirs().front()) {
+    const FreshState host;
+    for (long i = 0; i < rules / domains / 8 + 1; ++i) std::ofstream(DataFile(i));
+    syscalls = Words(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL);
+    capabilities = Words(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY);
+    for (long i = 0; i < domains; ++i) {
+      std::ofstream file(dir.path / DomainName(i));
+      for (long j = 0; j < rules / domains; ++j) file << Line(j, domains) << '\n';
+    }
+  }
+  const fs::path& Path() const { return dir.path; }
+
+ private:
+  std::string DataFile(long number) const {
+    return (data.path / ("file" + std::to_string(number))).string();
+  }
+
+  std::string Line(long line, long domains) const {
+    const long number = line / 8;
+    const auto nth = static_cast<std::size_t>(number);
+    switch (line % 8) {
+      case 0:
+        return "-a " + Label(number) + " read grant";
+      case 1:
+        return "-c " + capabilities[nth % capabilities.size()] + " grant";
+      case 2:
+        return "-d " + Label(number) + " " + DomainName(number % domains) + " exec grant";
+      case 3:
+        return "-f " + Label(number) + " " + Label(number + 1) + " regular grant";
+      case 4:
+        return "-p bind_port " + std::to_string(number) + " grant";
+      case 5:
+        return "-r " + DataFile(number) + " rw";
+      case 6:
+        return "-s " + syscalls[nth % syscalls.size()] + " grant";
+      default:
+        return "-u " + Label(number) + " stream grant";
+    }
+  }
+
+  ScratchDir dir;
+  ScratchDir data;
+  std::vector<std::string> syscalls;
+  std::vector<std::string> capabilities;
+};
+
+void LoadDomains(benchmark::State& state) {
+  const DomainFiles files(state.range(0), state.range(1));
+  for (auto _ : state) {
+    state.PauseTiming();
+    const FreshState host;
+    TeskAccessInterfaceImpl access;
+    state.ResumeTiming();
+    SecPolicy::LoadPolicyDomains(files.Path(), access);
+  }
+}
+BENCHMARK(LoadDomains)
+    ->Args({kDomains, kRules})
+    ->Args({kDomains, kRules / 100})
+    ->Args({1, kRules / 100})
+    ->Args({400, 400 * (kRules / 100)})
+    ->UseRealTime()
+    ->Unit(benchmark::kMillisecond);
+
+class Database {
+ public:
+  explicit Database(const fs::path& path) {
+    if (sqlite3_open(path.c_str(), &database) != SQLITE_OK) std::abort();
+    sqlite3_exec(database, "PRAGMA synchronous = OFF", nullptr, nullptr, nullptr);
+  }
+  Database(const Database&) = delete;
+  Database& operator=(const Database&) = delete;
+  ~Database() { sqlite3_close(database); }
+
+  sqlite3* database = nullptr;
+};
+
+// One prepared insert and one commit for each rule, into the host's own schema.
+void InsertRulesBare(benchmark::State& state) {
+  for (auto _ : state) {
+    state.PauseTiming();
+    const FreshState host;
+    const Database target(host.Path());
+    sqlite3_stmt* insert = nullptr;
+    sqlite3_prepare_v2(target.database,
+                       "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line) "
+                       "VALUES (?1, 'object access', ?2, 'read', '', 1, ?3)",
+                       -1, &insert, nullptr);
+    state.ResumeTiming();
+    for (int rule = 0; rule < kRules; ++rule) {
+      const std::string word = "label" + std::to_string(rule);
+      sqlite3_bind_int(insert, 1, rule / static_cast<int>(kRules / kDomains));
+      sqlite3_bind_text(insert, 2, word.data(), static_cast<int>(word.size()), SQLITE_STATIC);
+      sqlite3_bind_int(insert, 3, rule);
+      if (sqlite3_step(insert) != SQLITE_DONE) std::abort();
+      sqlite3_reset(insert);
+    }
+    state.PauseTiming();
+    sqlite3_finalize(insert);
+    state.ResumeTiming();
+  }
+}
+BENCHMARK(InsertRulesBare)->UseRealTime()->Unit(benchmark::kMillisecond);
+
+// The checks that a load of as many rules makes: one or two words each.
+void CheckWords(benchmark::State& state) {
+  const FreshState host;
+  TeskAccessInterfaceImpl access;
+  const std::string kind = "read";
+  for (auto _ : state) {
+    for (long rule = 0; rule < kRules; ++rule) {
+      const std::string label = Label(rule);
+      benchmark::DoNotOptimize(
+          access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label));
+      benchmark::DoNotOptimize(
+          access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS, kind));
+    }
+  }
+}
+BENCHMARK(CheckWords)->UseRealTime()->Unit(benchmark::kMillisecond);
+
+// ---- Showing what is installed ----------------------------------------------------------------
+
+// Sends standard output to a file of its own.
+class OutputToFile {
+ public:
+  explicit OutputToFile(const fs::path& path)
+      : saved(dup(STDOUT_FILENO)), file(open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC, 0600)) {
+    dup2(file, STDOUT_FILENO);
+  }
+  OutputToFile(const OutputToFile&) = delete;
+  OutputToFile& operator=(const OutputToFile&) = delete;
+  ~OutputToFile() {
+    dup2(saved, STDOUT_FILENO);
+    close(saved);
+    close(file);
+  }
+
+  void StartOver() const {
+    if (ftruncate(file, 0) != 0) std::abort();
+    lseek(file, 0, SEEK_SET);
+  }
+
+ private:
+  int saved;
+  int file;
+};
+
+void DisplayDomains(benchmark::State& state) {
+  const ScratchDir scratch(BenchDirs().back());
+  const DomainFiles files(kDomains, state.range(0));
+  const FreshState host;
+  TeskAccessInterfaceImpl access;
+  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  const OutputToFile output(scratch.path / "display");
+  for (auto _ : state) {
+    output.StartOver();
+    SecPolicy::DisplayPolicyDomains(access, "");
+  }
+}
+BENCHMARK(DisplayDomains)
+    ->Arg(kRules)
+    ->Arg(kRules / 100)
+    ->UseRealTime()
+    ->Unit(benchmark::kMillisecond);
+
+void WriteLinesBare(benchmark::State& state) {
+  const ScratchDir scratch(BenchDirs().back());
+  const DomainFiles files(kDomains, kRules);
+  const FreshState host;
+  TeskAccessInterfaceImpl access;
+  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  const fs::path shown = scratch.path / "display";
+  {
+    const OutputToFile output(shown);
+    SecPolicy::DisplayPolicyDomains(access, "");
+  }
+  std::vector<std::string> lines;
+  std::ifstream in(shown);
+  for (std::string line; std::getline(in, line);) lines.push_back(line + "\n");
+
+  const OutputToFile output(shown);
+  for (auto _ : state) {
+    output.StartOver();
+    for (const std::string& line : lines) std::cout << line << std::flush;
+  }
+}
+BENCHMARK(WriteLinesBare)->UseRealTime()->Unit(benchmark::kMillisecond);
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  for (const fs::path& dir : BenchDirs()) {
+    benchmark::RegisterBenchmark(("LabelTree" + dir.string()).c_str(), LabelTree, dir)
+        ->UseRealTime()
+        ->Unit(benchmark::kMillisecond);
+    benchmark::RegisterBenchmark(("LabelTreeBare" + dir.string()).c_str(), LabelTreeBare, dir)
+        ->UseRealTime()
+        ->Unit(benchmark::kMillisecond);
+  }
+  benchmark::Initialize(&argc, argv);
+  benchmark::RunSpecifiedBenchmarks();
+}
