@@ -169,6 +169,20 @@ TEST_F(DisplayDomainPolicy, ReportsDomainThatCannotBeRead) {
              "returns"}));
 }
 
+// Between the words, the name and the failure stands nothing.
+TEST_F(DisplayDomainPolicy, ReportsNameThatWasReadBeforeTheFailure) {
+  host.domains[3] = {.name = "sys", .namedBeforeFailure = true};
+  host.Fail("GetCompleteDomainInfo", "slot unreadable");
+
+  EXPECT_EQ(
+      Display(3),
+      Lines(
+          {"GetCompleteDomainInfo(3)",
+           R"(stderr "Error: Failed to get policy for domain :sysslot unreadable\n")",
+           R"(syslog(LOG_ERR, "Error: %s", "Failed to get policy for domain :sysslot unreadable"))",
+           "returns"}));
+}
+
 TEST_F(DisplayDomainPolicy, PassesOnForeignExceptionOfDomain) {
   host.FailForeign("GetCompleteDomainInfo");
   EXPECT_EQ(Display(3),

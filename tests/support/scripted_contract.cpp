@@ -475,9 +475,11 @@ bool TeskAccessInterfaceImpl::GetCompleteDomainInfo(unsigned int id, std::string
                                                     unsigned int& state, unsigned int& refCount,
                                                     unsigned int& worldRefCount,
                                                     TeskAccessKsi_DefaultDom& dflt) {
-  impl->host.Enter("GetCompleteDomainInfo", Print(id));
   const auto domain = impl->host.domains.find(id);
-  if (domain == impl->host.domains.end()) return false;
+  const bool known = domain != impl->host.domains.end();
+  if (known && domain->second.namedBeforeFailure) name = domain->second.name;
+  impl->host.Enter("GetCompleteDomainInfo", Print(id));
+  if (!known) return false;
   name = domain->second.name;
   enforcementLevel = domain->second.level;
   state = domain->second.state;

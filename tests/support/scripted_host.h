@@ -94,6 +94,7 @@ struct DomainRecord {
   unsigned int refCount = 0;
   unsigned int worldRefCount = 0;
   TeskAccessKsi_DefaultDom dflt = TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+  bool namedBeforeFailure = false;  // GetCompleteDomainInfo tells the name even when it fails
 };
 
 struct InstalledRules {
