@@ -168,7 +168,8 @@ TEST(SyncLabelsFromPolicyFaults, AnyFailingStepEndsItAndPassesUnchanged) {
     host.syslogRunning = false;
     host.invalidLabels[TESKACCESS_LABEL_OBJECT] = {"stale"};
     TeskAccessInterfaceImpl access;
-    host.FailCall(host.FallibleCalls() + failing, DerivedBraxoException("refused"));
+    // The first call of all made the interface object.
+    host.FailCall(failing + 1, DerivedBraxoException("refused"));
 
     const Transcript run = Record([&] {
       SecPolicy::SyncLabelsFromPolicy({"tool"}, {{"old", 7}}, TESKACCESS_LABEL_OBJECT, access);
