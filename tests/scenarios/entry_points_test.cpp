@@ -209,10 +209,9 @@ constexpr char kConnected[] = "TeskAccessInterfaceImpl()\n";
 class DisplayPolicy : public FixedRootsTest {
  protected:
   // One tardisk is left: two are shown in whatever order the directory gives them.
-  class LoadedHost : public GoodHost {
-   public:
+  struct LoadedHost : GoodHost {
     LoadedHost() {
-      LoadOnce();
+      LoadOnce(host);
       std::filesystem::remove("/tardisks/extra.tgz");
     }
   };

@@ -15,8 +15,8 @@ constexpr char kTardiskPolicy[] = "/etc/zorvan/secpolicy/tardisks/base";
 
 }  // namespace
 
-GoodHost::GoodHost()
-    : roots({
+GoodRoots::GoodRoots()
+    : FixedRoots({
           {"/policy/objects/base", "toolLabel\nlogLabel  # written by everybody\n"},
           {"/policy/domains/appDom", "# the domain of tardisks without a policy\n"},
           {"/policy/domains/daemonFrameworkDom", "-s execve grant\n"},
@@ -46,7 +46,9 @@ GoodHost::GoodHost()
           {"/opt/log/today", ""},
           {"/opt/tool/run", ""},
           {"/opt/early", ""},
-      }) {
+      }) {}
+
+void ScriptGoodHost(ScriptedHost& host) {
   host.domains[1] = {.name = "supportDom",
                      .level = "permissive",
                      .state = 4294967295,
@@ -59,7 +61,7 @@ GoodHost::GoodHost()
   host.SetOption("/UserVars/CheckAccessTemplateEnabled", 1);
 }
 
-void GoodHost::LoadOnce() {
+void LoadOnce(ScriptedHost& host) {
   SecPolicy::LoadPolicy("/policy");
   host.keywords[TESKACCESS_KEYWORD_LABEL] = {
       {"logLabel", 5}, {"tardiskDefault", 3}, {"toolLabel", 4}, {"unlabeled", 2}};

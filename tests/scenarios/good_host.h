@@ -10,15 +10,20 @@ namespace SecPolicyTest {
 
 // A small host on which everything works: a policy under /policy, an early policy under /early, and
 // what always comes from the fixed roots. Each also has files in places that are not to be read.
-class GoodHost {
+class GoodRoots : public FixedRoots {
  public:
-  GoodHost();
+  GoodRoots();
+};
 
-  // Brings the kernel into the state that a first load leaves behind.
-  void LoadOnce();
+// Brings a host on good roots into its first state, and into the one that a first load leaves.
+void ScriptGoodHost(ScriptedHost& host);
+void LoadOnce(ScriptedHost& host);
+
+struct GoodHost {
+  GoodHost() { ScriptGoodHost(host); }
 
   ScriptedHost host;
-  FixedRoots roots;
+  GoodRoots roots;
 };
 
 // What the trace shows for one message, each line ended.

@@ -36,13 +36,13 @@ TEST_F(LoadPolicy, InstallsTheWholeTree) {
 
 TEST_F(LoadPolicy, ReusesWhatAnEarlierLoadInstalled) {
   GoodHost good;
-  good.LoadOnce();
+  LoadOnce(good.host);
   EXPECT_EQ(Load().Text(), kNextLoad.Text());
 }
 
 TEST_F(LoadPolicy, IsTheSameTheThirdTime) {
   GoodHost good;
-  good.LoadOnce();
+  LoadOnce(good.host);
   Load();
   EXPECT_EQ(Load().Text(), kNextLoad.Text());
 }

@@ -102,7 +102,8 @@ void ScriptedHost::Note(const std::string& call, const std::string& arguments) {
 void ScriptedHost::Enter(const std::string& call, const std::string& arguments) {
   Note(call, arguments);
   const unsigned int number = ++callCounts[call];
-  if (++fallibleCalls == sweepCall) std::rethrow_exception(sweepException);
+  fallibleCalls.push_back(trace.Size() - 1);
+  if (fallibleCalls.size() == sweepCall) std::rethrow_exception(sweepException);
 
   const auto fits = [&](const Fault& fault) {
     return fault.call == call && (fault.which.nth == 0 || fault.which.nth == number) &&

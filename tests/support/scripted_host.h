@@ -155,12 +155,12 @@ class ScriptedHost {
 
   // Fails the `number`-th (from 1) of all calls that may throw.
   template <class Exception>
-  void FailCall(unsigned int number, const Exception& exception) {
+  void FailCall(std::size_t number, const Exception& exception) {
     sweepCall = number;
     sweepException = std::make_exception_ptr(exception);
   }
-  // How many calls that may throw were made.
-  unsigned int FallibleCalls() const { return fallibleCalls; }
+  // The place in the trace, counted from 0, of every call so far that may throw.
+  const std::vector<std::size_t>& FallibleCalls() const { return fallibleCalls; }
 
   // ---- State. The slots start with "hostDom" in slot 0.
 
@@ -261,8 +261,8 @@ class ScriptedHost {
   std::map<std::uint32_t, KernelCall> kernelCalls;
   std::set<std::string> falseResults;
   std::map<unsigned long, Inode> inodes;
-  unsigned int fallibleCalls = 0;
-  unsigned int sweepCall = 0;
+  std::vector<std::size_t> fallibleCalls;
+  std::size_t sweepCall = 0;
   std::exception_ptr sweepException;
   CapturedStream standardOutput;
   CapturedStream standardError;

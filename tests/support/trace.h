@@ -19,6 +19,9 @@ class Trace {
   void Write(const std::string& stream, const char* text, std::size_t size);
   void Flush();
 
+  // The number of lines that are closed.
+  std::size_t Size() const { return lines.size(); }
+
   // Closes the open output and returns the lines.
   const std::vector<std::string>& Lines();
 
