@@ -9,6 +9,7 @@ set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, b
 # Libraries and headers. A caller's include paths begin at the public header, and at the contract
 # headers that it includes.
 target_include_directories(secpolicy INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
+set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN")
 install(TARGETS secpolicy secpolicyhost host_contract EXPORT secpolicyTargets
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}")
 install(FILES secpolicy/secpolicy.h secpolicy/export.h
@@ -23,6 +24,8 @@ configure_package_config_file(cmake/secpolicyConfig.cmake.in secpolicyConfig.cma
 write_basic_package_version_file(secpolicyConfigVersion.cmake COMPATIBILITY SameMajorVersion)
 install(FILES "${CMAKE_BINARY_DIR}/secpolicyConfig.cmake"
   "${CMAKE_BINARY_DIR}/secpolicyConfigVersion.cmake" DESTINATION "${SECPOLICY_CMAKE}")
+file(RELATIVE_PATH SECPOLICY_PC_TO_PREFIX
+  "${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig" "${CMAKE_INSTALL_PREFIX}")
 configure_file(packaging/secpolicy.pc.in secpolicy.pc @ONLY)
 install(FILES "${CMAKE_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 

@@ -1,0 +1,64 @@
+# What is installed can be used: by other builds, and as a command.
+
+load helper
+
+# Installs once for all tests of this file.
+setup_file() {
+  export PREFIX=$BATS_FILE_TMPDIR/prefix
+  cmake --install "$BUILD_DIR" --prefix "$PREFIX" >"$BATS_FILE_TMPDIR/install.log"
+  # shellcheck disable=SC2155
+  export PKG_CONFIG_PATH=$(dirname "$(find "$PREFIX" -name secpolicy.pc)")
+}
+
+# runs_as_service PROGRAM: the program is the runtime example, and works.
+runs_as_service() {
+  SECPOLICY_HOST_STATE=$BATS_TEST_TMPDIR/state/host.db LD_LIBRARY_PATH=$(dirname "$PKG_CONFIG_PATH") \
+    run --separate-stderr "$1"
+  exits 0
+  shows "job7: /usr/bin/convert 0x11"
+}
+
+@test "a program builds with pkg-config against what is installed" {
+  # shellcheck disable=SC2046
+  ${CXX:-c++} -std=c++20 $SANITIZER "$SOURCE/examples/runtime.cpp" \
+    $(pkg-config --cflags --libs secpolicy) -o "$BATS_TEST_TMPDIR/runtime"
+  runs_as_service "$BATS_TEST_TMPDIR/runtime"
+}
+
+@test "a program builds with find_package against what is installed" {
+  cat >"$BATS_TEST_TMPDIR/CMakeLists.txt" <<EOF
+cmake_minimum_required(VERSION 3.25)
+project(service LANGUAGES CXX)
+set(CMAKE_CXX_STANDARD 20)
+find_package(secpolicy 1 REQUIRED)
+add_executable(runtime "$SOURCE/examples/runtime.cpp")
+target_link_libraries(runtime PRIVATE secpolicy::secpolicy)
+EOF
+  CXXFLAGS=$SANITIZER cmake -S "$BATS_TEST_TMPDIR" -B "$BATS_TEST_TMPDIR/build" \
+    -DCMAKE_PREFIX_PATH="$PREFIX"
+  cmake --build "$BATS_TEST_TMPDIR/build"
+  runs_as_service "$BATS_TEST_TMPDIR/build/runtime"
+}
+
+@test "the installed command finds its libraries" {
+  SECPOLICY=$PREFIX/bin/secpolicy
+  boot
+  secpolicy display
+  exits 0
+  shows "/tardisks/monitor.tgz (monitorImage)"
+}
+
+@test "manual pages, completions and units are installed" {
+  [[ -f $PREFIX/share/man/man5/secpolicy.5 && -f $PREFIX/share/man/man8/secpolicy.8 ]]
+  [[ -f $PREFIX/share/bash-completion/completions/secpolicy ]]
+  [[ -f $PREFIX/share/zsh/vendor-completions/_secpolicy ]]
+  for unit in boot restore load; do
+    grep -q "^ExecStart=/.*/secpolicy $unit$" "$PREFIX/lib/systemd/system/secpolicy-$unit.service"
+  done
+}
+
+@test "installed headers stand alone" {
+  while read -r header; do
+    ${CXX:-c++} -std=c++20 -fsyntax-only -I "$PREFIX/include/libsecpolicy" -x c++ "$header"
+  done < <(find "$PREFIX/include/libsecpolicy" -name '*.h')
+}
