@@ -118,7 +118,7 @@ class Unpacking {
   }
 
  private:
-  static constexpr std::size_t kBlockSize = 64 * 1024;
+  static constexpr std::size_t kBlockSize = 65536;
 
   [[noreturn]] void Fail(int error, std::string_view reason) const {
     throw HostError(error > 0 ? error : EINVAL,
