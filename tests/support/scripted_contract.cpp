@@ -526,8 +526,10 @@ bool TeskAccessInterfaceImpl::ValidateKeyword(TeskAccess_KeywordType type,
                                               const std::string& word) {
   impl->host.Enter("ValidateKeyword", Arguments(type, word));
   if (impl->host.strict) {
-    const bool isLabel =
-        type == TESKACCESS_KEYWORD_LABEL && impl->host.LabelId(word, TESKACCESS_LABEL_OBJECT) != 1;
+    const auto isNamed = [&](const auto& slot) { return slot.second.name == word; };
+    const bool isLabel = type == TESKACCESS_KEYWORD_LABEL &&
+                         (impl->host.LabelId(word, TESKACCESS_LABEL_OBJECT) != 1 ||
+                          std::ranges::any_of(impl->host.domains, isNamed));
     if (!isLabel && !impl->host.keywords[type].contains(word)) Refuse("unknown word " + word);
   }
   return impl->host.Result("ValidateKeyword");

@@ -1,0 +1,23 @@
+#include "contract_host.h"
+#include "host/linux/security_attribute.h"
+#include "linux/state_directory.h"
+
+namespace HostContractTest {
+
+class ContractHost::Impl {
+ public:
+  Impl() : file(state.Path() + "/labelled") {
+    state.Write("labelled", "");
+    LinuxHost::GiveFirstLabel(file.c_str(), 2);
+  }
+
+  LinuxHostTest::StateDirectory state;
+  std::string file;
+};
+
+ContractHost::ContractHost() : impl(std::make_unique<Impl>()) {}
+ContractHost::~ContractHost() = default;
+
+const std::string& ContractHost::LabelledFile() const { return impl->file; }
+
+}  // namespace HostContractTest
