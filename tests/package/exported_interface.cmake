@@ -1,0 +1,13 @@
+# A program of its own: it sees the public header and links libsecpolicy.so, nothing of its objects.
+add_executable(package_consumer "${CMAKE_CURRENT_LIST_DIR}/exception_border_test.cpp")
+target_link_libraries(package_consumer PRIVATE secpolicy GTest::gtest GTest::gtest_main)
+gtest_discover_tests(package_consumer DISCOVERY_MODE PRE_TEST)
+
+# What the dynamic linker shows: one line more or less is a changed promise.
+add_test(NAME package.exported_symbols
+  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-exported-symbols"
+    "$<TARGET_FILE:secpolicy>" "${CMAKE_CURRENT_LIST_DIR}/exported_symbols.txt")
+
+# What it needs at run time: the host, the C++ runtime and the C library.
+add_test(NAME package.needed_libraries
+  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-needed-libraries" "$<TARGET_FILE:secpolicy>")
