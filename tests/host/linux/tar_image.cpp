@@ -3,7 +3,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <cstring>
 #include <fstream>
 
@@ -36,7 +35,9 @@ static_assert(sizeof(Header) == kBlockSize);
 
 template <std::size_t size>
 void PutNumber(char (&field)[size], unsigned long value) {
-  std::snprintf(field, size, "%0*lo", static_cast<int>(size) - 1, value);
+  for (std::size_t index = size - 1; index-- > 0; value /= 8) {
+    field[index] = static_cast<char>('0' + value % 8);
+  }
 }
 
 template <std::size_t size>
