@@ -1,6 +1,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 
 #include "secpolicy/secpolicy.h"
@@ -357,15 +358,44 @@ TEST_P(LoadPolicyDomainsForeign, ExceptionPassesThrough) {
   EXPECT_EQ(run.exceptionText, "foreign");
 }
 
-TEST_F(LoadPolicyDomains, PassesOnExceptionOfEachReport) {
+// A load without syslog, whose `failing`-th report (from 1; 0: none) throws.
+Transcript LoadWithFailingReport(const std::string& dir, unsigned int failing) {
+  ScriptedHost host;
   host.syslogRunning = false;
-  tree.Write("a", "-x\n");
-  host.Fail("WriteToKlog", "log full");
+  host.Fail("CheckCapabilityParamRuleConstraints", With(R"("conflict", [])"), "conflict");
+  if (failing != 0) host.FailWith("WriteToKlog", Nth(failing), DerivedBraxoException("log full"));
+  TeskAccessInterfaceImpl access;
+  return Record([&] { SecPolicy::LoadPolicyDomains(dir, access); });
+}
 
-  // Whichever report fails, nothing more is done.
-  EXPECT_EQ(Load(), Lines({R"(FindDomain("a"))", R"(CreateDomain("a", 0))",
-                           R"(WriteToKlog("Parsed all domain names", "[INFO]"))",
-                           "throws Braxo::Lib::BraxoException: log full"}));
+// Whichever report fails, nothing is done after it.
+void ExpectEndsAtEachReport(const std::string& dir, unsigned int reports) {
+  const std::vector<std::string> whole = LoadWithFailingReport(dir, 0).trace;
+  const auto isReport = [](const std::string& line) { return line.starts_with("WriteToKlog("); };
+  ASSERT_EQ(std::count_if(whole.begin(), whole.end(), isReport), reports);
+
+  auto end = whole.begin();
+  for (unsigned int failing = 1; failing <= reports; ++failing) {
+    end = std::find_if(end, whole.end(), isReport) + 1;
+    const Transcript run = LoadWithFailingReport(dir, failing);
+    EXPECT_EQ(run.trace, std::vector<std::string>(whole.begin(), end));
+    EXPECT_EQ(run.exceptionType, "SecPolicyTest::DerivedBraxoException");
+    EXPECT_EQ(run.exceptionText, "log full");
+  }
+}
+
+TEST(LoadPolicyDomainsReports, EndGoodLoadWhenTheyFail) {
+  const PolicyTree tree({{"good", "-s read grant\n"}});
+  ExpectEndsAtEachReport(tree.Root(), 4);
+}
+
+// The names, three failures of a domain, the refusal of the one with the conflict, three summaries.
+TEST(LoadPolicyDomainsReports, EndBadLoadWhenTheyFail) {
+  const PolicyTree tree({{"bad", "-x\n"},
+                         {"conflict", "-s read grant\n"},
+                         {"good", "-s read grant\n"},
+                         {"wrong", "-r /bin/ls R\n"}});
+  ExpectEndsAtEachReport(tree.Root(), 8);
 }
 
 TEST_F(LoadPolicyDomains, PassesOnExceptionOfErrorReport) {
@@ -382,43 +412,6 @@ TEST_F(LoadPolicyDomains, PassesOnExceptionOfErrorReport) {
            R"~(stderr "Error: Error in parsing policy for domain: a: 1 : invalid policy rule type (-x)\n")~",
            R"~(WriteToKlog("Error in parsing policy for domain: a: 1 : invalid policy rule type (-x)", "[ERR]"))~",
            "throws Braxo::Lib::BraxoException: log full"}));
-}
-
-TEST_F(LoadPolicyDomains, PassesOnExceptionOfConstraintReport) {
-  host.syslogRunning = false;
-  tree.Write("a", "-s read grant\n");
-  host.Fail("CheckCapabilityParamRuleConstraints", "conflict");
-  host.Fail("WriteToKlog", Nth(3), "log full");
-
-  EXPECT_EQ(Load(),
-            Lines({R"(FindDomain("a"))", R"(CreateDomain("a", 0))",
-                   R"(WriteToKlog("Parsed all domain names", "[INFO]"))",
-                   R"(ValidateKeyword(SYSCALL, "read"))",
-                   R"(WriteToKlog("Domain policies parsed and syntax validated", "[INFO]"))",
-                   R"(CheckCapabilityParamRuleConstraints("a", []))",
-                   R"(stderr "Error: Policy constraint error for domain: a : conflict\n")",
-                   R"(WriteToKlog("Policy constraint error for domain: a : conflict", "[ERR]"))",
-                   "throws Braxo::Lib::BraxoException: log full"}));
-}
-
-TEST_F(LoadPolicyDomains, PassesOnExceptionOfSetReport) {
-  host.syslogRunning = false;
-  tree.Write("a", "-r /bin/ls R\n");
-  tree.Write("b", "-s read grant\n");
-  host.Fail("WriteToKlog", Nth(4), "log full");
-
-  EXPECT_EQ(
-      Load(),
-      Lines({R"(FindDomain("a"))", R"(CreateDomain("a", 0))", R"(FindDomain("b"))",
-             R"(CreateDomain("b", 0))", R"(WriteToKlog("Parsed all domain names", "[INFO]"))",
-             R"(ValidateKeyword(SYSCALL, "read"))",
-             R"(WriteToKlog("Domain policies parsed and syntax validated", "[INFO]"))",
-             R"(CheckCapabilityParamRuleConstraints("a", []))",
-             R"(CheckCapabilityParamRuleConstraints("b", []))",
-             R"(WriteToKlog("Constraints check for domain policies succeeded", "[INFO]"))",
-             R"(RealPath("/bin/ls"))", R"(stderr "Error: Unknown access privilege specified.\n")",
-             R"(WriteToKlog("Unknown access privilege specified.", "[ERR]"))",
-             "throws Braxo::Lib::BraxoException: log full"}));
 }
 
 // ---- The fixed directory of partner domains.
