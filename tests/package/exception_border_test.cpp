@@ -104,7 +104,7 @@ TEST_F(ExceptionBorderOnHost, LetsAFailureOfTheHostComeThrough) {
   } catch (const BraxoException& failure) {
     caught = failure.what();
   }
-  EXPECT_EQ(caught, "@");
+  EXPECT_EQ(caught, "unknown domain " + std::to_string(domain + 1));
 }
 
 // The class is exported because its objects are the caller's to delete.
