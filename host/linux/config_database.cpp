@@ -41,7 +41,7 @@ constexpr StoreLayout kLayout{
 
 std::string ConfiguredPath() {
   const char* path = secure_getenv("SECPOLICY_HOST_CONFIG");
-  return path == nullptr ? kDefaultPath : path;
+  return path != nullptr && *path != '\0' ? path : kDefaultPath;
 }
 
 // Anything but a missing file is for the store to judge.
