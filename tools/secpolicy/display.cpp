@@ -1,3 +1,4 @@
+#include <CLI/App.hpp>
 #include <charconv>
 
 #include "kitlibs/file.h"

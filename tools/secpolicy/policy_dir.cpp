@@ -1,5 +1,7 @@
 #include "policy_dir.h"
 
+#include <CLI/App.hpp>
+
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "root.h"

@@ -1,5 +1,6 @@
 #include "host/linux/settings.h"
 
+#include <CLI/App.hpp>
 #include <functional>
 #include <iostream>
 #include <variant>
