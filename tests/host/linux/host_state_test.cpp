@@ -1,0 +1,194 @@
+#include "host/linux/host_state.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <stdexcept>
+#include <thread>
+#include <vector>
+
+#include "child_process.h"
+#include "host/linux/domain_table.h"
+#include "host/linux/file_policy_table.h"
+#include "host/linux/inode_origin.h"
+#include "host/linux/label_table.h"
+#include "host/linux/parameter_rule_table.h"
+#include "host/linux/rule_table.h"
+#include "host/linux/world_table.h"
+#include "message_of.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::HostState;
+using LinuxHost::InodeOrigin;
+using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+using ::testing::ElementsAre;
+using ::testing::Pair;
+
+InodeOrigin OriginOf(dev_t device, ino_t inode, const std::string& tardisk) {
+  InodeOrigin origin;
+  origin.device = device;
+  origin.inode = inode;
+  origin.tardisk = tardisk;
+  return origin;
+}
+
+// Empty for an inode that came from no tardisk.
+std::string TardiskOf(dev_t device, ino_t inode) {
+  const auto origin = HostState::Current().FindOrigin(device, inode);
+  return origin ? origin->tardisk : std::string();
+}
+
+class HostStateFile : public ::testing::Test {
+ protected:
+  StateDirectory directory;
+};
+
+TEST_F(HostStateFile, LiesWhereTheEnvironmentSays) {
+  EXPECT_EQ(HostState::Current().Database().Path(), directory.Database());
+  EXPECT_TRUE(std::filesystem::exists(directory.Database()));
+}
+
+TEST_F(HostStateFile, StartsWithTheBuiltInContents) {
+  HostState& state = HostState::Current();
+  EXPECT_EQ(state.Domains().Get("hostDom").id, 0U);
+  EXPECT_EQ(state.Domains().Get("hostDom").level, "permissive");
+  EXPECT_THAT(state.Labels().All(), ElementsAre(Pair("tardiskDefault", 3), Pair("unlabeled", 2)));
+  EXPECT_EQ(state.LabelAttribute(), "");
+}
+
+TEST_F(HostStateFile, StaysOpenFromCallToCall) {
+  const HostState* first = &HostState::Current();
+  EXPECT_EQ(&HostState::Current(), first);
+}
+
+TEST_F(HostStateFile, FollowsTheEnvironmentToAnotherPlace) {
+  HostState::Current().Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, false);
+  const std::string other = directory.Path() + "/other.db";
+  setenv("SECPOLICY_HOST_STATE", other.c_str(), 1);
+  EXPECT_EQ(HostState::Current().Domains().Find("tool"), nullptr);
+  EXPECT_EQ(HostState::Current().Database().Path(), other);
+}
+
+TEST_F(HostStateFile, StartsAnewWhenTheFileIsGone) {
+  HostState::Current().Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, false);
+  for (const char* suffix : {"", "-wal", "-shm"}) {
+    std::filesystem::remove(directory.Database() + suffix);
+  }
+  EXPECT_EQ(HostState::Current().Domains().Find("tool"), nullptr);
+}
+
+TEST_F(HostStateFile, IsOpenedAgainInAForkedChild) {
+  HostState::Current().Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, false);
+  EXPECT_EQ(RunInChild([] {
+              HostState::Current().Domains().Create("child", TESKACCESS_DEFAULT_DOM_NONE, false);
+            }),
+            "");
+  HostState::Current().Refresh();
+  EXPECT_NE(HostState::Current().Domains().Find("child"), nullptr);
+}
+
+TEST_F(HostStateFile, IsOpenedByEachThread) {
+  HostState* other = nullptr;
+  std::thread([&] {
+    other = &HostState::Current();
+    other->Domains().Create("thread", TESKACCESS_DEFAULT_DOM_NONE, false);
+  }).join();
+  EXPECT_NE(other, &HostState::Current());
+  EXPECT_NE(HostState::Current().Domains().Find("thread"), nullptr);
+}
+
+TEST_F(HostStateFile, SaysWhatToDoAboutAForeignFile) {
+  directory.Write("host.db", "# this is my diary, not a database\n");
+  std::filesystem::permissions(directory.Database(), std::filesystem::perms(0600));
+  EXPECT_EQ(MessageOf([] { HostState::Current(); }),
+            "Unable to use the host state " + directory.Database() +
+                ": it is damaged or no such thing (file is not a database). Remove the file and "
+                "run \"secpolicy boot\", which makes a new one");
+}
+
+TEST_F(HostStateFile, GoesBackToTheBuiltInContents) {
+  HostState& state = HostState::Current();
+  const unsigned int id = state.Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, true);
+  state.Labels().Add({"toolLabel"});
+  state.Domains().SetRole(LinuxHost::DomainRole::GlobalVm, id);
+  state.Domains().AddGuestService(id, "clipboard");
+  state.Rules().Install({.domain = {id, "tool"}, .words = {"read"}, .granted = true});
+  state.ParameterRules().Install({.domain = {id, "tool"},
+                                  .check = "bind_port",
+                                  .range = {80, 80},
+                                  .firstWord = "80",
+                                  .lastWord = ""});
+  const LinuxHost::FilePolicy policy = {.domain = {id, "tool"}, .path = "/etc", .permission = 1};
+  state.FilePolicies().Install({&policy, 1});
+  state.Worlds().Place(getpid(), id);
+  const InodeOrigin origin = OriginOf(7, 8, "base.tgz");
+  state.RecordOrigins({&origin, 1});
+  state.ChooseLabelAttribute("user.zorvan.security");
+
+  state.Reset();
+
+  EXPECT_THAT(state.Labels().All(), ElementsAre(Pair("tardiskDefault", 3), Pair("unlabeled", 2)));
+  EXPECT_EQ(state.Domains().Find("tool"), nullptr);
+  EXPECT_EQ(state.LabelAttribute(), "");
+  EXPECT_EQ(TardiskOf(7, 8), "");
+  EXPECT_EQ(state.Worlds().DomainOf(getpid()), LinuxHost::kStartDomain);
+  // A new domain in the same slot finds nothing of the old one.
+  EXPECT_EQ(state.Domains().Create("next", TESKACCESS_DEFAULT_DOM_NONE, false), id);
+  EXPECT_EQ(state.Domains().CountReferences(state.Domains().Get(id)).Sum(), 0U);
+  EXPECT_THAT(state.Domains().GuestServices(id), ElementsAre());
+  EXPECT_FALSE(state.Rules().Read(id, LinuxHost::RuleKind::Syscall).Next());
+  EXPECT_FALSE(state.ParameterRules().Read(id).Next());
+  EXPECT_EQ(state.FilePolicies().Count(id), 0U);
+  state.Labels().Add({"first"});
+  state.Refresh();
+  EXPECT_EQ(state.Labels().Lookup("first"), 4U);
+}
+
+TEST_F(HostStateFile, ResetsForOtherProcessesToo) {
+  HostState& state = HostState::Current();
+  state.Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, false);
+  ASSERT_EQ(RunInChild([] { HostState::Current().Reset(); }), "");
+  state.Refresh();
+  EXPECT_EQ(state.Domains().Find("tool"), nullptr);
+}
+
+TEST_F(HostStateFile, RemembersWhereInodesCameFrom) {
+  HostState& state = HostState::Current();
+  const std::vector<InodeOrigin> origins = {OriginOf(1, 10, "base.tgz"),
+                                            OriginOf(1, 11, "tool.tgz")};
+  state.RecordOrigins(origins);
+  EXPECT_EQ(TardiskOf(1, 10), "base.tgz");
+  EXPECT_EQ(TardiskOf(1, 11), "tool.tgz");
+  EXPECT_EQ(TardiskOf(2, 10), "");
+  EXPECT_EQ(TardiskOf(1, 12), "");
+
+  const InodeOrigin later = OriginOf(1, 10, "patch.tgz");
+  state.RecordOrigins({&later, 1});
+  EXPECT_EQ(TardiskOf(1, 10), "patch.tgz");
+}
+
+TEST_F(HostStateFile, TakesTheGreatestInodeNumber) {
+  const InodeOrigin origin = OriginOf(~dev_t{0}, ~ino_t{0}, "base.tgz");
+  HostState::Current().RecordOrigins({&origin, 1});
+  EXPECT_EQ(TardiskOf(~dev_t{0}, ~ino_t{0}), "base.tgz");
+}
+
+TEST_F(HostStateFile, KeepsTheFirstChoiceOfAnAttribute) {
+  HostState& state = HostState::Current();
+  EXPECT_EQ(state.ChooseLabelAttribute("security.zorvan"), "security.zorvan");
+  EXPECT_EQ(state.ChooseLabelAttribute("user.zorvan.security"), "security.zorvan");
+  EXPECT_EQ(state.LabelAttribute(), "security.zorvan");
+  EXPECT_EQ(RunInChild([] {
+              if (HostState::Current().LabelAttribute() != "security.zorvan")
+                throw std::runtime_error("another");
+            }),
+            "");
+}
+
+}  // namespace
+}  // namespace LinuxHostTest

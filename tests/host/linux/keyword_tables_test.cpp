@@ -1,0 +1,119 @@
+#include "host/linux/keyword_tables.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "host/linux/host_state.h"
+#include "message_of.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::HostState;
+using LinuxHost::KeywordRefusal;
+using LinuxHost::Keywords;
+using TeskCtl::Security::TeskAccess_KeywordType;
+using ::testing::ElementsAre;
+using ::testing::Pair;
+using ::testing::UnorderedElementsAre;
+
+class KeywordTables : public ::testing::Test {
+ protected:
+  std::string Refusal(TeskAccess_KeywordType type, const std::string& word) {
+    const auto refusal = KeywordRefusal(state, type, word);
+    return refusal ? refusal->what() : "";
+  }
+
+  StateDirectory directory;
+  HostState& state = HostState::Current();
+};
+
+TEST_F(KeywordTables, NumberTheCapabilities) {
+  const char* words[] = {"cap_chown",           "cap_dac_override",
+                         "cap_dac_read_search", "cap_fowner",
+                         "cap_fsetid",          "cap_kill",
+                         "cap_setgid",          "cap_setuid",
+                         "cap_setpcap",         "cap_net_bind_service",
+                         "cap_net_admin",       "cap_net_raw",
+                         "cap_ipc_lock",        "cap_sys_module",
+                         "cap_sys_rawio",       "cap_sys_chroot",
+                         "cap_sys_ptrace",      "cap_sys_admin",
+                         "cap_sys_boot"};
+  std::map<std::string, long> expected;
+  for (const char* word : words) expected.emplace(word, static_cast<long>(expected.size()));
+  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
+  EXPECT_EQ(LinuxHost::CapabilityWord(18), "cap_sys_boot");
+  EXPECT_EQ(MessageOf([] { LinuxHost::CapabilityWord(19); }), "unknown capability 19");
+}
+
+TEST_F(KeywordTables, NumberTheParameterChecks) {
+  EXPECT_THAT(
+      Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK),
+      UnorderedElementsAre(Pair("socket_family", 0), Pair("socket_type", 1), Pair("bind_port", 2),
+                           Pair("connect_port", 3), Pair("ioctl_request", 4),
+                           Pair("prctl_option", 5), Pair("clone_flags", 6), Pair("kill_signal", 7),
+                           Pair("set_uid", 8), Pair("set_gid", 9)));
+  EXPECT_EQ(LinuxHost::ParameterCheckWord(9), "set_gid");
+  EXPECT_EQ(MessageOf([] { LinuxHost::ParameterCheckWord(10); }), "unknown parameter check 10");
+}
+
+TEST_F(KeywordTables, NumberTheKinds) {
+  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS),
+              ElementsAre(Pair("execute", 2), Pair("list", 3), Pair("read", 0), Pair("remove", 4),
+                          Pair("truncate", 5), Pair("write", 1)));
+  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS),
+              ElementsAre(Pair("enter", 2), Pair("exec", 0), Pair("tardisk_exec", 1)));
+  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION),
+              ElementsAre(Pair("block_device", 5), Pair("char_device", 4), Pair("directory", 1),
+                          Pair("fifo", 3), Pair("regular", 0), Pair("symlink", 2)));
+  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION),
+              ElementsAre(Pair("dgram", 1), Pair("seqpacket", 2), Pair("stream", 0)));
+}
+
+TEST_F(KeywordTables, KnowEverySystemCallThatTheyList) {
+  const auto calls = Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL);
+  EXPECT_GT(calls.size(), 300U);
+  for (const auto& [word, number] : calls) {
+    EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, word), "");
+  }
+  // One that only other architectures have is a Linux system call, too.
+  EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, "_newselect"), "");
+  EXPECT_TRUE(calls.contains("_newselect"));
+}
+
+TEST_F(KeywordTables, NameWhatTheyDoNotKnow) {
+  const std::pair<TeskAccess_KeywordType, const char*> refusals[] = {
+      {TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, "unknown label 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY, "unknown capability 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, "unknown parameter check 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS, "unknown object access kind 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS, "unknown domain transition kind 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION, "unknown file creation kind 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION,
+       "unknown unix socket creation kind 'x'"},
+      {TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, "unknown system call 'x'"},
+  };
+  for (const auto& [type, message] : refusals) EXPECT_EQ(Refusal(type, "x"), message);
+}
+
+TEST_F(KeywordTables, CompareWholeWords) {
+  EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, std::string("read\0x", 6)),
+            std::string("unknown system call 'read\0x'", 28).c_str());
+  EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY, "cap_kil"),
+            "unknown capability 'cap_kil'");
+  EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY, "CAP_KILL"),
+            "unknown capability 'CAP_KILL'");
+}
+
+TEST_F(KeywordTables, AreEight) {
+  for (const int type : {0, 9, -1}) {
+    const auto noTable = static_cast<TeskAccess_KeywordType>(type);
+    const std::string message = "unknown keyword table " + std::to_string(type);
+    EXPECT_EQ(MessageOf([&] { Keywords(state, noTable); }), message);
+    EXPECT_EQ(MessageOf([&] { KeywordRefusal(state, noTable, "x"); }), message);
+  }
+}
+
+}  // namespace
+}  // namespace LinuxHostTest

@@ -1,0 +1,120 @@
+#include "host/linux/label_table.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "host/linux/domain_table.h"
+#include "host/linux/host_state.h"
+#include "host/linux/rule_table.h"
+#include "message_of.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::HostState;
+using LinuxHost::kNoLabel;
+using LinuxHost::RuleKind;
+using ::testing::ElementsAre;
+using ::testing::Pair;
+
+class Labels : public ::testing::Test {
+ protected:
+  unsigned int Lookup(const std::string& name) {
+    state.Refresh();
+    return state.Labels().Lookup(name);
+  }
+
+  StateDirectory directory;
+  HostState& state = HostState::Current();
+};
+
+TEST_F(Labels, GetIdentifiersInTheOrderTheyAreAdded) {
+  state.Labels().Add({"b", "a", "b", "unlabeled"});
+  state.Refresh();
+  EXPECT_THAT(state.Labels().All(), ElementsAre(Pair("a", 5), Pair("b", 4),
+                                                Pair("tardiskDefault", 3), Pair("unlabeled", 2)));
+}
+
+TEST_F(Labels, NeverGetAnIdentifierAgain) {
+  state.Labels().Add({"a", "b"});
+  state.Labels().Remove({"b"});
+  state.Labels().Add({"c", "b"});
+  EXPECT_EQ(Lookup("c"), 6U);
+  EXPECT_EQ(Lookup("b"), 7U);
+  EXPECT_EQ(MessageOf([&] { state.Labels().Name(5); }), "no label has the identifier 5");
+}
+
+TEST_F(Labels, AreAddedAllOrNone) {
+  EXPECT_EQ(MessageOf([&] { state.Labels().Add({"a", ""}); }), "a label needs a name");
+  EXPECT_EQ(Lookup("a"), kNoLabel);
+  EXPECT_EQ(MessageOf([&] {
+              state.Labels().Add({"a", std::string("b\0c", 3)});
+            }),
+            "label 'b' goes on after a NUL byte");
+  EXPECT_EQ(Lookup("a"), kNoLabel);
+}
+
+TEST_F(Labels, AreAtMost255BytesLong) {
+  const std::string longest(255, 'l');
+  EXPECT_EQ(MessageOf([&] { state.Labels().Add({longest}); }), "");
+  EXPECT_EQ(MessageOf([&] { state.Labels().Add({longest + "l"}); }),
+            "label '" + longest + "l' is too long: 256 bytes, at most 255");
+}
+
+TEST_F(Labels, StayWhenTheyArePredefined) {
+  state.Labels().Remove({"unlabeled", "tardiskDefault", "nothing"});
+  EXPECT_EQ(Lookup("unlabeled"), 2U);
+  EXPECT_EQ(Lookup("tardiskDefault"), 3U);
+}
+
+TEST_F(Labels, TakeTheRulesThatNameThemAlong) {
+  state.Labels().Add({"a", "b"});
+  state.Refresh();
+  const auto install = [&](RuleKind kind, std::string_view first, std::string_view second,
+                           std::string_view third) {
+    state.Rules().Install({.domain = {0, {}}, .kind = kind, .words = {first, second, third}});
+  };
+  install(RuleKind::ObjectAccess, "a", "read", "");
+  install(RuleKind::ObjectAccess, "b", "read", "");
+  install(RuleKind::FileCreation, "b", "a", "fifo");
+  install(RuleKind::FileCreation, "b", "b", "fifo");
+  install(RuleKind::UnixSocketCreation, "a", "stream", "");
+  install(RuleKind::DomainTransition, "a", "hostDom", "exec");
+  install(RuleKind::Syscall, "read", "", "");
+  install(RuleKind::Capability, "cap_kill", "", "");
+
+  state.Labels().Remove({"a"});
+
+  const auto count = [&](RuleKind kind) {
+    int rules = 0;
+    for (auto rows = state.Rules().Read(0, kind); rows.Next();) ++rules;
+    return rules;
+  };
+  EXPECT_EQ(count(RuleKind::ObjectAccess), 1);
+  EXPECT_EQ(count(RuleKind::FileCreation), 1);
+  EXPECT_EQ(count(RuleKind::UnixSocketCreation), 0);
+  EXPECT_EQ(count(RuleKind::DomainTransition), 0);
+  EXPECT_EQ(count(RuleKind::Syscall), 1);
+  EXPECT_EQ(count(RuleKind::Capability), 1);
+}
+
+TEST_F(Labels, LeaveTheRulesThatNameADomainOfTheSameName) {
+  state.Domains().Create("a", TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE, false);
+  state.Labels().Add({"a"});
+  state.Rules().Install(
+      {.domain = {0, {}}, .kind = RuleKind::ObjectAccess, .words = {"a", "read"}});
+  state.Labels().Remove({"a"});
+  EXPECT_TRUE(state.Rules().Read(0, RuleKind::ObjectAccess).Next());
+}
+
+TEST_F(Labels, AreSeenByOtherConnections) {
+  const auto other = std::make_shared<HostState>(directory.Database());
+  EXPECT_EQ(other->Labels().Lookup("a"), kNoLabel);
+  state.Labels().Add({"a"});
+  other->Refresh();
+  EXPECT_EQ(other->Labels().Lookup("a"), 4U);
+}
+
+}  // namespace
+}  // namespace LinuxHostTest
