@@ -1,0 +1,264 @@
+// Numbered kernel calls of the Linux host: whatever the number and the arguments, it answers with
+// success or an error, writes only where it was told to, and its state stays whole.
+//
+// An input is a program, one call a line: the number in hexadecimal, then the arguments.
+//   42  -1  0xff     a number              self             the number of this process
+//   t:TEXT           text with its NUL     u:TEXT           text without, where memory ends
+//   c:TEXT           text, not writable    g                an address of nothing
+//   o:SIZE           room for an answer    m:FIRST,LAST     a range of parameters
+//   r:PERMISSION:PATH[;PERMISSION:PATH]... file policies
+
+#include <sqlite3.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <list>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "host_state.h"
+#include "mode_param.h"
+#include "support/caller_memory.h"
+#include "support/outcome.h"
+#include "support/reference_reader.h"
+#include "support/require.h"
+#include "teskctl/security.h"
+#include "zorvan/kernel.h"
+
+namespace SecPolicyFuzz {
+namespace {
+
+using TeskCtl::Security::TeskAccess_FileRule;
+using TeskCtl::Security::TeskAccess_ModeParam;
+using TeskCtl::Security::TeskAccessInterfaceImpl;
+
+constexpr std::size_t kMostArguments = 6;
+
+// The calls, and which of their arguments are addresses.
+struct Signature {
+  std::uint32_t number;
+  std::string_view arguments;  // "n" a number, "p" an address
+};
+constexpr Signature kSignatures[] = {
+    {0x4059, "pnp"}, {0x405a, "n"},     {0x405b, "npn"}, {0x405c, "nnp"},  {0x405d, "npn"},
+    {0x405e, "np"},  {0x405f, "nnpnp"}, {0x4061, "nnn"}, {0x4062, "nnpn"}, {0x4064, "ppn"},
+    {0x4065, "np"},  {0x4066, "npn"},   {0x4067, "pp"},  {0x413e, "nnp"},
+};
+
+const Signature* Find(std::uint32_t number) {
+  for (const Signature& signature : kSignatures) {
+    if (signature.number == number) return &signature;
+  }
+  return nullptr;
+}
+
+// A connection of our own to the host's state, to look at it from outside.
+class StateWitness {
+ public:
+  StateWitness() {
+    Require(sqlite3_open_v2(getenv("SECPOLICY_HOST_STATE"), &database, SQLITE_OPEN_READONLY,
+                            nullptr) == SQLITE_OK,
+            "the state is a database");
+  }
+  StateWitness(const StateWitness&) = delete;
+  StateWitness& operator=(const StateWitness&) = delete;
+  ~StateWitness() { sqlite3_close(database); }
+
+  // The first column of the first row.
+  std::string Ask(const char* query) {
+    sqlite3_stmt* statement = nullptr;
+    Require(sqlite3_prepare_v2(database, query, -1, &statement, nullptr) == SQLITE_OK, query);
+    Require(sqlite3_step(statement) == SQLITE_ROW, query);
+    const std::string answer = reinterpret_cast<const char*>(sqlite3_column_text(statement, 0));
+    sqlite3_finalize(statement);
+    return answer;
+  }
+
+  // Changes whenever another connection changes anything.
+  std::string Version() { return Ask("PRAGMA data_version"); }
+
+ private:
+  sqlite3* database = nullptr;
+};
+
+// The state's directory, in the directory for temporary files, for as long as the process lives.
+class StateDirectory {
+ public:
+  StateDirectory() {
+    std::string name = std::filesystem::temp_directory_path() / "secpolicy-fuzz-XXXXXX";
+    Require(mkdtemp(name.data()) != nullptr, "a temporary directory can be made");
+    path = name;
+    setenv("SECPOLICY_HOST_STATE", (path / "host.db").c_str(), 1);
+    LinuxHost::HostState::Current();
+  }
+  StateDirectory(const StateDirectory&) = delete;
+  StateDirectory& operator=(const StateDirectory&) = delete;
+  ~StateDirectory() { std::filesystem::remove_all(path); }
+
+ private:
+  std::filesystem::path path;
+};
+
+// Words that are no number are 0.
+std::uint64_t Number(const std::string& word) { return std::strtoull(word.c_str(), nullptr, 0); }
+
+std::string RangeBytes(const std::string& text) {
+  const std::size_t comma = std::min(text.find(','), text.size());
+  const TeskAccess_ModeParam range{Number(text.substr(0, comma)),
+                                   Number(text.substr(std::min(comma + 1, text.size())))};
+  return {reinterpret_cast<const char*>(&range), sizeof range};
+}
+
+// A path longer than its room has no end there.
+std::string RuleBytes(const std::string& text) {
+  std::string bytes;
+  std::istringstream rules(text);
+  std::string rule;
+  while (std::getline(rules, rule, ';')) {
+    const std::size_t colon = std::min(rule.find(':'), rule.size());
+    TeskAccess_FileRule record{};
+    record.permission = static_cast<unsigned int>(Number(rule.substr(0, colon)));
+    const std::string path = rule.substr(std::min(colon + 1, rule.size()));
+    std::memcpy(record.path, path.data(), std::min(path.size(), sizeof record.path));
+    bytes.append(reinterpret_cast<const char*>(&record), sizeof record);
+  }
+  return bytes;
+}
+
+std::uint64_t Argument(const std::string& word, CallerMemory& memory) {
+  if (word == "self") return static_cast<std::uint64_t>(getpid());
+  if (word == "g") return memory.Nowhere();
+  const std::string value = word.size() < 2 ? "" : word.substr(2);
+  if (word.starts_with("t:")) return memory.Place(value + '\0');
+  if (word.starts_with("u:")) return memory.Place(value);
+  if (word.starts_with("c:")) return memory.PlaceConstant(value + '\0');
+  if (word.starts_with("o:")) return memory.Place(std::string(Number(value) % 16'384, '\x5a'));
+  if (word.starts_with("m:")) return memory.Place(RangeBytes(value));
+  if (word.starts_with("r:")) return memory.Place(RuleBytes(value));
+  return Number(word);
+}
+
+// A number in place of an address could be one of this process's own: it is made one that no
+// process has.
+std::uint64_t Harmless(std::uint64_t address, const std::string& word) {
+  constexpr std::uint64_t kFirstPage = 4096;
+  const bool isPlaced = word == "g" || (word.size() > 1 && word[1] == ':');
+  return isPlaced || address < kFirstPage ? address : address | std::uint64_t{1} << 63;
+}
+
+std::vector<std::uint64_t> Arguments(const Words& words, const Signature* signature,
+                                     CallerMemory& memory) {
+  std::vector<std::uint64_t> arguments;
+  for (std::size_t index = 1; index < words.size() && index <= kMostArguments; ++index) {
+    std::uint64_t value = Argument(words[index], memory);
+    const bool isAddress = signature != nullptr && index <= signature->arguments.size() &&
+                           signature->arguments[index - 1] == 'p';
+    if (isAddress) value = Harmless(value, words[index]);
+    arguments.push_back(value);
+  }
+  return arguments;
+}
+
+Zorvan::Kernel::CallResult Call(std::uint32_t number, const std::vector<std::uint64_t>& a) {
+  using Zorvan::Kernel::Call;
+  switch (a.size()) {
+    case 0:
+      return Call(number, {});
+    case 1:
+      return Call(number, {a[0]});
+    case 2:
+      return Call(number, {a[0], a[1]});
+    case 3:
+      return Call(number, {a[0], a[1], a[2]});
+    case 4:
+      return Call(number, {a[0], a[1], a[2], a[3]});
+    case 5:
+      return Call(number, {a[0], a[1], a[2], a[3], a[4]});
+    default:
+      return Call(number, {a[0], a[1], a[2], a[3], a[4], a[5]});
+  }
+}
+
+void RunCall(const Words& words, CallerMemory& memory, StateWitness& witness) {
+  const auto number = static_cast<std::uint32_t>(std::strtoul(words[0].c_str(), nullptr, 16));
+  const Signature* signature = Find(number);
+  const std::vector<std::uint64_t> arguments = Arguments(words, signature, memory);
+  const std::string before = witness.Version();
+
+  errno = EXFULL;
+  const auto [status, error] = Call(number, arguments);
+  const std::string call = Show(words);
+  Require(errno == EXFULL, "a call leaves errno alone: " + call);
+  Require(status == 0 ? error == 0 : error < 0, "a failure has an error, a success none: " + call);
+  if (signature == nullptr) Require(error == -ENOSYS, "an unknown call is told so: " + call);
+  const bool rightCount = signature != nullptr && arguments.size() == signature->arguments.size();
+  if (!rightCount) Require(status != 0, "a wrong number of arguments is refused: " + call);
+  if (status != 0) Require(witness.Version() == before, "a failed call changes nothing: " + call);
+  memory.Clear();
+}
+
+template <class Rule>
+void ReadRules(unsigned int id, TeskAccessInterfaceImpl& access,
+               void (TeskAccessInterfaceImpl::*get)(unsigned int, std::list<Rule>&)) {
+  std::list<Rule> rules;
+  (access.*get)(id, rules);
+}
+
+// Everything that the state holds can be shown.
+void ReadEverything() {
+  TeskAccessInterfaceImpl access;
+  for (unsigned int id = 0; id < access.GetMaxDomains(); ++id) {
+    std::string name, level;
+    unsigned int state = 0, refCount = 0, worldRefCount = 0;
+    TeskCtl::Security::TeskAccessKsi_DefaultDom dflt{};
+    if (!access.GetCompleteDomainInfo(id, name, level, state, refCount, worldRefCount, dflt)) {
+      continue;
+    }
+    unsigned int found = 0;
+    Require(access.FindDomain(name, &found) && found == id, "a domain is found by its name");
+    ReadRules(id, access, &TeskAccessInterfaceImpl::GetFilePathAccessRules);
+    ReadRules(id, access, &TeskAccessInterfaceImpl::GetCapabilityRules);
+    ReadRules(id, access, &TeskAccessInterfaceImpl::GetCapabilityParamRules);
+    ReadRules(id, access, &TeskAccessInterfaceImpl::GetDomTransRules);
+  }
+}
+
+void CheckState(StateWitness& witness) {
+  RequireEqual(witness.Ask("PRAGMA integrity_check"), "ok", "the state is whole");
+  RequireEqual(witness.Ask("SELECT name FROM domain WHERE id = 0"), "hostDom", "the start domain");
+  RequireEqual(witness.Ask("SELECT count(*) FROM domain WHERE id NOT BETWEEN 0 AND 511 OR "
+                           "length(CAST(name AS BLOB)) NOT BETWEEN 1 AND 63"),
+               "0", "domains out of bounds");
+  for (const char* table : {"rule", "parameter_rule", "file_policy", "world", "role"}) {
+    const std::string query = std::string("SELECT count(*) FROM ") + table +
+                              " WHERE domain_id NOT IN (SELECT id FROM domain)";
+    RequireEqual(witness.Ask(query.c_str()), "0", "entries of domains that are gone");
+  }
+  RequireEqual(FailureOf(ReadEverything), "", "reading the state");
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static const StateDirectory directory;
+  static StateWitness witness;
+  static CallerMemory memory;
+  LinuxHost::HostState::Current().Reset();
+
+  std::istringstream program{std::string(Text(data, size))};
+  std::string line;
+  while (std::getline(program, line)) {
+    const Words words = ReadLine(line);
+    if (!words.empty()) RunCall(words, memory, witness);
+  }
+  CheckState(witness);
+  return 0;
+}
+
+}  // namespace SecPolicyFuzz
