@@ -1,0 +1,216 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <vector>
+
+#include "host/linux/domain_table.h"
+#include "host/linux/host_state.h"
+#include "host/linux/parameter_range.h"
+#include "host/linux/parameter_rule_table.h"
+#include "message_of.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::HostState;
+using LinuxHost::ParseParameterRange;
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+using ::testing::ElementsAre;
+
+std::string RangeRefusal(const std::string& first, const std::string& last) {
+  return MessageOf([&] { ParseParameterRange(first, last); });
+}
+
+TEST(ParseParameterRange, ReadsDecimalAndHexadecimalNumbers) {
+  const auto range = ParseParameterRange("80", "0x1bB");
+  EXPECT_EQ(range.first, 80U);
+  EXPECT_EQ(range.last, 443U);
+  EXPECT_EQ(ParseParameterRange("0X10", "").first, 16U);
+  EXPECT_EQ(ParseParameterRange("0", "18446744073709551615").last, ~std::uint64_t{0});
+  EXPECT_EQ(ParseParameterRange("010", "").first, 10U);
+}
+
+TEST(ParseParameterRange, IsOneValueWithoutASecondWord) {
+  const auto range = ParseParameterRange("80", "");
+  EXPECT_EQ(range.first, range.last);
+}
+
+TEST(ParseParameterRange, RefusesWhatIsNoNumber) {
+  for (const char* word : {"", "x", "-1", "+1", "1 ", " 1", "0x", "0xg", "1.5", "12a", "0x-1"}) {
+    EXPECT_EQ(RangeRefusal(word, ""),
+              std::string("parameter '") + word + "' is not an unsigned number");
+  }
+  EXPECT_EQ(RangeRefusal("1", "x"), "parameter 'x' is not an unsigned number");
+}
+
+TEST(ParseParameterRange, RefusesNumbersThatDoNotFit) {
+  EXPECT_EQ(RangeRefusal("18446744073709551616", ""),
+            "parameter '18446744073709551616' is too large");
+  EXPECT_EQ(RangeRefusal("0x10000000000000000", ""),
+            "parameter '0x10000000000000000' is too large");
+}
+
+TEST(ParseParameterRange, RefusesARangeThatRunsBackwards) {
+  EXPECT_EQ(RangeRefusal("443", "80"), "parameter range 443 to 80 is empty");
+  EXPECT_EQ(RangeRefusal("80", "80"), "");
+}
+
+// ---- Conflicts.
+
+using ParameterRules = std::list<TeskAccess_CapabilityParamRule>;
+
+TeskAccess_CapabilityParamRule ParameterRuleOf(unsigned int line, const std::string& first,
+                                               const std::string& last, bool grant,
+                                               const std::string& check = "bind_port") {
+  return {line, 0, "owner", check, first, last, grant};
+}
+
+std::string Conflict(const ParameterRules& rules) {
+  return MessageOf([&] { LinuxHost::RequireNoConflict(rules); });
+}
+
+TEST(ParameterRuleConflict, IsAnOverlapOfGrantAndRevoke) {
+  EXPECT_EQ(
+      Conflict({ParameterRuleOf(1, "80", "443", true), ParameterRuleOf(2, "443", "", false)}),
+      "parameter check 'bind_port': grant of 80 to 443 in line 1 conflicts with revoke of 443 "
+      "in line 2");
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "5", "", false), ParameterRuleOf(2, "0x5", "", true)}),
+            "parameter check 'bind_port': revoke of 5 in line 1 conflicts with grant of 0x5 in "
+            "line 2");
+  EXPECT_EQ(
+      Conflict({ParameterRuleOf(1, "50", "60", false), ParameterRuleOf(2, "1", "99", true)}),
+      "parameter check 'bind_port': revoke of 50 to 60 in line 1 conflicts with grant of 1 to "
+      "99 in line 2");
+}
+
+TEST(ParameterRuleConflict, IsNoOverlapOfTheSameVerdict) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "1", "9", true), ParameterRuleOf(2, "5", "20", true)}),
+            "");
+}
+
+TEST(ParameterRuleConflict, IsNotBetweenNeighbours) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "1", "9", true), ParameterRuleOf(2, "10", "20", false),
+                      ParameterRuleOf(3, "21", "30", true)}),
+            "");
+}
+
+TEST(ParameterRuleConflict, IsNotBetweenDifferentChecks) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "1", "9", true),
+                      ParameterRuleOf(2, "1", "9", false, "connect_port")}),
+            "");
+}
+
+TEST(ParameterRuleConflict, IsFoundBehindALongRange) {
+  EXPECT_EQ(
+      Conflict({ParameterRuleOf(1, "1", "1000", true), ParameterRuleOf(2, "2", "3", true),
+                ParameterRuleOf(3, "500", "", false)}),
+      "parameter check 'bind_port': grant of 1 to 1000 in line 1 conflicts with revoke of 500 "
+      "in line 3");
+}
+
+TEST(ParameterRuleConflict, AgreesWithComparingEachPair) {
+  std::uint64_t seed = 1;
+  const auto random = [&](std::uint64_t limit) {
+    seed = seed * 6364136223846793005U + 1442695040888963407U;
+    return (seed >> 33U) % limit;
+  };
+  int conflicts = 0;
+  for (int round = 0; round < 2000; ++round) {
+    ParameterRules rules;
+    for (unsigned int line = 1; line <= 4; ++line) {
+      const auto first = random(30);
+      rules.push_back(ParameterRuleOf(line, std::to_string(first),
+                                      std::to_string(first + random(6)), random(2) == 0));
+    }
+    bool expected = false;
+    for (const auto& left : rules) {
+      for (const auto& right : rules) {
+        expected = expected || (left.grant != right.grant &&
+                                std::stoul(left.firstParam) <= std::stoul(right.secondParam) &&
+                                std::stoul(right.firstParam) <= std::stoul(left.secondParam));
+      }
+    }
+    ASSERT_EQ(!Conflict(rules).empty(), expected);
+    conflicts += expected ? 1 : 0;
+  }
+  EXPECT_GT(conflicts, 200);
+  EXPECT_LT(conflicts, 1800);
+}
+
+TEST(ParameterRuleConflict, NamesARangeThatCannotBeRead) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "many", "", true)}),
+            "parameter 'many' is not an unsigned number");
+}
+
+// ---- The table.
+
+class InstalledParameterRules : public ::testing::Test {
+ protected:
+  void Install(const std::string& first, const std::string& last, bool granted,
+               const std::string& check = "bind_port") {
+    state.ParameterRules().Install({.domain = {domain, "owner"},
+                                    .check = check,
+                                    .range = ParseParameterRange(first, last),
+                                    .firstWord = first,
+                                    .lastWord = last,
+                                    .granted = granted,
+                                    .line = 1});
+  }
+
+  std::vector<std::string> All() {
+    std::vector<std::string> rules;
+    for (auto rows = state.ParameterRules().Read(domain); rows.Next();) {
+      rules.push_back(rows.Text(0) + " " + rows.Text(1) + " " + rows.Text(2) + " " +
+                      (rows.Integer(3) != 0 ? "grant" : "revoke"));
+    }
+    return rules;
+  }
+
+  StateDirectory directory;
+  HostState& state = HostState::Current();
+  unsigned int domain =
+      state.Domains().Create("owner", TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE, false);
+};
+
+TEST_F(InstalledParameterRules, AreTheSameHoweverTheirNumbersAreWritten) {
+  Install("80", "443", true);
+  Install("7", "", true);
+  Install("0x50", "0x1bb", false);
+  Install("7", "7", true);
+  EXPECT_THAT(All(), ElementsAre("bind_port 0x50 0x1bb revoke", "bind_port 7 7 grant"));
+}
+
+TEST_F(InstalledParameterRules, HoldTheGreatestNumber) {
+  Install("0", "18446744073709551615", true);
+  state.ParameterRules().Remove(domain, "bind_port", {0, ~std::uint64_t{0}});
+  EXPECT_THAT(All(), ElementsAre());
+}
+
+TEST_F(InstalledParameterRules, AreRemovedByExactlyTheirRange) {
+  Install("80", "443", true);
+  EXPECT_EQ(MessageOf([&] {
+              state.ParameterRules().Remove(domain, "bind_port", {80, 80});
+            }),
+            "no rule for parameter check 'bind_port'");
+  EXPECT_EQ(MessageOf([&] {
+              state.ParameterRules().Remove(domain, "set_uid", {80, 443});
+            }),
+            "no rule for parameter check 'set_uid'");
+  EXPECT_EQ(MessageOf([&] { state.ParameterRules().Remove(domain, "bind_port", {80, 443}); }), "");
+  EXPECT_THAT(All(), ElementsAre());
+}
+
+TEST_F(InstalledParameterRules, MustUseADomainAndACheckThatExist) {
+  EXPECT_EQ(MessageOf([&] { Install("1", "", true, "shoe_size"); }),
+            "unknown parameter check 'shoe_size'");
+  domain = 77;
+  EXPECT_EQ(MessageOf([&] { Install("1", "", true); }), "unknown domain 77");
+  EXPECT_EQ(MessageOf([&] {
+              state.ParameterRules().Remove(77, "bind_port", {1, 1});
+            }),
+            "unknown domain 77");
+}
+
+}  // namespace
+}  // namespace LinuxHostTest
