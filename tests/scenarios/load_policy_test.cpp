@@ -1,6 +1,7 @@
 #include <csignal>
 #include <cstdio>
 #include <filesystem>
+#include <memory>
 
 #include "scenarios/good_host.h"
 #include "secpolicy/cached_domains.h"
@@ -315,20 +316,26 @@ class LoadPolicyMissingDomainDeathTest : public LoadPolicy,
            Reported(GetParam().message);
   }
 
-  // Shows how far the load came when the process ends in the standard way.
+  // Shows how far the load came when the process ends in the standard way, and clears up.
   [[noreturn]] static void ShowTraceAndAbort() {
     std::string text;
     for (const std::string& line : ScriptedHost::Current().trace.Lines()) text += line + "\n";
     std::fputs(text.c_str(), stderr);
+    roots.reset();
     std::abort();
   }
 
   static void LoadWithout(const std::string& domain) {
     std::set_terminate(ShowTraceAndAbort);
-    GoodHost good;
-    good.host.hiddenDomains.insert(domain);
+    ScriptedHost host;
+    roots = std::make_unique<GoodRoots>();
+    ScriptGoodHost(host);
+    host.hiddenDomains.insert(domain);
     SecPolicy::LoadPolicy("/policy");
   }
+
+ private:
+  inline static std::unique_ptr<GoodRoots> roots;
 };
 
 TEST_P(LoadPolicyMissingDomainDeathTest, EndsTheProcess) {
