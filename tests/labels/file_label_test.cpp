@@ -241,12 +241,14 @@ class SetDirLabelRecursiveDevice : public FileLabelTest,
 
 TEST_P(SetDirLabelRecursiveDevice, IsLabelled) {
   tree.Write("dir/", "");
+  const std::string device = tree / "dir/device";
   // The null device, as a character or as a block device.
-  if (mknod((tree / "dir/device").c_str(), GetParam() | 0600, makedev(1, 3)) != 0) {
-    GTEST_SKIP() << "skipped: devices cannot be made here: " << std::strerror(errno);
+  if (mknod(device.c_str(), GetParam() | 0600, makedev(1, 3)) != 0) {
+    const int error = errno;
+    GTEST_SKIP() << "skipped: devices cannot be made here: " << std::strerror(error);
   }
   EXPECT_EQ(SetTree(tree / "dir").Text(),
-            Lines({Labelled(tree / "dir"), Labelled(tree / "dir/device"), "returns"}));
+            Lines({Labelled(tree / "dir"), Labelled(device), "returns"}));
 }
 
 INSTANTIATE_TEST_SUITE_P(Kinds, SetDirLabelRecursiveDevice, testing::Values(S_IFCHR, S_IFBLK),
