@@ -138,7 +138,9 @@ unsigned int DomainTable::LowestFreeSlot() const {
 unsigned int DomainTable::Create(const std::string& name, TeskAccessKsi_DefaultDom defaultRules,
                                  bool createdAtRunTime) {
   Change change(*this);
-  if (Find(name) != nullptr) {
+  if (const Domain* existing = Find(name)) {
+    // Of two loaders that missed the same domain, the second one gets the first one's.
+    if (!createdAtRunTime && existing->defaultRules == defaultRules) return existing->id;
     throw HostError(EEXIST, StrCat("domain '", name, "' exists already"));
   }
   const unsigned int id = Insert(name, defaultRules, createdAtRunTime);

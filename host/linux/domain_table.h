@@ -58,8 +58,9 @@ class DomainTable {
   const Domain& Get(std::string_view name);
   const Domain& Get(unsigned int id);
 
-  // Creates a domain in the lowest free slot and returns its identifier. Throws when the name is
-  // taken or cannot be one, and when no slot is free.
+  // Creates a domain in the lowest free slot and returns its identifier. A policy's domain that
+  // exists with the same default rules is returned as it is; any other taken name is refused, and
+  // so is a name that cannot be one, and any name when no slot is free.
   unsigned int Create(const std::string& name,
                       TeskCtl::Security::TeskAccessKsi_DefaultDom defaultRules,
                       bool createdAtRunTime);

@@ -66,10 +66,18 @@ TEST_F(Domains, FillTheLowestFreeSlotButNeverSlotOne) {
 TEST_F(Domains, StartEnforcing) { EXPECT_EQ(state.Domains().Get(Create("a")).level, "enforcing"); }
 
 TEST_F(Domains, KeepTheirNamesToThemselves) {
-  Create("a");
-  EXPECT_EQ(CreateRefusal("a"), "domain 'a' exists already");
-  EXPECT_EQ(CreateRefusal("hostDom"), "domain 'hostDom' exists already");
-  EXPECT_EQ(CreateRefusal("A"), "");
+  const unsigned int id = Create("a");
+  EXPECT_EQ(MessageOf([&] { Create("a", true); }), "domain 'a' exists already");
+  EXPECT_EQ(MessageOf([&] { Create("hostDom", true); }), "domain 'hostDom' exists already");
+  EXPECT_EQ(
+      MessageOf([&] { state.Domains().Create("a", TESKACCESS_DEFAULT_DOM_CHECK_ACCESS, false); }),
+      "domain 'a' exists already");
+  EXPECT_NE(Create("A", true), id);
+}
+
+TEST_F(Domains, OfAPolicyAreReturnedWhenTheyExist) {
+  const unsigned int id = Create("a");
+  EXPECT_EQ(Create("a"), id);
 }
 
 TEST_F(Domains, TakeNamesOf63Bytes) {
@@ -112,8 +120,7 @@ TEST_F(Domains, AreSeenByOtherConnections) {
 TEST_F(Domains, AreNeverCreatedTwiceByTwoConnections) {
   const auto other = std::make_shared<HostState>(directory.Database());
   Create("a");
-  EXPECT_EQ(MessageOf([&] { other->Domains().Create("a", TESKACCESS_DEFAULT_DOM_NONE, false); }),
-            "domain 'a' exists already");
+  EXPECT_EQ(other->Domains().Create("a", TESKACCESS_DEFAULT_DOM_NONE, false), 2U);
   EXPECT_EQ(other->Domains().Create("b", TESKACCESS_DEFAULT_DOM_NONE, false), 3U);
 }
 
