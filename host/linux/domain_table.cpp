@@ -280,6 +280,7 @@ DomainReferences DomainTable::CountReferences(const Domain& domain) {
 }
 
 std::vector<unsigned int> DomainTable::Leaked() {
+  state.Refresh();
   Load();
   std::vector<unsigned int> leaked;
   for (const auto& slot : slots) {

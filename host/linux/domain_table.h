@@ -90,7 +90,7 @@ class DomainTable {
 
   DomainReferences CountReferences(const Domain& domain);
 
-  // The domains that were created at run time and that nothing refers to, in ascending order.
+  // The domains that were created at run time and that nothing refers to now, in ascending order.
   std::vector<unsigned int> Leaked();
 
   // The version of the table that the state is at now.

@@ -4,6 +4,7 @@
 #include <cerrno>
 
 #include "braxo/misc/strcat.h"
+#include "checked_install.h"
 #include "domain_table.h"
 #include "host_error.h"
 #include "host_state.h"
@@ -69,24 +70,34 @@ std::string FormatPermissions(unsigned int permission) {
 
 FilePolicyTable::FilePolicyTable(HostState& owner) : state(owner) {}
 
+void FilePolicyTable::RequireDomain(unsigned int domainId) {
+  state.Refresh();
+  state.Domains().Get(domainId);
+}
+
 void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
   Transaction transaction(state.Database());
-  state.Refresh();
   for (const auto& policy : policies) {
-    if (const auto refusal = DomainRefusal(state, policy.domain)) throw *refusal;
     RequireWorld(policy.world);
     RequirePath(policy.path);
     RequirePermission(policy.permission);
-    state.Database().Run(
-        "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line) "
-        "VALUES (?1, ?2, ?3, ?4, ?5)",
-        policy.domain.id, policy.world, policy.path, policy.permission, policy.line);
+    InstallChecked(
+        state, [&] { return DomainRefusal(state, policy.domain); },
+        [&] { return InstallIfUnchanged(policy); });
   }
   transaction.Commit();
 }
 
+bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
+  return state.Database().Run(
+             "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line) "
+             "SELECT ?1, ?2, ?3, ?4, ?5 FROM state WHERE domain_version = ?6",
+             policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
+             state.Domains().Version()) != 0;
+}
+
 void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
-  state.Domains().Get(domainId);
+  RequireDomain(domainId);
   const int removed = state.Database().Run(
       "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
       path);
@@ -95,7 +106,7 @@ void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string
 
 void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
                              unsigned int permission) {
-  state.Domains().Get(domainId);
+  RequireDomain(domainId);
   RequirePermission(permission);
   const int updated = state.Database().Run(
       "UPDATE file_policy SET permission = ?3 WHERE domain_id = ?1 AND path = ?2", domainId, path,
@@ -112,7 +123,7 @@ void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& new
 }
 
 unsigned int FilePolicyTable::Count(unsigned int domainId) {
-  state.Domains().Get(domainId);
+  RequireDomain(domainId);
   Rows rows =
       state.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
   rows.Next();
@@ -120,7 +131,7 @@ unsigned int FilePolicyTable::Count(unsigned int domainId) {
 }
 
 std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
-  state.Domains().Get(domainId);
+  RequireDomain(domainId);
   std::vector<FilePolicy> policies;
   Rows rows = state.Database().Select(
       "SELECT world, path, permission, line FROM file_policy WHERE domain_id = ?1 ORDER BY id",

@@ -60,6 +60,9 @@ class FilePolicyTable {
   [[nodiscard]] Rows Read(unsigned int domainId);
 
  private:
+  void RequireDomain(unsigned int domainId);
+  bool InstallIfUnchanged(const FilePolicy& policy);
+
   HostState& state;
 };
 

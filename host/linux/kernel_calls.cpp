@@ -195,6 +195,7 @@ std::uint32_t DomainOfWorld(HostState& state, Args args) {
 }
 
 std::uint32_t DomainName(HostState& state, Args args) {
+  state.Refresh();
   const std::string& name = state.Domains().Get(Unsigned(args[0])).name;
   if (args[2] <= name.size()) throw HostError(ERANGE, "buffer too small for the name");
   WriteUser(args[1], name.c_str(), name.size() + 1);
@@ -235,9 +236,7 @@ CallResult Run(std::uint32_t number, Args args) {
                                   [&](const auto& row) { return row.number == number; });
   if (call == kCalls.end()) return {kFailure, -ENOSYS};
   if (args.size() != call->argCount) return {kFailure, -EINVAL};
-  HostState& state = HostState::Current();
-  state.Refresh();
-  const std::uint32_t status = call->run(state, args);
+  const std::uint32_t status = call->run(HostState::Current(), args);
   return {status, status == kBufferTooSmall ? -EAGAIN : 0};
 }
 

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "braxo/misc/strcat.h"
+#include "checked_install.h"
 #include "domain_table.h"
 #include "host_error.h"
 #include "host_state.h"
@@ -65,24 +66,28 @@ void RequireNoConflict(const std::list<TeskAccess_CapabilityParamRule>& rules) {
 
 ParameterRuleTable::ParameterRuleTable(HostState& owner) : state(owner) {}
 
+std::optional<HostError> ParameterRuleTable::Refusal(const ParameterRule& rule) {
+  if (auto refusal = DomainRefusal(state, rule.domain)) return refusal;
+  return KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.check);
+}
+
+bool ParameterRuleTable::InstallIfUnchanged(const ParameterRule& rule) {
+  return state.Database().Run(
+             "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
+             "last_value, first_word, last_word, granted, line) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8 FROM state WHERE domain_version = ?9",
+             rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
+             rule.lastWord, rule.granted, rule.line, state.Domains().Version()) != 0;
+}
+
 void ParameterRuleTable::Install(const ParameterRule& rule) {
-  Transaction transaction(state.Database());
-  state.Refresh();
-  if (const auto refusal = DomainRefusal(state, rule.domain)) throw *refusal;
-  if (const auto refusal =
-          KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.check)) {
-    throw *refusal;
-  }
-  state.Database().Run(
-      "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, last_value, "
-      "first_word, last_word, granted, line) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)",
-      rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord, rule.lastWord,
-      rule.granted, rule.line);
-  transaction.Commit();
+  InstallChecked(
+      state, [&] { return Refusal(rule); }, [&] { return InstallIfUnchanged(rule); });
 }
 
 void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
                                 const ParameterRange& range) {
+  state.Refresh();
   state.Domains().Get(domainId);
   const int removed = state.Database().Run(
       "DELETE FROM parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "

@@ -1,7 +1,9 @@
 #pragma once
 
 #include <list>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "parameter_range.h"
 #include "rule_table.h"
@@ -40,6 +42,9 @@ class ParameterRuleTable {
   [[nodiscard]] Rows Read(unsigned int domainId);
 
  private:
+  std::optional<HostError> Refusal(const ParameterRule& rule);
+  bool InstallIfUnchanged(const ParameterRule& rule);
+
   HostState& state;
 };
 

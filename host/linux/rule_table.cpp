@@ -3,6 +3,7 @@
 #include <cerrno>
 
 #include "braxo/misc/strcat.h"
+#include "checked_install.h"
 #include "domain_table.h"
 #include "host_state.h"
 #include "keyword_tables.h"
@@ -73,13 +74,8 @@ bool RuleTable::InstallIfUnchanged(const Rule& rule) {
 }
 
 void RuleTable::Install(const Rule& rule) {
-  // The common way makes one statement: what is known is good enough to check against, since the
-  // insertion itself proves that it still holds.
-  if (!Refusal(rule) && InstallIfUnchanged(rule)) return;
-  do {
-    state.Refresh();
-    if (const auto refusal = Refusal(rule)) throw *refusal;
-  } while (!InstallIfUnchanged(rule));
+  InstallChecked(
+      state, [&] { return Refusal(rule); }, [&] { return InstallIfUnchanged(rule); });
 }
 
 Rows RuleTable::Read(unsigned int domainId, RuleKind kind) {

@@ -134,6 +134,24 @@ TEST_F(KernelCalls, AnswerAnErrorWhenTheStateCannotBeUsed) {
   EXPECT_EQ(ErrorOf(kDestroyDomain, {5}), ENOENT);
 }
 
+TEST_F(KernelCalls, SeeWhatAnotherProcessHasJustDone) {
+  std::array<char, 64> name{};
+  const std::uint64_t next = domain + 1;
+  ASSERT_EQ(ErrorOf(kDomainName, {next, Address(name.data()), name.size()}), ENOENT);
+  ASSERT_EQ(RunInChild([&] { Create("next"); }), "");
+  EXPECT_EQ(ErrorOf(kDomainName, {next, Address(name.data()), name.size()}), 0);
+  EXPECT_STREQ(name.data(), "next");
+
+  ASSERT_EQ(RunInChild([&] { Call(kDestroyDomain, {next}); }), "");
+  std::uint32_t count = 0;
+  EXPECT_EQ(ErrorOf(kCountFilePolicies, {next, Address(&count)}), ENOENT);
+  ASSERT_EQ(RunInChild([&] { Create("again"); }), "");
+  EXPECT_EQ(ErrorOf(kSetCapability, {next, 0, 1}), 0);
+  std::array<std::uint32_t, 4> ids{};
+  EXPECT_EQ(ErrorOf(kRetrieveLeaked, {Address(ids.data()), Address(&count), ids.size()}), 0);
+  EXPECT_EQ(count, 2U);
+}
+
 // ---- Domains.
 
 TEST_F(KernelCalls, CreateAndDestroyDomains) {

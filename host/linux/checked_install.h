@@ -1,0 +1,21 @@
+#pragma once
+
+#include "host_state.h"
+
+namespace LinuxHost {
+
+// Installs something that refers to domains and labels. `refuse()` returns why it cannot be
+// installed as far as is known (an optional HostError); `install()` does it in one statement that
+// changes nothing, and returns false, once what is known no longer holds. Throws the refusal.
+template <class Refuse, class Install>
+void InstallChecked(HostState& state, const Refuse& refuse, const Install& install) {
+  // The common way makes one statement: what was known last is good enough to check against, since
+  // the installation itself proves that it still holds.
+  if (!refuse() && install()) return;
+  do {
+    state.Refresh();
+    if (const auto refusal = refuse()) throw *refusal;
+  } while (!install());
+}
+
+}  // namespace LinuxHost
