@@ -10,6 +10,7 @@
 #include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -176,6 +177,13 @@ class World {
     Require(origins.size() == 1 && IsInRoot("first"), "a good archive is unpacked");
   }
 
+  // The names of the extended attributes, by which a file is labelled.
+  static std::string Labels(const fs::path& file) {
+    char names[1024];
+    const ssize_t size = llistxattr(file.c_str(), names, sizeof names);
+    return {names, size < 0 ? 0 : static_cast<std::size_t>(size)};
+  }
+
   // Everything but the root, the image and the host's own state.
   std::string Describe() const {
     std::map<std::string, std::string> entries;
@@ -189,6 +197,7 @@ class World {
       text << std::oct << status.st_mode << std::dec << " " << status.st_uid << " ";
       if (S_ISREG(status.st_mode))
         text << status.st_mtime << " " << std::ifstream(entry->path()).rdbuf();
+      text << " " << Labels(entry->path());
       if (S_ISLNK(status.st_mode)) text << fs::read_symlink(entry->path());
       entries[name] = text.str();
     }

@@ -39,16 +39,31 @@ using TeskCtl::Security::TeskAccess_ModeParam;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
 
 constexpr std::size_t kMostArguments = 6;
+constexpr std::uint32_t kGetDomainName = 0x4066;
 
-// The calls, and which of their arguments are addresses.
+// A call, and what its arguments are: "n" a number, "r" the address of what is read, "w" of four
+// bytes to write, "c" of as many units to write as the argument `capacity` says.
 struct Signature {
   std::uint32_t number;
-  std::string_view arguments;  // "n" a number, "p" an address
+  std::string_view arguments;
+  std::size_t capacity = 0;
+  std::uint64_t unit = 0;
 };
 constexpr Signature kSignatures[] = {
-    {0x4059, "pnp"}, {0x405a, "n"},     {0x405b, "npn"}, {0x405c, "nnp"},  {0x405d, "npn"},
-    {0x405e, "np"},  {0x405f, "nnpnp"}, {0x4061, "nnn"}, {0x4062, "nnpn"}, {0x4064, "ppn"},
-    {0x4065, "np"},  {0x4066, "npn"},   {0x4067, "pp"},  {0x413e, "nnp"},
+    {0x4059, "rnw"},
+    {0x405a, "n"},
+    {0x405b, "nrn"},
+    {0x405c, "nnr"},
+    {0x405d, "ncn", 2, sizeof(TeskAccess_FileRule)},
+    {0x405e, "nw"},
+    {0x405f, "nnrnw"},
+    {0x4061, "nnn"},
+    {0x4062, "nnrn"},
+    {0x4064, "cwn", 2, sizeof(std::uint32_t)},
+    {0x4065, "nw"},
+    {kGetDomainName, "ncn", 2, 1},
+    {0x4067, "rr"},
+    {0x413e, "nnr"},
 };
 
 const Signature* Find(std::uint32_t number) {
@@ -70,12 +85,15 @@ class StateWitness {
   StateWitness& operator=(const StateWitness&) = delete;
   ~StateWitness() { sqlite3_close(database); }
 
-  // The first column of the first row.
-  std::string Ask(const char* query) {
+  // The first column of the first row, empty when there is none.
+  std::string Ask(const std::string& query) {
     sqlite3_stmt* statement = nullptr;
-    Require(sqlite3_prepare_v2(database, query, -1, &statement, nullptr) == SQLITE_OK, query);
-    Require(sqlite3_step(statement) == SQLITE_ROW, query);
-    const std::string answer = reinterpret_cast<const char*>(sqlite3_column_text(statement, 0));
+    Require(sqlite3_prepare_v2(database, query.c_str(), -1, &statement, nullptr) == SQLITE_OK,
+            query);
+    std::string answer;
+    if (sqlite3_step(statement) == SQLITE_ROW) {
+      answer = reinterpret_cast<const char*>(sqlite3_column_text(statement, 0));
+    }
     sqlite3_finalize(statement);
     return answer;
   }
@@ -158,7 +176,7 @@ std::vector<std::uint64_t> Arguments(const Words& words, const Signature* signat
   for (std::size_t index = 1; index < words.size() && index <= kMostArguments; ++index) {
     std::uint64_t value = Argument(words[index], memory);
     const bool isAddress = signature != nullptr && index <= signature->arguments.size() &&
-                           signature->arguments[index - 1] == 'p';
+                           signature->arguments[index - 1] != 'n';
     if (isAddress) value = Harmless(value, words[index]);
     arguments.push_back(value);
   }
@@ -185,6 +203,44 @@ Zorvan::Kernel::CallResult Call(std::uint32_t number, const std::vector<std::uin
   }
 }
 
+// What the call may write to its argument `index`, in bytes.
+std::uint64_t MostWritten(const Signature& signature, std::size_t index,
+                          const std::vector<std::uint64_t>& arguments) {
+  switch (signature.arguments[index]) {
+    case 'w':
+      return sizeof(std::uint32_t);
+    case 'c': {
+      const std::uint64_t capacity = arguments[signature.capacity];
+      return std::min(capacity, std::uint64_t{1} << 32) * signature.unit;
+    }
+    default:
+      return 0;
+  }
+}
+
+void CheckMemory(const Signature& signature, const std::vector<std::uint64_t>& arguments,
+                 const CallerMemory& memory, const std::string& call) {
+  for (std::size_t index = 0; index < arguments.size(); ++index) {
+    Require(memory.Written(arguments[index]) <= MostWritten(signature, index, arguments),
+            "a call writes only its answer: " + call);
+  }
+}
+
+// Where there is such a domain, and room for its name, the call tells it.
+void CheckName(const std::vector<std::uint64_t>& arguments, std::uint32_t status,
+               const CallerMemory& memory, StateWitness& witness, const std::string& call) {
+  const std::string name =
+      arguments[0] > UINT32_MAX
+          ? ""
+          : witness.Ask("SELECT name FROM domain WHERE id = " + std::to_string(arguments[0]));
+  const std::size_t room = std::min<std::uint64_t>(memory.RoomAt(arguments[1]), arguments[2]);
+  Require(status != 0 || !name.empty(), "only a domain has a name: " + call);
+  Require(status == 0 || name.empty() || room <= name.size(), "the name is told: " + call);
+  if (status == 0) {
+    RequireEqual(reinterpret_cast<const char*>(arguments[1]), name, "the name: " + call);
+  }
+}
+
 void RunCall(const Words& words, CallerMemory& memory, StateWitness& witness) {
   const auto number = static_cast<std::uint32_t>(std::strtoul(words[0].c_str(), nullptr, 16));
   const Signature* signature = Find(number);
@@ -199,6 +255,8 @@ void RunCall(const Words& words, CallerMemory& memory, StateWitness& witness) {
   if (signature == nullptr) Require(error == -ENOSYS, "an unknown call is told so: " + call);
   const bool rightCount = signature != nullptr && arguments.size() == signature->arguments.size();
   if (!rightCount) Require(status != 0, "a wrong number of arguments is refused: " + call);
+  if (rightCount) CheckMemory(*signature, arguments, memory, call);
+  if (rightCount && number == kGetDomainName) CheckName(arguments, status, memory, witness, call);
   if (status != 0) Require(witness.Version() == before, "a failed call changes nothing: " + call);
   memory.Clear();
 }
@@ -236,9 +294,9 @@ void CheckState(StateWitness& witness) {
                            "length(CAST(name AS BLOB)) NOT BETWEEN 1 AND 63"),
                "0", "domains out of bounds");
   for (const char* table : {"rule", "parameter_rule", "file_policy", "world", "role"}) {
-    const std::string query = std::string("SELECT count(*) FROM ") + table +
-                              " WHERE domain_id NOT IN (SELECT id FROM domain)";
-    RequireEqual(witness.Ask(query.c_str()), "0", "entries of domains that are gone");
+    RequireEqual(witness.Ask(std::string("SELECT count(*) FROM ") + table +
+                             " WHERE domain_id NOT IN (SELECT id FROM domain)"),
+                 "0", "entries of domains that are gone");
   }
   RequireEqual(FailureOf(ReadEverything), "", "reading the state");
 }

@@ -14,6 +14,9 @@ constexpr std::size_t kPage = 4096;
 constexpr std::size_t kRoom = 4 * kPage;
 constexpr unsigned char kUntouched = 0xa5;
 
+// A piece ends where its region's room does.
+unsigned char* PieceOf(unsigned char* start, std::size_t size) { return start + kRoom - size; }
+
 }  // namespace
 
 CallerMemory::CallerMemory() {
@@ -35,15 +38,17 @@ CallerMemory::Region& CallerMemory::NextRegion() { return regions[next++ % kRegi
 
 std::uint64_t CallerMemory::Place(std::string_view bytes) {
   Region& region = NextRegion();
-  region.used = std::min(bytes.size(), kRoom);
-  unsigned char* piece = region.start + kRoom - region.used;
-  std::memcpy(piece, bytes.data(), region.used);
+  region.placed = bytes.substr(0, kRoom);
+  unsigned char* piece = PieceOf(region.start, region.placed.size());
+  std::memcpy(piece, region.placed.data(), region.placed.size());
   return reinterpret_cast<std::uint64_t>(piece);
 }
 
 std::uint64_t CallerMemory::PlaceConstant(std::string_view bytes) {
   const std::uint64_t address = Place(bytes);
-  mprotect(regions[(next - 1) % kRegions].start, kRoom, PROT_READ);
+  Region& region = regions[(next - 1) % kRegions];
+  mprotect(region.start, kRoom, PROT_READ);
+  region.writable = false;
   return address;
 }
 
@@ -51,15 +56,42 @@ std::uint64_t CallerMemory::Nowhere() const {
   return reinterpret_cast<std::uint64_t>(regions[0].start + kRoom);
 }
 
+const CallerMemory::Region* CallerMemory::Find(std::uint64_t address) const {
+  for (const Region& region : regions) {
+    if (region.placed.empty()) continue;
+    if (reinterpret_cast<std::uint64_t>(PieceOf(region.start, region.placed.size())) == address) {
+      return &region;
+    }
+  }
+  return nullptr;
+}
+
+std::size_t CallerMemory::Written(std::uint64_t address) const {
+  const Region* region = Find(address);
+  if (region == nullptr) return 0;
+  const unsigned char* piece = PieceOf(region->start, region->placed.size());
+  for (std::size_t size = region->placed.size(); size > 0; --size) {
+    if (piece[size - 1] != static_cast<unsigned char>(region->placed[size - 1])) return size;
+  }
+  return 0;
+}
+
+std::size_t CallerMemory::RoomAt(std::uint64_t address) const {
+  const Region* region = Find(address);
+  return region == nullptr || !region->writable ? 0 : region->placed.size();
+}
+
 void CallerMemory::Clear() {
   for (Region& region : regions) {
-    const unsigned char* end = region.start + kRoom - region.used;
-    const bool intact = std::all_of(static_cast<const unsigned char*>(region.start), end,
+    const unsigned char* piece = PieceOf(region.start, region.placed.size());
+    const bool intact = std::all_of(static_cast<const unsigned char*>(region.start), piece,
                                     [](unsigned char byte) { return byte == kUntouched; });
     Require(intact, "nothing in front of a caller's piece of memory is written");
+    if (region.placed.empty()) continue;
     mprotect(region.start, kRoom, PROT_READ | PROT_WRITE);
-    std::memset(region.start + kRoom - region.used, kUntouched, region.used);
-    region.used = 0;
+    std::memset(PieceOf(region.start, region.placed.size()), kUntouched, region.placed.size());
+    region.placed.clear();
+    region.writable = true;
   }
   next = 0;
 }
