@@ -106,7 +106,7 @@ class World {
     std::string name = fs::temp_directory_path() / "secpolicy-fuzz-XXXXXX";
     Require(mkdtemp(name.data()) != nullptr, "a temporary directory can be made");
     path = name;
-    for (const char* directory : {"etc", "beside", "state", "work"}) {
+    for (const char* directory : {"etc", "beside", "state", "inside"}) {
       fs::create_directory(path / directory);
     }
     fs::permissions(path / "state", fs::perms::owner_all);
@@ -128,7 +128,7 @@ class World {
   // Empties the root but for what an archive may stumble over. The image stays behind if the
   // process ends.
   void Prepare(std::string_view archive) const {
-    const fs::path root = path / "work/root";
+    const fs::path root = path / "inside/root";
     fs::remove_all(root);
     fs::create_directories(root / "sub");
     fs::create_directory_symlink("../../beside", root / "up");
@@ -141,13 +141,13 @@ class World {
 
   // Returns why the archive was refused, empty when it was not.
   std::string Unpack(std::vector<LinuxHost::InodeOrigin>& origins) const {
-    const bool entered = chroot(path.c_str()) == 0 && chdir("/work/root") == 0;
+    const bool entered = chroot(path.c_str()) == 0 && chdir("/inside/root") == 0;
     Require(entered, "the root can be entered");
     const std::string failure =
         FailureOf([&] { LinuxHost::UnpackTardisk("/image.tgz", kUnlabeled, origins); });
     struct stat here {
     }, root{};
-    const bool stayed = stat(".", &here) == 0 && stat("/work/root", &root) == 0 &&
+    const bool stayed = stat(".", &here) == 0 && stat("/inside/root", &root) == 0 &&
                         here.st_dev == root.st_dev && here.st_ino == root.st_ino;
     const bool left = fchdir(outerRoot) == 0 && chroot(".") == 0 && fchdir(outerDirectory) == 0;
     Require(left, "the root can be left");
@@ -159,7 +159,7 @@ class World {
 
   // True when there is something of that name, which leads through no link, in the root.
   bool IsInRoot(const std::string& name) const {
-    fs::path place = path / "work/root";
+    fs::path place = path / "inside/root";
     for (const fs::path& part : fs::path(name).relative_path()) {
       if (part.empty()) continue;  // behind a "/" at the end
       if (part == ".." || fs::is_symlink(fs::symlink_status(place))) return false;
@@ -189,8 +189,8 @@ class World {
     std::map<std::string, std::string> entries;
     for (auto entry = fs::recursive_directory_iterator(path); entry != fs::end(entry); ++entry) {
       const std::string name = fs::relative(entry->path(), path);
-      if (name == "work/root" || name == "state") entry.disable_recursion_pending();
-      if (name == "work/root" || name == "state" || name == "image.tgz") continue;
+      if (name == "inside/root" || name == "state") entry.disable_recursion_pending();
+      if (name == "inside/root" || name == "state" || name == "image.tgz") continue;
       struct stat status {};
       lstat(entry->path().c_str(), &status);
       std::ostringstream text;

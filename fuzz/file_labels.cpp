@@ -57,9 +57,9 @@ Reading ReadReference(const std::string& path, const Lines& lines, PolicyHost& h
       reading.refusal = "unknown word " + words[1];
       return reading;
     }
-    const std::string& spec = words[0];
-    const bool recursive = spec.ends_with("/*");
-    const std::string named = recursive ? spec.substr(0, spec.size() - 2) : spec;
+    const std::string& pattern = words[0];
+    const bool recursive = pattern.ends_with("/*");
+    const std::string named = recursive ? pattern.substr(0, pattern.size() - 2) : pattern;
     // "/*" is for the end alone; "/*/*" has one before it.
     if ((named + (recursive ? "/" : "")).find("/*") != std::string::npos) {
       reading.refusal = place + "Unrecognized format for file/dir specification";
