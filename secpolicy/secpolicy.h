@@ -35,7 +35,8 @@ using TeskCtl::Security::TeskAccessLabelType;
 // Installs the full policy under `policyDir`: objects, the check-access template domain, domains,
 // partner domains, tardisks (always of the fixed policy root) and file labels. A part that fails is
 // reported and the next is loaded; throws at the end when one failed. Ends the process when one of
-// the four well-known domains is missing after the domains are loaded.
+// the four well-known domains is missing after the domains are loaded; called from inside a
+// handler, it throws the exception being handled instead.
 SECPOLICY_EXPORT void LoadPolicy(const std::string& policyDir);
 
 // Installs the early-boot policy: the domains under `earlyPolicyDir`, the objects and file labels
@@ -71,7 +72,7 @@ class SECPOLICY_EXPORT SecPolicyRetryException : public Braxo::Lib::BraxoExcepti
   SecPolicyRetryException(const std::string& text, const Braxo::Lib::KweMessage& handle);
 
   SecPolicyRetryException(const SecPolicyRetryException&);
-  SecPolicyRetryException& operator=(const SecPolicyRetryException&) = delete;
+  SecPolicyRetryException& operator=(const SecPolicyRetryException&) = default;
   ~SecPolicyRetryException() override;
 };
 
@@ -172,8 +173,9 @@ SECPOLICY_EXPORT void LoadPolicyFileLabels(const std::string& dir, TeskAccessInt
 SECPOLICY_EXPORT void SetFileLabel(const std::string& path, const std::string& label,
                                    TeskAccessInterfaceImpl& access);
 
-// Gives `dir` and everything in it but links and sockets the object label `label`. Throws at the
-// first entry that fails; what was labelled before keeps its label.
+// Gives `dir` and everything in it the object label `label`, but links, sockets and entries whose
+// type the directory does not tell. Throws at the first entry that fails; what was labelled before
+// keeps its label.
 SECPOLICY_EXPORT void SetDirLabelRecursive(const std::string& dir, const std::string& label,
                                            TeskAccessInterfaceImpl& access);
 
@@ -215,7 +217,8 @@ SECPOLICY_EXPORT void GetAllTardisks(std::list<std::string>& tardisks);
 
 // Appends the policies of `policyDir` whose files came from a tardisk to `policies`, which the
 // caller deletes, also after an exception; and to `unmatched` the tardisks without a policy. Both
-// stay as they were when `policyDir` does not exist.
+// stay as they were when `policyDir` does not exist. Throws when the tardisks or the directory
+// cannot be listed, and when a policy file cannot be opened, examined or asked for its tardisk.
 SECPOLICY_EXPORT void GetTardiskLists(const std::string& policyDir,
                                       std::list<TardiskPolicy*>& policies,
                                       std::list<std::string>& unmatched);
@@ -226,7 +229,7 @@ SECPOLICY_EXPORT void ParseAndSetTardiskPolicy(std::list<TardiskPolicy*> policie
                                                TeskAccessInterfaceImpl& access);
 
 // Installs the tardisk policies of `dir`, and the default policy for all other tardisks. Failures
-// are reported; throws at the end when there was one, and when the tardisks cannot be listed.
+// are reported; throws at the end when there was one, and at once as GetTardiskLists.
 SECPOLICY_EXPORT void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access);
 
 // Installs the default transitions and gives `tardisks` the default label. Failures are reported;

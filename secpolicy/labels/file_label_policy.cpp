@@ -22,17 +22,17 @@ std::string LineMessage(const std::string& file, unsigned int line, const std::s
 FileLabel ParseLine(const std::string& file, unsigned int line, std::queue<std::string>& tokens,
                     TeskAccessInterfaceImpl& access) {
   if (tokens.size() != 2) RaiseError(LineMessage(file, line, "incorrect no of parameters"));
-  const std::string& specification = tokens.front();
+  const std::string& pattern = tokens.front();
   const std::string& label = tokens.back();
-  // An unknown label is told in the kernel's own words, before the specification is looked at.
+  // An unknown label is told in the kernel's own words, before the pattern is looked at.
   access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
 
-  const std::size_t marker = specification.find(kTreeMarker);
+  const std::size_t marker = pattern.find(kTreeMarker);
   const bool recursive = marker != std::string::npos;
-  if (recursive && marker + kTreeMarker.size() != specification.size()) {
+  if (recursive && marker + kTreeMarker.size() != pattern.size()) {
     RaiseError(LineMessage(file, line, "Unrecognized format for file/dir specification"));
   }
-  return {.path = specification.substr(0, marker),
+  return {.path = pattern.substr(0, marker),
           .label = label,
           .recursive = recursive,
           .policyFile = file,
