@@ -150,6 +150,9 @@ bool TeskAccessInterfaceImpl::GetCompleteDomainInfo(unsigned int id, std::string
     throw HostError(
         EINVAL, StrCat("domain ", id, " is beyond the last slot ", LinuxHost::kDomainSlots - 1));
   }
+  // Most slots are empty, which takes no lock to see.
+  if (impl->Fresh().Domains().Find(id) == nullptr) return false;
+  const LinuxHost::Transaction transaction(impl->Any().Database());
   auto& domains = impl->Fresh().Domains();
   const Domain* domain = domains.Find(id);
   if (domain == nullptr) return false;

@@ -97,21 +97,25 @@ bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
 }
 
 void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
+  Transaction transaction(state.Database());
   RequireDomain(domainId);
   const int removed = state.Database().Run(
       "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
       path);
   if (removed == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+  transaction.Commit();
 }
 
 void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
                              unsigned int permission) {
+  Transaction transaction(state.Database());
   RequireDomain(domainId);
   RequirePermission(permission);
   const int updated = state.Database().Run(
       "UPDATE file_policy SET permission = ?3 WHERE domain_id = ?1 AND path = ?2", domainId, path,
       permission);
   if (updated == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+  transaction.Commit();
 }
 
 void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& newPath) {
@@ -123,6 +127,7 @@ void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& new
 }
 
 unsigned int FilePolicyTable::Count(unsigned int domainId) {
+  const Transaction transaction(state.Database());
   RequireDomain(domainId);
   Rows rows =
       state.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
@@ -131,6 +136,7 @@ unsigned int FilePolicyTable::Count(unsigned int domainId) {
 }
 
 std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
+  const Transaction transaction(state.Database());
   RequireDomain(domainId);
   std::vector<FilePolicy> policies;
   Rows rows = state.Database().Select(

@@ -219,8 +219,6 @@ bool Store::ReadCommitMark(CommitMark* mark) const {
   return *mark == second;
 }
 
-std::int64_t Store::LastInsertId() const { return sqlite3_last_insert_rowid(database); }
-
 sqlite3_stmt* Store::Prepared(Sql sql) {
   if (getpid() != owner) {
     throw HostError(EBADF, StrCat("The ", layout.purpose,

@@ -96,9 +96,6 @@ class Store {
     return Rows(*this, statement);
   }
 
-  // The row identifier of the last row inserted through this object.
-  std::int64_t LastInsertId() const;
-
   // Writes the current mark to `*mark` and returns true; false while it cannot be told. Makes no
   // system call. Two equal marks mean that nothing was committed between them.
   bool ReadCommitMark(CommitMark* mark) const;
