@@ -2,7 +2,6 @@
 
 #include <sys/mman.h>
 
-#include <algorithm>
 #include <cstring>
 
 #include "support/require.h"
@@ -82,10 +81,10 @@ std::size_t CallerMemory::RoomAt(std::uint64_t address) const {
 }
 
 void CallerMemory::Clear() {
+  static const std::string untouched(kRoom, static_cast<char>(kUntouched));
   for (Region& region : regions) {
-    const unsigned char* piece = PieceOf(region.start, region.placed.size());
-    const bool intact = std::all_of(static_cast<const unsigned char*>(region.start), piece,
-                                    [](unsigned char byte) { return byte == kUntouched; });
+    const bool intact =
+        std::memcmp(region.start, untouched.data(), kRoom - region.placed.size()) == 0;
     Require(intact, "nothing in front of a caller's piece of memory is written");
     if (region.placed.empty()) continue;
     mprotect(region.start, kRoom, PROT_READ | PROT_WRITE);
