@@ -115,7 +115,9 @@ void LabelTree(benchmark::State& state, const fs::path& parent) {
   static std::map<fs::path, LabelledTree> trees;
   const fs::path& tree = trees.try_emplace(parent, parent).first->second.Path();
   TeskAccessInterfaceImpl access;
-  for (auto _ : state) SecPolicy::SetDirLabelRecursive(tree, Label(0), access);
+  long round = 0;
+  // Another label each time: a file system may skip a value that is there already.
+  for (auto _ : state) SecPolicy::SetDirLabelRecursive(tree, Label(++round % 2), access);
 }
 
 void LabelBare(char* path, std::size_t length, std::uint32_t id) {
@@ -137,8 +139,8 @@ void LabelTreeBare(benchmark::State& state, const fs::path& parent) {
   const std::string tree = trees.try_emplace(parent, parent).first->second.Path().string();
   std::array<char, 4096> path{};
   tree.copy(path.data(), path.size() - 1);
-  std::uint32_t id = 3;
-  for (auto _ : state) LabelBare(path.data(), tree.size(), id);
+  std::uint32_t round = 0;
+  for (auto _ : state) LabelBare(path.data(), tree.size(), 4 + ++round % 2);
 }
 
 // ---- Installing rules -------------------------------------------------------------------------
@@ -183,7 +185,9 @@ class DomainFiles {
       case 0:
         return "-a " + Label(number) + " read grant";
       case 1:
-        return "-c " + capabilities[nth % capabilities.size()] + " grant";
+        // There are only so many: a rule that names the same thing again would be no further row.
+        if (nth >= capabilities.size()) return "-a " + Label(number) + " write grant";
+        return "-c " + capabilities[nth] + " grant";
       case 2:
         return "-d " + Label(number) + " " + DomainName(number % domains) + " exec grant";
       case 3:
@@ -193,7 +197,8 @@ class DomainFiles {
       case 5:
         return "-r " + DataFile(number) + " rw";
       case 6:
-        return "-s " + syscalls[nth % syscalls.size()] + " grant";
+        if (nth >= syscalls.size()) return "-a " + Label(number) + " list grant";
+        return "-s " + syscalls[nth] + " grant";
       default:
         return "-u " + Label(number) + " stream grant";
     }
@@ -236,32 +241,83 @@ class Database {
   sqlite3* database = nullptr;
 };
 
-// One prepared insert and one commit for each rule, into the host's own schema.
+// The rows that a load leaves behind, and the insertion of one of them.
+class InstalledRows {
+ public:
+  InstalledRows(const Database& source, const char* select, const char* insertion)
+      : statement(insertion) {
+    sqlite3_stmt* query = nullptr;
+    if (sqlite3_prepare_v2(source.database, select, -1, &query, nullptr) != SQLITE_OK) std::abort();
+    while (sqlite3_step(query) == SQLITE_ROW) {
+      for (int column = 0; column < sqlite3_column_count(query); ++column) {
+        values.push_back(sqlite3_value_dup(sqlite3_column_value(query, column)));
+      }
+      columns = sqlite3_column_count(query);
+    }
+    sqlite3_finalize(query);
+  }
+  InstalledRows(const InstalledRows&) = delete;
+  InstalledRows& operator=(const InstalledRows&) = delete;
+  ~InstalledRows() {
+    for (sqlite3_value* value : values) sqlite3_value_free(value);
+  }
+
+  // Each with a commit of its own.
+  void InsertInto(const Database& target) const {
+    sqlite3_stmt* insert = nullptr;
+    if (sqlite3_prepare_v2(target.database, statement, -1, &insert, nullptr) != SQLITE_OK) {
+      std::abort();
+    }
+    int column = 0;
+    for (const sqlite3_value* value : values) {
+      sqlite3_bind_value(insert, ++column, value);
+      if (column < columns) continue;
+      if (sqlite3_step(insert) != SQLITE_DONE) std::abort();
+      sqlite3_reset(insert);
+      column = 0;
+    }
+    sqlite3_finalize(insert);
+  }
+
+ private:
+  const char* statement;
+  std::vector<sqlite3_value*> values;
+  int columns = 0;
+};
+
+// The rows of the same rules, in the same order, by bare prepared inserts into the host's own
+// schema.
 void InsertRulesBare(benchmark::State& state) {
+  const DomainFiles files(state.range(0), state.range(1));
+  const FreshState loaded;
+  TeskAccessInterfaceImpl access;
+  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  const Database source(loaded.Path());
+  const InstalledRows words(
+      source, "SELECT domain_id, kind, word1, word2, word3, granted, line FROM rule ORDER BY id",
+      "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line) "
+      "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7)");
+  const InstalledRows parameters(
+      source,
+      "SELECT domain_id, parameter_check, first_value, last_value, first_word, last_word, granted, "
+      "line FROM parameter_rule ORDER BY id",
+      "INSERT INTO parameter_rule (domain_id, parameter_check, first_value, last_value, "
+      "first_word, last_word, granted, line) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)");
+  const InstalledRows paths(
+      source, "SELECT domain_id, world, path, permission, line FROM file_policy ORDER BY id",
+      "INSERT INTO file_policy (domain_id, world, path, permission, line) "
+      "VALUES (?1, ?2, ?3, ?4, ?5)");
   for (auto _ : state) {
     state.PauseTiming();
     const FreshState host;
     const Database target(host.Path());
-    sqlite3_stmt* insert = nullptr;
-    sqlite3_prepare_v2(target.database,
-                       "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line) "
-                       "VALUES (?1, 'object access', ?2, 'read', '', 1, ?3)",
-                       -1, &insert, nullptr);
     state.ResumeTiming();
-    for (int rule = 0; rule < kRules; ++rule) {
-      const std::string word = "label" + std::to_string(rule);
-      sqlite3_bind_int(insert, 1, rule / static_cast<int>(kRules / kDomains));
-      sqlite3_bind_text(insert, 2, word.data(), static_cast<int>(word.size()), SQLITE_STATIC);
-      sqlite3_bind_int(insert, 3, rule);
-      if (sqlite3_step(insert) != SQLITE_DONE) std::abort();
-      sqlite3_reset(insert);
-    }
-    state.PauseTiming();
-    sqlite3_finalize(insert);
-    state.ResumeTiming();
+    words.InsertInto(target);
+    parameters.InsertInto(target);
+    paths.InsertInto(target);
   }
 }
-BENCHMARK(InsertRulesBare)->UseRealTime()->Unit(benchmark::kMillisecond);
+BENCHMARK(InsertRulesBare)->Args({kDomains, kRules})->UseRealTime()->Unit(benchmark::kMillisecond);
 
 // The checks that a load of as many rules makes: one or two words each.
 void CheckWords(benchmark::State& state) {
@@ -309,7 +365,7 @@ class OutputToFile {
 
 void DisplayDomains(benchmark::State& state) {
   const ScratchDir scratch(BenchDirs().back());
-  const DomainFiles files(kDomains, state.range(0));
+  const DomainFiles files(state.range(0), state.range(1));
   const FreshState host;
   TeskAccessInterfaceImpl access;
   SecPolicy::LoadPolicyDomains(files.Path(), access);
@@ -320,8 +376,10 @@ void DisplayDomains(benchmark::State& state) {
   }
 }
 BENCHMARK(DisplayDomains)
-    ->Arg(kRules)
-    ->Arg(kRules / 100)
+    ->Args({kDomains, kRules})
+    ->Args({kDomains, kRules / 100})
+    ->Args({1, kRules / 100})
+    ->Args({400, 400 * (kRules / 100)})
     ->UseRealTime()
     ->Unit(benchmark::kMillisecond);
 

@@ -42,6 +42,11 @@ void RequireWorld(int world) {
   if (world != 0) WorldTable::RequireAlive(world);
 }
 
+bool IsForTheSame(const FilePolicy& one, const FilePolicy& other) {
+  return one.path == other.path && one.world == other.world && one.domain.id == other.domain.id &&
+         one.domain.name == other.domain.name;
+}
+
 }  // namespace
 
 unsigned int ParsePermissions(const std::string& letters) {
@@ -77,10 +82,14 @@ void FilePolicyTable::RequireDomain(unsigned int domainId) {
 
 void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
   Transaction transaction(state.Database());
-  for (const auto& policy : policies) {
+  for (std::size_t index = 0; index < policies.size(); ++index) {
+    const FilePolicy& policy = policies[index];
     RequireWorld(policy.world);
     RequirePath(policy.path);
     RequirePermission(policy.permission);
+    // A path often comes twice in a row, as it is written and as it resolves: the second one would
+    // replace the first.
+    if (index + 1 < policies.size() && IsForTheSame(policy, policies[index + 1])) continue;
     InstallChecked(
         state, [&] { return DomainRefusal(state, policy.domain); },
         [&] { return InstallIfUnchanged(policy); });
