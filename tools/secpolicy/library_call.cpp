@@ -50,7 +50,7 @@ void OnTerminate() {
       std::cout.flush();
       WriteSummary(running.verb,
                    Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
-                                       ", and tardisks and file labels were not loaded. Put a "
+                                       ", so the load ended before tardisks and file labels. Put a "
                                        "policy file named ",
                                        domain.name, " into ", running.policyDir,
                                        "/domains and run it again."));

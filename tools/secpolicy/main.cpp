@@ -13,7 +13,8 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kDisplay, &kSettings};
+constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck,   &kLoad,    &kLoadEarly,
+                                  &kRestore, &kDisplay, &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";

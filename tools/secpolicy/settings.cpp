@@ -51,8 +51,8 @@ ExitCode Show(const Kind& kind, const std::string& key) {
                                   ". Store something with 'secpolicy settings " + kind.name + " " +
                                   key + " " + kind.value + "'.");
   }
-  std::cout << *value << std::endl;
-  return kWell;
+  return CallLibrary(
+      "settings", "", [&] { std::cout << *value << std::endl; }, AdviseOnPrivilege);
 }
 
 ExitCode Store(const Kind& kind, const std::string& key, const std::string& value) {

@@ -29,6 +29,7 @@ struct Verb {
 };
 
 extern const Verb kBoot;
+extern const Verb kCheck;
 extern const Verb kLoad;
 extern const Verb kLoadEarly;
 extern const Verb kRestore;

@@ -1,0 +1,127 @@
+#include <CLI/App.hpp>
+#include <filesystem>
+#include <iostream>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "check/check_run.h"
+#include "check/report_format.h"
+#include "kitlibs/file.h"
+#include "library_call.h"
+#include "policy_dir.h"
+#include "secpolicy/policy_root.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr char kPartnerPrefix[] = "plugin-";
+constexpr char kPartnerDir[] = "plugins";
+
+using Write = void (*)(const DiagnosticList& diagnostics, std::ostream& output);
+
+const std::map<std::string, Write> kFormats = {
+    {"text", WriteText}, {"json", WriteJson}, {"sarif", WriteSarif}};
+
+struct Options {
+  bool fresh = false;
+  bool warningsAreErrors = false;
+  std::string format = "text";
+  std::vector<std::string> unwanted;
+};
+
+bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
+
+// In the order in which a boot comes to the files. The directories of early boot, partners and
+// tardisks may be missing.
+void CheckPolicy(CheckRun& run, const std::string& root) {
+  const std::string domains = root + "/" + SecPolicy::kDomainsDir;
+  const std::string earlyDomains = root + "/early/" + SecPolicy::kDomainsDir;
+  const std::string partners = domains + "/" + kPartnerDir;
+  const std::string tardisks = root + "/" + SecPolicy::kTardisksDir;
+  CheckObjects(run, root + "/" + SecPolicy::kObjectsDir);
+  if (IsDirectory(earlyDomains)) CheckDomains(run, earlyDomains, "");
+  CheckDomains(run, domains, "", kPartnerDir);
+  if (IsDirectory(partners)) CheckDomains(run, partners, kPartnerPrefix);
+  if (IsDirectory(tardisks)) CheckTardisks(run, tardisks);
+  CheckFileLabels(run, root + "/" + SecPolicy::kFileLabelsDir);
+  CheckUse(run, domains);
+}
+
+std::string CountOf(std::size_t count, const std::string& noun) {
+  return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
+}
+
+void WriteSummary(const std::string& text) {
+  std::cerr << "secpolicy: check: " << text << std::endl;
+}
+
+ExitCode Check(const std::string& dir, const Options& options) {
+  if (!IsDirectory(dir)) {
+    return Refuse("check", "there is no directory " + dir +
+                               " below this root. Name the directory of the policy, or the root "
+                               "that it is in (--root DIR).");
+  }
+  CheckRun run(options.fresh, options.unwanted);
+  if (!run.scratch.CopyFailure().empty()) {
+    WriteSummary("the installed state cannot be read (" + run.scratch.CopyFailure() +
+                 "): checked as after a boot");
+  }
+  CheckPolicy(run, dir);
+  run.diagnostics.Sort();
+  kFormats.at(options.format)(run.diagnostics, std::cout);
+  std::cout.flush();
+
+  const std::size_t errors = run.diagnostics.Count(Severity::kError);
+  const std::size_t warnings = run.diagnostics.Count(Severity::kWarning);
+  WriteSummary(errors + warnings == 0
+                   ? "no problems"
+                   : CountOf(errors, "error") + ", " + CountOf(warnings, "warning"));
+  return errors > 0 || (options.warningsAreErrors && warnings > 0) ? kFailed : kWell;
+}
+
+std::string CheckWarningName(const std::string& name) {
+  for (const Code* code : AllCodes()) {
+    if (code->name != name) continue;
+    if (code->severity == Severity::kWarning) return "";
+    return "'" + name + "' is an error: a load does not end well with it";
+  }
+  return "there is no warning '" + name + "'";
+}
+
+Action Define(CLI::App& app) {
+  const auto options = std::make_shared<Options>();
+  const auto dir = AddPolicyDir(app, SecPolicy::kPolicyRoot);
+  app.add_flag("--fresh", options->fresh,
+               "Check as after a boot, whatever is installed on this host now");
+  app.add_option("--format", options->format, "How to write the problems: text, json or sarif")
+      ->check(CLI::IsMember({"text", "json", "sarif"}))
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  app.add_flag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
+  app.add_option("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
+      ->check(CLI::Validator(CheckWarningName, ""))
+      ->type_name("CODE")
+      ->allow_extra_args(false);
+  return [dir, options] { return Check(*dir, *options); };
+}
+
+}  // namespace
+
+const Verb kCheck = {
+    "check", "Look for every problem of the policy files, and change nothing",
+    "Reads the whole policy as a load would, against a copy of what is installed, and prints "
+    "every\n"
+    "problem with its file, line and column: what a load refuses (errors), and what it accepts\n"
+    "although it can hardly be meant (warnings). Needs no privilege. Exit status: 0 no errors,\n"
+    "1 errors, or with --werror warnings.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy check                            the host's policy\n"
+    "  secpolicy check --fresh ./my-policy        a directory, as if on a newly booted host\n"
+    "  secpolicy check --werror --disable missing-path\n"
+    "  secpolicy check --format sarif >check.sarif",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,76 @@
+#pragma once
+
+#include <deque>
+#include <functional>
+#include <map>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "diagnostic.h"
+#include "scratch_state.h"
+#include "secpolicy/secpolicy.h"
+#include "source_file.h"
+
+namespace SecPolicyCli {
+
+// A line of a policy file.
+struct Place {
+  const SourceFile* file = nullptr;
+  unsigned int line = 0;
+};
+
+// A policy file and its name in its directory.
+struct NamedFile {
+  const SourceFile* file = nullptr;
+  std::string name;
+};
+
+// One check of a whole policy: what all its parts share.
+struct CheckRun {
+  // `unwanted` are the names of the warnings to leave out. Throws what the host throws.
+  CheckRun(bool fresh, const std::vector<std::string>& unwanted)
+      : scratch(fresh), diagnostics(unwanted) {}
+
+  ScratchState scratch;  // first: `access` is a connection to it
+  SecPolicy::TeskAccessInterfaceImpl access;
+  DiagnosticList diagnostics;
+  std::deque<SourceFile> files;
+
+  // What the files say of each other.
+  std::map<std::string, Place> objects;                      // where each is declared
+  std::set<std::string> usedLabels;                          // in rules and on files
+  std::map<std::string, const SourceFile*> domains;          // of policy files
+  std::map<std::string, std::set<std::string>> transitions;  // from domain to domain
+  std::set<std::string> enteredDomains;                      // other than by a -d rule
+};
+
+// Opens every policy file of `dir`, in the order in which a load takes them, and checks its bytes.
+// What cannot be read, and what a load skips, becomes a problem; the directory `expected` does not.
+std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
+                                       const std::string& expected = {});
+
+// True when there is surely nothing at `path`.
+bool IsMissing(const std::string& path);
+
+// Hands all lines of `file` to `parse`, which reads the policy file that it is given and throws at
+// a bad line, after it has made `count` grow by one for each line above. Where it throws, it is
+// called again with the lines below, in the file `scratchFile`; `refused` is told the line and the
+// message without its place. Returns the numbers of the lines that were accepted, in order.
+std::vector<unsigned int> ParseEveryLine(
+    const SourceFile& file, const std::string& scratchFile,
+    const std::function<void(const std::string& path)>& parse,
+    const std::function<std::size_t()>& count,
+    const std::function<void(unsigned int line, const std::string& message)>& refused);
+
+// The parts of a check, in the order in which a load comes to them. `dir` is that of the files.
+void CheckObjects(CheckRun& run, const std::string& dir);
+void CheckDomains(CheckRun& run, const std::string& dir, const std::string& prefix,
+                  const std::string& expected = {});
+void CheckTardisks(CheckRun& run, const std::string& dir);
+void CheckFileLabels(CheckRun& run, const std::string& dir);
+
+// Looks for domains that every host needs below `dir`, and for what nobody uses.
+void CheckUse(CheckRun& run, const std::string& dir);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,151 @@
+#include "diagnostic.h"
+
+#include <algorithm>
+#include <array>
+#include <string_view>
+#include <tuple>
+#include <utility>
+
+namespace SecPolicyCli {
+namespace Codes {
+
+using enum Severity;
+
+const Code kArgumentCount{"argument-count", kError, "A line has too many or too few words"};
+const Code kBadName{"bad-name", kError, "The host refuses the name of an object or a domain"};
+const Code kBadPermissions{"bad-permissions", kError,
+                           "The letters of a -r rule fail when the rule is installed"};
+const Code kGrantWord{"grant-word", kError, "The last word is neither grant nor revoke"};
+const Code kMissingDomain{"missing-domain", kError,
+                          "A domain that every host needs is missing: a load stops"};
+const Code kParameterConflict{"parameter-conflict", kError,
+                              "The host refuses a -p rule, alone or beside another one"};
+const Code kRuleType{"rule-type", kError, "The first word is no kind of rule"};
+const Code kSecondRule{"second-rule", kError, "A tardisk policy has more than one rule"};
+const Code kTreeMarker{"tree-marker", kError, "\"/*\" does not end the path"};
+const Code kUnknownDomain{"unknown-domain", kError, "A rule names a domain that is not defined"};
+const Code kUnknownWord{"unknown-word", kError,
+                        "A word is not in the host's table of labels, kinds, capabilities, checks "
+                        "or system calls"};
+const Code kUnreadable{"unreadable", kError, "A policy file or directory cannot be read"};
+
+const Code kCarriageReturn{"carriage-return", kWarning, "A carriage return is part of a word"};
+const Code kContradictingRule{"contradicting-rule", kWarning,
+                              "A later rule replaces an earlier one"};
+const Code kDuplicateObject{"duplicate-object", kWarning, "An object is declared twice"};
+const Code kDuplicateRule{"duplicate-rule", kWarning, "A rule is written twice"};
+const Code kInstalledOnly{"installed-only", kWarning,
+                          "A domain that every host needs is installed, but no file defines it"};
+const Code kLongLine{"long-line", kWarning, "A line over 1023 characters ends its file"};
+const Code kMissingPath{"missing-path", kWarning, "A path does not exist under this root"};
+const Code kNoTardisk{"no-tardisk", kWarning, "A tardisk policy came from no tardisk"};
+const Code kNulByte{"nul-byte", kWarning, "A NUL byte ends its line"};
+const Code kSecondPolicy{"second-policy", kWarning, "A tardisk has more than one policy file"};
+const Code kSkippedEntry{"skipped-entry", kWarning,
+                         "A directory entry is no regular file and is skipped"};
+const Code kStarInPath{"star-in-path", kWarning, "A star in a path does not mean what it seems to"};
+const Code kTab{"tab", kWarning, "A tab is part of a word"};
+const Code kTwoLabels{"two-labels", kWarning, "Two lines give one file different labels"};
+const Code kUnreachableDomain{"unreachable-domain", kWarning, "Nothing enters a domain"};
+const Code kUnusedObject{"unused-object", kWarning, "Nobody uses an object"};
+
+}  // namespace Codes
+
+namespace {
+
+constexpr std::array<const Code*, 28> kAll = {
+    &Codes::kArgumentCount,
+    &Codes::kBadName,
+    &Codes::kBadPermissions,
+    &Codes::kGrantWord,
+    &Codes::kMissingDomain,
+    &Codes::kParameterConflict,
+    &Codes::kRuleType,
+    &Codes::kSecondRule,
+    &Codes::kTreeMarker,
+    &Codes::kUnknownDomain,
+    &Codes::kUnknownWord,
+    &Codes::kUnreadable,
+    &Codes::kCarriageReturn,
+    &Codes::kContradictingRule,
+    &Codes::kDuplicateObject,
+    &Codes::kDuplicateRule,
+    &Codes::kInstalledOnly,
+    &Codes::kLongLine,
+    &Codes::kMissingPath,
+    &Codes::kNoTardisk,
+    &Codes::kNulByte,
+    &Codes::kSecondPolicy,
+    &Codes::kSkippedEntry,
+    &Codes::kStarInPath,
+    &Codes::kTab,
+    &Codes::kTwoLabels,
+    &Codes::kUnreachableDomain,
+    &Codes::kUnusedObject,
+};
+
+struct Refusal {
+  std::string_view beginning;
+  const Code* code;
+};
+
+// What the library says itself; every other text is the host's, about a word that it does not know.
+constexpr Refusal kRefusals[] = {
+    {"invalid policy rule type ", &Codes::kRuleType},
+    {"invalid tardisk policy rule type ", &Codes::kRuleType},
+    {"incorrect number of arguments", &Codes::kArgumentCount},
+    {"cannot define more than one object", &Codes::kArgumentCount},
+    {"incorrect no of parameters", &Codes::kArgumentCount},
+    {"invalid keyword ", &Codes::kGrantWord},
+    {"Failed to fetch domain id ", &Codes::kUnknownDomain},
+    {"Unrecognized format for file/dir", &Codes::kTreeMarker},
+    {"Only one rule of this type", &Codes::kSecondRule},
+    {"Unable to open policy ", &Codes::kUnreadable},
+};
+
+}  // namespace
+
+std::span<const Code* const> AllCodes() { return kAll; }
+
+const Code& CodeOfRefusal(const std::string& message) {
+  for (const Refusal& refusal : kRefusals) {
+    if (message.starts_with(refusal.beginning)) return *refusal.code;
+  }
+  return Codes::kUnknownWord;
+}
+
+const char* SeverityName(Severity severity) {
+  return severity == Severity::kError ? "error" : "warning";
+}
+
+DiagnosticList::DiagnosticList(const std::vector<std::string>& codes)
+    : unwanted(codes.begin(), codes.end()) {}
+
+void DiagnosticList::BeginFile(const std::string& file) {
+  fileOrder.try_emplace(file, fileOrder.size());
+}
+
+void DiagnosticList::Add(Diagnostic diagnostic) {
+  if (diagnostic.code->severity == Severity::kWarning && unwanted.contains(diagnostic.code->name)) {
+    return;
+  }
+  BeginFile(diagnostic.file);
+  diagnostics.push_back(std::move(diagnostic));
+}
+
+void DiagnosticList::Sort() {
+  const auto place = [this](const Diagnostic& diagnostic) {
+    return std::tuple(fileOrder.at(diagnostic.file), diagnostic.line, diagnostic.column);
+  };
+  std::stable_sort(
+      diagnostics.begin(), diagnostics.end(),
+      [&](const Diagnostic& one, const Diagnostic& other) { return place(one) < place(other); });
+}
+
+std::size_t DiagnosticList::Count(Severity severity) const {
+  return static_cast<std::size_t>(std::count_if(
+      diagnostics.begin(), diagnostics.end(),
+      [&](const Diagnostic& diagnostic) { return diagnostic.code->severity == severity; }));
+}
+
+}  // namespace SecPolicyCli

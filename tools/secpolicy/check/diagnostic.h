@@ -1,0 +1,101 @@
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <set>
+#include <span>
+#include <string>
+#include <vector>
+
+namespace SecPolicyCli {
+
+enum class Severity { kError, kWarning };
+
+// The stable name of one kind of problem. An error is what keeps a load from ending well; a warning
+// is what a load accepts although it can hardly be meant.
+struct Code {
+  const char* name;
+  Severity severity;
+  const char* summary;
+};
+
+namespace Codes {
+
+extern const Code kArgumentCount;
+extern const Code kBadName;
+extern const Code kBadPermissions;
+extern const Code kGrantWord;
+extern const Code kMissingDomain;
+extern const Code kParameterConflict;
+extern const Code kRuleType;
+extern const Code kSecondRule;
+extern const Code kTreeMarker;
+extern const Code kUnknownDomain;
+extern const Code kUnknownWord;
+extern const Code kUnreadable;
+
+extern const Code kCarriageReturn;
+extern const Code kContradictingRule;
+extern const Code kDuplicateObject;
+extern const Code kDuplicateRule;
+extern const Code kInstalledOnly;
+extern const Code kLongLine;
+extern const Code kMissingPath;
+extern const Code kNoTardisk;
+extern const Code kNulByte;
+extern const Code kSecondPolicy;
+extern const Code kSkippedEntry;
+extern const Code kStarInPath;
+extern const Code kTab;
+extern const Code kTwoLabels;
+extern const Code kUnreachableDomain;
+extern const Code kUnusedObject;
+
+}  // namespace Codes
+
+// All codes: the errors and then the warnings, each in order of name.
+std::span<const Code* const> AllCodes();
+
+// The code of a line that the library refuses, by the library's own text for it.
+const Code& CodeOfRefusal(const std::string& message);
+
+// "error" or "warning".
+const char* SeverityName(Severity severity);
+
+// One problem. Lines and columns count from 1; line 0 is the file as a whole. Columns and lengths
+// count characters, a byte that belongs to none as one.
+struct Diagnostic {
+  const Code* code = nullptr;
+  std::string file;
+  unsigned int line = 0;
+  std::size_t column = 0;
+  std::size_t length = 0;
+  std::string message;
+  std::string hint;    // empty: none
+  std::string source;  // the bytes of the line
+};
+
+// The problems of one check.
+class DiagnosticList {
+ public:
+  // `codes` are the names of the warnings that are not wanted.
+  explicit DiagnosticList(const std::vector<std::string>& codes);
+
+  // Tells that the problems of `file` come after those of all files that were told before.
+  void BeginFile(const std::string& file);
+
+  void Add(Diagnostic diagnostic);
+
+  // Brings the problems into the order of files, lines and columns.
+  void Sort();
+
+  const std::vector<Diagnostic>& All() const { return diagnostics; }
+  std::size_t Count(Severity severity) const;
+
+ private:
+  std::set<std::string> unwanted;
+  std::map<std::string, std::size_t> fileOrder;
+  std::vector<Diagnostic> diagnostics;
+};
+
+}  // namespace SecPolicyCli

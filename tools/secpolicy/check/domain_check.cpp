@@ -1,0 +1,202 @@
+#include <algorithm>
+#include <queue>
+#include <unordered_map>
+
+#include "check_run.h"
+#include "rule_form.h"
+#include "secpolicy/domain/capability_param_rules.h"
+#include "secpolicy/domain/domain_policy.h"
+#include "secpolicy/domain/file_path_access_rules.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Braxo::Lib::BraxoException;
+using SecPolicy::CapabilityParamRules;
+using SecPolicy::DomainPolicy;
+using Words = SourceFile::Words;
+
+constexpr char kParameterRule[] = "-p";
+constexpr char kPathRule[] = "-r";
+
+std::string WithoutPrefix(const std::string& message, const std::string& prefix) {
+  return message.starts_with(prefix) ? message.substr(prefix.size()) : message;
+}
+
+// The check of one domain's file.
+class DomainCheck {
+ public:
+  DomainCheck(CheckRun& checkRun, const SourceFile& policyFile, const std::string& name,
+              unsigned int id)
+      : run(checkRun), file(policyFile), policy(name, id) {}
+
+  void CheckLines() {
+    for (const auto& [line, words] : file.Lines()) {
+      if (!Accepts(line, words)) continue;
+      CheckRepetition(line, words);
+      if (words.front() == kPathRule) CheckPathRule(line, words);
+    }
+    CheckParameterRules();
+  }
+
+ private:
+  // What a rule says of the thing that it is about.
+  struct Saying {
+    unsigned int line;
+    std::string word;
+  };
+
+  bool Accepts(unsigned int line, const Words& words) {
+    NoteUse(words);
+    std::map<unsigned int, std::queue<std::string>> parsed;
+    for (const std::string& word : words) parsed[line].push(word);
+    try {
+      policy.ProcessParsedPolicyFile(run.access, parsed);
+      return true;
+    } catch (const BraxoException& failure) {
+      Refuse(line, words, failure.what());
+      return false;
+    }
+  }
+
+  void Refuse(unsigned int line, const Words& words, const std::string& failure) {
+    const std::string message =
+        WithoutPrefix(failure, "Error in parsing policy for domain: " + policy.name + ": " +
+                                   std::to_string(line) + " : ");
+    const Code& code = CodeOfRefusal(message);
+    const std::size_t word = FindBlamedWord(code, message, words);
+    const std::string hint = HintForRule(run, code, words, word);
+    const bool wholeLine = word == words.size();
+    run.diagnostics.Add(file.AtWords(code, line, wholeLine ? 0 : word,
+                                     wholeLine ? words.size() - 1 : word, message, hint));
+  }
+
+  // Also what a bad line names counts as used: its own problem is enough.
+  void NoteUse(const Words& words) {
+    const RuleForm* const form = FindRuleForm(words.front());
+    if (form == nullptr) return;
+    const std::size_t count = std::min(form->words.size(), words.size() - 1);
+    for (std::size_t i = 0; i < count; ++i) {
+      const std::string& word = words[i + 1];
+      if (form->words[i] == WordKind::kLabel) run.usedLabels.insert(word);
+      if (form->words[i] == WordKind::kDomain && words.back() != "revoke") {
+        run.transitions[policy.name].insert(word);
+      }
+    }
+  }
+
+  void CheckRepetition(unsigned int line, const Words& words) {
+    const bool isPath = words.front() == kPathRule;
+    std::string about;
+    for (std::size_t i = 0; i < (isPath ? 2 : words.size() - 1); ++i) about += words[i] + ' ';
+    std::string saying = isPath ? (words.size() > 2 ? words[2] : "") : words.back();
+    if (isPath) std::sort(saying.begin(), saying.end());
+
+    const auto [earlier, isNew] = sayings.try_emplace(about, Saying{line, saying});
+    if (isNew) return;
+    const std::string place = "line " + std::to_string(earlier->second.line);
+    if (earlier->second.word == saying) {
+      Add(Codes::kDuplicateRule, line, words, "this rule is in " + place + " already");
+    } else if (words.front() != kParameterRule) {
+      Add(Codes::kContradictingRule, line, words,
+          "this rule replaces the one in " + place + ", which says otherwise");
+    }
+    earlier->second = {line, saying};
+  }
+
+  void CheckPathRule(unsigned int line, const Words& words) {
+    const std::string& path = words[1];
+    if (path.find('*') != std::string::npos) {
+      run.diagnostics.Add(
+          file.AtWord(Codes::kStarInPath, line, 1,
+                      "a -r rule has no patterns: this one is about a file whose name has a star"));
+    } else if (IsMissing(path)) {
+      run.diagnostics.Add(file.AtWord(Codes::kMissingPath, line, 1,
+                                      "there is nothing at " + path + " under this root"));
+    }
+    if (words.size() < 3) return;
+    try {
+      SecPolicy::FilePathAccessRules().GetPermission(words[2]);
+    } catch (const BraxoException& failure) {
+      run.diagnostics.Add(file.AtWord(Codes::kBadPermissions, line, 2, failure.what(),
+                                      "letters out of r, w and x, each at most once"));
+    }
+  }
+
+  // Adds the rules one by one to those that do not contradict each other, until the host has
+  // nothing against the rest.
+  void CheckParameterRules() {
+    auto& rules = dynamic_cast<CapabilityParamRules&>(*policy.ruleSets.at(kParameterRule));
+    std::string refusal = Conflict(rules);
+    if (refusal.empty()) return;
+    CapabilityParamRules sound;
+    for (const auto& rule : rules.rules) {
+      sound.rules.push_back(rule);
+      refusal = Conflict(sound);
+      if (refusal.empty()) continue;
+      sound.rules.pop_back();
+      Add(Codes::kParameterConflict, rule.line, file.Lines().at(rule.line), refusal);
+    }
+  }
+
+  // Why the host refuses the rules; empty when it does not.
+  std::string Conflict(CapabilityParamRules& rules) {
+    try {
+      rules.CheckConstraints(policy.name, run.access);
+      return "";
+    } catch (const BraxoException& failure) {
+      return WithoutPrefix(failure.what(),
+                           "Policy constraint error for domain: " + policy.name + " : ");
+    }
+  }
+
+  void Add(const Code& code, unsigned int line, const Words& words, const std::string& message) {
+    run.diagnostics.Add(file.AtWords(code, line, 0, words.size() - 1, message));
+  }
+
+  CheckRun& run;
+  const SourceFile& file;
+  DomainPolicy policy;
+  std::unordered_map<std::string, Saying> sayings;  // the latest of each thing
+};
+
+struct NamedDomain {
+  const SourceFile* file;
+  std::string name;
+  unsigned int id;
+};
+
+// Creates the domain in the scratch state, as a load does before it reads any file.
+std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>& files,
+                                     const std::string& prefix) {
+  std::vector<NamedDomain> domains;
+  for (const NamedFile& named : files) {
+    const std::string name = prefix + named.name;
+    unsigned int id = 0;
+    try {
+      if (!run.access.FindDomain(name, &id)) {
+        id = run.access.CreateDomain(name, TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE);
+      }
+    } catch (const BraxoException& refusal) {
+      run.diagnostics.Add(named.file->About(Codes::kBadName, refusal.what()));
+      continue;
+    }
+    run.domains[name] = named.file;
+    domains.push_back({named.file, name, id});
+  }
+  return domains;
+}
+
+}  // namespace
+
+void CheckDomains(CheckRun& run, const std::string& dir, const std::string& prefix,
+                  const std::string& expected) {
+  const std::vector<NamedFile> files = OpenPolicyFiles(run, dir, expected);
+  for (const NamedDomain& domain : NameDomains(run, files, prefix)) {
+    // Partner domains are entered by the service that belongs to them.
+    if (!prefix.empty()) run.enteredDomains.insert(domain.name);
+    DomainCheck(run, *domain.file, domain.name, domain.id).CheckLines();
+  }
+}
+
+}  // namespace SecPolicyCli

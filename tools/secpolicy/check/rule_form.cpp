@@ -1,0 +1,121 @@
+#include "rule_form.h"
+
+#include <algorithm>
+
+#include "suggestion.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using enum WordKind;
+using TeskCtl::Security::TeskAccess_KeywordType;
+
+const std::vector<RuleForm>& RuleForms() {
+  static const std::vector<RuleForm> forms = {
+      {"-a", "-a LABEL ACCESS grant", {kLabel, kObjectAccess}},
+      {"-c", "-c CAPABILITY grant", {kCapability}},
+      {"-d", "-d LABEL DOMAIN KIND grant", {kLabel, kDomain, kTransition}},
+      {"-f", "-f LABEL NEWLABEL KIND grant", {kLabel, kLabel, kFileKind}},
+      {"-p", "-p CHECK FIRST [SECOND] grant", {kParameterCheck, kFree, kFree}},
+      {"-r", "-r PATH [PERMISSIONS]", {kFree, kFree}},
+      {"-s", "-s SYSCALL grant", {kSystemCall}},
+      {"-u", "-u LABEL KIND grant", {kLabel, kSocketKind}},
+      {"-E", "-E LABEL DOMAIN", {kLabel, kDomain}},
+  };
+  return forms;
+}
+
+TeskAccess_KeywordType TableOf(WordKind kind) {
+  switch (kind) {
+    case kObjectAccess:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS;
+    case kCapability:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY;
+    case kTransition:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS;
+    case kFileKind:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION;
+    case kParameterCheck:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK;
+    case kSystemCall:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL;
+    case kSocketKind:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION;
+    default:
+      return TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
+  }
+}
+
+std::vector<std::string> Candidates(CheckRun& run, WordKind kind) {
+  std::vector<std::string> candidates;
+  if (kind == kFree) return candidates;
+  if (kind == kDomain) {
+    for (const auto& [name, file] : run.domains) candidates.push_back(name);
+    return candidates;
+  }
+  for (const auto& [word, id] : run.access.GetKeywordsMap(TableOf(kind)))
+    candidates.push_back(word);
+  return candidates;
+}
+
+std::string Suggest(const std::string& word, const std::vector<std::string>& candidates) {
+  const std::string nearest = NearestWord(word, candidates);
+  return nearest.empty() ? "" : "did you mean '" + nearest + "'?";
+}
+
+// A short table is told as a whole when no word of it is near.
+std::string SuggestOrList(const std::string& word, const std::vector<std::string>& candidates) {
+  constexpr std::size_t kShortTable = 10;
+  const std::string suggestion = Suggest(word, candidates);
+  if (!suggestion.empty() || candidates.empty() || candidates.size() > kShortTable) {
+    return suggestion;
+  }
+  std::string list = "one of";
+  for (const std::string& candidate : candidates) list += " " + candidate;
+  return list;
+}
+
+}  // namespace
+
+const RuleForm* FindRuleForm(const std::string& keyword) {
+  for (const RuleForm& form : RuleForms()) {
+    if (form.keyword == keyword) return &form;
+  }
+  return nullptr;
+}
+
+std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
+                        std::size_t index) {
+  if (&code == &Codes::kRuleType) return "a line begins with one of -a -c -d -f -p -r -s -u";
+  const RuleForm* const form = FindRuleForm(words.front());
+  if (form == nullptr) return "";
+  if (&code == &Codes::kArgumentCount) return std::string("write: ") + form->usage;
+  if (index == 0 || index >= words.size()) return "";
+  if (&code == &Codes::kGrantWord) {
+    const std::string suggestion = Suggest(words[index], {"grant", "revoke"});
+    return suggestion.empty() ? "the last word is 'grant' or 'revoke'" : suggestion;
+  }
+  if (index > form->words.size()) return "";
+  const WordKind kind = form->words[index - 1];
+  if (kind == kLabel) return HintForLabel(run, words[index]);
+  return SuggestOrList(words[index], Candidates(run, kind));
+}
+
+std::string HintForLabel(CheckRun& run, const std::string& word) {
+  const std::string suggestion = Suggest(word, Candidates(run, kLabel));
+  return suggestion.empty() ? "labels are declared in objects/" : suggestion;
+}
+
+std::size_t FindBlamedWord(const Code& code, const std::string& message,
+                           const SourceFile::Words& words) {
+  if (&code == &Codes::kArgumentCount || &code == &Codes::kSecondRule) return words.size();
+  if (&code == &Codes::kRuleType || &code == &Codes::kTreeMarker) return 0;
+  if (&code == &Codes::kGrantWord) return words.size() - 1;
+  if (&code == &Codes::kUnknownDomain) return std::min<std::size_t>(2, words.size() - 1);
+  for (std::size_t i = 0; i < words.size(); ++i) {
+    if (message.find("'" + words[i] + "'") != std::string::npos) return i;
+  }
+  return words.size();
+}
+
+}  // namespace SecPolicyCli

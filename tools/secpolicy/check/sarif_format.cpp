@@ -1,0 +1,84 @@
+#include <algorithm>
+#include <nlohmann/json.hpp>
+#include <string_view>
+
+#include "report_format.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+// The form of identifiers of the OASIS standard, by which readers know it.
+constexpr char kSchema[] =
+    "https://docs.oasis-open.org/sarif/sarif/v2.1.0/errata01/os/schemas/sarif-schema-2.1.0.json";
+constexpr char kSarifVersion[] = "2.1.0";
+
+bool IsPlain(char byte) {
+  const bool isLetter = (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z');
+  return isLetter || (byte >= '0' && byte <= '9') ||
+         std::string_view("-._~/").find(byte) != std::string_view::npos;
+}
+
+std::string ToUri(const std::string& path) {
+  constexpr char kDigits[] = "0123456789ABCDEF";
+  std::string uri = path.starts_with('/') ? "file://" : "";
+  for (const char letter : path) {
+    if (IsPlain(letter)) {
+      uri += letter;
+      continue;
+    }
+    const auto byte = static_cast<unsigned char>(letter);
+    uri += '%';
+    uri += kDigits[byte >> 4];
+    uri += kDigits[byte & 0xf];
+  }
+  return uri;
+}
+
+Json Rules() {
+  Json rules = Json::array();
+  for (const Code* code : AllCodes()) {
+    rules.push_back({{"id", code->name},
+                     {"shortDescription", {{"text", code->summary}}},
+                     {"defaultConfiguration", {{"level", SeverityName(code->severity)}}}});
+  }
+  return rules;
+}
+
+Json Location(const Diagnostic& diagnostic) {
+  Json physical = {{"artifactLocation", {{"uri", ToUri(diagnostic.file)}}}};
+  if (diagnostic.line > 0) {
+    physical["region"] = {{"startLine", diagnostic.line},
+                          {"startColumn", diagnostic.column},
+                          {"endColumn", diagnostic.column + diagnostic.length},
+                          {"snippet", {{"text", diagnostic.source}}}};
+  }
+  return {{"physicalLocation", physical}};
+}
+
+Json Result(const Diagnostic& diagnostic) {
+  const auto codes = AllCodes();
+  const std::string text = diagnostic.hint.empty()
+                               ? diagnostic.message
+                               : diagnostic.message + " (" + diagnostic.hint + ")";
+  return {{"ruleId", diagnostic.code->name},
+          {"ruleIndex", std::find(codes.begin(), codes.end(), diagnostic.code) - codes.begin()},
+          {"level", SeverityName(diagnostic.code->severity)},
+          {"message", {{"text", text}}},
+          {"locations", Json::array({Location(diagnostic)})}};
+}
+
+}  // namespace
+
+void WriteSarif(const DiagnosticList& diagnostics, std::ostream& output) {
+  Json results = Json::array();
+  for (const Diagnostic& diagnostic : diagnostics.All()) results.push_back(Result(diagnostic));
+  const Json driver = {{"name", "secpolicy"}, {"version", SECPOLICY_VERSION}, {"rules", Rules()}};
+  const Json run = {
+      {"tool", {{"driver", driver}}}, {"columnKind", "unicodeCodePoints"}, {"results", results}};
+  const Json log = {{"$schema", kSchema}, {"version", kSarifVersion}, {"runs", Json::array({run})}};
+  output << log.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,33 @@
+#pragma once
+
+#include <string>
+
+namespace SecPolicyCli {
+
+// A private copy of the host's state, which takes the place of the installed one for the rest of
+// this process. Goes away with this object; the installed state is never written.
+class ScratchState {
+ public:
+  // Copies the installed state; with `fresh`, and where there is none, starts from the state after
+  // a boot. Throws std::system_error when there is no place for it.
+  explicit ScratchState(bool fresh);
+  ScratchState(const ScratchState&) = delete;
+  ScratchState& operator=(const ScratchState&) = delete;
+  ~ScratchState();
+
+  // False when the state is a new one.
+  bool IsCopy() const { return copied; }
+
+  // Why an installed state was not copied; empty when it was, and when there is none.
+  const std::string& CopyFailure() const { return copyFailure; }
+
+  // A file beside the state, for what has to be read from a file.
+  std::string ScratchFile() const { return directory + "/policy"; }
+
+ private:
+  std::string directory;
+  bool copied = false;
+  std::string copyFailure;
+};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,58 @@
+#pragma once
+
+#include <map>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "diagnostic.h"
+
+namespace SecPolicyCli {
+
+// A policy file: its words as the library reads them, and its bytes to point into.
+class SourceFile {
+ public:
+  using Words = std::vector<std::string>;
+
+  // Reads the file. Throws BraxoException, in the library's words, when it cannot be opened.
+  explicit SourceFile(const std::string& filePath);
+
+  const std::string& Path() const { return path; }
+
+  // The lines that have words, by number from 1, as far as the library reads the file.
+  const std::map<unsigned int, Words>& Lines() const { return lines; }
+
+  // The bytes of the line `number`, without its line feed.
+  std::string_view Text(unsigned int number) const { return texts.at(number - 1); }
+
+  // A problem of the whole file.
+  Diagnostic About(const Code& code, std::string message, std::string hint = {}) const;
+
+  // A problem of the words `first` to `last` of the line `number`, counted from 0.
+  Diagnostic AtWords(const Code& code, unsigned int number, std::size_t first, std::size_t last,
+                     std::string message, std::string hint = {}) const;
+  Diagnostic AtWord(const Code& code, unsigned int number, std::size_t word, std::string message,
+                    std::string hint = {}) const {
+    return AtWords(code, number, word, word, std::move(message), std::move(hint));
+  }
+
+  // A problem of `size` bytes of the line `number` from the byte `offset` on.
+  Diagnostic AtBytes(const Code& code, unsigned int number, std::size_t offset, std::size_t size,
+                     std::string message, std::string hint = {}) const;
+
+  // Adds what the library reads otherwise than it looks.
+  void CheckBytes(DiagnosticList& diagnostics) const;
+
+ private:
+  void CheckWords(unsigned int number, const Words& words, DiagnosticList& diagnostics) const;
+
+  std::string path;
+  std::string contents;
+  std::vector<std::string_view> texts;
+  std::map<unsigned int, Words> lines;
+};
+
+// The number of characters in `text`; a byte that belongs to none counts as one.
+std::size_t CountCharacters(std::string_view text);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,75 @@
+#include <algorithm>
+#include <string>
+#include <string_view>
+
+#include "report_format.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// Of a long line, what is shown before and in all.
+constexpr std::size_t kShownBefore = 60;
+constexpr std::size_t kShownWidth = 100;
+
+bool IsControl(char byte) { return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7f; }
+
+// A file may hold anything: control characters are shown as ^I and the like, so that none reaches
+// the terminal.
+void AppendVisible(std::string& text, std::string_view character) {
+  if (!IsControl(character.front())) {
+    text += character;
+    return;
+  }
+  text += '^';
+  text += static_cast<char>(character.front() ^ 0x40);
+}
+
+std::string_view TakeCharacter(std::string_view& text) {
+  std::size_t size = 1;
+  while (size < text.size() && (static_cast<unsigned char>(text[size]) & 0xc0) == 0x80) ++size;
+  const std::string_view character = text.substr(0, size);
+  text.remove_prefix(size);
+  return character;
+}
+
+std::string Visible(std::string_view text) {
+  std::string visible;
+  while (!text.empty()) AppendVisible(visible, TakeCharacter(text));
+  return visible;
+}
+
+// The line, and below it a mark under the characters that the problem is about.
+void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
+  const std::size_t first = diagnostic.column > kShownBefore ? diagnostic.column - kShownBefore : 1;
+  const std::size_t end = diagnostic.column + std::max<std::size_t>(diagnostic.length, 1);
+  std::string excerpt = first > 1 ? "..." : "";
+  std::string marks(excerpt.size(), ' ');
+  std::string_view rest = diagnostic.source;
+  for (std::size_t column = 1; !rest.empty() && column < first + kShownWidth; ++column) {
+    const std::string_view character = TakeCharacter(rest);
+    if (column < first) continue;
+    AppendVisible(excerpt, character);
+    const bool marked = column >= diagnostic.column && column < end;
+    marks.append(IsControl(character.front()) ? 2 : 1, !marked                       ? ' '
+                                                       : column == diagnostic.column ? '^'
+                                                                                     : '~');
+  }
+  if (!rest.empty()) excerpt += "...";
+  marks.erase(marks.find_last_not_of(' ') + 1);
+  output << "    " << excerpt << "\n    " << marks << '\n';
+}
+
+}  // namespace
+
+void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
+  for (const Diagnostic& diagnostic : diagnostics.All()) {
+    output << Visible(diagnostic.file) << ':';
+    if (diagnostic.line > 0) output << diagnostic.line << ':' << diagnostic.column << ':';
+    output << ' ' << SeverityName(diagnostic.code->severity) << ": " << Visible(diagnostic.message)
+           << " [" << diagnostic.code->name << "]\n";
+    if (diagnostic.line > 0) WriteExcerpt(diagnostic, output);
+    if (!diagnostic.hint.empty()) output << "    hint: " << Visible(diagnostic.hint) << '\n';
+  }
+}
+
+}  // namespace SecPolicyCli
