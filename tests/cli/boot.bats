@@ -65,5 +65,5 @@ load helper
   secpolicy boot
   exits 3
   says "Error: Failed to fetch domainID for global VM Domain"
-  ends_with "secpolicy: boot: stopped: there is no domain globalVMDom, and tardisks and file labels were not loaded. Put a policy file named globalVMDom into /etc/zorvan/secpolicy/domains and run it again."
+  ends_with "secpolicy: boot: stopped: there is no domain globalVMDom, so the load ended before tardisks and file labels. Put a policy file named globalVMDom into /etc/zorvan/secpolicy/domains and run it again."
 }

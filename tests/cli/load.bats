@@ -64,7 +64,7 @@ load helper
   secpolicy load
   exits 3
   says "Error: Failed to fetch domainID for IOFilter domain"
-  ends_with "secpolicy: load: stopped: there is no domain ioFilterDom, and tardisks and file labels were not loaded. Put a policy file named ioFilterDom into /etc/zorvan/secpolicy/domains and run it again."
+  ends_with "secpolicy: load: stopped: there is no domain ioFilterDom, so the load ended before tardisks and file labels. Put a policy file named ioFilterDom into /etc/zorvan/secpolicy/domains and run it again."
 }
 
 @test "load of a directory that is not there changes nothing and says what to do" {
