@@ -41,7 +41,7 @@ foreach(unit boot restore load)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${CMAKE_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
-install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md
+install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md docs/diagnostics.md
   DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 
 # `cpack` in the build directory makes a Debian package.

@@ -2,11 +2,11 @@
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot load load-early restore display settings'
+  local verbs='boot check load load-early restore display settings'
   local verb='' kind='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root ]]; then
+    if [[ $word == --root || $word == --format || $word == --disable ]]; then
       index=$((index + 1))
     elif [[ $word == -* ]]; then
       continue
@@ -23,11 +23,19 @@ _secpolicy() {
   if [[ $previous == --root ]]; then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
+  elif [[ $verb == check && $previous == --format ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
+  elif [[ $verb == check && $previous == --disable ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
+      installed-only long-line missing-path no-tardisk nul-byte second-policy skipped-entry star-in-path
+      tab two-labels unreachable-domain unused-object' -- "$current")
+  elif [[ $verb == check && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
   elif [[ $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
   elif [[ -z $verb ]]; then
     mapfile -t COMPREPLY < <(compgen -W "$verbs" -- "$current")
-  elif [[ $verb == load || $verb == load-early ]] && ((positional == 0)); then
+  elif [[ $verb == check || $verb == load || $verb == load-early ]] && ((positional == 0)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == settings && -z $kind ]]; then

@@ -13,7 +13,7 @@ load helper
 }
 
 @test "--help of every verb has an example" {
-  for verb in boot load load-early restore display settings; do
+  for verb in boot check load load-early restore display settings; do
     run --separate-stderr "$SECPOLICY" "$verb" --help
     exits 0
     [[ $output == *"Example"*"secpolicy "*"$verb"* ]]

@@ -1,4 +1,6 @@
 #include <algorithm>
+#include <cstddef>
+#include <iterator>
 #include <queue>
 #include <unordered_map>
 
@@ -123,19 +125,42 @@ class DomainCheck {
     }
   }
 
-  // Adds the rules one by one to those that do not contradict each other, until the host has
-  // nothing against the rest.
+  // Adds the rules to those that do not contradict each other, twice as many each time; where the
+  // host refuses them, half as many, down to the one rule to blame.
   void CheckParameterRules() {
     auto& rules = dynamic_cast<CapabilityParamRules&>(*policy.ruleSets.at(kParameterRule));
-    std::string refusal = Conflict(rules);
-    if (refusal.empty()) return;
+    if (Conflict(rules).empty()) return;
     CapabilityParamRules sound;
-    for (const auto& rule : rules.rules) {
-      sound.rules.push_back(rule);
-      refusal = Conflict(sound);
-      if (refusal.empty()) continue;
-      sound.rules.pop_back();
-      Add(Codes::kParameterConflict, rule.line, file.Lines().at(rule.line), refusal);
+    std::size_t size = 1;
+    while (!rules.rules.empty()) {
+      size = std::min(size, rules.rules.size());
+      const auto end = std::next(rules.rules.begin(), static_cast<std::ptrdiff_t>(size));
+      const auto added = rules.rules.begin();
+      sound.rules.splice(sound.rules.end(), rules.rules, added, end);
+      const std::string refusal = Conflict(sound);
+      if (refusal.empty()) {
+        size *= 2;
+        continue;
+      }
+      if (size == 1) {
+        RefuseParameterRule(added->line, refusal);
+        sound.rules.erase(added);
+        continue;
+      }
+      rules.rules.splice(rules.rules.begin(), sound.rules, added, sound.rules.end());
+      size /= 2;
+    }
+  }
+
+  // A number that is none is to blame itself, else the rule is.
+  void RefuseParameterRule(unsigned int line, const std::string& refusal) {
+    constexpr std::size_t kFirstNumber = 2;
+    const Words& words = file.Lines().at(line);
+    const std::size_t word = FindBlamedWord(Codes::kParameterConflict, refusal, words);
+    if (word < kFirstNumber || word == words.size()) {
+      Add(Codes::kParameterConflict, line, words, refusal);
+    } else {
+      run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, word, refusal));
     }
   }
 

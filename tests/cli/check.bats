@@ -1,0 +1,397 @@
+# secpolicy check
+
+load helper
+
+# Every test but those of the real root checks the booted example, changed in one way.
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/etc/zorvan/secpolicy
+  shown=/etc/zorvan/secpolicy
+  "$SOURCE/scripts/pack-example" "$root"
+  "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err"
+}
+
+# add FILE LINE...: appends the lines to the policy file, and keeps the number of the last one.
+add() {
+  local file=$policy/$1
+  shift
+  printf '%s\n' "$@" >>"$file"
+  number=$(wc -l <"$file")
+}
+
+# finds LINE: the check ended with an error, and showed this line.
+finds() {
+  secpolicy check
+  exits 1
+  shows "$1"
+}
+
+# warns LINE: the check found this, and nothing that is an error.
+warns() {
+  secpolicy check
+  exits 0
+  shows "$1"
+}
+
+@test "the example has no problems, booted or not yet installed" {
+  secpolicy check --werror
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: check: no problems" ]]
+  secpolicy check --werror --fresh
+  exits 0
+  [[ $stderr == "secpolicy: check: no problems" ]]
+}
+
+@test "check changes nothing, logs nothing and leaves nothing behind" {
+  add domains/appDom "-s no_such_call grant"
+  add objects/base "newObject"
+  (cd "$root" && find . -type f -exec sha256sum {} + | sort) >"$BATS_TEST_TMPDIR/before"
+  (cd "$root" && find . | sort) >>"$BATS_TEST_TMPDIR/before"
+  secpolicy check
+  exits 1
+  (cd "$root" && find . -type f -exec sha256sum {} + | sort) >"$BATS_TEST_TMPDIR/after"
+  (cd "$root" && find . | sort) >>"$BATS_TEST_TMPDIR/after"
+  cmp "$BATS_TEST_TMPDIR/before" "$BATS_TEST_TMPDIR/after"
+}
+
+@test "a problem is shown with its line, a mark and a hint" {
+  printf '%s\n' '-s read grnt' >"$policy/domains/appDom"
+  secpolicy check
+  exits 1
+  [[ $output == *"$shown/domains/appDom:1:9: error: invalid keyword grnt [grant-word]
+    -s read grnt
+            ^~~~
+    hint: did you mean 'grant'?"* ]]
+  [[ $stderr == "secpolicy: check: 1 error, 0 warnings" ]]
+}
+
+@test "every bad line of every file is told, in the order of a load" {
+  printf '%s\n' '-x' '-s read grant' '-s reed grant' >"$policy/domains/appDom"
+  printf '%s\n' 'a b' 'hostProgram' 'c d' >"$policy/objects/zz"
+  printf '%s\n' '/etc' '/etc/*x hostConfig' '/etc nolabel' >"$policy/fileLabels/zz"
+  secpolicy check --disable duplicate-object
+  exits 1
+  [[ $(grep -o "^[^ ]*: error:.*\[.*\]" <<<"$output" | sed "s|^$shown/\([^:]*:[0-9]*\):.*\[|\1 [|") == \
+    "objects/zz:1 [argument-count]
+objects/zz:3 [argument-count]
+domains/appDom:1 [rule-type]
+domains/appDom:3 [unknown-word]
+fileLabels/zz:1 [argument-count]
+fileLabels/zz:2 [tree-marker]
+fileLabels/zz:3 [unknown-word]" ]]
+}
+
+@test "the messages are those of a load" {
+  add domains/appDom "-c cap_net_ray grant"
+  secpolicy load
+  local message=${stderr#*"domain: appDom: $number : "}
+  finds "$shown/domains/appDom:$number:4: error: ${message%%$'\n'*} [unknown-word]"
+  shows "    hint: did you mean 'cap_net_raw'?"
+}
+
+@test "argument-count" {
+  add domains/appDom "-s read"
+  finds "$shown/domains/appDom:$number:1: error: incorrect number of arguments for this rule type [argument-count]"
+  shows "    hint: write: -s SYSCALL grant"
+}
+
+@test "bad-name" {
+  local name
+  name=$(printf 'x%.0s' {1..64})
+  touch "$policy/domains/$name"
+  secpolicy check
+  exits 1
+  [[ $output == *"$shown/domains/$name: error: "*" [bad-name]"* ]]
+}
+
+@test "bad-name, of an object" {
+  local name
+  name=$(printf 'x%.0s' {1..256})
+  add objects/base "$name"
+  secpolicy check
+  exits 1
+  [[ $output == *"$shown/objects/base:$number:1: error: "*" [bad-name]"* ]]
+}
+
+@test "bad-permissions" {
+  add domains/appDom "-r /etc rr"
+  finds "$shown/domains/appDom:$number:9: error: Read access already specified. [bad-permissions]"
+}
+
+@test "missing-domain" {
+  rm "$policy/domains/ioFilterDom"
+  secpolicy check --fresh
+  exits 1
+  shows "$shown/domains: error: there is no domain 'ioFilterDom', which every host needs: a load stops without it, before tardisks and file labels [missing-domain]"
+  shows "    hint: an empty file $shown/domains/ioFilterDom defines it"
+}
+
+@test "parameter-conflict, of every pair" {
+  add domains/appDom "-p set_uid 1 10 grant" "-p set_uid 5 revoke" "-p set_uid 20 grant" \
+    "-p set_uid 7 revoke" "-p set_gid nobody grant"
+  finds "$shown/domains/appDom:$((number - 3)):1: error: parameter check 'set_uid': grant of 1 to 10 in line $((number - 4)) conflicts with revoke of 5 in line $((number - 3)) [parameter-conflict]"
+  shows "$shown/domains/appDom:$((number - 1)):1: error: parameter check 'set_uid': grant of 1 to 10 in line $((number - 4)) conflicts with revoke of 7 in line $((number - 1)) [parameter-conflict]"
+  shows "$shown/domains/appDom:$number:12: error: parameter 'nobody' is not an unsigned number [parameter-conflict]"
+  [[ $stderr == "secpolicy: check: 3 errors, 0 warnings" ]]
+}
+
+@test "rule-type" {
+  add domains/appDom "-S read grant"
+  finds "$shown/domains/appDom:$number:1: error: invalid policy rule type (-S) [rule-type]"
+}
+
+@test "second-rule, and rules of other kinds, of a tardisk policy" {
+  add tardisks/monitor "-E hostProgram appDom" "-F x"
+  finds "$shown/tardisks/monitor:$((number - 1)):1: error: Only one rule of this type is allowed [second-rule]"
+  shows "$shown/tardisks/monitor:$number:1: error: invalid tardisk policy rule type (-F) [rule-type]"
+}
+
+@test "tree-marker" {
+  add fileLabels/base "/etc/*.conf hostConfig"
+  finds "$shown/fileLabels/base:$number:1: error: Unrecognized format for file/dir specification [tree-marker]"
+}
+
+@test "unknown-domain" {
+  add domains/appDom "-d hostProgram sshDon exec grant"
+  finds "$shown/domains/appDom:$number:16: error: Failed to fetch domain id for: sshDon [unknown-domain]"
+  shows "    hint: did you mean 'sshDom'?"
+}
+
+@test "unknown-word, for a label that is a domain, where only an object will do" {
+  add fileLabels/base "/etc/services.conf sshDom"
+  secpolicy check
+  exits 1
+  shows "$shown/fileLabels/base:$number:20: error: Invalid label (sshDom) for file /etc/services.conf [unknown-word]"
+}
+
+@test "unreadable" {
+  rm -r "$policy/fileLabels"
+  finds "$shown/fileLabels: error: Unable to open policy directory $shown/fileLabels [unreadable]"
+}
+
+@test "carriage-return" {
+  printf -- '-s bind grant\r\n' >>"$policy/domains/appDom"
+  secpolicy check
+  exits 1
+  [[ $output == *": warning: this carriage return is part of a word: lines end with a line feed alone [carriage-return]
+    -s bind grant^M
+                 ^^"* ]]
+}
+
+@test "contradicting-rule" {
+  add domains/appDom "-s bind grant" "-s bind revoke"
+  warns "$shown/domains/appDom:$number:1: warning: this rule replaces the one in line $((number - 1)), which says otherwise [contradicting-rule]"
+}
+
+@test "duplicate-object" {
+  add objects/base "sshKey"
+  secpolicy check
+  exits 0
+  [[ $output == *"$shown/objects/base:$number:1: warning: 'sshKey' is declared in line "*" of $shown/objects/base already [duplicate-object]"* ]]
+}
+
+@test "duplicate-rule, the letters of paths in any order" {
+  add domains/appDom "-r /etc rw" "-r /etc wr"
+  warns "$shown/domains/appDom:$number:1: warning: this rule is in line $((number - 1)) already [duplicate-rule]"
+}
+
+@test "installed-only" {
+  rm "$policy/domains/globalVMDom"
+  secpolicy check
+  exits 0
+  shows "$shown/domains: warning: no file defines the domain 'globalVMDom', which every host needs; it is installed since an earlier load, and the next boot will lack it [installed-only]"
+}
+
+@test "long-line" {
+  printf -- '-s bind grant %1100s\n-x\n' '' >>"$policy/domains/appDom"
+  number=$(($(wc -l <"$policy/domains/appDom") - 1))
+  warns "$shown/domains/appDom:$number:1024: warning: this line has more than 1023 characters: the rest of it and all lines below it are not read [long-line]"
+}
+
+@test "missing-path, of rules and of labels" {
+  add domains/appDom "-r /no/such r"
+  warns "$shown/domains/appDom:$number:4: warning: there is nothing at /no/such under this root [missing-path]"
+  add fileLabels/base "/no/such/* hostConfig"
+  warns "$shown/fileLabels/base:$number:1: warning: there is nothing at /no/such under this root [missing-path]"
+}
+
+@test "no-tardisk" {
+  echo "-E monitorImage monitorDom" >"$policy/tardisks/late"
+  warns "$shown/tardisks/late: warning: No backing tardisk for policy file $shown/tardisks/late [no-tardisk]"
+}
+
+@test "nul-byte" {
+  printf -- '-s bind grant \0 x\n' >>"$policy/domains/appDom"
+  number=$(wc -l <"$policy/domains/appDom")
+  warns "$shown/domains/appDom:$number:15: warning: a NUL byte ends this line; what follows it is not read [nul-byte]"
+}
+
+@test "second-policy" {
+  mkdir -p "$BATS_TEST_TMPDIR/disk/etc/zorvan/secpolicy/tardisks"
+  echo "-E monitorImage monitorDom" | tee "$BATS_TEST_TMPDIR/disk/etc/zorvan/secpolicy/tardisks/"{one,two} >/dev/null
+  tar -C "$BATS_TEST_TMPDIR/disk" -czf "$root/tardisks/twice.tgz" etc
+  "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err" || true
+  warns "$shown/tardisks/two: warning: More than one exception specification for tardisk /tardisks/twice.tgz [second-policy]"
+}
+
+@test "skipped-entry, but for the directory of partner domains" {
+  ln -s appDom "$policy/domains/linkDom"
+  mkdir "$policy/objects/more"
+  warns "$shown/domains/linkDom: warning: this is a symbolic link: a load skips it [skipped-entry]"
+  shows "$shown/objects/more: warning: this is a directory: a load skips it [skipped-entry]"
+  [[ $stderr == "secpolicy: check: 0 errors, 2 warnings" ]]
+}
+
+@test "star-in-path, where /* is no tree" {
+  add domains/appDom "-r /etc/* r"
+  warns "$shown/domains/appDom:$number:4: warning: a -r rule has no patterns: this one is about a file whose name has a star [star-in-path]"
+  add fileLabels/base "/* hostConfig" "/etc/services.conf/* hostConfig" "/etc/s*.conf hostConfig"
+  warns "$shown/fileLabels/base:$((number - 2)):1: warning: there is no directory before the /* [star-in-path]"
+  shows "$shown/fileLabels/base:$((number - 1)):1: warning: /* stands behind something that is no directory [star-in-path]"
+  shows "$shown/fileLabels/base:$number:1: warning: there are no patterns: this is a file whose name has a star [star-in-path]"
+}
+
+@test "tab" {
+  add domains/appDom "-s"$'\t'"bind grant"
+  secpolicy check
+  exits 1
+  shows "$shown/domains/appDom:$number:3: warning: this tab is part of a word: only spaces separate words [tab]"
+}
+
+@test "two-labels: one path, two names of one file, and a tree below" {
+  ln "$root/etc/services.conf" "$root/etc/other.conf"
+  echo "/etc/services.conf sshKey" >"$policy/fileLabels/one"
+  echo "/etc/services.conf vmDisk" >"$policy/fileLabels/two"
+  echo "/etc/other.conf sshKey" >"$policy/fileLabels/x"
+  warns "$shown/fileLabels/two:1:20: warning: this label replaces 'sshKey' of line 1 of $shown/fileLabels/one [two-labels]"
+  shows "$shown/fileLabels/x:1:17: warning: this label replaces 'vmDisk' of line 1 of $shown/fileLabels/two: /etc/services.conf is the same file [two-labels]"
+  echo "/etc/* hostConfig" >"$policy/fileLabels/y"
+  warns "$shown/fileLabels/x:1:17: warning: this label does not stay: line 1 of $shown/fileLabels/y gives the whole tree 'hostConfig' [two-labels]"
+}
+
+@test "unreachable-domain, also of domains that enter each other" {
+  echo "-d hostProgram twoDom exec grant" >"$policy/domains/oneDom"
+  echo "-d hostProgram oneDom exec grant" >"$policy/domains/twoDom"
+  warns "$shown/domains/oneDom: warning: nothing enters the domain 'oneDom': no -d rule of a domain in use leads to it [unreachable-domain]"
+  shows "$shown/domains/twoDom: warning: nothing enters the domain 'twoDom': no -d rule of a domain in use leads to it [unreachable-domain]"
+}
+
+@test "unused-object" {
+  add objects/base "lonelyObject"
+  warns "$shown/objects/base:$number:1: warning: no rule and no file label uses 'lonelyObject' [unused-object]"
+}
+
+@test "--werror ends with 1 for a warning" {
+  add objects/base "lonelyObject"
+  secpolicy check --werror
+  exits 1
+  [[ $stderr == "secpolicy: check: 0 errors, 1 warning" ]]
+}
+
+@test "--disable leaves a warning out, and can be repeated" {
+  add objects/base "lonelyObject" "sshKey"
+  secpolicy check --werror --disable unused-object --disable duplicate-object
+  exits 0
+  [[ -z $output ]]
+}
+
+@test "--disable of an error and of no code is wrong usage" {
+  secpolicy check --disable rule-type
+  exits 2
+  [[ $stderr == *"'rule-type' is an error"* ]]
+  secpolicy check --disable no-such-code
+  exits 2
+  [[ $stderr == *"there is no warning 'no-such-code'"* ]]
+}
+
+@test "--format json" {
+  add domains/appDom "-s reed grant"
+  add objects/base "lonelyObject"
+  secpolicy check --format json
+  exits 1
+  jq -e --argjson line "$(wc -l <"$policy/domains/appDom")" '
+    .version == 1 and .errors == 1 and .warnings == 1 and (.problems | length) == 2 and
+    .problems[1] == {file: "/etc/zorvan/secpolicy/domains/appDom", line: $line, column: 4,
+      length: 4, source: "-s reed grant", severity: "error", code: "unknown-word",
+      message: "unknown system call '"'reed'"'", hint: "did you mean '"'read'"'?"}' <<<"$output"
+}
+
+@test "--format json of a policy without problems, and of bytes that are no text" {
+  secpolicy check --format json
+  exits 0
+  jq -e '.problems == [] and .errors == 0' <<<"$output"
+  printf -- '-s \xff\xfe grant\n' >>"$policy/domains/appDom"
+  secpolicy check --format json
+  exits 1
+  jq -e '.errors == 1' <<<"$output"
+}
+
+@test "--format sarif has what its schema requires" {
+  add domains/appDom "-s reed grant"
+  touch "$policy/domains/odd name%"
+  secpolicy check --format sarif
+  exits 1
+  jq -e '.version == "2.1.0" and (.["$schema"] | type) == "string" and (.runs | length) == 1' <<<"$output"
+  jq -e '.runs[0].tool.driver | .name == "secpolicy" and (.rules | map(.id) | length > 0 and length == (unique | length))' <<<"$output"
+  # Every result names a rule by its place, has a level, a text and a place.
+  jq -e '.runs[0] as $run | $run.results | length == 2 and all(
+    $run.tool.driver.rules[.ruleIndex].id == .ruleId and
+    (.level | IN("error", "warning")) and (.message.text | length > 0) and
+    (.locations | length == 1) and (.locations[0].physicalLocation.artifactLocation.uri | startswith("file:///")))' <<<"$output"
+  jq -e --argjson line "$number" '.runs[0].results[] | select(.ruleId == "unknown-word") |
+    .locations[0].physicalLocation.region |
+    .startLine == $line and .startColumn == 4 and .endColumn == 8' <<<"$output"
+  jq -e '.runs[0].results | map(.locations[0].physicalLocation.artifactLocation.uri) |
+    index("file:///etc/zorvan/secpolicy/domains/odd%20name%25") != null' <<<"$output"
+}
+
+@test "control characters of a file do not reach the terminal" {
+  printf -- '-s \033[2J grant\n' >>"$policy/domains/appDom"
+  secpolicy check
+  exits 1
+  [[ $output != *$'\033'* && $output == *'-s ^[[2J grant'* ]]
+}
+
+@test "what is installed counts, but not with --fresh" {
+  add domains/appDom "-d hostProgram sshDom exec grant"
+  rm "$policy/domains/sshDom"
+  sed -i '/sshDom/d' "$policy/domains/hostDom" "$policy/domains/daemonFrameworkDom"
+  secpolicy check --disable unused-object
+  exits 0
+  secpolicy check --fresh
+  exits 1
+  [[ $output == *"Failed to fetch domain id for: sshDom [unknown-domain]"* ]]
+}
+
+@test "a state that cannot be read is said, and the policy is checked as after a boot" {
+  echo garbage >"$root/run/secpolicy/host.db"
+  secpolicy check
+  exits 0
+  [[ $stderr == "secpolicy: check: the installed state cannot be read ("*"): checked as after a boot
+secpolicy: check: no problems" ]]
+}
+
+@test "a directory that is not there" {
+  secpolicy check /no/such
+  exits 1
+  [[ $stderr == "secpolicy: check: there is no directory /no/such below this root. Name the directory of the policy, or the root that it is in (--root DIR)." ]]
+}
+
+@test "the mistake of the broken example shows from the output alone" {
+  run --separate-stderr "$SECPOLICY" check --fresh "$SOURCE/examples/broken"
+  exits 1
+  [[ $output == "$SOURCE/examples/broken/domains/webDom:4:4: error: unknown label 'webContnet' [unknown-word]
+    -a webContnet read    grant
+       ^~~~~~~~~~
+    hint: did you mean 'webContent'?" ]]
+  cp -r "$SOURCE/examples/broken" "$BATS_TEST_TMPDIR/mended"
+  sed -i s/webContnet/webContent/ "$BATS_TEST_TMPDIR/mended/domains/webDom"
+  run --separate-stderr "$SECPOLICY" check --werror --fresh "$BATS_TEST_TMPDIR/mended"
+  exits 0
+}
+
+@test "every code has its page in the documentation, and no other has" {
+  secpolicy check --format sarif
+  diff <(jq -r '.runs[0].tool.driver.rules[].id' <<<"$output" | sort) \
+    <(sed -n 's/^### `\(.*\)`$/\1/p' "$SOURCE/docs/diagnostics.md" | sort)
+}
