@@ -20,6 +20,13 @@ namespace {
   throw HostError(code, StrCat(what, ": ", std::strerror(code)));
 }
 
+[[noreturn]] void ThrowParentMissing(const std::string& directory, const std::string& purpose) {
+  throw HostError(
+      ENOENT, StrCat("Unable to create the directory ", directory, " for the ", purpose, ": ",
+                     std::strerror(ENOENT), ". Make ", directory.substr(0, directory.rfind('/')),
+                     " first, or choose another place"));
+}
+
 void RequirePrivate(const struct stat& status, const std::string& path,
                     const std::string& purpose) {
   if (status.st_uid != geteuid() && status.st_uid != 0) {
@@ -35,6 +42,7 @@ void RequirePrivate(const struct stat& status, const std::string& path,
 
 void PrepareDirectory(const std::string& directory, const std::string& purpose) {
   if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
+    if (errno == ENOENT) ThrowParentMissing(directory, purpose);
     ThrowSystemError(StrCat("Unable to create the directory ", directory, " for the ", purpose));
   }
   struct stat status {};

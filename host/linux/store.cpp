@@ -56,6 +56,12 @@ bool IsDamaged(int result) {
   return (result & 0xff) == SQLITE_CORRUPT || (result & 0xff) == SQLITE_NOTADB;
 }
 
+// What to do about a failure that the state itself has no part in. Empty when nothing helps.
+const char* RemedyFor(int result) {
+  const bool full = (result & 0xff) == SQLITE_FULL || result == SQLITE_IOERR_SHMSIZE;
+  return full ? ". Make room there, and run it again" : "";
+}
+
 // Connections that a fork left in a child. To close one would act on the parent's files.
 void Abandon(sqlite3* database) {
   static auto* abandoned = new std::vector<sqlite3*>;
@@ -148,12 +154,18 @@ void Store::Open() {
   inode = status.st_ino;
   sqlite3_extended_result_codes(database, 1);
   sqlite3_busy_handler(database, WaitForOthers, nullptr);
-  if (sqlite3_db_readonly(database, "main") == 1) Refuse(EROFS, "cannot be written");
+  if (sqlite3_db_readonly(database, "main") == 1) {
+    throw HostError(EROFS, StrCat("Unable to use the ", layout.purpose, " ", file,
+                                  ": it cannot be written. Make it writable, or choose another "
+                                  "place"));
+  }
   RunScript(layout.survivesPowerLoss ? "PRAGMA synchronous = FULL" : "PRAGMA synchronous = OFF");
 }
 
 bool Store::IsReady() {
   const auto applicationId = ReadInteger("PRAGMA application_id");
+  // Known only now that the head of the file was read.
+  if (sqlite3_db_readonly(database, "main") == 1) Refuse(EPROTO, "is of a format for reading only");
   const auto version = ReadInteger("PRAGMA user_version");
   if (applicationId == layout.applicationId && version == layout.version) return true;
   if (applicationId == layout.applicationId) {
@@ -277,8 +289,8 @@ std::int64_t Store::ReadInteger(const char* query) {
 void Store::Fail(int result) const {
   const char* reason = database != nullptr ? sqlite3_errmsg(database) : sqlite3_errstr(result);
   if (IsDamaged(result)) Refuse(EIO, StrCat("is damaged or no such thing (", reason, ")"));
-  throw HostError(ErrorNumber(result),
-                  StrCat("Unable to use the ", layout.purpose, " ", file, ": ", reason));
+  throw HostError(ErrorNumber(result), StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
+                                              reason, RemedyFor(result)));
 }
 
 void Store::Refuse(int code, const std::string& reason) const {

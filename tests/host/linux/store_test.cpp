@@ -109,7 +109,8 @@ TEST_F(StoreFile, RefusesAPathThatIsNotAbsolute) {
 TEST_F(StoreFile, NamesTheDirectoryThatCannotBeMade) {
   EXPECT_EQ(Refusal(directory.Path() + "/missing/new/list.db"),
             "Unable to create the directory " + directory.Path() +
-                "/missing/new for the shopping list: No such file or directory");
+                "/missing/new for the shopping list: No such file or directory. Make " +
+                directory.Path() + "/missing first, or choose another place");
   EXPECT_EQ(code, ENOENT);
 }
 
