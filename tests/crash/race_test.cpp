@@ -1,0 +1,106 @@
+// Loaders that run at the same time, and readers beside them.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <list>
+#include <map>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "command.h"
+#include "host_root.h"
+#include "state_content.h"
+
+namespace CrashTest {
+namespace {
+
+// The lines of each domain in what `display` printed, by the line that begins it.
+std::map<std::string, std::vector<std::string>> DomainsOf(const std::string& display) {
+  std::map<std::string, std::vector<std::string>> domains;
+  std::string domain;
+  std::istringstream lines(display);
+  for (std::string line; std::getline(lines, line);) {
+    if (line.starts_with("Domain Name: ")) domain = line.substr(0, line.find(" Domain ID"));
+    if (line.starts_with("-") && !line.starts_with("--")) domains[domain].push_back(line);
+  }
+  return domains;
+}
+
+std::vector<std::string> OfKind(const std::vector<std::string>& rules, const std::string& kind) {
+  std::vector<std::string> found;
+  for (const std::string& rule : rules) {
+    if (rule.starts_with(kind)) found.push_back(rule);
+  }
+  return found;
+}
+
+// Every kind of rule is read in one call, and installed in the order of the file.
+void ExpectBeginningsOf(const std::string& whole, const std::string& display) {
+  const auto expected = DomainsOf(whole);
+  for (const auto& [domain, rules] : DomainsOf(display)) {
+    ASSERT_EQ(expected.count(domain), 1U) << domain;
+    for (const char* kind : {"-a", "-c", "-d", "-f", "-p", "-r", "-s", "-u"}) {
+      const auto all = OfKind(expected.at(domain), kind);
+      const auto seen = OfKind(rules, kind);
+      ASSERT_LE(seen.size(), all.size());
+      ASSERT_TRUE(std::equal(seen.begin(), seen.end(), all.begin())) << display;
+    }
+    ASSERT_EQ(OfKind(rules, "-r").size() % 2, 0U) << display;
+  }
+}
+
+class LoadersAtOnce : public ::testing::TestWithParam<int> {};
+
+TEST_P(LoadersAtOnce, EndRightAndLeaveTheStateOfOne) {
+  const HostRoot root;
+  ASSERT_EQ(RunCommand(root.Path(), {"load"}).exitStatus, 0);
+  const std::string content = ContentOf(root.State());
+
+  for (int round = 0; round < (LongTests() ? 20 : 2); ++round) {
+    root.Forget();
+    std::list<Command> loaders;
+    for (int loader = 0; loader < GetParam(); ++loader) {
+      loaders.emplace_back(root.Path(), std::vector<std::string>{"load"});
+    }
+    for (Command& loader : loaders) {
+      const Outcome outcome = loader.Wait();
+      EXPECT_EQ(outcome.exitStatus, 0);
+      EXPECT_EQ(outcome.errors, "secpolicy: load: done\n");
+    }
+    EXPECT_EQ(ContentOf(root.State()), content);
+    EXPECT_EQ(StateFile(root.State()).Integrity(), "ok");
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(Loaders, LoadersAtOnce, ::testing::Values(2, 4, 8));
+
+TEST(Reader, NeverSeesHalfACall) {
+  const HostRoot root;
+  ASSERT_EQ(RunCommand(root.Path(), {"load"}).exitStatus, 0);
+  const std::string whole = RunCommand(root.Path(), {"display"}).output;
+  const std::size_t domains = DomainsOf(whole).size();
+  // Those of the policy, and the built-in one.
+  ASSERT_EQ(domains, static_cast<std::size_t>(kServices) + 5);
+  ASSERT_EQ(OfKind(DomainsOf(whole).at("Domain Name: service0"), "-r").size(), 2U * kLinks);
+
+  int partial = 0;
+  for (int round = 0; round < (LongTests() ? 100 : 15); ++round) {
+    root.Forget();
+    Command loader(root.Path(), {"load"});
+    std::string display;
+    do {
+      const Outcome reader = RunCommand(root.Path(), {"display"});
+      ASSERT_EQ(reader.exitStatus, 0) << reader.errors;
+      display = reader.output;
+      ExpectBeginningsOf(whole, display);
+      if (!DomainsOf(display).empty() && display != whole) ++partial;
+    } while (display != whole && !HasFatalFailure());
+    EXPECT_EQ(loader.Wait().exitStatus, 0);
+  }
+  EXPECT_GT(partial, 0);
+}
+
+}  // namespace
+}  // namespace CrashTest
