@@ -34,7 +34,7 @@ find_package(secpolicy 1 REQUIRED)
 add_executable(runtime "$SOURCE/examples/runtime.cpp")
 target_link_libraries(runtime PRIVATE secpolicy::secpolicy)
 EOF
-  CXXFLAGS=$SANITIZER cmake -S "$BATS_TEST_TMPDIR" -B "$BATS_TEST_TMPDIR/build" \
+  CXXFLAGS=$SANITIZER cmake -G Ninja -S "$BATS_TEST_TMPDIR" -B "$BATS_TEST_TMPDIR/build" \
     -DCMAKE_PREFIX_PATH="$PREFIX"
   cmake --build "$BATS_TEST_TMPDIR/build"
   runs_as_service "$BATS_TEST_TMPDIR/build/runtime"

@@ -2,6 +2,13 @@
 
 load helper
 
+# Puts a copy of the command where every user can reach it: the build may be in somebody's home.
+share_command() {
+  cmake --install "$BUILD_DIR" --prefix "$BATS_TEST_TMPDIR/prefix" >/dev/null
+  SECPOLICY=$BATS_TEST_TMPDIR/prefix/bin/secpolicy
+  chmod 755 "$BATS_RUN_TMPDIR" "$(dirname "$BATS_TEST_TMPDIR")" "$BATS_TEST_TMPDIR"
+}
+
 # as_nobody COMMAND...: runs the command as a user without any privilege.
 as_nobody() {
   setpriv --reuid=65534 --regid=65534 --clear-groups --inh-caps=-all --bounding-set=-all "$@"
@@ -31,7 +38,7 @@ as_nobody() {
 @test "an ordinary user boots and shows a root of its own" {
   [[ $(id -u) -eq 0 ]] || skip "all tests run as an ordinary user already"
   as_nobody unshare --user true || skip "this machine allows no user namespaces"
-  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR" "$BATS_TEST_TMPDIR"
+  share_command
   chown -R 65534:65534 "$root"
   run --separate-stderr as_nobody "$SECPOLICY" --root "$root" boot
   exits 0
@@ -43,6 +50,7 @@ as_nobody() {
 
 @test "an ordinary user without a root is told what to do" {
   [[ $(id -u) -eq 0 ]] || skip "needs root to become an ordinary user without a state"
+  share_command
   run --separate-stderr as_nobody "$SECPOLICY" restore
   exits 1
   [[ ${stderr##*$'\n'} == *"You are not root: run it as root, or give --root DIR to work below a directory of yours." ]]
