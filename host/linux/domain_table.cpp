@@ -96,7 +96,9 @@ void DomainTable::Load() {
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain");
   while (rows.Next()) {
     const auto id = static_cast<unsigned int>(rows.Integer(0));
-    if (id >= slots.size()) throw HostError(EUCLEAN, StrCat("the state holds a domain ", id));
+    if (id >= slots.size())
+      throw HostError(EUCLEAN,
+                      StrCat("the host state holds a domain ", id, " beyond the last slot"));
     slots[id] =
         Domain{id, rows.Text(1), rows.Text(2),
                static_cast<TeskAccessKsi_DefaultDom>(rows.Integer(3)), rows.Integer(4) != 0};
