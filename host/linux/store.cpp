@@ -163,20 +163,21 @@ void Store::Open() {
 }
 
 bool Store::IsReady() {
+  // One look at all of it: another process may be setting the file up.
+  RunScript("BEGIN");
   const auto applicationId = ReadInteger("PRAGMA application_id");
   // Known only now that the head of the file was read.
   if (sqlite3_db_readonly(database, "main") == 1) Refuse(EPROTO, "is of a format for reading only");
   const auto version = ReadInteger("PRAGMA user_version");
-  if (applicationId == layout.applicationId && version == layout.version) return true;
-  if (applicationId == layout.applicationId) {
-    Refuse(EPROTO, StrCat("has schema ", version, ", this program works with schema ",
-                          layout.version, ": it was made by another version of it"));
-  }
-  if (applicationId != 0 || version != 0 ||
-      ReadInteger("SELECT count(*) FROM sqlite_schema") != 0) {
-    Refuse(EPROTO, "is the database of something else");
-  }
-  return false;
+  const bool isEmpty =
+      applicationId == 0 && version == 0 && ReadInteger("SELECT count(*) FROM sqlite_schema") == 0;
+  RunScript("COMMIT");
+
+  if (isEmpty) return false;
+  if (applicationId != layout.applicationId) Refuse(EPROTO, "is the database of something else");
+  if (version == layout.version) return true;
+  Refuse(EPROTO, StrCat("has schema ", version, ", this program works with schema ", layout.version,
+                        ": it was made by another version of it"));
 }
 
 void Store::Create() {
