@@ -52,8 +52,10 @@ int ErrorNumber(int result) {
   }
 }
 
+// The statements are our own and fit the schema: one that is wrong has met another schema.
 bool IsDamaged(int result) {
-  return (result & 0xff) == SQLITE_CORRUPT || (result & 0xff) == SQLITE_NOTADB;
+  const int kind = result & 0xff;
+  return kind == SQLITE_CORRUPT || kind == SQLITE_NOTADB || kind == SQLITE_ERROR;
 }
 
 // What to do about a failure that the state itself has no part in. Empty when nothing helps.
