@@ -40,7 +40,7 @@ struct InstalledTardisk {
 struct InstalledPolicy {
   std::vector<InstalledDomain> domains;  // in ascending order of their identifiers
   std::map<std::string, unsigned int> objects;
-  std::vector<InstalledTardisk> tardisks;
+  std::vector<InstalledTardisk> tardisks;  // in order of path
 };
 
 // Reads the state that this process works with, by way of the library's own rule sets. Throws what

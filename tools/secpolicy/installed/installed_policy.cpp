@@ -1,0 +1,76 @@
+#include "installed_policy.h"
+
+#include <list>
+#include <optional>
+#include <utility>
+
+#include "kitlibs/file.h"
+#include "printed_rules.h"
+#include "secpolicy/domain/domain_policy.h"
+#include "secpolicy/policy_root.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using SecPolicy::TeskAccessInterfaceImpl;
+
+std::vector<InstalledRule> ReadRules(const std::string& name, unsigned int id,
+                                     TeskAccessInterfaceImpl& access) {
+  SecPolicy::DomainPolicy policy(name, id);
+  std::vector<InstalledRule> rules;
+  // Set by set, because reading a whole domain reports a set that cannot be read and goes on.
+  for (const auto& [keyword, ruleSet] : policy.ruleSets) {
+    ruleSet->ReadSystemRules(id, access);
+    for (std::string& text : PrintedRules(*ruleSet)) {
+      rules.push_back({.text = std::move(text), .origin = {}});
+    }
+  }
+  return rules;
+}
+
+std::optional<InstalledDomain> ReadDomain(unsigned int id, TeskAccessInterfaceImpl& access) {
+  InstalledDomain domain;
+  domain.id = id;
+  if (!access.GetCompleteDomainInfo(id, domain.name, domain.level, domain.state, domain.references,
+                                    domain.worldReferences, domain.defaultRules)) {
+    return std::nullopt;
+  }
+  domain.rules = ReadRules(domain.name, id, access);
+  return domain;
+}
+
+std::string ReadLabel(const std::string& path, TeskAccessInterfaceImpl& access) {
+  try {
+    return SecPolicy::GetFileLabel(path, access);
+  } catch (const Braxo::Lib::BraxoException&) {
+    return "";
+  }
+}
+
+// A root without the directory of tardisks has none.
+std::list<std::string> ListTardisks() {
+  std::list<std::string> paths;
+  if (File_IsDirectory(SecPolicy::kTardiskImagesDir)) SecPolicy::GetAllTardisks(paths);
+  paths.sort();
+  return paths;
+}
+
+}  // namespace
+
+InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
+  InstalledPolicy policy;
+  const unsigned int slots = access.GetMaxDomains();
+  for (unsigned int id = 0; id < slots; ++id) {
+    if (auto domain = ReadDomain(id, access)) policy.domains.push_back(std::move(*domain));
+  }
+  for (const auto& [name, id] :
+       access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL)) {
+    policy.objects.emplace(name, static_cast<unsigned int>(id));
+  }
+  for (const std::string& path : ListTardisks()) {
+    policy.tardisks.push_back({.path = path, .label = ReadLabel(path, access)});
+  }
+  return policy;
+}
+
+}  // namespace SecPolicyCli
