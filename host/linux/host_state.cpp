@@ -86,6 +86,31 @@ CREATE TABLE inode_origin (
   birth INTEGER NOT NULL,
   PRIMARY KEY (device, inode)
 ) WITHOUT ROWID;
+CREATE TABLE rule_origin (
+  domain TEXT NOT NULL,
+  rule TEXT NOT NULL,
+  file TEXT NOT NULL,
+  line INTEGER NOT NULL,
+  PRIMARY KEY (domain, rule)
+) WITHOUT ROWID;
+CREATE TABLE label_origin (
+  id INTEGER PRIMARY KEY,
+  path TEXT NOT NULL,
+  is_tree INTEGER NOT NULL,
+  label TEXT NOT NULL,
+  file TEXT NOT NULL,
+  line INTEGER NOT NULL,
+  UNIQUE (path, is_tree)
+);
+CREATE TABLE load_record (
+  one INTEGER PRIMARY KEY CHECK (one = 1),
+  verb TEXT NOT NULL,
+  directory TEXT NOT NULL,
+  time INTEGER NOT NULL,
+  ending TEXT NOT NULL,
+  error_count INTEGER NOT NULL
+);
+CREATE TABLE load_error (id INTEGER PRIMARY KEY, message TEXT NOT NULL);
 INSERT INTO state VALUES (1, 1, 1, '');
 INSERT INTO domain VALUES (0, 'hostDom', 'permissive', 0, 0);
 INSERT INTO label VALUES (2, 'unlabeled'), (3, 'tardiskDefault');
@@ -95,7 +120,7 @@ constexpr StoreLayout kLayout = {
     .purpose = "host state",
     .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
     .applicationId = 0x5a6f7276,
-    .version = 1,
+    .version = 2,
     .schema = kSchema,
     .survivesPowerLoss = false,
 };
@@ -156,6 +181,10 @@ void HostState::Reset() {
   store.Run("DELETE FROM file_policy");
   store.Run("DELETE FROM world");
   store.Run("DELETE FROM inode_origin");
+  store.Run("DELETE FROM rule_origin");
+  store.Run("DELETE FROM label_origin");
+  store.Run("DELETE FROM load_record");
+  store.Run("DELETE FROM load_error");
   store.Run("INSERT INTO domain VALUES (0, 'hostDom', 'permissive', 0, 0)");
   store.Run("INSERT INTO label VALUES (2, 'unlabeled'), (3, 'tardiskDefault')");
   // The versions go on, so that every process notices.

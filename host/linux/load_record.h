@@ -1,0 +1,29 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+// What the state remembers of the latest load in this boot. Everything throws
+// Braxo::Lib::BraxoException when the state cannot be used.
+namespace LinuxHost {
+
+struct LoadRecord {
+  std::string verb;
+  std::string directory;
+  std::int64_t time = 0;  // seconds since 1970
+  std::string ending;     // "done", "failed" or "stopped"
+  std::uint64_t errorCount = 0;
+  std::vector<std::string> errors;  // the first kKeptErrors of them
+};
+
+constexpr std::size_t kKeptErrors = 100;
+
+// Takes the place of the earlier record.
+__attribute__((visibility("default"))) void RecordLoad(const LoadRecord& record);
+
+// Empty when nothing was recorded since the boot.
+__attribute__((visibility("default"))) std::optional<LoadRecord> LatestLoad();
+
+}  // namespace LinuxHost

@@ -1,0 +1,84 @@
+#include "host/linux/load_record.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "host/linux/host_state.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::HostState;
+using LinuxHost::LatestLoad;
+using LinuxHost::LoadRecord;
+using LinuxHost::RecordLoad;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+class LoadRecordTest : public ::testing::Test {
+ protected:
+  StateDirectory directory;
+};
+
+LoadRecord FailedLoad() {
+  LoadRecord record;
+  record.verb = "load";
+  record.directory = "/etc/zorvan/secpolicy";
+  record.time = 1'700'000'000;
+  record.ending = "failed";
+  record.errorCount = 2;
+  record.errors = {"second", "first"};
+  return record;
+}
+
+TEST_F(LoadRecordTest, IsEmptyBeforeTheFirstLoad) { EXPECT_FALSE(LatestLoad().has_value()); }
+
+TEST_F(LoadRecordTest, KeepsWhatItIsGiven) {
+  RecordLoad(FailedLoad());
+  const auto record = LatestLoad();
+  ASSERT_TRUE(record.has_value());
+  EXPECT_EQ(record->verb, "load");
+  EXPECT_EQ(record->directory, "/etc/zorvan/secpolicy");
+  EXPECT_EQ(record->time, 1'700'000'000);
+  EXPECT_EQ(record->ending, "failed");
+  EXPECT_EQ(record->errorCount, 2U);
+  EXPECT_THAT(record->errors, ElementsAre("second", "first"));
+}
+
+TEST_F(LoadRecordTest, IsOfTheLatestLoadAlone) {
+  RecordLoad(FailedLoad());
+  LoadRecord good;
+  good.verb = "load-early";
+  good.ending = "done";
+  RecordLoad(good);
+  const auto record = LatestLoad();
+  ASSERT_TRUE(record.has_value());
+  EXPECT_EQ(record->verb, "load-early");
+  EXPECT_EQ(record->errorCount, 0U);
+  EXPECT_THAT(record->errors, IsEmpty());
+}
+
+TEST_F(LoadRecordTest, KeepsTheFirstOfVeryManyErrors) {
+  LoadRecord many = FailedLoad();
+  many.errorCount = 1000;
+  many.errors.assign(1000, "again");
+  many.errors.front() = "first";
+  RecordLoad(many);
+  const auto record = LatestLoad();
+  ASSERT_TRUE(record.has_value());
+  EXPECT_EQ(record->errorCount, 1000U);
+  ASSERT_EQ(record->errors.size(), LinuxHost::kKeptErrors);
+  EXPECT_EQ(record->errors.front(), "first");
+}
+
+TEST_F(LoadRecordTest, GoesWithABoot) {
+  RecordLoad(FailedLoad());
+  HostState::Current().Reset();
+  EXPECT_FALSE(LatestLoad().has_value());
+  RecordLoad(LoadRecord{});
+  EXPECT_THAT(LatestLoad()->errors, IsEmpty());
+}
+
+}  // namespace
+}  // namespace LinuxHostTest
