@@ -33,10 +33,7 @@ void ErrorWatch::Note(char letter) {
     line += letter;
     return;
   }
-  if (line.starts_with(kErrorPrefix)) {
-    ++count;
-    lastMessage = line.substr(kErrorPrefix.size());
-  }
+  if (line.starts_with(kErrorPrefix)) messages.push_back(line.substr(kErrorPrefix.size()));
   line.clear();
 }
 

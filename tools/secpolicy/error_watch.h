@@ -4,6 +4,7 @@
 #include <ostream>
 #include <streambuf>
 #include <string>
+#include <vector>
 
 namespace SecPolicyCli {
 
@@ -19,10 +20,10 @@ class ErrorWatch : public std::streambuf {
   ~ErrorWatch() override;
 
   // The number of error lines so far.
-  std::size_t Count() const { return count; }
+  std::size_t Count() const { return messages.size(); }
 
-  // The message of the latest error; empty before the first.
-  const std::string& LastMessage() const { return lastMessage; }
+  // The messages of the errors so far, without what marks them as errors.
+  const std::vector<std::string>& Messages() const { return messages; }
 
  protected:
   int_type overflow(int_type letter) override;
@@ -35,8 +36,7 @@ class ErrorWatch : public std::streambuf {
   std::ostream& stream;
   std::streambuf* target;
   std::string line;
-  std::string lastMessage;
-  std::size_t count = 0;
+  std::vector<std::string> messages;
 };
 
 }  // namespace SecPolicyCli

@@ -9,6 +9,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "error_watch.h"
+#include "load_record.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -40,14 +41,22 @@ void WriteSummary(const std::string& verb, const std::string& text) {
   std::cerr << "secpolicy: " << verb << ": " << text << std::endl;
 }
 
+// A call without a policy directory is no load.
+void Record(const RunningCall& call, const std::string& ending,
+            const std::vector<std::string>& errors) {
+  if (!call.policyDir.empty()) RecordLoad(call.verb, call.policyDir, ending, errors);
+}
+
 // The library stops a load by rethrowing while no exception is being handled. Whatever else ends
 // the process keeps its usual way, core dump included.
 void OnTerminate() {
   const RunningCall& running = *runningCall;
-  if (!std::current_exception()) {
+  const std::vector<std::string>& messages = running.errors->Messages();
+  if (!std::current_exception() && !messages.empty()) {
     for (const WellKnownDomain& domain : kWellKnownDomains) {
-      if (running.errors->LastMessage() != domain.message) continue;
+      if (messages.back() != domain.message) continue;
       std::cout.flush();
+      Record(running, "stopped", messages);
       WriteSummary(running.verb,
                    Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
                                        ", so the load ended before tardisks and file labels. Put a "
@@ -97,9 +106,12 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   }
   std::cout.flush();
   if (failure.empty() && errors.Count() == 0) {
+    Record(running, "done", {});
     WriteSummary(verb, "done");
     return kWell;
   }
+  Record(running, "failed",
+         errors.Count() > 0 ? errors.Messages() : std::vector<std::string>{failure});
   std::string summary = failure.empty() ? "failed" : failure;
   if (errors.Count() > 0) summary += " (" + ErrorsAbove(errors.Count()) + ")";
   const std::string next = advice();

@@ -1,0 +1,14 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace SecPolicyCli {
+
+// Keeps in the host's state how a load ended, for `status`. `ending` is "done", "failed" or
+// "stopped"; `errors` are the messages of the load. That it cannot be kept is said on standard
+// error, unless the load did not end well either.
+void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
+                const std::vector<std::string>& errors);
+
+}  // namespace SecPolicyCli
