@@ -11,6 +11,7 @@
 #include "descriptor.h"
 #include "host_error.h"
 #include "host_state.h"
+#include "label_rehearsal.h"
 #include "zorvan/kernel.h"
 
 namespace LinuxHost {
@@ -73,12 +74,18 @@ namespace Zorvan::Kernel {
 
 int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
   const char* realName = LinuxHost::RealName(name);
-  return realName == nullptr ? -1 : setxattr(path, realName, value, size, flags);
+  if (realName == nullptr) return -1;
+  if (LinuxHost::IsRehearsing()) {
+    return LinuxHost::RehearseSetting(path, realName, value, size, flags);
+  }
+  return setxattr(path, realName, value, size, flags);
 }
 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
   const char* realName = LinuxHost::RealName(name);
-  return realName == nullptr ? -1 : getxattr(path, realName, value, size);
+  if (realName == nullptr) return -1;
+  if (LinuxHost::IsRehearsing()) return LinuxHost::ReadRehearsed(path, realName, value, size);
+  return getxattr(path, realName, value, size);
 }
 
 }  // namespace Zorvan::Kernel

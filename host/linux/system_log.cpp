@@ -28,6 +28,7 @@ constexpr char kInformationTag[] = "[INFO]";
 constexpr std::size_t kMaxRecordText = 900;
 
 bool informationShown = false;
+bool dropped = false;
 
 // Never waits: a daemon with a full queue does not take messages.
 bool AcceptsConnection(const char* path, int type) {
@@ -118,6 +119,8 @@ void WriteToSyslog(const std::string& message, const std::string& tag) {
 
 void ShowInformation() { informationShown = true; }
 
+void DropLog() { dropped = true; }
+
 void LogInformation(const std::string& message) {
   if (TeskCtl::System::SyslogIsRunning()) return WriteToSyslog(message, kInformationTag);
   TeskCtl::System::WriteToKlog(message, kInformationTag);
@@ -127,9 +130,12 @@ void LogInformation(const std::string& message) {
 
 namespace TeskCtl::System {
 
-bool SyslogIsRunning() { return !LinuxHost::informationShown && LinuxHost::SyslogDaemonListens(); }
+bool SyslogIsRunning() {
+  return !LinuxHost::dropped && !LinuxHost::informationShown && LinuxHost::SyslogDaemonListens();
+}
 
 void WriteToKlog(const std::string& message, const std::string& tag) {
+  if (LinuxHost::dropped) return;
   if (LinuxHost::informationShown && tag == LinuxHost::kInformationTag) {
     std::cerr << message << std::endl;
   }

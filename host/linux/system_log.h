@@ -11,6 +11,10 @@ namespace LinuxHost {
 // would have given it, else to the kernel log. So each line still reaches the log it belongs to.
 __attribute__((visibility("default"))) void ShowInformation();
 
+// From now on drops every line, those that are shown included: what a process only rehearses has
+// not happened.
+__attribute__((visibility("default"))) void DropLog();
+
 // Logs one information line of the host's own, by the same road as those of the library.
 void LogInformation(const std::string& message);
 

@@ -69,6 +69,20 @@ TEST_F(SystemLog, WritesLinesWithTheirTagToFile) {
   EXPECT_EQ(KernelLog(), "[INFO] first\n[ERR] second\n");
 }
 
+TEST_F(SystemLog, DropsEveryLineWhenToldTo) {
+  ASSERT_EQ(scratch.RunInside([] {
+    WriteToKlog("first", "[INFO]");
+    const LogDaemon daemon(SOCK_DGRAM);
+    LinuxHost::DropLog();
+    LinuxHost::ShowInformation();
+    WriteToKlog("second", "[ERR]");
+    LinuxHost::LogInformation("third");
+    return std::string(SyslogIsRunning() ? "running, " : "not running, ") + daemon.Next();
+  }),
+            "not running, (nothing)");
+  EXPECT_EQ(KernelLog(), "[INFO] first\n");
+}
+
 TEST_F(SystemLog, KeepsTheFileToItsOwner) {
   std::filesystem::remove(scratch.Root() / "run");
   scratch.RunInside([] {

@@ -1,0 +1,35 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+// What giving labels would do, without doing it.
+namespace LinuxHost {
+
+// A file whose label would change.
+struct LabelChange {
+  std::string path;          // the one by which the file was reached first
+  std::uint32_t before = 0;  // 0: what the file carries is no identifier
+  std::uint32_t after = 0;
+};
+
+// From now on this process only notes the labels that it gives to files, and reads them back as if
+// they had been given; the files stay as they are. A label that a file could not be given fails as
+// it would.
+__attribute__((visibility("default"))) void StartLabelRehearsal();
+
+// The files whose label would be another one by now, in ascending order of their paths.
+__attribute__((visibility("default"))) std::vector<LabelChange> RehearsedLabels();
+
+// For the attribute itself: whether labels are only noted, and what then stands in for setxattr(2)
+// and getxattr(2) with the attribute `name`.
+bool IsRehearsing();
+int RehearseSetting(const char* path, const char* name, const void* value, std::size_t size,
+                    int flags);
+ssize_t ReadRehearsed(const char* path, const char* name, void* value, std::size_t size);
+
+}  // namespace LinuxHost
