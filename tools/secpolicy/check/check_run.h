@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "diagnostic.h"
-#include "scratch_state.h"
+#include "scratch/scratch_state.h"
 #include "secpolicy/secpolicy.h"
 #include "source_file.h"
 

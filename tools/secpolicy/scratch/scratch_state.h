@@ -2,18 +2,18 @@
 
 #include <string>
 
+#include "scratch_directory.h"
+#include "used_state.h"
+
 namespace SecPolicyCli {
 
-// A private copy of the host's state, which takes the place of the installed one for the rest of
-// this process. Goes away with this object; the installed state is never written.
+// A private copy of the host's state, which takes the place of the installed one as long as this
+// object lives. The installed state is never written.
 class ScratchState {
  public:
   // Copies the installed state; with `fresh`, and where there is none, starts from the state after
   // a boot. Throws std::system_error when there is no place for it.
   explicit ScratchState(bool fresh);
-  ScratchState(const ScratchState&) = delete;
-  ScratchState& operator=(const ScratchState&) = delete;
-  ~ScratchState();
 
   // False when the state is a new one.
   bool IsCopy() const { return copied; }
@@ -22,12 +22,13 @@ class ScratchState {
   const std::string& CopyFailure() const { return copyFailure; }
 
   // A file beside the state, for what has to be read from a file.
-  std::string ScratchFile() const { return directory + "/policy"; }
+  std::string ScratchFile() const { return directory.File("policy"); }
 
  private:
-  std::string directory;
-  bool copied = false;
+  ScratchDirectory directory;
   std::string copyFailure;
+  bool copied;
+  UsedState used;
 };
 
 }  // namespace SecPolicyCli

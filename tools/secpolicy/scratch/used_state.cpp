@@ -1,0 +1,49 @@
+#include "used_state.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <system_error>
+
+#include "host/linux/store_copy.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
+constexpr char kInstalledState[] = "/run/secpolicy/host.db";
+
+}  // namespace
+
+std::string StatePath() {
+  const char* const path = secure_getenv(kStateVariable);
+  return path != nullptr && *path != '\0' ? path : kInstalledState;
+}
+
+std::string CopyState(const std::string& from, const std::string& to) {
+  std::string failure = LinuxHost::CopyDatabase(from, to);
+  std::error_code ignored;
+  if (!failure.empty()) {
+    std::filesystem::remove(to, ignored);
+    return failure;
+  }
+  // The host trusts only what nobody else can write.
+  std::filesystem::permissions(to, std::filesystem::perms(0600));
+  return "";
+}
+
+std::string CopyUsedState(const std::string& to) {
+  const std::string used = StatePath();
+  if (access(used.c_str(), R_OK) == 0) return CopyState(used, to);
+  return errno == ENOENT ? "" : std::generic_category().message(errno);
+}
+
+UsedState::UsedState(const std::string& path) : before(StatePath()) {
+  setenv(kStateVariable, path.c_str(), 1);
+}
+
+UsedState::~UsedState() { setenv(kStateVariable, before.c_str(), 1); }
+
+}  // namespace SecPolicyCli

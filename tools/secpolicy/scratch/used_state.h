@@ -1,0 +1,31 @@
+#pragma once
+
+#include <string>
+
+namespace SecPolicyCli {
+
+// The path of the host's state that this process works with; there may be none yet.
+std::string StatePath();
+
+// Copies the state at `from`, which is only read, to the new file `to`, such that the host works
+// with the copy. Returns why it could not, and leaves no file then; empty when it could.
+std::string CopyState(const std::string& from, const std::string& to);
+
+// The same for the state that this process works with. Where there is none, nothing is copied, and
+// that is no failure.
+std::string CopyUsedState(const std::string& to);
+
+// Makes this process work with the state at `path`, as long as this object lives. The host makes a
+// new one where there is none.
+class UsedState {
+ public:
+  explicit UsedState(const std::string& path);
+  UsedState(const UsedState&) = delete;
+  UsedState& operator=(const UsedState&) = delete;
+  ~UsedState();
+
+ private:
+  std::string before;
+};
+
+}  // namespace SecPolicyCli
