@@ -67,3 +67,20 @@ load helper
   says "Error: Failed to fetch domainID for global VM Domain"
   ends_with "secpolicy: boot: stopped: there is no domain globalVMDom, so the load ended before tardisks and file labels. Put a policy file named globalVMDom into /etc/zorvan/secpolicy/domains and run it again."
 }
+
+@test "boot of a root without an early policy ends well and tells it under -v" {
+  rm -r "$policy/early"
+  secpolicy -v boot
+  exits 0
+  says "No early policy: there is no directory /etc/zorvan/secpolicy/early"
+  ends_with "secpolicy: boot: done"
+  [[ -n $(domain_id sshDom) ]]
+}
+
+@test "boot of a root whose early policy has no domains fails" {
+  rm -r "$policy/early/domains"
+  secpolicy boot
+  exits 1
+  [[ $stderr == "Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
+secpolicy: boot: failed (1 error above)" ]]
+}

@@ -10,9 +10,18 @@
 namespace SecPolicyCli {
 namespace {
 
+// A root whose services all start after the full load needs no early policy.
+void LoadEarly() {
+  if (File_IsDirectory(SecPolicy::kEarlyPolicyRoot)) {
+    return SecPolicy::LoadPolicyEarly(SecPolicy::kEarlyPolicyRoot);
+  }
+  SecPolicy::SecpolicyInfo(std::string("No early policy: there is no directory ") +
+                           SecPolicy::kEarlyPolicyRoot);
+}
+
 void BootAndLoad() {
   LinuxHost::Boot();
-  SecPolicy::LoadPolicyEarly(SecPolicy::kEarlyPolicyRoot);
+  LoadEarly();
   SecPolicy::LoadPolicy(SecPolicy::kPolicyRoot);
 }
 
@@ -33,6 +42,7 @@ const Verb kBoot = {
     "boot", "Unpack the tardisks, label every file, and install the policy",
     "Starts from an empty state: unpacks every archive of /tardisks/ into the root, in byte order\n"
     "of name, gives every file the label 'unlabeled', and then does what load-early and load do.\n"
+    "A root without /etc/zorvan/secpolicy/early is booted without an early policy.\n"
     "It writes into the root that it is given, so try it on a root of your own first.\n"
     "\n"
     "Example:\n"

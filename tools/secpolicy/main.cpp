@@ -24,6 +24,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r boot                        unpack the tardisks and install the "
     "policy\n"
     "  secpolicy --root ./r display                     look at what is installed now\n"
+    "  secpolicy --root ./r check                       find every problem of the policy files\n"
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"
     "  secpolicy --root ./r load-early                  install only what early boot needs\n"
     "  secpolicy --root ./r settings enforcement appDom permissive\n"

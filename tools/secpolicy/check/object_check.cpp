@@ -19,7 +19,8 @@ void ReadObjects(CheckRun& run, const SourceFile& file, SecPolicy::ObjectPolicy&
                                          "write each name on a line of its own"));
       });
   for (std::size_t i = 0; i < lines.size(); ++i) {
-    const auto [object, isNew] = run.objects.try_emplace(policy.names[first + i], &file, lines[i]);
+    const auto [object, isNew] =
+        run.objects.emplace(policy.names[first + i], Place{&file, lines[i]});
     if (isNew) continue;
     const auto& [declaredIn, declaredAt] = object->second;
     run.diagnostics.Add(file.AtWord(Codes::kDuplicateObject, lines[i], 0,

@@ -66,7 +66,7 @@ std::string Suggest(const std::string& word, const std::vector<std::string>& can
 // A short table is told as a whole when no word of it is near.
 std::string SuggestOrList(const std::string& word, const std::vector<std::string>& candidates) {
   constexpr std::size_t kShortTable = 10;
-  const std::string suggestion = Suggest(word, candidates);
+  std::string suggestion = Suggest(word, candidates);
   if (!suggestion.empty() || candidates.empty() || candidates.size() > kShortTable) {
     return suggestion;
   }
