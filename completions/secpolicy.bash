@@ -25,12 +25,16 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
+  elif [[ $verb == display && $previous == --format ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
       installed-only long-line missing-path no-tardisk nul-byte second-policy skipped-entry star-in-path
       tab two-labels unreachable-domain unused-object' -- "$current")
   elif [[ $verb == check && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
+  elif [[ $verb == display && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
   elif [[ -z $verb ]]; then

@@ -70,3 +70,62 @@ load helper
   [[ $stderr == *"Error: Error in reading tardisk label: (/tardisks/late.tgz): "* ]]
   ends_with "secpolicy: display: failed (1 error above)"
 }
+
+@test "--format json has the same domains, rules, objects and tardisks" {
+  boot
+  local text
+  text=$("$SECPOLICY" --root "$root" display 2>/dev/null)
+  secpolicy display --format json
+  exits 0
+  [[ $stderr == "secpolicy: display: done" ]]
+  fits_schema display
+  [[ $(jq -r .schema <<<"$output") == secpolicy.display/1 ]]
+  diff <(jq -r '.domains[] | "Domain Name: \(.name) Domain ID :\(.id) Enforcement Level: \(.level)"' <<<"$output") \
+    <(grep '^Domain Name: ' <<<"$text")
+  diff <(jq -r '.domains[] | "State: \(.state) RefCount: \(.references) WorldRefCount: \(.worldReferences) defaultDom: \(.defaultRules)"' <<<"$output") \
+    <(grep '^State: ' <<<"$text")
+  diff <(jq -r '.domains[].rules[].text' <<<"$output") <(grep '^-[a-z] ' <<<"$text")
+  diff <(jq -r '.objects[] | "\(.name) (\(.id))"' <<<"$output") <(grep -E '^[A-Za-z]+ \([0-9]+\)$' <<<"$text")
+  diff <(jq -r '.tardisks[] | "\(.path) (\(.label))"' <<<"$output") <(grep '^/tardisks/' <<<"$text" | sort)
+}
+
+@test "--format json takes rules apart" {
+  boot
+  secpolicy display --format json "$(domain_id appDom)"
+  exits 0
+  fits_schema display
+  [[ $(jq -c '.domains | map(.name)' <<<"$output") == '["appDom"]' ]]
+  jq -e '.domains[0].rules | map({keyword, words, grant}) |
+    index({keyword: "-p", words: ["connect_port", "1024", "65535"], grant: true}) != null and
+    index({keyword: "-s", words: ["mount"], grant: false}) != null' <<<"$output"
+  secpolicy display --format json "$(domain_id sshDom)"
+  jq -e '.domains[0].rules | any(.keyword == "-r" and .words == ["/etc/ssh", "r"] and (has("grant") | not))' <<<"$output"
+}
+
+@test "--format json keeps a path of any letters as one word" {
+  printf -- '-r /odd\tpath\n-r /none\n' >>"$policy/domains/appDom"
+  boot
+  secpolicy display --format json
+  exits 0
+  jq -e '[.domains[].rules[] | select(.keyword == "-r") | .words] |
+    any(. == ["/odd\tpath", ""]) and any(. == ["/none", ""])' <<<"$output"
+}
+
+@test "--format json of a tardisk whose label cannot be read" {
+  boot
+  echo new >"$root/tardisks/late.tgz"
+  secpolicy display --format json
+  exits 0
+  fits_schema display
+  [[ $(jq -c '.tardisks[] | select(.path == "/tardisks/late.tgz") | .label' <<<"$output") == null ]]
+}
+
+@test "--format json where nothing was booted says what to do, and an unknown format is wrong usage" {
+  rm -r "$root/tardisks"
+  secpolicy display --format json
+  exits 1
+  [[ -z $output ]]
+  ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' first."
+  secpolicy display --format xml
+  exits 2
+}

@@ -52,3 +52,13 @@ domain_id() {
   "$SECPOLICY" --root "$root" display 2>/dev/null |
     sed -n "s/^Domain Name: $1 Domain ID :\([0-9]*\) .*/\1/p"
 }
+
+# fits_schema NAME: the latest command wrote a JSON document that docs/schema/NAME.json describes.
+fits_schema() {
+  python3 -c '
+import json, sys, jsonschema
+schema = json.load(open(sys.argv[1]))
+jsonschema.Draft202012Validator.check_schema(schema)
+jsonschema.Draft202012Validator(schema).validate(json.load(sys.stdin))' \
+    "$SOURCE/docs/schema/$1.json" <<<"$output"
+}

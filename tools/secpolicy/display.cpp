@@ -1,6 +1,10 @@
 #include <CLI/App.hpp>
 #include <charconv>
+#include <iostream>
+#include <list>
 
+#include "installed/installed_json.h"
+#include "installed/installed_policy.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "root.h"
@@ -28,13 +32,38 @@ std::string Advise() {
          "first.";
 }
 
+// Throws the library's own failure where there is no directory of tardisks: nothing was booted.
+void RequireTardisks() {
+  std::list<std::string> tardisks;
+  if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) SecPolicy::GetAllTardisks(tardisks);
+}
+
+void WriteJson(const std::string& domainId) {
+  RequireTardisks();
+  SecPolicy::TeskAccessInterfaceImpl access;
+  InstalledPolicy policy = ReadInstalledPolicy(access);
+  if (!domainId.empty()) {
+    std::erase_if(policy.domains,
+                  [&](const InstalledDomain& domain) { return domain.id != std::stoul(domainId); });
+  }
+  nlohmann::ordered_json json = {{"schema", "secpolicy.display/1"}};
+  json.update(ToJson(policy));
+  std::cout << DumpJson(json);
+}
+
 Action Define(CLI::App& app) {
   const auto domain = std::make_shared<std::string>();
+  const auto format = std::make_shared<std::string>("text");
   app.add_option("DOMAIN_ID", *domain, "The number of one domain; all domains without it")
       ->check(CLI::Validator(CheckDomainId, ""));
-  return [domain] {
+  app.add_option("--format", *format, "How to write it: text or json")
+      ->check(CLI::IsMember({"text", "json"}))
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  return [domain, format] {
+    const auto show = *format == "json" ? WriteJson : SecPolicy::DisplayPolicy;
     return CallLibrary(
-        "display", "", [&] { SecPolicy::DisplayPolicy(*domain); }, Advise);
+        "display", "", [&] { show(*domain); }, Advise);
   };
 }
 
@@ -49,7 +78,8 @@ const Verb kDisplay = {
     "Examples:\n"
     "  secpolicy display                    everything\n"
     "  secpolicy display 3                  only the domain with the identifier 3\n"
-    "  secpolicy display | grep '^-c'       all capability rules",
+    "  secpolicy display | grep '^-c'       all capability rules\n"
+    "  secpolicy display --format json | jq '.objects | length'",
     Define};
 
 }  // namespace SecPolicyCli
