@@ -40,7 +40,7 @@ const char* Attribute() {
 
 }  // namespace
 
-bool LongRun() { return std::getenv("SECPOLICY_HOSTILE_LONG") != nullptr; }
+bool LongRun() { return std::getenv("SECPOLICY_LONG_TESTS") != nullptr; }
 
 void GiveFirstLabel(const std::string& path) {
   Require(lsetxattr(path.c_str(), Attribute(), &kFirstLabelId, sizeof kFirstLabelId, 0) == 0, path);
