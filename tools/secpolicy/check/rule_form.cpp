@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "suggestion.h"
+#include "text/suggestion.h"
 
 namespace SecPolicyCli {
 namespace {

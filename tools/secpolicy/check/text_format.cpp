@@ -3,6 +3,7 @@
 #include <string_view>
 
 #include "report_format.h"
+#include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -10,33 +11,6 @@ namespace {
 // Of a long line, what is shown before and in all.
 constexpr std::size_t kShownBefore = 60;
 constexpr std::size_t kShownWidth = 100;
-
-bool IsControl(char byte) { return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7f; }
-
-// A file may hold anything: control characters are shown as ^I and the like, so that none reaches
-// the terminal.
-void AppendVisible(std::string& text, std::string_view character) {
-  if (!IsControl(character.front())) {
-    text += character;
-    return;
-  }
-  text += '^';
-  text += static_cast<char>(character.front() ^ 0x40);
-}
-
-std::string_view TakeCharacter(std::string_view& text) {
-  std::size_t size = 1;
-  while (size < text.size() && (static_cast<unsigned char>(text[size]) & 0xc0) == 0x80) ++size;
-  const std::string_view character = text.substr(0, size);
-  text.remove_prefix(size);
-  return character;
-}
-
-std::string Visible(std::string_view text) {
-  std::string visible;
-  while (!text.empty()) AppendVisible(visible, TakeCharacter(text));
-  return visible;
-}
 
 // The line, and below it a mark under the characters that the problem is about.
 void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
