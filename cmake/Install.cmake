@@ -9,9 +9,12 @@ set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, b
 # Libraries and headers. A caller's include paths begin at the public header, and at the contract
 # headers that it includes.
 target_include_directories(secpolicy INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
-set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN")
+set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN" BUILD_WITH_INSTALL_RPATH ON)
 install(TARGETS secpolicy secpolicyhost host_contract EXPORT secpolicyTargets
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}")
+# Never linked to, so without the name for linkers.
+install(TARGETS secpolicyhost_archive
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" NAMELINK_SKIP)
 install(FILES secpolicy/secpolicy.h secpolicy/export.h
   DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
 install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")

@@ -48,6 +48,18 @@ EOF
   shows "/tardisks/monitor.tgz (monitorImage)"
 }
 
+@test "a boot names the library that is missing, and nothing else misses it" {
+  boot
+  cp -r "$PREFIX" "$BATS_TEST_TMPDIR/prefix"
+  find "$BATS_TEST_TMPDIR/prefix" -name 'libsecpolicyhost-archive.so*' -delete
+  SECPOLICY=$BATS_TEST_TMPDIR/prefix/bin/secpolicy
+  secpolicy boot
+  exits 1
+  [[ $stderr == "secpolicy: Unable to load what unpacks tardisks: libsecpolicyhost-archive.so.1: "*". It belongs beside libsecpolicyhost.so.1: install that again" ]]
+  secpolicy load
+  exits 0
+}
+
 @test "manual pages, completions and units are installed" {
   [[ -f $PREFIX/share/man/man5/secpolicy.5 && -f $PREFIX/share/man/man8/secpolicy.8 ]]
   [[ -f $PREFIX/share/bash-completion/completions/secpolicy ]]

@@ -11,3 +11,8 @@ add_test(NAME package.exported_symbols
 # What it needs at run time: the host, the C++ runtime and the C library.
 add_test(NAME package.needed_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-needed-libraries" "$<TARGET_FILE:secpolicy>")
+
+# What a boot alone needs is loaded by a boot alone.
+add_test(NAME package.late_libraries
+  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-late-libraries"
+    "$<TARGET_FILE:secpolicy_cli>" "$<TARGET_FILE:secpolicyhost_archive>")

@@ -1,5 +1,6 @@
 #include "host/linux/boot.h"
 
+#include "host/linux/archive_library.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "root.h"
@@ -48,6 +49,6 @@ const Verb kBoot = {
     "Example:\n"
     "  mkdir -p r/tardisks && cp base.tgz r/tardisks/\n"
     "  secpolicy --root ./r boot",
-    Define};
+    Define, LinuxHost::LoadArchiveLibrary};
 
 }  // namespace SecPolicyCli

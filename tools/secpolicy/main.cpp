@@ -52,6 +52,7 @@ int Run(int argc, char** argv) {
   std::string root;
   bool verbose = false;
   Action action;
+  void (*prepare)() = nullptr;
 
   app.require_subcommand(1);
   app.fallthrough();
@@ -65,8 +66,10 @@ int Run(int argc, char** argv) {
   for (const Verb* verb : kVerbs) {
     CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
     subcommand->footer(verb->help);
-    subcommand->parse_complete_callback(
-        [&action, chosen = verb->define(*subcommand)] { action = chosen; });
+    subcommand->parse_complete_callback([&, verb, chosen = verb->define(*subcommand)] {
+      action = chosen;
+      prepare = verb->prepare;
+    });
   }
 
   try {
@@ -75,6 +78,7 @@ int Run(int argc, char** argv) {
     return app.exit(error) == 0 ? kWell : kUsage;
   }
   try {
+    if (prepare != nullptr) prepare();
     if (rootOption->count() > 0) EnterRoot(root);
     if (verbose) LinuxHost::ShowInformation();
     return action();

@@ -26,6 +26,9 @@ struct Verb {
 
   // Adds the verb's arguments to `app` and returns its action, which keeps their values.
   Action (*define)(CLI::App& app);
+
+  // What has to be done before the root is entered, if anything; may throw as an action may.
+  void (*prepare)() = nullptr;
 };
 
 extern const Verb kBoot;

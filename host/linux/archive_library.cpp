@@ -1,0 +1,52 @@
+#include "archive_library.h"
+
+#include <dlfcn.h>
+#include <iconv.h>
+
+#include <cerrno>
+#include <string>
+
+#include "braxo/misc/strcat.h"
+#include "host_error.h"
+#include "tardisk_archive.h"
+
+namespace LinuxHost {
+namespace {
+
+using Unpack = decltype(&UnpackArchive);
+
+constexpr char kLibrary[] = "libsecpolicyhost-archive.so.1";
+constexpr char kEntryPoint[] = "SecPolicyHostUnpackArchive";
+
+// libarchive converts names with iconv, whose configuration says which libraries convert what. It
+// is read once, at first use: here, and not below a root that belongs to somebody else.
+void ReadConversions() {
+  const iconv_t conversion = iconv_open("ASCII", "UTF-8");
+  if (conversion != reinterpret_cast<iconv_t>(-1)) iconv_close(conversion);
+}
+
+// Looked for as what this library is linked to is: beside it first of all.
+Unpack Load() {
+  void* const library = dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
+  void* const entryPoint = library == nullptr ? nullptr : dlsym(library, kEntryPoint);
+  if (entryPoint != nullptr) return reinterpret_cast<Unpack>(entryPoint);
+  throw HostError(ELIBACC, Braxo::Misc::StrCat("Unable to load what unpacks tardisks: ", dlerror(),
+                                               ". It belongs beside libsecpolicyhost.so.1: "
+                                               "install that again"));
+}
+
+Unpack Loaded() {
+  static const Unpack unpack = Load();
+  return unpack;
+}
+
+}  // namespace
+
+void LoadArchiveLibrary() {
+  Loaded();
+  ReadConversions();
+}
+
+void UnpackArchive(const std::string& image, const Arrival& arrived) { Loaded()(image, arrived); }
+
+}  // namespace LinuxHost
