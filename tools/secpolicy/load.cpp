@@ -1,4 +1,7 @@
+#include <CLI/App.hpp>
+
 #include "policy_dir.h"
+#include "rehearsal/planned_load.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "verb.h"
@@ -6,9 +9,31 @@
 namespace SecPolicyCli {
 namespace {
 
+struct Options {
+  bool plan = false;
+  PlanOptions planOptions;
+};
+
+ExitCode Load(const std::string& dir, const Options& options) {
+  if (options.plan) return PlanLoad(dir, options.planOptions);
+  return LoadFrom("load", dir, SecPolicy::LoadPolicy);
+}
+
 Action Define(CLI::App& app) {
   const auto dir = AddPolicyDir(app, SecPolicy::kPolicyRoot);
-  return [dir] { return LoadFrom("load", *dir, SecPolicy::LoadPolicy); };
+  const auto options = std::make_shared<Options>();
+  CLI::Option* const plan = app.add_flag(
+      "--plan", options->plan, "Only show what the load would change; -v shows every file");
+  app.add_option("--format", options->planOptions.format, "How to write the plan: text or json")
+      ->check(CLI::IsMember({"text", "json"}))
+      ->needs(plan)
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  const CLI::Option* const verbose = app.get_parent()->get_option("--verbose");
+  return [=] {
+    options->planOptions.showAll = verbose->count() > 0;
+    return Load(*dir, *options);
+  };
 }
 
 }  // namespace
@@ -17,12 +42,15 @@ const Verb kLoad = {
     "load", "Install the full policy",
     "Installs objects, domains, partner domains, tardisk policy and file labels, in this order.\n"
     "A part that fails is reported and the next one is loaded. Tardisk policy and partner domains\n"
-    "are always those of /etc/zorvan/secpolicy.\n"
+    "are always those of /etc/zorvan/secpolicy. What is installed and in no file any more stays.\n"
+    "With --plan the load is rehearsed on a copy of what is installed: it shows what it would\n"
+    "change and which problems it would have, and changes nothing. Exit status as of the load.\n"
     "\n"
     "Examples:\n"
     "  secpolicy load                       install the host's policy again after an edit\n"
     "  secpolicy --root /srv/r load -v      the same below /srv/r, and show the progress\n"
-    "  secpolicy load /root/new-policy      objects, domains and labels of another directory",
+    "  secpolicy load /root/new-policy      objects, domains and labels of another directory\n"
+    "  secpolicy load --plan                what would change? -v shows every file",
     Define};
 
 }  // namespace SecPolicyCli

@@ -14,13 +14,16 @@ std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string
   return dir;
 }
 
+std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir) {
+  if (File_IsDirectory(dir.c_str())) return std::nullopt;
+  return Refuse(verb, "there is no directory " + dir +
+                          " below this root, so nothing was changed. Name the directory of the "
+                          "policy, or the root that it is in (--root DIR).");
+}
+
 ExitCode LoadFrom(const std::string& verb, const std::string& dir,
                   void (*load)(const std::string& dir)) {
-  if (!File_IsDirectory(dir.c_str())) {
-    return Refuse(verb, "there is no directory " + dir +
-                            " below this root, so nothing was changed. Name the directory of the "
-                            "policy, or the root that it is in (--root DIR).");
-  }
+  if (const auto refusal = RefuseMissingDir(verb, dir)) return *refusal;
   return CallLibrary(
       verb, dir, [&] { load(dir); }, AdviseOnPrivilege);
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "verb.h"
@@ -9,6 +10,9 @@ namespace SecPolicyCli {
 
 // Adds the argument DIR, a policy directory, to `app`; its value is `preset` when it is not given.
 std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string& preset);
+
+// Refuses a policy directory that is not there; nothing for one that is.
+std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);
 
 // Loads the policy directory `dir` with `load` for the verb `verb`. A directory that is not there
 // is refused before anything is changed.

@@ -14,13 +14,17 @@ namespace {
 
 constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
 constexpr char kInstalledState[] = "/run/secpolicy/host.db";
+constexpr char kSettingsVariable[] = "SECPOLICY_HOST_CONFIG";
+constexpr char kSettings[] = "/var/lib/secpolicy/config.db";
+
+std::string PathIn(const char* variable, const char* otherwise) {
+  const char* const path = secure_getenv(variable);
+  return path != nullptr && *path != '\0' ? path : otherwise;
+}
 
 }  // namespace
 
-std::string StatePath() {
-  const char* const path = secure_getenv(kStateVariable);
-  return path != nullptr && *path != '\0' ? path : kInstalledState;
-}
+std::string StatePath() { return PathIn(kStateVariable, kInstalledState); }
 
 std::string CopyState(const std::string& from, const std::string& to) {
   std::string failure = LinuxHost::CopyDatabase(from, to);
@@ -45,5 +49,10 @@ UsedState::UsedState(const std::string& path) : before(StatePath()) {
 }
 
 UsedState::~UsedState() { setenv(kStateVariable, before.c_str(), 1); }
+
+void UseCopyOfSettings(const std::string& to) {
+  const std::string settings = PathIn(kSettingsVariable, kSettings);
+  if (CopyState(settings, to).empty()) setenv(kSettingsVariable, to.c_str(), 1);
+}
 
 }  // namespace SecPolicyCli

@@ -28,4 +28,9 @@ class UsedState {
   std::string before;
 };
 
+// Makes this process work with a copy of the wanted settings, which becomes the new file `to`, from
+// now on: even reading leaves traces beside the real ones. Settings that cannot be copied stay in
+// use, for the host to say what is wrong with them.
+void UseCopyOfSettings(const std::string& to);
+
 }  // namespace SecPolicyCli

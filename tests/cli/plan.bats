@@ -1,0 +1,191 @@
+# secpolicy load --plan
+
+load helper
+
+# Every test plans a load of a changed copy of the booted example.
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/new
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  cp -r "$root/etc/zorvan/secpolicy" "$policy"
+  rm -r "$policy/tardisks"
+}
+
+# Every file of the root, with when it was last changed in any way, labels included.
+fingerprint() { (cd "$root" && find . -type f -printf '%p %i %s %m %C@\n' | sort); }
+
+plan() { secpolicy load --plan /new "$@"; }
+
+@test "nothing would change after a boot" {
+  secpolicy load --plan
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: load: nothing would change" ]]
+}
+
+@test "every kind of change is shown, and what stays" {
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  sed -i '/listen/d; s/^\(-c cap_net_bind_service\) grant/\1 revoke/; s|^\(-r /etc/ssh *\)r$|\1rw|' \
+    "$policy/domains/sshDom"
+  echo "-r /srv rw" >"$policy/domains/newDom"
+  sed -i '/monitorSocket/d' "$policy/domains/monitorDom" "$policy/objects/monitor"
+  rm "$policy/early/domains/bootDom"
+  echo "newObject" >>"$policy/objects/base"
+  echo "/etc/services.conf newObject" >"$policy/fileLabels/zz"
+  plan
+  exits 0
+  diff - <(printf '%s\n' "$output") <<'END'
+domains to create (1):
+  newDom
+objects to add (1):
+  newObject
+objects to remove (1):
+  monitorSocket
+rules to add (2):
+  appDom: -c cap_net_raw grant
+  newDom: -r /srv rw
+rules to change (2):
+  sshDom: -c cap_net_bind_service grant -> revoke
+  sshDom: -r /etc/ssh r -> rw
+rules to remove with their object (1):
+  monitorDom: -u monitorSocket stream grant
+files to label anew (1):
+  /etc/services.conf: hostConfig -> newObject
+domains that stay installed although no file defines them (1):
+  bootDom
+rules that stay installed although no file has them (2):
+  hostDom: -d hostProgram bootDom exec grant
+  sshDom: -s listen grant
+END
+  [[ $stderr == "secpolicy: load: this was a plan: nothing was changed" ]]
+}
+
+@test "the plan is what the load then does" {
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  echo "newObject" >>"$policy/objects/base"
+  echo "/etc/services.conf newObject" >"$policy/fileLabels/zz"
+  plan
+  [[ -n $output ]]
+  secpolicy load /new
+  exits 0
+  plan
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: load: nothing would change" ]]
+}
+
+@test "what only stays is shown, and changes nothing" {
+  sed -i '/cap_sys_chroot/d' "$policy/domains/sshDom"
+  plan
+  exits 0
+  [[ $output == "rules that stay installed although no file has them (1):
+  sshDom: -c cap_sys_chroot grant" ]]
+  [[ $stderr == "secpolicy: load: nothing would change" ]]
+}
+
+@test "a plan changes no file, no label, no state and no setting, and logs nothing" {
+  secpolicy settings option /UserVars/CheckAccessTemplateEnabled 1
+  echo "-x" >>"$policy/domains/appDom"
+  echo "newObject" >>"$policy/objects/base"
+  echo "/etc/* newObject" >"$policy/fileLabels/zz"
+  fingerprint >"$BATS_TEST_TMPDIR/before"
+  plan
+  exits 1
+  shows "  checkAccessTemplateDom"
+  fingerprint | diff "$BATS_TEST_TMPDIR/before" -
+}
+
+@test "the problems of the load are told as the load tells them" {
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  echo "/no/such hostConfig" >"$policy/fileLabels/zz"
+  plan
+  exits 1
+  local planned=$stderr
+  secpolicy load /new
+  exits 1
+  [[ $planned == "$stderr
+secpolicy: load: nothing would change" ]]
+  [[ $stderr == *no_such_call* && $stderr == *"/no/such: No such file"* ]]
+}
+
+@test "a load that would be stopped, and what it would do until then" {
+  rm "$root/run/secpolicy/"*
+  rm "$policy/domains/ioFilterDom"
+  sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
+  plan
+  exits 3
+  says "Error: Failed to fetch domainID for IOFilter domain"
+  shows "  sshDom"
+  [[ ! -e $root/run/secpolicy/host.db ]]
+}
+
+@test "many files are counted, and all shown with -v" {
+  local number
+  mkdir "$root/many"
+  for number in {10..40}; do touch "$root/many/$number"; done
+  boot
+  echo "/many/* hostConfig" >"$policy/fileLabels/zz"
+  plan
+  exits 0
+  [[ $output == "files to label anew (32):
+  /many: unlabeled -> hostConfig
+  /many/10: unlabeled -> hostConfig"*"
+  /many/28: unlabeled -> hostConfig
+  ... and 12 more; -v shows all" ]]
+  plan -v
+  [[ $(wc -l <<<"$output") -eq 33 ]]
+  shows "  /many/40: unlabeled -> hostConfig"
+}
+
+@test "a label whose object is gone shows as its number" {
+  local id
+  echo "oldObject" >"$policy/objects/old"
+  echo "/etc/services.conf oldObject" >"$policy/fileLabels/zz"
+  secpolicy load /new
+  secpolicy display
+  id=$(sed -n 's/^oldObject (\(.*\))$/\1/p' <<<"$output")
+  rm "$policy/objects/old" "$policy/fileLabels/zz"
+  sed -i '/hostConfig/d' "$policy/fileLabels/base"
+  secpolicy load /new
+  echo "/etc/services.conf hostConfig" >"$policy/fileLabels/zz"
+  plan
+  shows "  /etc/services.conf: #$id -> hostConfig"
+}
+
+@test "--format json" {
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  sed -i '/listen/d; s/^\(-c cap_net_bind_service\) grant/\1 revoke/' "$policy/domains/sshDom"
+  echo "/etc/services.conf sshKey" >"$policy/fileLabels/zz"
+  plan --format json
+  exits 0
+  jq -e '. == {schema: "secpolicy.plan/1", directory: "/new", ending: "done", errors: [],
+    changesNothing: false,
+    domains: {create: [], stay: []}, objects: {add: [], remove: []},
+    rules: {
+      add: [{domain: "appDom", rule: "-c cap_net_raw grant"}],
+      change: [{domain: "sshDom", before: "-c cap_net_bind_service grant", after: "-c cap_net_bind_service revoke"}],
+      remove: [], stay: [{domain: "sshDom", rule: "-s listen grant"}]},
+    labels: [{path: "/etc/services.conf", before: "hostConfig", after: "sshKey"}]}' <<<"$output"
+  echo "-x" >>"$policy/domains/appDom"
+  plan --format json
+  exits 1
+  jq -e '.ending == "failed" and (.errors | length) == 3 and
+    .errors[2] == "Failure in domain policy"' <<<"$output"
+}
+
+@test "--format needs --plan, and knows what it writes" {
+  secpolicy load --format json
+  exits 2
+  plan --format xml
+  exits 2
+}
+
+@test "a state that cannot be read, and a directory that is not there" {
+  echo garbage >"$root/run/secpolicy/host.db"
+  plan
+  exits 1
+  [[ $stderr == "secpolicy: the installed state /run/secpolicy/host.db cannot be read: "* ]]
+  [[ $(cat "$root/run/secpolicy/host.db") == garbage ]]
+  secpolicy load --plan /no/such
+  exits 1
+  [[ $stderr == "secpolicy: load: there is no directory /no/such below this root, "* ]]
+}

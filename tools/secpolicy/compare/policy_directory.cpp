@@ -1,0 +1,80 @@
+#include "policy_directory.h"
+
+#include <filesystem>
+
+#include "kitlibs/file.h"
+#include "scratch/scratch_directory.h"
+#include "scratch/used_state.h"
+#include "secpolicy/carry_on.h"
+#include "secpolicy/labels/file_label_policy.h"
+#include "secpolicy/policy_root.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using SecPolicy::TeskAccessInterfaceImpl;
+
+constexpr char kPartnerPrefix[] = "plugin-";
+
+bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
+
+std::map<std::string, std::string> FilesOf(const std::string& dir) {
+  std::map<std::string, std::string> files;
+  SecPolicy::GetFileList(dir, files);
+  return files;
+}
+
+// The library names partner domains so only where the host's own lie; a copy of the files under the
+// full names does it anywhere.
+void InstallPartners(const std::string& dir, const std::string& copies,
+                     TeskAccessInterfaceImpl& access) {
+  std::filesystem::create_directory(copies);
+  for (const auto& [path, name] : FilesOf(dir)) {
+    std::filesystem::copy_file(path, copies + "/" + kPartnerPrefix + name);
+  }
+  SecPolicy::LoadPolicyDomains(copies, access);
+}
+
+std::map<std::string, std::string> ReadLabels(const std::string& dir, bool& isClean,
+                                              TeskAccessInterfaceImpl& access) {
+  SecPolicy::FileLabelPolicy policy;
+  for (const auto& [path, name] : FilesOf(dir)) {
+    isClean &= SecPolicy::CarryOn([&, &file = path] { policy.ParsePolicy(file, access); });
+  }
+  std::map<std::string, std::string> labels;
+  for (const auto& line : policy.fileLabels) {
+    labels[line.path + (line.recursive ? "/*" : "")] = line.label;
+  }
+  return labels;
+}
+
+}  // namespace
+
+std::string PartnerDirOf(const std::string& dir) {
+  return dir + "/" + SecPolicy::kDomainsDir + "/plugins";
+}
+
+WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir) {
+  const ScratchDirectory scratch;
+  const UsedState state(scratch.File("host.db"));
+  TeskAccessInterfaceImpl access;
+  WrittenPolicy written;
+  const auto step = [&](auto part) { written.isClean &= SecPolicy::CarryOn(part); };
+
+  const std::string earlyDomains = dir + "/early/" + SecPolicy::kDomainsDir;
+  step([&] { SecPolicy::LoadPolicyObjects(dir + "/" + SecPolicy::kObjectsDir, access); });
+  if (IsDirectory(earlyDomains)) {
+    step([&] { SecPolicy::LoadPolicyDomains(earlyDomains, access); });
+  }
+  step([&] { SecPolicy::LoadPolicyDomains(dir + "/" + SecPolicy::kDomainsDir, access); });
+  if (IsDirectory(partnerDir)) {
+    step([&] { InstallPartners(partnerDir, scratch.File("partners"), access); });
+  }
+  step([&] {
+    written.labels = ReadLabels(dir + "/" + SecPolicy::kFileLabelsDir, written.isClean, access);
+  });
+  written.policy = ReadInstalledPolicy(access);
+  return written;
+}
+
+}  // namespace SecPolicyCli

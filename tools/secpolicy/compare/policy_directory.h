@@ -1,0 +1,25 @@
+#pragma once
+
+#include <map>
+#include <string>
+
+#include "installed/installed_policy.h"
+
+namespace SecPolicyCli {
+
+// What the files of a policy directory say.
+struct WrittenPolicy {
+  InstalledPolicy policy;                     // as they would install it on an empty host
+  std::map<std::string, std::string> labels;  // by what is labelled: "/etc/fstab", "/srv/*"
+  bool isClean = true;                        // false: a line was refused, and left out
+};
+
+// Where the partner domains of the policy directory `dir` lie.
+std::string PartnerDirOf(const std::string& dir);
+
+// Reads the objects, the domains of early boot, the domains and the file labels of `dir`, and the
+// partner domains of `partnerDir`; there may be none of early boot and of partners. Works on a
+// scratch state. What is refused is reported, as a load does. Throws what the host throws.
+WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,44 @@
+#include "forked.h"
+
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <exception>
+#include <iostream>
+#include <system_error>
+
+namespace SecPolicyCli {
+namespace {
+
+[[noreturn]] void RunChild(const std::function<ExitCode()>& body) {
+  ExitCode code = kFailed;
+  try {
+    code = body();
+  } catch (const std::exception& failure) {
+    std::cerr << "secpolicy: " << failure.what() << std::endl;
+  }
+  std::cout.flush();
+  // What the parent has yet to write and to clean up is not the child's.
+  _exit(code);
+}
+
+}  // namespace
+
+ForkedEnd RunForked(const std::function<ExitCode()>& body) {
+  std::cout.flush();
+  std::cerr.flush();
+  const pid_t child = fork();
+  if (child < 0) throw std::system_error(errno, std::generic_category(), "cannot fork");
+  if (child == 0) RunChild(body);
+
+  int status = 0;
+  while (waitpid(child, &status, 0) < 0) {
+    if (errno != EINTR) throw std::system_error(errno, std::generic_category(), "cannot wait");
+  }
+  if (WIFEXITED(status)) return {.code = static_cast<ExitCode>(WEXITSTATUS(status)), .death = ""};
+  return {.code = kFailed, .death = strsignal(WTERMSIG(status))};
+}
+
+}  // namespace SecPolicyCli

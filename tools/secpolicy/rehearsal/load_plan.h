@@ -1,0 +1,48 @@
+#pragma once
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "compare/policy_difference.h"
+#include "load_rehearsal.h"
+
+namespace SecPolicyCli {
+
+// A rule of a domain.
+struct DomainRule {
+  std::string domain;
+  std::string rule;
+};
+
+// A file and its labels by name.
+struct FileLabelChange {
+  std::string path;
+  std::string before;
+  std::string after;
+};
+
+// What a load would change. Everything is in ascending order.
+struct LoadPlan {
+  PolicyDifference difference;
+  std::vector<FileLabelChange> labels;
+
+  // What is installed and in no file any more: a load leaves it.
+  std::vector<std::string> stayingDomains;
+  std::vector<DomainRule> stayingRules;
+
+  bool ChangesNothing() const { return difference.IsEmpty() && labels.empty(); }
+};
+
+// The plan of the load of `policyDir` that was rehearsed. Throws what the host throws.
+LoadPlan MakeLoadPlan(const std::string& policyDir, const LoadRehearsal& rehearsal);
+
+// Writes the plan for people: one thing a line under a heading for each kind of change. At most
+// `maxLabels` files are shown.
+void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& output);
+
+// Writes the plan for programs, with how the load of `policyDir` would end.
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
+                   const LoadRehearsal& rehearsal, std::ostream& output);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,93 @@
+#include "load_rehearsal.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <stdexcept>
+#include <system_error>
+
+#include "forked.h"
+#include "host/linux/system_log.h"
+#include "policy_dir.h"
+#include "root.h"
+#include "scratch/used_state.h"
+#include "secpolicy/secpolicy.h"
+
+namespace SecPolicyCli {
+namespace {
+
+void RequireCopied(const std::string& failure) {
+  if (failure.empty()) return;
+  const std::string advice = AdviseOnPrivilege();
+  throw std::runtime_error("the installed state " + StatePath() + " cannot be read: " + failure +
+                           (advice.empty() ? "" : ". " + advice));
+}
+
+void Redirect(int descriptor, const std::string& path) {
+  const int file = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+  if (file < 0 || dup2(file, descriptor) < 0) {
+    throw std::system_error(errno, std::generic_category(), "cannot write " + path);
+  }
+  close(file);
+}
+
+void WriteLabels(const std::string& path) {
+  std::ofstream file(path, std::ios::binary);
+  for (const auto& change : LinuxHost::RehearsedLabels()) {
+    file << change.before << ' ' << change.after << ' ' << change.path << '\0';
+  }
+  file.flush();
+  if (!file) throw std::runtime_error("cannot write " + path);
+}
+
+// A load that was stopped has not come to the labels, and has left no file.
+std::vector<LinuxHost::LabelChange> ReadLabels(const std::string& path) {
+  std::vector<LinuxHost::LabelChange> changes;
+  std::ifstream file(path, std::ios::binary);
+  LinuxHost::LabelChange change;
+  while (file >> change.before >> change.after && file.get() == ' ' &&
+         std::getline(file, change.path, '\0')) {
+    changes.push_back(change);
+  }
+  return changes;
+}
+
+std::string ReadAll(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  return {std::istreambuf_iterator<char>(file), {}};
+}
+
+}  // namespace
+
+LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
+  RequireCopied(CopyUsedState(StateBefore()));
+  // Both are of the same moment.
+  if (std::filesystem::exists(StateBefore())) {
+    RequireCopied(CopyState(StateBefore(), StateAfter()));
+  }
+  const std::string messageFile = scratch.File("messages");
+  const std::string labelFile = scratch.File("labels");
+  const ForkedEnd end = RunForked([&] {
+    Redirect(STDOUT_FILENO, scratch.File("output"));
+    Redirect(STDERR_FILENO, messageFile);
+    LinuxHost::DropLog();
+    LinuxHost::StartLabelRehearsal();
+    UseCopyOfSettings(scratch.File("config.db"));
+    const UsedState state(StateAfter());
+    const ExitCode code = LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
+    WriteLabels(labelFile);
+    return code;
+  });
+  messages = ReadAll(messageFile);
+  if (!end.death.empty()) {
+    throw std::runtime_error("the rehearsal of the load died: " + end.death + "\n" + messages);
+  }
+  ending = end.code;
+  labels = ReadLabels(labelFile);
+}
+
+}  // namespace SecPolicyCli

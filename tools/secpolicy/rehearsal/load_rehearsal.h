@@ -1,0 +1,41 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "host/linux/label_rehearsal.h"
+#include "scratch/scratch_directory.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// A whole load of a policy directory on a copy of the host's state. Neither the installed state nor
+// a file is changed, and nothing is logged.
+class LoadRehearsal {
+ public:
+  // Rehearses the load of `policyDir`. Nothing of the host may be in use in this process. Throws
+  // std::runtime_error when it cannot be done.
+  explicit LoadRehearsal(const std::string& policyDir);
+
+  // How the load would end.
+  ExitCode Ending() const { return ending; }
+
+  // What it would write to standard error, its summary line included.
+  const std::string& Messages() const { return messages; }
+
+  // The files whose label it would change.
+  const std::vector<LinuxHost::LabelChange>& Labels() const { return labels; }
+
+  // The copy of the state that was installed, and the state that the load would leave. There is no
+  // file for the first one where nothing is installed yet.
+  std::string StateBefore() const { return scratch.File("before.db"); }
+  std::string StateAfter() const { return scratch.File("after.db"); }
+
+ private:
+  ScratchDirectory scratch;
+  ExitCode ending = kFailed;
+  std::string messages;
+  std::vector<LinuxHost::LabelChange> labels;
+};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,96 @@
+#include <nlohmann/json.hpp>
+#include <sstream>
+
+#include "load_plan.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+Json RulesOf(const PolicyDifference& difference,
+             std::vector<std::string> DomainDifference::*rules) {
+  Json list = Json::array();
+  for (const DomainDifference& domain : difference.domains) {
+    for (const std::string& rule : domain.*rules) {
+      list.push_back({{"domain", domain.name}, {"rule", rule}});
+    }
+  }
+  return list;
+}
+
+Json ChangesOf(const PolicyDifference& difference) {
+  Json list = Json::array();
+  for (const DomainDifference& domain : difference.domains) {
+    for (const auto& [before, after] : domain.changed) {
+      list.push_back({{"domain", domain.name}, {"before", before}, {"after", after}});
+    }
+  }
+  return list;
+}
+
+Json NewDomains(const PolicyDifference& difference) {
+  Json list = Json::array();
+  for (const DomainDifference& domain : difference.domains) {
+    if (domain.IsNew()) list.push_back(domain.name);
+  }
+  return list;
+}
+
+Json StayingRules(const LoadPlan& plan) {
+  Json list = Json::array();
+  for (const auto& [domain, rule] : plan.stayingRules) {
+    list.push_back({{"domain", domain}, {"rule", rule}});
+  }
+  return list;
+}
+
+Json Labels(const LoadPlan& plan) {
+  Json list = Json::array();
+  for (const auto& [path, before, after] : plan.labels) {
+    list.push_back({{"path", path}, {"before", before}, {"after", after}});
+  }
+  return list;
+}
+
+// The errors among the lines that a load writes to standard error.
+Json Errors(const std::string& messages) {
+  constexpr std::string_view kPrefix = "Error: ";
+  Json list = Json::array();
+  std::istringstream lines(messages);
+  for (std::string line; std::getline(lines, line);) {
+    if (line.starts_with(kPrefix)) list.push_back(line.substr(kPrefix.size()));
+  }
+  return list;
+}
+
+const char* WordFor(ExitCode ending) {
+  if (ending == kWell) return "done";
+  return ending == kStopped ? "stopped" : "failed";
+}
+
+}  // namespace
+
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
+                   const LoadRehearsal& rehearsal, std::ostream& output) {
+  const PolicyDifference& difference = plan.difference;
+  const Json document = {
+      {"schema", "secpolicy.plan/1"},
+      {"directory", policyDir},
+      {"ending", WordFor(rehearsal.Ending())},
+      {"errors", Errors(rehearsal.Messages())},
+      {"changesNothing", plan.ChangesNothing()},
+      {"domains", {{"create", NewDomains(difference)}, {"stay", plan.stayingDomains}}},
+      {"objects", {{"add", difference.objectsAdded}, {"remove", difference.objectsRemoved}}},
+      {"rules",
+       {{"add", RulesOf(difference, &DomainDifference::added)},
+        {"change", ChangesOf(difference)},
+        {"remove", RulesOf(difference, &DomainDifference::removed)},
+        {"stay", StayingRules(plan)}}},
+      {"labels", Labels(plan)},
+  };
+  // A path need not be text.
+  output << document.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+}
+
+}  // namespace SecPolicyCli

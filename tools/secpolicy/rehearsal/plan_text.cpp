@@ -1,0 +1,67 @@
+#include <algorithm>
+
+#include "load_plan.h"
+#include "text/visible.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Lines = std::vector<std::string>;
+
+// The things of one heading. `maximum` of them are shown.
+void WriteSection(const std::string& heading, const Lines& lines, std::size_t maximum,
+                  std::ostream& output) {
+  if (lines.empty()) return;
+  output << heading << " (" << lines.size() << "):\n";
+  const std::size_t shown = std::min(lines.size(), maximum);
+  for (std::size_t index = 0; index < shown; ++index)
+    output << "  " << Visible(lines[index]) << '\n';
+  if (shown < lines.size()) {
+    output << "  ... and " << lines.size() - shown << " more; -v shows all\n";
+  }
+}
+
+void WriteSection(const std::string& heading, const Lines& lines, std::ostream& output) {
+  WriteSection(heading, lines, lines.size(), output);
+}
+
+std::string Arrow(const std::string& before, const std::string& after) {
+  return before + " -> " + (after.empty() ? "(nothing)" : after);
+}
+
+}  // namespace
+
+void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& output) {
+  Lines newDomains;
+  Lines added;
+  Lines changed;
+  Lines removed;
+  for (const DomainDifference& domain : plan.difference.domains) {
+    if (domain.IsNew()) newDomains.push_back(domain.name);
+    const std::string prefix = domain.name + ": ";
+    for (const std::string& rule : domain.added) added.push_back(prefix + rule);
+    for (const std::string& rule : domain.removed) removed.push_back(prefix + rule);
+    for (const auto& [before, after] : domain.changed) {
+      changed.push_back(prefix + Arrow(before, DecisionOf(after)));
+    }
+  }
+  Lines stayingRules;
+  for (const auto& [domain, rule] : plan.stayingRules) stayingRules.push_back(domain + ": " + rule);
+  Lines labels;
+  for (const auto& [path, before, after] : plan.labels) {
+    labels.push_back(path + ": " + Arrow(before, after));
+  }
+
+  WriteSection("domains to create", newDomains, output);
+  WriteSection("objects to add", plan.difference.objectsAdded, output);
+  WriteSection("objects to remove", plan.difference.objectsRemoved, output);
+  WriteSection("rules to add", added, output);
+  WriteSection("rules to change", changed, output);
+  WriteSection("rules to remove with their object", removed, output);
+  WriteSection("files to label anew", labels, maxLabels, output);
+  WriteSection("domains that stay installed although no file defines them", plan.stayingDomains,
+               output);
+  WriteSection("rules that stay installed although no file has them", stayingRules, output);
+}
+
+}  // namespace SecPolicyCli

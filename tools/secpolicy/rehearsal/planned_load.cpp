@@ -1,0 +1,40 @@
+#include "planned_load.h"
+
+#include <iostream>
+#include <limits>
+
+#include "host/linux/system_log.h"
+#include "load_plan.h"
+#include "policy_dir.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// More files fill a screen without telling more.
+constexpr std::size_t kShownLabels = 20;
+
+void WriteSummary(const std::string& text) {
+  std::cerr << "secpolicy: load: " << text << std::endl;
+}
+
+}  // namespace
+
+ExitCode PlanLoad(const std::string& policyDir, const PlanOptions& options) {
+  if (const auto refusal = RefuseMissingDir("load", policyDir)) return *refusal;
+  const LoadRehearsal rehearsal(policyDir);
+  if (rehearsal.Ending() != kWell) std::cerr << rehearsal.Messages() << std::flush;
+  LinuxHost::DropLog();
+  const LoadPlan plan = MakeLoadPlan(policyDir, rehearsal);
+  if (options.format == "json") {
+    WritePlanJson(plan, policyDir, rehearsal, std::cout);
+  } else {
+    const auto all = std::numeric_limits<std::size_t>::max();
+    WritePlanText(plan, options.showAll ? all : kShownLabels, std::cout);
+  }
+  std::cout.flush();
+  WriteSummary(plan.ChangesNothing() ? "nothing would change"
+                                     : "this was a plan: nothing was changed");
+  return rehearsal.Ending();
+}
+
+}  // namespace SecPolicyCli

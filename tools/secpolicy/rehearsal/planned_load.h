@@ -1,0 +1,18 @@
+#pragma once
+
+#include <string>
+
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+struct PlanOptions {
+  std::string format = "text";  // or "json"
+  bool showAll = false;         // every file whose label would change, however many
+};
+
+// Prints to standard output what a load of `policyDir` would change, and changes nothing. The
+// problems that the load would report are reported too. Returns how the load would end.
+ExitCode PlanLoad(const std::string& policyDir, const PlanOptions& options);
+
+}  // namespace SecPolicyCli
