@@ -67,10 +67,11 @@ LinuxHost::Rule ToRule(const Record& record, const RecordShape<Record>& shape) {
   return rule;
 }
 
-// A record with its header filled in, from the row's column `lineColumn`.
+// A record behind those of `records`, with its header filled in from the row's column `lineColumn`.
 template <class Record>
-Record StartRecord(const Domain& domain, const Rows& rows, int lineColumn) {
-  Record record;
+Record& AddRecord(std::list<Record>& records, const Domain& domain, const Rows& rows,
+                  int lineColumn) {
+  Record& record = records.emplace_back();
   record.line = static_cast<unsigned int>(rows.Integer(lineColumn));
   record.domainId = domain.id;
   record.domainName = domain.name;
@@ -83,13 +84,12 @@ void ReadRules(HostState& state, unsigned int domainId, const RecordShape<Record
   const Domain& domain = state.Domains().Get(domainId);
   Rows rows = state.Rules().Read(domainId, shape.kind);
   while (rows.Next()) {
-    auto record = StartRecord<Record>(domain, rows, 4);
+    Record& record = AddRecord(records, domain, rows, 4);
     for (std::size_t index = 0; index < shape.words.size(); ++index) {
       if (shape.words[index] == nullptr) continue;
       record.*shape.words[index] = rows.Text(static_cast<int>(index));
     }
     record.grant = rows.Integer(3) != 0;
-    records.push_back(std::move(record));
   }
 }
 
@@ -306,10 +306,9 @@ void TeskAccessInterfaceImpl::GetFilePathAccessRules(
   const Domain& domain = state.Domains().Get(domainId);
   Rows rows = state.FilePolicies().Read(domainId);
   while (rows.Next()) {
-    auto rule = StartRecord<TeskAccess_FilePathAccessRule>(domain, rows, 2);
+    auto& rule = AddRecord(rules, domain, rows, 2);
     rule.path = rows.Text(0);
     rule.permissions = LinuxHost::FormatPermissions(static_cast<unsigned int>(rows.Integer(1)));
-    rules.push_back(std::move(rule));
   }
 }
 
@@ -329,12 +328,11 @@ void TeskAccessInterfaceImpl::GetCapabilityParamRules(
   const Domain& domain = state.Domains().Get(domainId);
   Rows rows = state.ParameterRules().Read(domainId);
   while (rows.Next()) {
-    auto rule = StartRecord<TeskAccess_CapabilityParamRule>(domain, rows, 4);
+    auto& rule = AddRecord(rules, domain, rows, 4);
     rule.paramCheck = rows.Text(0);
     rule.firstParam = rows.Text(1);
     rule.secondParam = rows.Text(2);
     rule.grant = rows.Integer(3) != 0;
-    rules.push_back(std::move(rule));
   }
 }
 
@@ -349,12 +347,12 @@ void TeskAccessInterfaceImpl::GetDomTransRules(unsigned int domainId,
   ReadRules(impl->Fresh(), domainId, kDomTrans, read);
   // A domain takes the transitions into it along: one that is gone by now was just destroyed.
   auto& domains = impl->Fresh().Domains();
-  for (auto& rule : read) {
+  read.remove_if([&](auto& rule) {
     const Domain* target = domains.Find(rule.targetDomain);
-    if (target == nullptr) continue;
-    rule.targetDomainId = target->id;
-    rules.push_back(std::move(rule));
-  }
+    if (target != nullptr) rule.targetDomainId = target->id;
+    return target == nullptr;
+  });
+  rules.splice(rules.end(), read);
 }
 
 void TeskAccessInterfaceImpl::GetFileCreationRules(unsigned int domainId,
