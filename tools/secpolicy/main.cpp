@@ -13,8 +13,8 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck,   &kLoad,    &kLoadEarly,
-                                  &kRestore, &kDisplay, &kSettings};
+constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck,  &kLoad,    &kLoadEarly,
+                                  &kRestore, &kStatus, &kDisplay, &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -23,6 +23,7 @@ constexpr char kFooter[] =
     "A first session, as an ordinary user, on a root of your own:\n"
     "  secpolicy --root ./r boot                        unpack the tardisks and install the "
     "policy\n"
+    "  secpolicy --root ./r status                      is it loaded, and did it go well?\n"
     "  secpolicy --root ./r display                     look at what is installed now\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"

@@ -38,5 +38,6 @@ extern const Verb kLoadEarly;
 extern const Verb kRestore;
 extern const Verb kDisplay;
 extern const Verb kSettings;
+extern const Verb kStatus;
 
 }  // namespace SecPolicyCli

@@ -1,0 +1,210 @@
+#include <CLI/App.hpp>
+#include <algorithm>
+#include <array>
+#include <ctime>
+#include <iomanip>
+#include <iostream>
+#include <map>
+#include <optional>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "host/linux/load_record.h"
+#include "installed/installed_json.h"
+#include "installed/installed_policy.h"
+#include "installed/rule_words.h"
+#include "text/visible.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+struct RuleKind {
+  const char* keyword;
+  const char* name;
+};
+
+constexpr std::array kRuleKinds = {
+    RuleKind{"-a", "object access"},     RuleKind{"-c", "capability"},
+    RuleKind{"-d", "domain transition"}, RuleKind{"-f", "file creation"},
+    RuleKind{"-p", "parameter check"},   RuleKind{"-r", "file path"},
+    RuleKind{"-s", "system call"},       RuleKind{"-u", "unix socket creation"},
+};
+
+constexpr std::array kLevels = {"enforcing", "permissive", "disabled"};
+
+// Of the errors of a load, as many as fit the screen.
+constexpr std::size_t kShownErrors = 10;
+
+constexpr int kTitleWidth = 13;
+
+struct Status {
+  InstalledPolicy policy;
+  std::optional<LinuxHost::LoadRecord> load;
+  std::map<std::string, std::vector<std::string>> domainsByLevel;
+  std::map<std::string, std::size_t> rulesByKeyword;
+  std::size_t ruleCount = 0;
+
+  // Beside the one that is built in, there are domains only when something was loaded.
+  bool IsLoaded() const { return policy.domains.size() > 1; }
+  bool HasProblems() const { return load && load->ending != "done"; }
+};
+
+Status ReadStatus() {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  Status status;
+  status.policy = ReadInstalledPolicy(access);
+  status.load = LinuxHost::LatestLoad();
+  for (const InstalledDomain& domain : status.policy.domains) {
+    status.domainsByLevel[domain.level].push_back(domain.name);
+    status.ruleCount += domain.rules.size();
+    for (const InstalledRule& rule : domain.rules) {
+      ++status.rulesByKeyword[SplitRule(rule.text).keyword];
+    }
+  }
+  return status;
+}
+
+std::string CountOf(std::size_t count, const std::string& noun) {
+  return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
+}
+
+std::string FormatTime(std::int64_t seconds, const char* format) {
+  const std::time_t time = seconds;
+  std::tm parts{};
+  gmtime_r(&time, &parts);
+  std::ostringstream text;
+  text << std::put_time(&parts, format);
+  return text.str();
+}
+
+// A line of the screen: what it is about, and what there is to say.
+void WriteLine(const std::string& title, const std::string& text) {
+  std::cout << std::left << std::setw(kTitleWidth) << title << Visible(text) << '\n';
+}
+
+std::string DescribeLoad(const LinuxHost::LoadRecord& load) {
+  return load.verb + " from " + load.directory + " at " +
+         FormatTime(load.time, "%Y-%m-%d %H:%M:%S UTC") + ": " + load.ending +
+         (load.errorCount > 0 ? ", " + CountOf(load.errorCount, "error") : "");
+}
+
+// The domains that are not enforcing are named: nothing is refused to them.
+std::string DescribeDomains(const Status& status) {
+  std::string text = std::to_string(status.policy.domains.size());
+  const char* separator = ": ";
+  for (const char* const level : kLevels) {
+    const auto found = status.domainsByLevel.find(level);
+    if (found == status.domainsByLevel.end()) continue;
+    const std::vector<std::string>& names = found->second;
+    text += separator + std::to_string(names.size()) + " " + level;
+    separator = ", ";
+    if (level == kLevels.front()) continue;
+    for (std::size_t index = 0; index < names.size(); ++index) {
+      text += (index == 0 ? " (" : " ") + names[index];
+    }
+    text += ")";
+  }
+  return text;
+}
+
+void WriteErrors(const LinuxHost::LoadRecord& load) {
+  const std::size_t shown = std::min(load.errors.size(), kShownErrors);
+  for (std::size_t index = 0; index < shown; ++index) WriteLine("", load.errors[index]);
+  if (load.errorCount > shown) {
+    WriteLine("", "and " + std::to_string(load.errorCount - shown) + " more");
+  }
+}
+
+void WriteText(const Status& status) {
+  WriteLine("policy", status.IsLoaded() ? "loaded" : "not loaded");
+  WriteLine("latest load", status.load ? DescribeLoad(*status.load) : "none by this command");
+  if (status.load) WriteErrors(*status.load);
+  WriteLine("domains", DescribeDomains(status));
+  WriteLine("objects", std::to_string(status.policy.objects.size()));
+  WriteLine("rules", std::to_string(status.ruleCount));
+  const std::size_t width = std::to_string(status.ruleCount).size();
+  for (const RuleKind& kind : kRuleKinds) {
+    const auto found = status.rulesByKeyword.find(kind.keyword);
+    const std::size_t count = found == status.rulesByKeyword.end() ? 0 : found->second;
+    const std::string number = std::to_string(count);
+    WriteLine(std::string("  ") + kind.keyword,
+              std::string(width - number.size(), ' ') + number + " " + kind.name);
+  }
+  WriteLine("tardisks", std::to_string(status.policy.tardisks.size()));
+  for (const InstalledTardisk& tardisk : status.policy.tardisks) {
+    WriteLine("", tardisk.path + " " + (tardisk.label.empty() ? "(no label)" : tardisk.label));
+  }
+}
+
+Json ToJson(const LinuxHost::LoadRecord& load) {
+  return {{"verb", load.verb},
+          {"directory", load.directory},
+          {"time", FormatTime(load.time, "%Y-%m-%dT%H:%M:%SZ")},
+          {"ending", load.ending},
+          {"errorCount", load.errorCount},
+          {"errors", load.errors}};
+}
+
+void WriteJson(const Status& status) {
+  Json levels = Json::object();
+  for (const char* const level : kLevels) levels[level] = Json::array();
+  for (const auto& [level, names] : status.domainsByLevel) levels[level] = names;
+  Json rules = Json::object();
+  for (const RuleKind& kind : kRuleKinds) rules[kind.keyword] = 0;
+  for (const auto& [keyword, count] : status.rulesByKeyword) rules[keyword] = count;
+  Json load;
+  if (status.load) load = ToJson(*status.load);
+  std::cout << DumpJson({{"schema", "secpolicy.status/1"},
+                         {"loaded", status.IsLoaded()},
+                         {"latestLoad", load},
+                         {"domains", status.policy.domains.size()},
+                         {"domainsByLevel", levels},
+                         {"objects", status.policy.objects.size()},
+                         {"rules", status.ruleCount},
+                         {"rulesByKeyword", rules},
+                         {"tardisks", ToJson(status.policy)["tardisks"]}});
+}
+
+ExitCode Summarize(const Status& status) {
+  const bool problems = status.HasProblems();
+  std::string text = "the policy is loaded";
+  if (!status.IsLoaded()) text = "no policy is loaded. 'secpolicy load' loads one";
+  if (problems) {
+    text = "the latest load did not end well. 'secpolicy check' shows every problem of the files";
+  }
+  std::cout.flush();
+  std::cerr << "secpolicy: status: " << text << std::endl;
+  return problems || !status.IsLoaded() ? kFailed : kWell;
+}
+
+Action Define(CLI::App& app) {
+  const auto format = std::make_shared<std::string>("text");
+  app.add_option("--format", *format, "How to write it: text or json")
+      ->check(CLI::IsMember({"text", "json"}))
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  return [format] {
+    const Status status = ReadStatus();
+    (*format == "json" ? WriteJson : WriteText)(status);
+    return Summarize(status);
+  };
+}
+
+}  // namespace
+
+const Verb kStatus = {
+    "status", "Show on one screen whether the policy is loaded, and how that went",
+    "Prints the latest load with its errors, the domains by enforcement level, and how many\n"
+    "objects, rules of each kind and tardisks there are. Exit status: 0 the policy is loaded,\n"
+    "1 it is not, or the latest load did not end well.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy status\n"
+    "  secpolicy status --format json | jq .latestLoad",
+    Define};
+
+}  // namespace SecPolicyCli
