@@ -157,6 +157,7 @@ secpolicy: load: nothing would change" ]]
   echo "/etc/services.conf sshKey" >"$policy/fileLabels/zz"
   plan --format json
   exits 0
+  fits_schema plan
   jq -e '. == {schema: "secpolicy.plan/1", directory: "/new", ending: "done", errors: [],
     changesNothing: false,
     domains: {create: [], stay: []}, objects: {add: [], remove: []},

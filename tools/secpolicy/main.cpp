@@ -13,8 +13,8 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck,  &kLoad,    &kLoadEarly,
-                                  &kRestore, &kStatus, &kDisplay, &kSettings};
+constexpr const Verb* kVerbs[] = {&kBoot,   &kCheck,   &kLoad, &kLoadEarly, &kRestore,
+                                  &kStatus, &kDisplay, &kDiff, &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -26,8 +26,10 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r status                      is it loaded, and did it go well?\n"
     "  secpolicy --root ./r display                     look at what is installed now\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
+    "  secpolicy --root ./r load --plan                 what would a load change?\n"
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"
     "  secpolicy --root ./r load-early                  install only what early boot needs\n"
+    "  secpolicy --root ./r diff ./old installed        how do two policies differ?\n"
     "  secpolicy --root ./r settings enforcement appDom permissive\n"
     "  secpolicy --root ./r restore                     apply the stored level\n"
     "\n"

@@ -37,6 +37,7 @@ extern const Verb kLoad;
 extern const Verb kLoadEarly;
 extern const Verb kRestore;
 extern const Verb kDisplay;
+extern const Verb kDiff;
 extern const Verb kSettings;
 extern const Verb kStatus;
 

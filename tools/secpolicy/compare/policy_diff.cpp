@@ -1,0 +1,49 @@
+#include "policy_diff.h"
+
+#include <set>
+
+#include "scratch/scratch_state.h"
+#include "tardisk_transitions.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Labels = std::map<std::string, std::string>;
+
+std::string LabelOf(const Labels& labels, const std::string& path) {
+  const auto found = labels.find(path);
+  return found == labels.end() ? "" : found->second;
+}
+
+std::vector<LabelDifference> CompareLabels(const Labels& before, const Labels& after) {
+  std::set<std::string> paths;
+  for (const auto& [path, label] : before) paths.insert(path);
+  for (const auto& [path, label] : after) paths.insert(path);
+  std::vector<LabelDifference> differences;
+  for (const std::string& path : paths) {
+    LabelDifference difference{path, LabelOf(before, path), LabelOf(after, path)};
+    if (difference.before != difference.after) differences.push_back(std::move(difference));
+  }
+  return differences;
+}
+
+void DropTardisksOfBoth(Side& one, Side& other) {
+  const ScratchState scratch(true);
+  SecPolicy::TeskAccessInterfaceImpl access;
+  DropTardiskTransitions(one.policy, access);
+  DropTardiskTransitions(other.policy, access);
+}
+
+}  // namespace
+
+PolicyDiff Diff(Side before, Side after) {
+  if (before.labels.has_value() != after.labels.has_value()) DropTardisksOfBoth(before, after);
+  PolicyDiff diff{.before = before.name,
+                  .after = after.name,
+                  .difference = Compare(before.policy, after.policy),
+                  .labels = std::nullopt};
+  if (before.labels && after.labels) diff.labels = CompareLabels(*before.labels, *after.labels);
+  return diff;
+}
+
+}  // namespace SecPolicyCli

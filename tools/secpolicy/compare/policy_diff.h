@@ -1,0 +1,40 @@
+#pragma once
+
+#include <optional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "policy_difference.h"
+#include "side.h"
+
+namespace SecPolicyCli {
+
+// A line of the file labels that differs; a label is empty where there is no such line.
+struct LabelDifference {
+  std::string path;
+  std::string before;
+  std::string after;
+};
+
+// How the policy `after` differs from `before`.
+struct PolicyDiff {
+  std::string before;  // the names of the two
+  std::string after;
+  PolicyDifference difference;
+  std::optional<std::vector<LabelDifference>> labels;  // nothing when they cannot be compared
+
+  bool IsSame() const { return difference.IsEmpty() && (!labels || labels->empty()); }
+};
+
+// Compares the two. A directory is compared with a state without the transitions of tardisks.
+PolicyDiff Diff(Side before, Side after);
+
+// For people: `-` and `+` lines under a heading for each domain, for objects and file labels.
+// Nothing when there is no difference.
+void WriteDiffText(const PolicyDiff& diff, std::ostream& output);
+
+// For programs.
+void WriteDiffJson(const PolicyDiff& diff, std::ostream& output);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,75 @@
+#include "side.h"
+
+#include <unistd.h>
+
+#include <stdexcept>
+
+#include "compare/policy_directory.h"
+#include "kitlibs/file.h"
+#include "saved/saved_state.h"
+#include "scratch/scratch_directory.h"
+#include "scratch/used_state.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr char kInstalled[] = "installed";
+
+bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
+
+Side ReadDirectory(const std::string& dir) {
+  if (!IsDirectory(dir)) {
+    throw std::runtime_error("there is no directory " + dir +
+                             " below this root. Name a policy directory, a saved state, or "
+                             "'installed'.");
+  }
+  WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir));
+  if (!written.isClean) {
+    throw std::runtime_error("the policy in " + dir +
+                             " has errors (above), so it was not compared. 'secpolicy check " +
+                             dir + "' shows every one with its place.");
+  }
+  return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
+}
+
+// A copy is read: even reading leaves traces beside a state.
+Side ReadStateOf(const std::string& name, const std::string& path) {
+  const ScratchDirectory scratch;
+  const std::string copy = scratch.File("host.db");
+  const std::string failure = CopyState(path, copy);
+  if (!failure.empty()) {
+    throw std::runtime_error("the state " + path + " cannot be read: " + failure);
+  }
+  const UsedState state(copy);
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return {.name = name, .policy = ReadInstalledPolicy(access), .labels = std::nullopt};
+}
+
+void RequireThere(const std::string& path, const std::string& otherwise) {
+  if (access(path.c_str(), F_OK) != 0) throw std::runtime_error(otherwise);
+}
+
+Side ReadInstalled() {
+  RequireThere(StatePath(),
+               "nothing is installed below this root. Name the root that was booted (--root DIR), "
+               "or run 'secpolicy boot' first.");
+  return ReadStateOf(kInstalled, StatePath());
+}
+
+Side ReadSaved(const std::string& name) {
+  const std::string path = SavedStatePath(name);
+  RequireThere(path, "there is no saved state '" + name +
+                         "', and no such directory. 'secpolicy history' lists what is saved; "
+                         "'installed' is what is installed now.");
+  return ReadStateOf(name, path);
+}
+
+}  // namespace
+
+Side ReadSide(const std::string& name) {
+  if (name == kInstalled) return ReadInstalled();
+  if (name.find('/') != std::string::npos || IsDirectory(name)) return ReadDirectory(name);
+  return ReadSaved(name);
+}
+
+}  // namespace SecPolicyCli

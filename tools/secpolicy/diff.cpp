@@ -1,0 +1,82 @@
+#include <CLI/App.hpp>
+#include <exception>
+#include <iostream>
+
+#include "compare/policy_diff.h"
+#include "host/linux/system_log.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+struct Options {
+  std::string before;
+  std::string after;
+  std::string format = "text";
+};
+
+void WriteSummary(const std::string& text) {
+  std::cerr << "secpolicy: diff: " << text << std::endl;
+}
+
+ExitCode Compare(const Options& options) {
+  LinuxHost::DropLog();
+  Side before = ReadSide(options.before);
+  Side after = ReadSide(options.after);
+  if (before.labels.has_value() != after.labels.has_value()) {
+    WriteSummary(
+        "file labels and the transitions of tardisks are left out: a directory has the "
+        "labels only, and a state the transitions");
+  }
+  const PolicyDiff diff = Diff(std::move(before), std::move(after));
+  if (options.format == "json") {
+    WriteDiffJson(diff, std::cout);
+  } else {
+    WriteDiffText(diff, std::cout);
+  }
+  std::cout.flush();
+  WriteSummary(diff.IsSame() ? "the same" : "different");
+  return diff.IsSame() ? kWell : kFailed;
+}
+
+// A program has to tell "different" from "not compared".
+ExitCode CompareOrRefuse(const Options& options) {
+  try {
+    return Compare(options);
+  } catch (const std::exception& failure) {
+    WriteSummary(failure.what());
+    return kUsage;
+  }
+}
+
+Action Define(CLI::App& app) {
+  const auto options = std::make_shared<Options>();
+  app.add_option("A", options->before, "A policy directory, 'installed', or a saved state")
+      ->required();
+  app.add_option("B", options->after, "What it is compared with; the same")->required();
+  app.add_option("--format", options->format, "How to write the differences: text or json")
+      ->check(CLI::IsMember({"text", "json"}))
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  return [options] { return CompareOrRefuse(*options); };
+}
+
+}  // namespace
+
+const Verb kDiff = {
+    "diff", "Compare two policies: directories, what is installed, saved states",
+    "Prints how B differs from A: domains, enforcement levels, rules, objects, and of two\n"
+    "directories the file labels. A name with a slash, or of a directory, is a policy directory;\n"
+    "'installed' is what is installed now; any other name is a saved state. A directory is what "
+    "it\n"
+    "installs on an empty host, with its early and partner domains; compared with a state, the\n"
+    "transitions of tardisks are left out. Changes nothing. Exit status: 0 the same, 1 different,\n"
+    "2 not compared.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy diff installed /etc/zorvan/secpolicy     what was edited since the load?\n"
+    "  secpolicy diff ./old ./new                         two directories\n"
+    "  secpolicy diff before-upgrade installed            since 'secpolicy save before-upgrade'",
+    Define};
+
+}  // namespace SecPolicyCli
