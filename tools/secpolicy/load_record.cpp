@@ -5,8 +5,43 @@
 
 #include "braxo/lib/exception.h"
 #include "host/linux/load_record.h"
+#include "installed/origin_reader.h"
+#include "secpolicy/policy_root.h"
+#include "verb.h"
 
 namespace SecPolicyCli {
+namespace {
+
+constexpr char kPartnerPrefix[] = "plugin-";
+
+std::string Join(const std::string& root, const char* directory) { return root + "/" + directory; }
+
+void ReadEarlyPolicy(const std::string& earlyDir, OriginReader& origins) {
+  origins.ReadDomains(Join(earlyDir, SecPolicy::kDomainsDir), "");
+  origins.ReadFileLabels(Join(SecPolicy::kPolicyRoot, SecPolicy::kFileLabelsDir));
+}
+
+void ReadPolicy(const std::string& dir, OriginReader& origins) {
+  origins.ReadDomains(Join(dir, SecPolicy::kDomainsDir), "");
+  origins.ReadDomains(SecPolicy::kPartnerDomainsDir, kPartnerPrefix);
+  origins.ReadTardisks(Join(SecPolicy::kPolicyRoot, SecPolicy::kTardisksDir));
+  origins.ReadFileLabels(Join(dir, SecPolicy::kFileLabelsDir));
+}
+
+// Reads the files that the verb loads, in its order.
+void RecordOrigins(const std::string& verb, const std::string& dir) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  OriginReader origins(access);
+  if (verb == kBoot.name) ReadEarlyPolicy(SecPolicy::kEarlyPolicyRoot, origins);
+  if (verb == kLoadEarly.name) {
+    ReadEarlyPolicy(dir, origins);
+  } else {
+    ReadPolicy(dir, origins);
+  }
+  LinuxHost::RecordOrigins(origins.Rules(), origins.Labels());
+}
+
+}  // namespace
 
 void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
                 const std::vector<std::string>& errors) {
@@ -17,10 +52,11 @@ void RecordLoad(const std::string& verb, const std::string& policyDir, const std
                            .ending = ending,
                            .errorCount = errors.size(),
                            .errors = errors});
+    RecordOrigins(verb, policyDir);
   } catch (const Braxo::Lib::BraxoException& failure) {
     if (ending != "done") return;
-    std::cerr << "secpolicy: " << verb
-              << ": 'secpolicy status' will not know of this load: " << failure.what() << std::endl;
+    std::cerr << "secpolicy: " << verb << ": this load cannot be recorded for the verbs that "
+              << "explain it: " << failure.what() << std::endl;
   }
 }
 

@@ -4,6 +4,7 @@
 #include <optional>
 #include <utility>
 
+#include "host/linux/rule_origins.h"
 #include "kitlibs/file.h"
 #include "printed_rules.h"
 #include "secpolicy/domain/domain_policy.h"
@@ -14,15 +15,29 @@ namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
 
+using Origins = std::map<std::string, Origin>;
+
+Origins ReadOrigins(const std::string& domain) {
+  Origins origins;
+  for (LinuxHost::RuleOrigin& origin : LinuxHost::FindRuleOrigins(domain)) {
+    origins.emplace(std::move(origin.rule),
+                    Origin{.file = std::move(origin.file), .line = origin.line});
+  }
+  return origins;
+}
+
 std::vector<InstalledRule> ReadRules(const std::string& name, unsigned int id,
                                      TeskAccessInterfaceImpl& access) {
+  const Origins origins = ReadOrigins(name);
   SecPolicy::DomainPolicy policy(name, id);
   std::vector<InstalledRule> rules;
   // Set by set, because reading a whole domain reports a set that cannot be read and goes on.
   for (const auto& [keyword, ruleSet] : policy.ruleSets) {
     ruleSet->ReadSystemRules(id, access);
     for (std::string& text : PrintedRules(*ruleSet)) {
-      rules.push_back({.text = std::move(text), .origin = {}});
+      const auto origin = origins.find(text);
+      rules.push_back(
+          {.text = std::move(text), .origin = origin == origins.end() ? Origin{} : origin->second});
     }
   }
   return rules;
