@@ -1,0 +1,410 @@
+#include "host/linux/saved_policy.h"
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+#include <optional>
+
+#include "child_process.h"
+#include "host/linux/domain_table.h"
+#include "host/linux/file_policy_table.h"
+#include "host/linux/host_state.h"
+#include "host/linux/label_table.h"
+#include "host/linux/rule_origins.h"
+#include "host/linux/rule_table.h"
+#include "host/linux/store_copy.h"
+#include "host/linux/world_table.h"
+#include "message_of.h"
+#include "state_directory.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::CopyDatabase;
+using LinuxHost::HostState;
+using LinuxHost::LabelNumbers;
+using LinuxHost::RestorePolicy;
+using LinuxHost::RuleKind;
+using LinuxHost::SaveState;
+
+constexpr auto kNoDefaults = TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+
+class SavedPolicy : public ::testing::Test {
+ protected:
+  unsigned int Create(const std::string& name) {
+    return state.Domains().Create(name, kNoDefaults, false);
+  }
+
+  void Grant(unsigned int domain, const std::string& call, bool granted = true) {
+    state.Rules().Install(
+        {.domain = {domain, ""}, .kind = RuleKind::Syscall, .words = {call}, .granted = granted});
+  }
+
+  void AddPolicy(unsigned int domain, int world, const std::string& path) {
+    const LinuxHost::FilePolicy policy{
+        .domain = {domain, ""}, .world = world, .path = path, .permission = 1};
+    state.FilePolicies().Install({&policy, 1});
+  }
+
+  // The number of a label, kNoLabel when there is none.
+  unsigned int Label(const std::string& name) {
+    state.Refresh();
+    return state.Labels().Lookup(name);
+  }
+
+  // The whole content of a table, one row a line.
+  std::string Table(LinuxHost::Sql query) {
+    std::string text;
+    LinuxHost::Rows rows = state.Database().Select(query);
+    while (rows.Next()) text += rows.Text(0) + "\n";
+    return text;
+  }
+
+  std::string Domains() { return Table("SELECT id || ' ' || name FROM domain ORDER BY id"); }
+  std::string Rules() {
+    return Table(
+        "SELECT domain_id || ' ' || word1 || ' ' || iif(granted, 'grant', 'revoke') FROM rule "
+        "ORDER BY id");
+  }
+  std::string FilePolicies() {
+    return Table(
+        "SELECT domain_id || ' ' || world || ' ' || path FROM file_policy ORDER BY domain_id, "
+        "world, path");
+  }
+
+  // A copy of the state as it is now, for one call of RestorePolicy.
+  std::string Copy(const std::string& name = "copy.db") {
+    const std::string path = directory.Path() + "/" + name;
+    std::filesystem::remove(path);
+    EXPECT_EQ(CopyDatabase(directory.Database(), path), "");
+    return path;
+  }
+
+  StateDirectory directory;
+  HostState& state = HostState::Current();
+};
+
+TEST_F(SavedPolicy, PutsDomainsRulesAndPartsBack) {
+  const unsigned int one = Create("oneDom");
+  const unsigned int two = Create("twoDom");
+  Grant(one, "read");
+  Grant(two, "write", false);
+  AddPolicy(two, 0, "/srv");
+  state.Domains().SetLevel("oneDom", "permissive");
+  state.Domains().SetRole(LinuxHost::DomainRole::GlobalVm, one);
+  state.Domains().AddGuestService(one, "clock");
+  const std::string domains = Domains();
+  const std::string rules = Rules();
+  const std::string copy = Copy();
+
+  state.Domains().SetRole(LinuxHost::DomainRole::GlobalVm, two);
+  state.Domains().Destroy(one);
+  Create("threeDom");
+  Grant(two, "write");
+  Grant(two, "open");
+  AddPolicy(two, 0, "/etc");
+  RestorePolicy(copy, LabelNumbers::kNew);
+
+  EXPECT_EQ(Domains(), domains);
+  EXPECT_EQ(Rules(), rules);
+  EXPECT_EQ(FilePolicies(), "3 0 /srv\n");
+  EXPECT_EQ(state.Domains().Get("oneDom").level, "permissive");
+  EXPECT_TRUE(state.Domains().HasRole(LinuxHost::DomainRole::GlobalVm, one));
+  EXPECT_EQ(state.Domains().GuestServices(one), std::vector<std::string>{"clock"});
+}
+
+TEST_F(SavedPolicy, KeepsTheNumbersOfLabelsThatAreStillThere) {
+  state.Labels().Add({"goneLabel", "keptLabel"});
+  const unsigned int gone = Label("goneLabel");
+  const unsigned int kept = Label("keptLabel");
+  const std::string copy = Copy();
+  state.Labels().Remove({"goneLabel"});
+  state.Labels().Add({"newLabel"});
+  const unsigned int latest = Label("newLabel");
+
+  RestorePolicy(copy, LabelNumbers::kNew);
+
+  EXPECT_EQ(Label("keptLabel"), kept);
+  EXPECT_EQ(Label("newLabel"), LinuxHost::kNoLabel);
+  EXPECT_EQ(Label("goneLabel"), latest + 1);
+  EXPECT_NE(Label("goneLabel"), gone);
+}
+
+TEST_F(SavedPolicy, GivesLabelsTheirNumbersBackWhenTold) {
+  state.Labels().Add({"goneLabel"});
+  const unsigned int gone = Label("goneLabel");
+  const std::string copy = Copy();
+  state.Labels().Remove({"goneLabel"});
+  state.Labels().Add({"newLabel"});
+  const unsigned int latest = Label("newLabel");
+
+  RestorePolicy(copy, LabelNumbers::kAsSaved);
+  EXPECT_EQ(Label("goneLabel"), gone);
+  state.Labels().Add({"another"});
+  EXPECT_EQ(Label("another"), latest + 1);
+}
+
+TEST_F(SavedPolicy, PutsOriginsOfRulesBackAndThoseOfLabelsWhenTold) {
+  const LinuxHost::RuleOrigin rule{"hostDom", "-s read grant", "/old", 1};
+  const LinuxHost::LabelOrigin label{"/etc", false, "unlabeled", "/old", 1};
+  LinuxHost::RecordOrigins({&rule, 1}, {&label, 1});
+  const std::string copy = Copy();
+  const std::string second = Copy("second.db");
+  const LinuxHost::RuleOrigin newRule{"hostDom", "-s read grant", "/new", 2};
+  const LinuxHost::LabelOrigin newLabel{"/etc", false, "unlabeled", "/new", 2};
+  LinuxHost::RecordOrigins({&newRule, 1}, {&newLabel, 1});
+
+  RestorePolicy(copy, LabelNumbers::kNew);
+  EXPECT_EQ(LinuxHost::FindRuleOrigins("hostDom").at(0).file, "/old");
+  EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/new");
+  RestorePolicy(second, LabelNumbers::kAsSaved);
+  EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/old");
+}
+
+TEST_F(SavedPolicy, KeepsWhereInodesCameFromAndTheAttribute) {
+  const std::string copy = Copy();
+  const LinuxHost::InodeOrigin origin{1, 2, "base.tgz", "/etc", 3};
+  state.RecordOrigins({&origin, 1});
+  state.ChooseLabelAttribute("user.zorvan.security");
+  RestorePolicy(copy, LabelNumbers::kNew);
+  EXPECT_EQ(state.FindOrigin(1, 2)->tardisk, "base.tgz");
+  EXPECT_EQ(state.LabelAttribute(), "user.zorvan.security");
+}
+
+TEST_F(SavedPolicy, IsSeenByOtherConnections) {
+  const std::string copy = Copy();
+  HostState other(directory.Database());
+  const unsigned int late = Create("lateDom");
+  other.Refresh();
+  ASSERT_NE(other.Domains().Find("lateDom"), nullptr);
+  state.Labels().Add({"lateLabel"});
+  other.Refresh();
+  ASSERT_NE(other.Labels().Lookup("lateLabel"), LinuxHost::kNoLabel);
+
+  RestorePolicy(copy, LabelNumbers::kNew);
+
+  EXPECT_EQ(MessageOf([&] {
+              other.Rules().Install({.domain = {late, "lateDom"}, .words = {"read"}});
+            }),
+            "unknown domain " + std::to_string(late));
+  EXPECT_EQ(other.Labels().Lookup("lateLabel"), LinuxHost::kNoLabel);
+}
+
+// ---- Worlds
+
+// In the saved state "oneDom" has the number that "twoDom" has now, and the other way round.
+class SwappedDomains : public SavedPolicy {
+ protected:
+  SwappedDomains() {
+    const unsigned int one = Create("oneDom");
+    Create("twoDom");
+    copy = Copy();
+    state.Domains().Destroy(state.Domains().Get("twoDom").id);
+    state.Domains().Destroy(one);
+    Create("twoDom");
+    Create("oneDom");
+  }
+
+  unsigned int Id(const std::string& name) { return state.Domains().Get(name).id; }
+
+  std::string copy;
+};
+
+TEST_F(SwappedDomains, KeepTheirWorlds) {
+  ChildProcess world([] { pause(); });
+  const unsigned int before = Id("oneDom");
+  state.Worlds().Place(getpid(), Id("oneDom"));
+  state.Worlds().Place(world.Id(), Id("twoDom"));
+  RestorePolicy(copy, LabelNumbers::kNew);
+  ASSERT_NE(Id("oneDom"), before);
+  EXPECT_EQ(state.Worlds().DomainOf(getpid()), Id("oneDom"));
+  EXPECT_EQ(state.Worlds().DomainOf(world.Id()), Id("twoDom"));
+  world.Kill();
+}
+
+TEST_F(SwappedDomains, KeepTheFilePoliciesOfTheirWorlds) {
+  AddPolicy(Id("oneDom"), getpid(), "/one");
+  AddPolicy(Id("oneDom"), getpid(), "/same");
+  AddPolicy(Id("twoDom"), getpid(), "/same");
+  RestorePolicy(copy, LabelNumbers::kNew);
+  const std::string world = " " + std::to_string(getpid()) + " ";
+  const std::string one = std::to_string(Id("oneDom")) + world;
+  const std::string two = std::to_string(Id("twoDom")) + world;
+  EXPECT_EQ(FilePolicies(), one + "/one\n" + one + "/same\n" + two + "/same\n");
+}
+
+TEST_F(SavedPolicy, IsRefusedWhileWorldsRunInADomainThatWouldGo) {
+  const std::string copy = Copy();
+  const unsigned int late = Create("lateDom");
+  Grant(late, "read");
+  ChildProcess world([] { pause(); });
+  state.Worlds().Place(world.Id(), late);
+  const std::string rules = Rules();
+
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }),
+            "worlds run in the domain 'lateDom', which it does not have. End them, and run it "
+            "again");
+  EXPECT_EQ(Rules(), rules);
+  EXPECT_EQ(state.Worlds().DomainOf(world.Id()), late);
+
+  world.Kill();
+  world.Wait();
+  RestorePolicy(copy, LabelNumbers::kNew);
+  EXPECT_EQ(state.Domains().Find("lateDom"), nullptr);
+  EXPECT_EQ(Table("SELECT id FROM world"), "");
+}
+
+TEST_F(SavedPolicy, DropsTheFilePoliciesOfWorldsInADomainThatGoes) {
+  AddPolicy(LinuxHost::kStartDomain, getpid(), "/of-then");
+  const std::string copy = Copy();
+  state.FilePolicies().Remove(LinuxHost::kStartDomain, getpid(), "/of-then");
+  AddPolicy(Create("lateDom"), getpid(), "/late");
+  RestorePolicy(copy, LabelNumbers::kNew);
+  EXPECT_EQ(FilePolicies(), "");
+}
+
+// ---- What is refused
+
+TEST_F(SavedPolicy, IsRefusedWhenItIsOfAnotherSchema) {
+  const std::string copy = Copy();
+  const std::string domains = Domains();
+  {
+    HostState edited(copy);
+    edited.Database().Run("PRAGMA user_version = 1");
+  }
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }),
+            "it has schema 1, this program works with schema 2: it was saved by another version");
+  EXPECT_EQ(Domains(), domains);
+}
+
+TEST_F(SavedPolicy, IsRefusedWhenItIsSomethingElse) {
+  const std::string copy = Copy();
+  {
+    HostState edited(copy);
+    edited.Database().Run("PRAGMA application_id = 1");
+  }
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }), "it is no saved state");
+  directory.Write("text",
+                  "this is a text of more than one hundred bytes, which no database begins "
+                  "with, and it goes on and on and on");
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(directory.Path() + "/text", LabelNumbers::kNew); }),
+            "it is damaged");
+}
+
+TEST_F(SavedPolicy, IsRefusedWhenItIsDamaged) {
+  for (int number = 0; number < 200; ++number) Create("domain" + std::to_string(number));
+  const std::string copy = Copy();
+  const std::string domains = Domains();
+  {
+    std::fstream file(copy, std::ios::in | std::ios::out | std::ios::binary);
+    file.seekp(4096 * 2);
+    file << std::string(4096 * 4, '\x55');
+  }
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }), "it is damaged");
+  EXPECT_EQ(Domains(), domains);
+  // The connection is none the worse for it.
+  RestorePolicy(Copy(), LabelNumbers::kNew);
+  EXPECT_EQ(Domains(), domains);
+}
+
+// The one step is one transaction: a killed process leaves the old or the new, never a part.
+TEST_F(SavedPolicy, IsWholeWheneverItIsKilled) {
+  const auto fill = [&](const std::string& prefix) {
+    for (int number = 0; number < 40; ++number) {
+      const unsigned int id = Create(prefix + std::to_string(number));
+      Grant(id, "read");
+      AddPolicy(id, 0, "/" + prefix);
+    }
+    state.Labels().Add({prefix + "Label"});
+  };
+  const auto contents = [&] {
+    state.Refresh();
+    return Domains() + Rules() + FilePolicies() + Table("SELECT name FROM label ORDER BY name");
+  };
+  const std::string empty = Copy("empty.db");
+  fill("one");
+  const std::string one = contents();
+  const std::string copyOfOne = Copy("one.db");
+  RestorePolicy(empty, LabelNumbers::kNew);
+  fill("two");
+  const std::string two = contents();
+  const std::string copyOfTwo = Copy("two.db");
+
+  for (useconds_t delay = 0; delay < 20'000; delay += 1'000) {
+    ChildProcess restorer([&] {
+      for (;;) {
+        RestorePolicy(copyOfOne, LabelNumbers::kNew);
+        RestorePolicy(copyOfTwo, LabelNumbers::kNew);
+      }
+    });
+    usleep(delay);
+    restorer.Kill();
+    ASSERT_EQ(restorer.Wait(), "killed");
+    const std::string left = contents();
+    EXPECT_TRUE(left == one || left == two) << left;
+  }
+}
+
+// ---- Saving
+
+TEST_F(SavedPolicy, IsSavedForItsOwnerAlone) {
+  Create("savedDom");
+  const std::string place = directory.Path() + "/a/saved";
+  const std::string path = place + "/one.db";
+  SaveState(directory.Database(), path, false);
+  struct stat status {};
+  ASSERT_EQ(stat(path.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode, S_IFREG | 0600U);
+  ASSERT_EQ(stat(place.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode, S_IFDIR | 0700U);
+  HostState saved(path);
+  EXPECT_NE(saved.Domains().Find("savedDom"), nullptr);
+}
+
+TEST_F(SavedPolicy, LeavesNothingButTheFile) {
+  const std::string place = directory.Path() + "/saved";
+  SaveState(directory.Database(), place + "/one.db", false);
+  std::size_t files = 0;
+  for (const auto& entry : std::filesystem::directory_iterator(place)) {
+    EXPECT_EQ(entry.path().filename(), "one.db");
+    ++files;
+  }
+  EXPECT_EQ(files, 1U);
+}
+
+TEST_F(SavedPolicy, ReplacesAFileOnlyWhenTold) {
+  const std::string path = directory.Path() + "/saved/one.db";
+  SaveState(directory.Database(), path, false);
+  Create("lateDom");
+  EXPECT_EQ(MessageOf([&] { SaveState(directory.Database(), path, false); }),
+            "Unable to make " + path + ": File exists");
+  EXPECT_EQ(HostState(path).Domains().Find("lateDom"), nullptr);
+  SaveState(directory.Database(), path, true);
+  EXPECT_NE(HostState(path).Domains().Find("lateDom"), nullptr);
+}
+
+TEST_F(SavedPolicy, RefusesAPlaceThatOthersMayWrite) {
+  const std::string place = directory.Path() + "/saved";
+  std::filesystem::create_directory(place);
+  std::filesystem::permissions(place, std::filesystem::perms::all);
+  EXPECT_EQ(MessageOf([&] { SaveState(directory.Database(), place + "/one.db", false); }),
+            "Refusing the saved state: other users may write " + place +
+                ". Take that right from them (chmod go-w), or choose another place");
+  EXPECT_TRUE(std::filesystem::is_empty(place));
+}
+
+TEST_F(SavedPolicy, IsNotSavedFromWhatIsNoState) {
+  directory.Write("text",
+                  "this is a text of more than one hundred bytes, which no database begins "
+                  "with, and it goes on and on and on");
+  const std::string from = directory.Path() + "/text";
+  EXPECT_EQ(MessageOf([&] { SaveState(from, directory.Path() + "/saved/one.db", false); }),
+            "Unable to copy " + from + ": file is not a database");
+  EXPECT_TRUE(std::filesystem::is_empty(directory.Path() + "/saved"));
+}
+
+}  // namespace
+}  // namespace LinuxHostTest
