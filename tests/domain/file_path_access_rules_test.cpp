@@ -72,6 +72,13 @@ TEST_F(FilePathAccessRules, SetsUnresolvablePathOnceAfterInformation) {
   EXPECT_EQ(host.StandardOutput(), "");
 }
 
+TEST_F(FilePathAccessRules, TakesPathWithPercentSignsAsItIs) {
+  Add("/tmp/%s%n r");
+  EXPECT_EQ(Set(), Lines({R"(RealPath("/tmp/%s%n"))",
+                          R"(Call(0x405f, 0, 42, [{"/tmp/%s%n", 1}, {"/tmp/%s%n", 1}], 2, &out))",
+                          "returns"}));
+}
+
 TEST_F(FilePathAccessRules, SetsEachRuleInBatchOfItsOwn) {
   host.FailErrno("RealPath", "/second", ENOENT);
   Add("/first r", 1);
