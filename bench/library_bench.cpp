@@ -1,7 +1,9 @@
 // The library's own work beside bare loops that do only what cannot be left out.
 #include <benchmark/benchmark.h>
+#include <malloc.h>
 
 #include <array>
+#include <climits>
 #include <filesystem>
 #include <fstream>
 #include <string_view>
@@ -121,4 +123,11 @@ BENCHMARK(SyncLabelsBare)->Arg(1000)->Arg(10000)->Arg(100000)->Unit(benchmark::k
 
 }  // namespace
 
-BENCHMARK_MAIN();
+int main(int argc, char** argv) {
+  // Otherwise the large cases alone would give their memory back after each round, and every round
+  // of theirs would be the kernel's work of handing it out again.
+  mallopt(M_TRIM_THRESHOLD, INT_MAX);
+  mallopt(M_MMAP_MAX, 0);
+  benchmark::Initialize(&argc, argv);
+  benchmark::RunSpecifiedBenchmarks();
+}
