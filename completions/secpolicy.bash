@@ -2,7 +2,8 @@
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display diff settings'
+  local verbs='boot check load load-early restore status display why who-can diff settings'
+  local questions='read write exec call use access enter create create-socket pass'
   local verb='' kind='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
@@ -25,7 +26,7 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
-  elif [[ ($verb == display || $verb == status || $verb == diff || $verb == load) && $previous == --format ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
@@ -35,7 +36,7 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--plan --format --root --verbose --help -v -h' -- "$current")
-  elif [[ ($verb == display || $verb == status || $verb == diff) && $current == -* ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
@@ -44,6 +45,11 @@ _secpolicy() {
   elif [[ $verb == check || $verb == load || $verb == load-early ]] && ((positional == 0)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
+  elif [[ ($verb == why && $positional -eq 1) || ($verb == who-can && $positional -eq 0) ]]; then
+    mapfile -t COMPREPLY < <(compgen -W "$questions" -- "$current")
+  elif [[ ($verb == why || $verb == who-can) && $previous == @(read|write|exec) ]]; then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == diff ]] && ((positional < 2)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -W installed -- "$current"; compgen -d -- "$current")

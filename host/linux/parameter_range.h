@@ -17,6 +17,7 @@ struct ParameterRange {
 
 // Reads the range from the words of a rule: unsigned numbers, decimal or hexadecimal with "0x".
 // Without `lastWord` the range is one value. Throws HostError for anything else.
-ParameterRange ParseParameterRange(const std::string& firstWord, const std::string& lastWord);
+__attribute__((visibility("default"))) ParameterRange ParseParameterRange(
+    const std::string& firstWord, const std::string& lastWord);
 
 }  // namespace LinuxHost

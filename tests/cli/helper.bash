@@ -27,6 +27,14 @@ exits() {
   return 1
 }
 
+# answers STATUS LINE...: the latest command ended with it and wrote these lines, and no others, to
+# standard output.
+answers() {
+  exits "$1" || return
+  shift
+  diff <(printf '%s\n' "$@") - <<<"$output"
+}
+
 # says LINE: the latest command wrote this whole line to standard error.
 says() { has_line "$stderr" "$1"; }
 

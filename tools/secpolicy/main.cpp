@@ -13,8 +13,8 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,   &kCheck,   &kLoad, &kLoadEarly, &kRestore,
-                                  &kStatus, &kDisplay, &kDiff, &kSettings};
+constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck, &kLoad,   &kLoadEarly, &kRestore, &kStatus,
+                                  &kDisplay, &kWhy,   &kWhoCan, &kDiff,      &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -25,6 +25,8 @@ constexpr char kFooter[] =
     "policy\n"
     "  secpolicy --root ./r status                      is it loaded, and did it go well?\n"
     "  secpolicy --root ./r display                     look at what is installed now\n"
+    "  secpolicy --root ./r why sshDom read /etc/ssh    may it, and which rule says so?\n"
+    "  secpolicy --root ./r who-can use cap_sys_boot    which domains may?\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
     "  secpolicy --root ./r load --plan                 what would a load change?\n"
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"

@@ -14,6 +14,7 @@
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "installed/rule_words.h"
+#include "text/count.h"
 #include "text/visible.h"
 #include "verb.h"
 
@@ -66,10 +67,6 @@ Status ReadStatus() {
     }
   }
   return status;
-}
-
-std::string CountOf(std::size_t count, const std::string& noun) {
-  return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
 }
 
 std::string FormatTime(std::int64_t seconds, const char* format) {

@@ -40,5 +40,7 @@ extern const Verb kDisplay;
 extern const Verb kDiff;
 extern const Verb kSettings;
 extern const Verb kStatus;
+extern const Verb kWhoCan;
+extern const Verb kWhy;
 
 }  // namespace SecPolicyCli

@@ -1,0 +1,235 @@
+# secpolicy why
+
+load helper
+
+shown=/etc/zorvan/secpolicy
+
+# at FILE TEXT: the place of the line of the policy that begins with the text, and what follows a
+# place in an answer.
+at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tail -n 1 | cut -d : -f 1)"; }
+
+@test "yes, with the rules and the label of a file" {
+  boot
+  secpolicy why sshDom read /etc/ssh/host_key
+  answers 0 "yes: sshDom may read /etc/ssh/host_key" \
+    "$(at domains/sshDom '-r /etc/ssh')-r /etc/ssh r" \
+    "$(at domains/sshDom '-a sshKey +read')-a sshKey read grant" \
+    "label: sshKey" \
+    "$(at fileLabels/base /etc/ssh/host_key)/etc/ssh/host_key sshKey"
+  [[ -z $stderr ]]
+}
+
+@test "no, with every rule that refuses and what to write instead" {
+  boot
+  secpolicy why sshDom write /etc/ssh/host_key
+  answers 1 "no: sshDom may not write /etc/ssh/host_key" \
+    "$(at domains/sshDom '-r /etc/ssh')-r /etc/ssh r" \
+    "  instead: -r /etc/ssh rw" \
+    "$(at domains/sshDom '-a sshKey +write')-a sshKey write revoke" \
+    "  instead: -a sshKey write grant" \
+    "label: sshKey" \
+    "$(at fileLabels/base /etc/ssh/host_key)/etc/ssh/host_key sshKey"
+}
+
+@test "no, with the rules of which one is missing" {
+  boot
+  secpolicy why sshDom read /etc/services.conf/
+  answers 1 "no: sshDom may not read /etc/services.conf/" \
+    "missing in $shown/domains/sshDom, one of:" \
+    "  -r /etc/services.conf r" \
+    "  -a hostConfig read grant" \
+    "label: hostConfig" \
+    "$(at fileLabels/base '/etc/[*]')/etc/* hostConfig"
+}
+
+@test "what is missing can be pasted, and what stands instead replaced" {
+  boot
+  local domain question rule line
+  while IFS='|' read -r domain question; do
+    secpolicy why "$domain" $question
+    exits 1
+    rule=$(sed -n 's/^  instead: //p; s/^  \(-\)/\1/p' <<<"$output" | head -n 1)
+    [[ -n $rule ]]
+    line=$(sed -n "2s|^$shown/domains/$domain:\([0-9]*\): .*|\1|p" <<<"$output")
+    # The file stays the same one, with its label.
+    { sed "${line:-999}d" "$policy/domains/$domain"; echo "$rule"; } >"$BATS_TEST_TMPDIR/edited"
+    cat "$BATS_TEST_TMPDIR/edited" >"$policy/domains/$domain"
+    "$SECPOLICY" --root "$root" load 2>/dev/null
+    secpolicy why "$domain" $question
+    exits 0
+    shows "yes: $domain may $question"
+    shows "$shown/domains/$domain:$(wc -l <"$policy/domains/$domain"): $rule"
+  done <<'END'
+sshDom|read /etc/services.conf
+monitorDom|exec /opt/monitor/spool
+appDom|call mount
+appDom|call umount2
+appDom|use cap_kill
+sshDom|access sshKey write
+sshDom|access hostConfig list
+appDom|enter sshDom
+globalVMDom|create vmDisk vmDisk symlink
+globalVMDom|create vmDisk vmDisk fifo
+appDom|create-socket vmSocket dgram
+appDom|create-socket vmSocket stream
+appDom|pass bind_port 80
+appDom|pass set_uid 0x10
+END
+}
+
+@test "the nearest path rule decides alone" {
+  boot
+  secpolicy why monitorDom write /opt/monitor/spool/README
+  exits 0
+  [[ $output == *": -r /opt/monitor/spool rw"* && $output != *"-r /opt/monitor rx"* ]]
+  secpolicy why monitorDom exec /opt/monitor/spool/README
+  answers 1 "no: monitorDom may not exec /opt/monitor/spool/README" \
+    "$(at domains/monitorDom '-r /opt/monitor/spool')-r /opt/monitor/spool rw" \
+    "  instead: -r /opt/monitor/spool rwx" \
+    "label: monitorSpool" \
+    "$(at fileLabels/monitor /opt/monitor/spool)/opt/monitor/spool/* monitorSpool"
+  secpolicy why monitorDom read /opt/monitors
+  exits 1
+  [[ $output != *"-r /opt/monitor rx"* ]]
+}
+
+@test "a path rule without letters and one for the root of everything" {
+  printf -- '-r / r\n-r /etc\n' >>"$policy/domains/sshDom"
+  boot
+  secpolicy why sshDom read /usr/bin
+  exits 0
+  [[ $output == *": -r / r"* ]]
+  secpolicy why sshDom read /etc/services.conf
+  exits 1
+  shows "  instead: -r /etc r"
+}
+
+@test "a path counts as written and as it resolves" {
+  boot
+  mkdir "$root/opt/secret"
+  touch "$root/opt/secret/file"
+  ln -s /opt/secret "$root/usr/sbin/link"
+  printf -- '-r /opt/secret r\n-r /usr/sbin rx\n' >>"$policy/domains/sshDom"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  secpolicy why sshDom exec /usr/sbin/link/file
+  answers 1 "no: sshDom may not exec /usr/sbin/link/file" \
+    "$(at domains/sshDom '-r /opt/secret')-r /opt/secret r" \
+    "  instead: -r /opt/secret rx" \
+    "file: leads to /opt/secret/file" \
+    "label: none"
+  secpolicy why sshDom read /usr/sbin/link/file
+  exits 0
+}
+
+@test "what a transition leads to can be executed" {
+  boot
+  secpolicy why globalVMDom exec /usr/lib/io-filters/cache
+  answers 0 "yes: globalVMDom may exec /usr/lib/io-filters/cache" \
+    "$(at domains/globalVMDom '-d filterProgram')-d filterProgram ioFilterDom exec grant" \
+    "label: filterProgram" \
+    "$(at fileLabels/base /usr/lib/io-filters)/usr/lib/io-filters/* filterProgram"
+}
+
+@test "a domain that is not enforcing may do everything, and the answer says so" {
+  boot
+  secpolicy why hostDom call mount
+  answers 0 "yes: hostDom may call mount: it is permissive, so nothing is refused to it; its rules would refuse this" \
+    "missing in $shown/domains/hostDom:" "  -s mount grant"
+  "$SECPOLICY" --root "$root" settings enforcement sshDom disabled
+  "$SECPOLICY" --root "$root" restore 2>/dev/null
+  secpolicy why sshDom use cap_setuid
+  answers 0 "yes: sshDom may use cap_setuid: it is disabled, so nothing is refused to it" \
+    "$(at domains/sshDom '-c cap_setuid')-c cap_setuid grant"
+}
+
+@test "a file that is not there, and one without a label of the policy" {
+  boot
+  secpolicy why sshDom read /etc/ssh/none
+  answers 0 "yes: sshDom may read /etc/ssh/none" \
+    "$(at domains/sshDom '-r /etc/ssh')-r /etc/ssh r" \
+    "file: there is nothing at /etc/ssh/none under this root"
+  secpolicy why sshDom read /opt
+  answers 1 "no: sshDom may not read /opt" "missing in $shown/domains/sshDom:" "  -r /opt r" "label: unlabeled"
+}
+
+@test "a rule that no file brought, and partner and early domains" {
+  boot
+  secpolicy why daemonFrameworkDom enter appDom
+  answers 0 "yes: daemonFrameworkDom may enter appDom" "(no policy file): -d tardiskDefault appDom tardisk_exec grant"
+  secpolicy why plugin-cache call mount
+  shows "missing in $shown/domains/plugins/cache:"
+  secpolicy why bootDom call mount
+  shows "missing in $shown/early/domains/bootDom:"
+}
+
+@test "entering a domain that nobody enters names the place for an object" {
+  : >"$policy/domains/lonelyDom"
+  boot
+  secpolicy why sshDom enter lonelyDom
+  answers 1 "no: sshDom may not enter lonelyDom" "missing in $shown/domains/sshDom:" "  -d OBJECT lonelyDom exec grant"
+}
+
+@test "one transition is enough, and a revoked one alone is not" {
+  echo "-d vmProgram hostDom exec revoke" >>"$policy/domains/sshDom"
+  echo "-d sshProgram sshDom exec revoke" >>"$policy/domains/appDom"
+  boot
+  secpolicy why sshDom enter hostDom
+  answers 0 "yes: sshDom may enter hostDom" "$(at domains/sshDom '-d hostProgram')-d hostProgram hostDom exec grant"
+  secpolicy why appDom enter sshDom
+  answers 1 "no: appDom may not enter sshDom" \
+    "$(at domains/appDom '-d sshProgram')-d sshProgram sshDom exec revoke" "  instead: -d sshProgram sshDom exec grant"
+}
+
+@test "misspelt words are wrong usage" {
+  boot
+  while IFS='|' read -r question message; do
+    secpolicy why $question
+    exits 2
+    [[ -z $output ]]
+    [[ $stderr == "secpolicy: why: $message
+'secpolicy why --help' explains the questions." ]]
+  done <<'END'
+sshdom read /etc|there is no domain 'sshdom'; did you mean 'sshDom'?
+sshDom raed /etc|there is no question 'raed'; did you mean 'read'?
+sshDom fly|there is no question 'fly'; there are read, write, exec, call, use, access, enter, create, create-socket, pass
+sshDom read etc|'etc' is no path from the root on: it begins with a slash
+sshDom read /a /b|write: read PATH
+sshDom create vmDisk regular|write: create OBJECT NEWOBJECT KIND
+sshDom call reed|there is no system call 'reed'; did you mean 'read'?
+sshDom use cap_kil|there is no capability 'cap_kil'; did you mean 'cap_kill'?
+sshDom access sshKye read|there is no object 'sshKye'; did you mean 'sshKey'?
+sshDom access sshKey fly|there is no kind of access 'fly'; there are execute, list, read, remove, truncate, write
+sshDom enter appDon|there is no domain 'appDon'; did you mean 'appDom'?
+sshDom create vmDisk vmDisk regluar|there is no kind of file 'regluar'; did you mean 'regular'?
+sshDom create-socket vmSocket strean|there is no kind of socket 'strean'; did you mean 'stream'?
+sshDom pass bind_prot 1|there is no parameter check 'bind_prot'; did you mean 'bind_port'?
+sshDom pass bind_port -1|'-1' is not an unsigned number, decimal or hexadecimal with 0x
+sshDom pass bind_port 8x|'8x' is not an unsigned number, decimal or hexadecimal with 0x
+END
+  secpolicy why sshDom
+  exits 2
+  secpolicy why
+  exits 2
+}
+
+@test "--format json" {
+  boot
+  secpolicy why sshDom write /etc/ssh/host_key --format json
+  exits 1
+  fits_schema why
+  jq -e --argjson rule "$(grep -nE '^-a sshKey +write' "$policy/domains/sshDom" | cut -d : -f 1)" \
+    --argjson written "$(grep -n '^/etc/ssh/host_key' "$policy/fileLabels/base" | cut -d : -f 1)" '
+    .schema == "secpolicy.why/1" and .domain == "sshDom" and .level == "enforcing" and
+    (.allowed or .granted | not) and .missing == [] and
+    .policyFile == "/etc/zorvan/secpolicy/domains/sshDom" and
+    .question == {action: "write", words: ["/etc/ssh/host_key"], file: {exists: true,
+      paths: ["/etc/ssh/host_key"], label: "sshKey",
+      labelFile: "/etc/zorvan/secpolicy/fileLabels/base", labelLine: $written}} and
+    .rules[1] == {text: "-a sshKey write revoke", keyword: "-a", words: ["sshKey", "write"],
+      grant: false, file: "/etc/zorvan/secpolicy/domains/sshDom", line: $rule,
+      instead: "-a sshKey write grant"} and .rules[0].instead == "-r /etc/ssh rw"' <<<"$output"
+  secpolicy why hostDom call mount --format json
+  exits 0
+  fits_schema why
+  jq -e '.allowed and (.granted | not) and .rules == [] and .missing == ["-s mount grant"]' <<<"$output"
+}

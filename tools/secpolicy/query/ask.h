@@ -1,0 +1,17 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// Adds --format text|json to `app`; its value is "text" when it is not given.
+std::shared_ptr<const std::string> AddAnswerFormat(CLI::App& app);
+
+// Runs `answer` for the verb `verb`; a question that it cannot understand is wrong usage.
+ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer);
+
+}  // namespace SecPolicyCli

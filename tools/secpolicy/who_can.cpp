@@ -1,0 +1,85 @@
+#include <CLI/App.hpp>
+#include <iostream>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "installed/installed_json.h"
+#include "installed/installed_policy.h"
+#include "query/answer.h"
+#include "query/ask.h"
+#include "query/decision.h"
+#include "query/question.h"
+#include "text/count.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+// A domain that may.
+struct Found {
+  const InstalledDomain& domain;
+  Decision decision;
+};
+
+std::vector<Found> FindDomains(const Question& question, const InstalledPolicy& policy) {
+  std::vector<Found> found;
+  for (const InstalledDomain& domain : policy.domains) {
+    Decision decision = Decide(question, domain, policy);
+    if (decision.IsAllowed()) found.push_back(Found{domain, std::move(decision)});
+  }
+  return found;
+}
+
+void WriteText(const std::vector<Found>& found) {
+  for (const auto& [domain, decision] : found) WriteAnswerLine(domain, decision, std::cout);
+}
+
+void WriteJson(const Question& question, const std::vector<Found>& found) {
+  Json domains = Json::array();
+  for (const auto& [domain, decision] : found) domains.push_back(AnswerToJson(domain, decision));
+  std::cout << DumpJson({{"schema", "secpolicy.who-can/1"},
+                         {"question", QuestionToJson(question)},
+                         {"domains", domains}});
+}
+
+ExitCode Answer(const std::vector<std::string>& words, const std::string& format) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  const InstalledPolicy policy = ReadInstalledPolicy(access);
+  const Question question = ReadQuestion(words, policy, access);
+  const std::vector<Found> found = FindDomains(question, policy);
+  if (format == "json") {
+    WriteJson(question, found);
+  } else {
+    WriteText(found);
+  }
+  std::cout.flush();
+  std::cerr << "secpolicy: who-can: " << CountOf(found.size(), "domain") << " may "
+            << question.Text() << std::endl;
+  return found.empty() ? kFailed : kWell;
+}
+
+Action Define(CLI::App& app) {
+  const auto words = std::make_shared<std::vector<std::string>>();
+  app.add_option("WHAT", *words, "What is done, as for 'secpolicy why'")->required();
+  const auto format = AddAnswerFormat(app);
+  return [=] { return Ask("who-can", [=] { return Answer(*words, *format); }); };
+}
+
+}  // namespace
+
+const Verb kWhoCan = {
+    "who-can", "List the domains that may do something, each with the rule that says so",
+    "Asks every installed domain what 'secpolicy why' asks one, and prints those that may, with\n"
+    "policy file, line and rule. WHAT is written as for 'why'. Exit status: 0 some domain may,\n"
+    "1 none may, 2 a word is not known.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy who-can write /etc/ssh/host_key\n"
+    "  secpolicy who-can use cap_sys_module\n"
+    "  secpolicy who-can enter sshDom",
+    Define};
+
+}  // namespace SecPolicyCli
