@@ -2,7 +2,7 @@
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display why who-can diff settings'
+  local verbs='boot check load load-early restore status display why who-can diff save history rollback settings'
   local questions='read write exec call use access enter create create-socket pass'
   local verb='' kind='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
@@ -34,6 +34,8 @@ _secpolicy() {
       tab two-labels unreachable-domain unused-object' -- "$current")
   elif [[ $verb == check && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
+  elif [[ $verb == save && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--plan --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then

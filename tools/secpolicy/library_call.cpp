@@ -92,8 +92,8 @@ std::string ErrorsAbove(std::size_t count) {
 }  // namespace
 
 ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
-                     const std::function<void()>& call,
-                     const std::function<std::string()>& advice) {
+                     const std::function<void()>& call, const std::function<std::string()>& advice,
+                     const std::function<std::string()>& ending) {
   std::string failure;
   ErrorWatch errors(std::cerr);
   RunningCall running{verb, policyDir, &errors, nullptr};
@@ -107,7 +107,7 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   std::cout.flush();
   if (failure.empty() && errors.Count() == 0) {
     Record(running, "done", {});
-    WriteSummary(verb, "done");
+    WriteSummary(verb, ending ? ending() : "done");
     return kWell;
   }
   Record(running, "failed",

@@ -13,8 +13,9 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck, &kLoad,   &kLoadEarly, &kRestore, &kStatus,
-                                  &kDisplay, &kWhy,   &kWhoCan, &kDiff,      &kSettings};
+constexpr const Verb* kVerbs[] = {&kBoot,   &kCheck,   &kLoad,     &kLoadEarly, &kRestore,
+                                  &kStatus, &kDisplay, &kWhy,      &kWhoCan,    &kDiff,
+                                  &kSave,   &kHistory, &kRollback, &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -32,6 +33,9 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"
     "  secpolicy --root ./r load-early                  install only what early boot needs\n"
     "  secpolicy --root ./r diff ./old installed        how do two policies differ?\n"
+    "  secpolicy --root ./r save good                   keep what is installed under a name\n"
+    "  secpolicy --root ./r history                     what is saved?\n"
+    "  secpolicy --root ./r rollback good               put it back\n"
     "  secpolicy --root ./r settings enforcement appDom permissive\n"
     "  secpolicy --root ./r restore                     apply the stored level\n"
     "\n"

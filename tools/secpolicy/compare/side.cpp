@@ -7,7 +7,7 @@
 #include "compare/policy_directory.h"
 #include "kitlibs/file.h"
 #include "saved/saved_state.h"
-#include "scratch/scratch_directory.h"
+#include "scratch/state_reader.h"
 #include "scratch/used_state.h"
 
 namespace SecPolicyCli {
@@ -32,17 +32,8 @@ Side ReadDirectory(const std::string& dir) {
   return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
 }
 
-// A copy is read: even reading leaves traces beside a state.
 Side ReadStateOf(const std::string& name, const std::string& path) {
-  const ScratchDirectory scratch;
-  const std::string copy = scratch.File("host.db");
-  const std::string failure = CopyState(path, copy);
-  if (!failure.empty()) {
-    throw std::runtime_error("the state " + path + " cannot be read: " + failure);
-  }
-  const UsedState state(copy);
-  SecPolicy::TeskAccessInterfaceImpl access;
-  return {.name = name, .policy = ReadInstalledPolicy(access), .labels = std::nullopt};
+  return {.name = name, .policy = ReadStateAt(path), .labels = std::nullopt};
 }
 
 void RequireThere(const std::string& path, const std::string& otherwise) {

@@ -1,10 +1,15 @@
 #include "saved_state.h"
 
+#include <sys/stat.h>
+
 #include <algorithm>
+#include <filesystem>
+#include <tuple>
 
 namespace SecPolicyCli {
 namespace {
 
+constexpr char kEnding[] = ".db";
 constexpr std::size_t kMaxNameSize = 64;
 
 // Letters of other alphabets would depend on the locale.
@@ -27,7 +32,27 @@ std::string WhyNoSavedName(const std::string& name) {
 }
 
 std::string SavedStatePath(const std::string& name) {
-  return std::string(kSavedStatesDir) + "/" + name + ".db";
+  return std::string(kSavedStatesDir) + "/" + name + kEnding;
+}
+
+bool IsSaved(const std::string& name) {
+  struct stat status {};
+  return stat(SavedStatePath(name).c_str(), &status) == 0;
+}
+
+std::vector<SavedState> ListSavedStates() {
+  std::vector<SavedState> states;
+  if (!std::filesystem::exists(kSavedStatesDir)) return states;
+  for (const auto& entry : std::filesystem::directory_iterator(kSavedStatesDir)) {
+    struct stat status {};
+    const std::string name = entry.path().stem();
+    if (entry.path().extension() != kEnding || !WhyNoSavedName(name).empty()) continue;
+    if (stat(entry.path().c_str(), &status) != 0 || !S_ISREG(status.st_mode)) continue;
+    states.push_back({.name = name, .time = status.st_mtim.tv_sec});
+  }
+  std::ranges::sort(states, {},
+                    [](const SavedState& state) { return std::tie(state.time, state.name); });
+  return states;
 }
 
 }  // namespace SecPolicyCli

@@ -1,16 +1,28 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
+#include <vector>
 
 namespace SecPolicyCli {
 
 // Where the saved states lie. They outlive a boot.
 inline constexpr char kSavedStatesDir[] = "/var/lib/secpolicy/saved";
 
+struct SavedState {
+  std::string name;
+  std::int64_t time = 0;  // when it was saved, in seconds since 1970
+};
+
 // Why `name` cannot be the name of a saved state; empty when it can.
 std::string WhyNoSavedName(const std::string& name);
 
 // The file of the saved state `name`, which may not be there.
 std::string SavedStatePath(const std::string& name);
+
+bool IsSaved(const std::string& name);
+
+// The saved states, the oldest first. Throws std::system_error when they cannot be listed.
+std::vector<SavedState> ListSavedStates();
 
 }  // namespace SecPolicyCli

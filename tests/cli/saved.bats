@@ -1,0 +1,180 @@
+# secpolicy save, history and rollback
+
+load helper
+
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/new
+  saved=$root/var/lib/secpolicy/saved
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  cp -r "$root/etc/zorvan/secpolicy" "$policy"
+}
+
+# What is installed, without the numbers of objects.
+installed() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed 's/^\([A-Za-z]*\) ([0-9]*)$/\1/'; }
+
+no_state() { echo "secpolicy: $1: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy boot' first."; }
+
+@test "what was saved comes back" {
+  secpolicy settings enforcement appDom permissive
+  secpolicy restore
+  installed >"$BATS_TEST_TMPDIR/before"
+  secpolicy save good
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: save: done" ]]
+
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  sed -i 's/^\(-c cap_net_bind_service\) grant/\1 revoke/' "$policy/domains/sshDom"
+  touch "$policy/domains/newDom"
+  sed -i '/monitorSocket/d' "$policy/domains/monitorDom" "$policy/objects/monitor"
+  echo "newObject" >>"$policy/objects/base"
+  secpolicy load /new
+  secpolicy settings enforcement appDom enforcing
+  secpolicy restore
+  secpolicy diff good installed
+  exits 1
+
+  secpolicy rollback good
+  exits 0
+  [[ -z $output ]]
+  [[ $stderr == "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy label verify' compares them with the policy" ]]
+  installed | diff "$BATS_TEST_TMPDIR/before" -
+  secpolicy diff good installed
+  exits 0
+}
+
+@test "after a rollback a load works as before" {
+  secpolicy save good
+  echo "newObject" >>"$policy/objects/base"
+  secpolicy load /new
+  secpolicy rollback good
+  secpolicy load
+  exits 0
+  secpolicy diff good installed
+  exits 0
+}
+
+@test "files keep the labels that they carry" {
+  secpolicy save good
+  echo "/etc/services.conf sshKey" >"$policy/fileLabels/zz"
+  secpolicy load /new
+  secpolicy rollback good
+  secpolicy load --plan
+  [[ $output == "files to label anew (1):
+  /etc/services.conf: sshKey -> hostConfig" ]]
+}
+
+@test "history lists the saved states, the oldest first" {
+  secpolicy history
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: history: nothing is saved" ]]
+  secpolicy save later
+  secpolicy save a
+  touch -d '2026-01-02 03:04:05 UTC' "$saved/later.db"
+  touch -d '2025-12-31 23:59:59 UTC' "$saved/a.db"
+  touch "$saved/notes" "$saved/.a.db.XXXXXX"
+  secpolicy history
+  exits 0
+  local rules
+  secpolicy display
+  rules=$(grep -c '^-[a-z] ' <<<"$output")
+  domains=$(grep -c '^Domain Name' <<<"$output")
+  secpolicy history
+  [[ $output == "a      2025-12-31 23:59:59 UTC  $domains domains, $rules rules
+later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
+  [[ $stderr == "secpolicy: history: 2 saved states" ]]
+}
+
+@test "a saved state is for its owner alone, and outlives the state" {
+  secpolicy save good
+  [[ $(stat -c '%a' "$saved") == 700 && $(stat -c '%a' "$saved/good.db") == 600 ]]
+  [[ $(ls -A "$saved") == good.db ]]
+  boot
+  secpolicy rollback good
+  exits 0
+}
+
+@test "a taken name is refused without --force" {
+  secpolicy save good
+  echo "newObject" >>"$policy/objects/base"
+  secpolicy load /new
+  secpolicy save good
+  exits 1
+  [[ $stderr == "secpolicy: save: there is a saved state 'good' already. Give --force to replace it, or choose another name." ]]
+  secpolicy diff good installed
+  exits 1
+  secpolicy save --force good
+  exits 0
+  secpolicy diff good installed
+  exits 0
+}
+
+@test "what cannot be a name is wrong usage" {
+  local name
+  for name in .hidden a/b 'a b' '' installed 'ü' "$(printf 'x%.0s' {1..65})"; do
+    secpolicy save "$name"
+    exits 2
+    secpolicy rollback "$name"
+    exits 2
+  done
+  [[ ! -e $saved ]]
+  secpolicy save A-z.0_9
+  exits 0
+}
+
+@test "what there is not" {
+  secpolicy rollback good
+  exits 1
+  [[ $stderr == "secpolicy: rollback: there is no saved state 'good'. 'secpolicy history' lists what is saved." ]]
+  secpolicy save good
+  rm "$root/run/secpolicy/"*
+  secpolicy save other
+  exits 1
+  [[ $stderr == "$(no_state save)" ]]
+  secpolicy rollback good
+  exits 1
+  [[ $stderr == "$(no_state rollback)" ]]
+  [[ ! -e $root/run/secpolicy/host.db ]]
+}
+
+@test "a damaged saved state, and one of another version, change nothing" {
+  installed >"$BATS_TEST_TMPDIR/before"
+  secpolicy save bad
+  secpolicy save old
+  echo garbage >"$saved/bad.db"
+  sqlite3 "$saved/old.db" 'PRAGMA user_version = 1'
+  touch -d '2025-01-01 UTC' "$saved/bad.db"
+  secpolicy rollback bad
+  exits 1
+  [[ $stderr == "secpolicy: rollback: the saved state 'bad' cannot be put back, so nothing was changed: file is not a database" ]]
+  secpolicy rollback old
+  exits 1
+  [[ $stderr =~ ^"secpolicy: rollback: the saved state 'old' cannot be put back, so nothing was changed: it has schema 1, this program works with schema "[0-9]+": it was saved by another version"$ ]]
+  installed | diff "$BATS_TEST_TMPDIR/before" -
+  secpolicy history
+  exits 1
+  [[ $output == "bad  2025-01-01 00:00:00 UTC  the state /var/lib/secpolicy/saved/bad.db cannot be read: file is not a database
+old  "*" UTC  Unable to use the host state /var/lib/secpolicy/saved/old.db: it has schema 1, "* ]]
+}
+
+@test "a rollback that would leave a process without its domain is refused" {
+  secpolicy save good
+  touch "$policy/domains/lateDom"
+  secpolicy load /new
+  sleep 1000 &
+  local world=$! start
+  start=$(sed 's/.*) //' "/proc/$world/stat" | cut -d' ' -f20)
+  sqlite3 "$root/run/secpolicy/host.db" "INSERT INTO world VALUES ($world, $start, $(domain_id lateDom))"
+  mkdir -p "$root/proc"
+  if ! mount -t proc proc "$root/proc"; then
+    kill "$world"
+    skip "/proc cannot be mounted here"
+  fi
+  secpolicy rollback good
+  umount "$root/proc"
+  kill "$world"
+  exits 1
+  [[ $stderr == "secpolicy: rollback: the saved state 'good' cannot be put back, so nothing was changed: worlds run in the domain 'lateDom', which it does not have. End them, and run it again" ]]
+  [[ -n $(domain_id lateDom) ]]
+}

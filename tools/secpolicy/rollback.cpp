@@ -1,0 +1,68 @@
+#include <unistd.h>
+
+#include <CLI/App.hpp>
+#include <stdexcept>
+
+#include "host/linux/saved_policy.h"
+#include "library_call.h"
+#include "root.h"
+#include "saved/saved_name.h"
+#include "saved/saved_state.h"
+#include "scratch/scratch_directory.h"
+#include "scratch/used_state.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+void PutBack(const std::string& name) {
+  const ScratchDirectory scratch;
+  const std::string copy = scratch.File("saved.db");
+  const std::string failure = CopyState(SavedStatePath(name), copy);
+  const std::string problem = "the saved state '" + name +
+                              "' cannot be put back, so nothing was "
+                              "changed: ";
+  if (!failure.empty()) throw std::runtime_error(problem + failure);
+  try {
+    LinuxHost::RestorePolicy(copy, LinuxHost::LabelNumbers::kNew);
+  } catch (const std::exception& reason) {
+    throw std::runtime_error(problem + reason.what());
+  }
+}
+
+ExitCode RollBack(const std::string& name) {
+  if (access(StatePath().c_str(), F_OK) != 0) return RefuseWithoutState("rollback");
+  if (!IsSaved(name)) {
+    return Refuse("rollback", "there is no saved state '" + name +
+                                  "'. 'secpolicy history' lists what is saved.");
+  }
+  return CallLibrary(
+      "rollback", "", [&] { PutBack(name); }, AdviseOnPrivilege,
+      [] {
+        return "done; files keep the labels that they have, and 'secpolicy label verify' compares "
+               "them with the policy";
+      });
+}
+
+Action Define(CLI::App& app) {
+  const auto name = AddSavedName(app, "The saved state to put back");
+  return [name] { return RollBack(*name); };
+}
+
+}  // namespace
+
+const Verb kRollback = {
+    "rollback", "Put a saved state back in place of what is installed",
+    "Domains, their enforcement levels, rules and parts, and the objects become what they were\n"
+    "when the state was saved, in one step: killed on the way, it leaves the old or the new.\n"
+    "Running processes stay in their domains; it is refused while any runs in a domain that the\n"
+    "saved state does not have. Files keep their labels, and objects their numbers; an object "
+    "that\n"
+    "was gone comes back with a new number, so label its files again ('label relabel').\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy diff before-upgrade installed   what would be lost?\n"
+    "  secpolicy rollback before-upgrade",
+    Define};
+
+}  // namespace SecPolicyCli

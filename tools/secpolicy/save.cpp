@@ -1,0 +1,48 @@
+#include <unistd.h>
+
+#include <CLI/App.hpp>
+#include <memory>
+
+#include "host/linux/saved_policy.h"
+#include "library_call.h"
+#include "root.h"
+#include "saved/saved_name.h"
+#include "saved/saved_state.h"
+#include "scratch/used_state.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+ExitCode Save(const std::string& name, bool force) {
+  if (access(StatePath().c_str(), F_OK) != 0) return RefuseWithoutState("save");
+  if (!force && IsSaved(name)) {
+    return Refuse("save", "there is a saved state '" + name +
+                              "' already. Give --force to replace it, or choose another name.");
+  }
+  return CallLibrary(
+      "save", "", [&] { LinuxHost::SaveState(StatePath(), SavedStatePath(name), force); },
+      AdviseOnPrivilege);
+}
+
+Action Define(CLI::App& app) {
+  const auto name = AddSavedName(app, "The name to save it under");
+  const auto force = std::make_shared<bool>(false);
+  app.add_flag("--force", *force, "Replace a saved state of this name");
+  return [name, force] { return Save(*name, *force); };
+}
+
+}  // namespace
+
+const Verb kSave = {
+    "save", "Keep what is installed now under a name",
+    "Copies the installed state, domains, rules, objects and all, to a file of its own in\n"
+    "/var/lib/secpolicy/saved, which outlives a boot. 'history' lists what is saved, 'diff' \n"
+    "compares with it, and 'rollback' puts it back. The labels that files carry are not saved.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy save before-upgrade\n"
+    "  secpolicy save --force nightly       replace the one of that name",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,22 @@
+#include "saved_name.h"
+
+#include <CLI/App.hpp>
+
+#include "library_call.h"
+#include "saved_state.h"
+
+namespace SecPolicyCli {
+
+std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string& meaning) {
+  const auto name = std::make_shared<std::string>();
+  app.add_option("NAME", *name, meaning)->required()->check(CLI::Validator(WhyNoSavedName, ""));
+  return name;
+}
+
+ExitCode RefuseWithoutState(const std::string& verb) {
+  return Refuse(verb,
+                "nothing is installed below this root. Name the root that was booted (--root "
+                "DIR), or run 'secpolicy boot' first.");
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// Adds the required argument NAME, the name of a saved state, to `app`.
+std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string& meaning);
+
+// Refuses what needs an installed state where there is none.
+ExitCode RefuseWithoutState(const std::string& verb);
+
+}  // namespace SecPolicyCli

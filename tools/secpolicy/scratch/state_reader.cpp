@@ -1,0 +1,36 @@
+#include "state_reader.h"
+
+#include <stdexcept>
+
+#include "braxo/lib/exception.h"
+#include "scratch_directory.h"
+#include "used_state.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// The message as it is about the original.
+std::string About(const std::string& path, const std::string& copy, std::string message) {
+  const std::size_t found = message.find(copy);
+  return found == std::string::npos ? message : message.replace(found, copy.size(), path);
+}
+
+}  // namespace
+
+InstalledPolicy ReadStateAt(const std::string& path) {
+  const ScratchDirectory scratch;
+  const std::string copy = scratch.File("host.db");
+  const std::string failure = CopyState(path, copy);
+  if (!failure.empty()) {
+    throw std::runtime_error("the state " + path + " cannot be read: " + failure);
+  }
+  const UsedState state(copy);
+  try {
+    SecPolicy::TeskAccessInterfaceImpl access;
+    return ReadInstalledPolicy(access);
+  } catch (const Braxo::Lib::BraxoException& problem) {
+    throw std::runtime_error(About(path, copy, problem.what()));
+  }
+}
+
+}  // namespace SecPolicyCli
