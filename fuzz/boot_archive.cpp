@@ -260,7 +260,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   std::set<fs::path> missing;
   for (const auto& origin : origins) {
     RequireEqual(origin.tardisk, "image.tgz", "the tardisk of " + origin.path);
-    if (!world.IsInRoot(origin.path)) missing.insert(fs::path(origin.path).lexically_normal());
+    if (!world.IsInRoot(origin.path))
+      missing.insert((fs::path(origin.path) / "").lexically_normal());
   }
   // An entry that cannot be made has removed an earlier one of its name by then.
   Require(missing.size() <= (failure.empty() ? 0 : 1),
