@@ -37,7 +37,7 @@ _secpolicy() {
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--plan --format --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $current == -* ]]; then

@@ -2,6 +2,7 @@
 
 #include "policy_dir.h"
 #include "rehearsal/planned_load.h"
+#include "rehearsal/whole_load.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "verb.h"
@@ -11,11 +12,13 @@ namespace {
 
 struct Options {
   bool plan = false;
+  bool allOrNothing = false;
   PlanOptions planOptions;
 };
 
 ExitCode Load(const std::string& dir, const Options& options) {
   if (options.plan) return PlanLoad(dir, options.planOptions);
+  if (options.allOrNothing) return LoadAllOrNothing(dir);
   return LoadFrom("load", dir, SecPolicy::LoadPolicy);
 }
 
@@ -29,6 +32,10 @@ Action Define(CLI::App& app) {
       ->needs(plan)
       ->type_name("FORMAT")
       ->capture_default_str();
+  app.add_flag(
+         "--all-or-nothing", options->allOrNothing,
+         "Load only when a rehearsal ends well, and put everything back when the load does not")
+      ->excludes(plan);
   const CLI::Option* const verbose = app.get_parent()->get_option("--verbose");
   return [=] {
     options->planOptions.showAll = verbose->count() > 0;
@@ -45,12 +52,15 @@ const Verb kLoad = {
     "are always those of /etc/zorvan/secpolicy. What is installed and in no file any more stays.\n"
     "With --plan the load is rehearsed on a copy of what is installed: it shows what it would\n"
     "change and which problems it would have, and changes nothing. Exit status as of the load.\n"
+    "With --all-or-nothing the load is rehearsed in the same way, and done only when that ends\n"
+    "well; when it then fails or is interrupted, rules, objects and file labels are put back.\n"
     "\n"
     "Examples:\n"
     "  secpolicy load                       install the host's policy again after an edit\n"
     "  secpolicy --root /srv/r load -v      the same below /srv/r, and show the progress\n"
     "  secpolicy load /root/new-policy      objects, domains and labels of another directory\n"
-    "  secpolicy load --plan                what would change? -v shows every file",
+    "  secpolicy load --plan                what would change? -v shows every file\n"
+    "  secpolicy load --all-or-nothing      never half a policy",
     Define};
 
 }  // namespace SecPolicyCli

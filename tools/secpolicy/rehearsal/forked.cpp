@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 #include <exception>
 #include <iostream>
@@ -19,9 +20,8 @@ namespace {
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << failure.what() << std::endl;
   }
-  std::cout.flush();
-  // What the parent has yet to write and to clean up is not the child's.
-  _exit(code);
+  // Closes the connections to the state. What the parent has on its stack is not cleaned up.
+  std::exit(code);
 }
 
 }  // namespace

@@ -1,0 +1,149 @@
+# secpolicy load --all-or-nothing
+
+load helper
+
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/new
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  cp -r "$root/etc/zorvan/secpolicy" "$policy"
+  # A load that changes a bit of everything, the labels of three files at last.
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  touch "$policy/domains/newDom"
+  sed -i '/monitorSocket/d' "$policy/domains/monitorDom" "$policy/objects/monitor"
+  echo "newObject" >>"$policy/objects/base"
+  printf '%s newObject\n' /etc/services.conf /usr/bin/supervise /var/lib/vms/demo/settings >\
+    "$policy/fileLabels/zz"
+}
+
+load_whole() { secpolicy load --all-or-nothing /new; }
+
+# The attribute of every file, and everything that display shows, numbers included.
+everything() {
+  python3 - "$root" <<'END'
+import os, sys
+for directory, _, files in sorted(os.walk(sys.argv[1])):
+    for path in [directory] + [os.path.join(directory, name) for name in sorted(files)]:
+        print(path, [(name, os.getxattr(path, name).hex()) for name in os.listxattr(path)])
+END
+  "$SECPOLICY" --root "$root" display 2>&1
+}
+
+# break_labels HOW PATH: from now on the kernel's answer to the second label of PATH is HOW, "fail"
+# or "die". A rehearsal gives no labels, so it does not notice.
+break_labels() {
+  cat >"$BATS_TEST_TMPDIR/break.c" <<'END'
+#define _GNU_SOURCE
+#include <dlfcn.h>
+#include <errno.h>
+#include <signal.h>
+#include <string.h>
+#include <stdlib.h>
+#include <sys/types.h>
+#include <unistd.h>
+int setxattr(const char* path, const char* name, const void* value, size_t size, int flags) {
+  static int calls = 0;
+  if (strcmp(path, getenv("BREAK_PATH")) == 0 && ++calls == 2) {
+    if (strcmp(getenv("BREAK_HOW"), "die") == 0) {
+      kill(getppid(), SIGINT);
+      kill(getpid(), SIGKILL);
+    }
+    errno = EIO;
+    return -1;
+  }
+  int (*really)(const char*, const char*, const void*, size_t, int) = dlsym(RTLD_NEXT, "setxattr");
+  return really(path, name, value, size, flags);
+}
+END
+  cc -shared -fPIC -o "$BATS_TEST_TMPDIR/break.so" "$BATS_TEST_TMPDIR/break.c"
+  breakage=(env "LD_PRELOAD=$BATS_TEST_TMPDIR/break.so" "BREAK_HOW=$1" "BREAK_PATH=$2"
+    ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0)
+}
+
+@test "a load that can be done is done" {
+  load_whole
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: load: done" ]]
+  secpolicy diff /new installed
+  exits 0
+  secpolicy load --plan /new
+  [[ -z $output && $stderr == "secpolicy: load: nothing would change" ]]
+}
+
+@test "it does what a load does" {
+  load_whole
+  everything | sed "s|^$root||" >"$BATS_TEST_TMPDIR/whole"
+  local whole=$root
+  root=$BATS_TEST_TMPDIR/other
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  cp -r "$whole/new" "$root/new"
+  secpolicy load /new
+  everything | sed "s|^$root||" | diff "$BATS_TEST_TMPDIR/whole" -
+}
+
+@test "a load with errors changes nothing, and tells them as a load does" {
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  everything >"$BATS_TEST_TMPDIR/before"
+  load_whole
+  exits 1
+  ends_with "secpolicy: load: nothing was changed: this was the rehearsal. Without --all-or-nothing, a load installs what has no errors."
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+  local rehearsed=${stderr%$'\n'*}
+  secpolicy load /new
+  [[ $rehearsed == "$stderr" ]]
+}
+
+@test "a load that would be stopped changes nothing" {
+  rm "$root/run/secpolicy/"* "$policy/domains/ioFilterDom"
+  sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
+  load_whole
+  exits 3
+  says "Error: Failed to fetch domainID for IOFilter domain"
+  [[ ! -e $root/run/secpolicy/host.db ]]
+}
+
+@test "a load that fails on the way is undone, labels and numbers included" {
+  everything >"$BATS_TEST_TMPDIR/before"
+  break_labels fail /var/lib/vms/demo/settings
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 1
+  says "Error: /new/fileLabels/zz:3 : Unable to set file label (newObject) for file /var/lib/vms/demo/settings: Input/output error"
+  ends_with "secpolicy: load: failed on the way, so everything was put back as it was (the state, and 2 file labels)"
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+  # The same failure leaves a plain load half done.
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load /new
+  exits 1
+  everything >"$BATS_TEST_TMPDIR/half"
+  run diff -q "$BATS_TEST_TMPDIR/before" "$BATS_TEST_TMPDIR/half"
+  exits 1
+}
+
+@test "a load that is killed on the way is undone, also when the command is interrupted" {
+  everything >"$BATS_TEST_TMPDIR/before"
+  break_labels die /usr/bin/supervise
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 1
+  [[ $stderr == "secpolicy: load: the load died: Killed
+secpolicy: load: failed on the way, so everything was put back as it was (the state, and 1 file label)" ]]
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+}
+
+@test "where nothing was installed, nothing is afterwards" {
+  rm "$root/run/secpolicy/"*
+  break_labels fail /var/lib/vms/demo/settings
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 1
+  secpolicy display
+  [[ $(grep -c '^Domain Name' <<<"$output") -eq 1 ]]
+  [[ $(grep -c '^-' <<<"$(grep '^-[a-z] ' <<<"$output")") -eq 0 ]]
+}
+
+@test "it does not go with --plan, nor without a directory" {
+  secpolicy load --plan --all-or-nothing
+  exits 2
+  secpolicy load --all-or-nothing /no/such
+  exits 1
+  [[ $stderr == "secpolicy: load: there is no directory /no/such below this root, so nothing was changed. "* ]]
+}
