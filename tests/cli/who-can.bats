@@ -68,7 +68,7 @@ END
   secpolicy who-can call reed
   exits 2
   [[ $stderr == "secpolicy: who-can: there is no system call 'reed'; did you mean 'read'?
-'secpolicy who-can --help' explains the questions." ]]
+'secpolicy who-can --help' explains the usage." ]]
   secpolicy who-can
   exits 2
 }

@@ -187,7 +187,7 @@ END
     exits 2
     [[ -z $output ]]
     [[ $stderr == "secpolicy: why: $message
-'secpolicy why --help' explains the questions." ]]
+'secpolicy why --help' explains the usage." ]]
   done <<'END'
 sshdom read /etc|there is no domain 'sshdom'; did you mean 'sshDom'?
 sshDom raed /etc|there is no question 'raed'; did you mean 'read'?

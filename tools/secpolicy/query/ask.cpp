@@ -21,7 +21,7 @@ ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer) {
     return answer();
   } catch (const QuestionError& error) {
     std::cerr << "secpolicy: " << verb << ": " << error.what() << "\n'secpolicy " << verb
-              << " --help' explains the questions." << std::endl;
+              << " --help' explains the usage." << std::endl;
     return kUsage;
   }
 }

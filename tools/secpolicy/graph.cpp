@@ -1,0 +1,66 @@
+#include <CLI/App.hpp>
+#include <iostream>
+#include <memory>
+#include <string>
+
+#include "graph/graphviz.h"
+#include "graph/policy_graph.h"
+#include "installed/installed_policy.h"
+#include "library_call.h"
+#include "query/ask.h"
+#include "query/question.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+DotGraph Draw(const std::string& name, const InstalledPolicy& policy) {
+  if (name.empty()) return DrawDomains(policy);
+  return DrawDomain(FindAskedDomain(name, policy), policy);
+}
+
+ExitCode Graph(const std::string& name, const std::string& format) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  const std::string dot = Draw(name, ReadInstalledPolicy(access)).Text();
+  if (format == "dot") {
+    std::cout << dot << std::flush;
+    return kWell;
+  }
+  try {
+    DrawSvg(dot);
+  } catch (const std::runtime_error& failure) {
+    return Refuse("graph", failure.what());
+  }
+  return kWell;
+}
+
+Action Define(CLI::App& app) {
+  const auto domain = std::make_shared<std::string>();
+  const auto format = std::make_shared<std::string>("dot");
+  app.add_option("--domain", *domain, "Draw only this domain, with all that it may reach")
+      ->type_name("DOMAIN");
+  app.add_option("--format", *format, "How to write the graph: dot or svg")
+      ->check(CLI::IsMember({"dot", "svg"}))
+      ->type_name("FORMAT")
+      ->capture_default_str();
+  return [=] { return Ask("graph", [=] { return Graph(*domain, *format); }); };
+}
+
+}  // namespace
+
+const Verb kGraph = {
+    "graph", "Draw the installed domains and the transitions between them",
+    "Writes a graph to standard output: a box for each domain, dashed when it is permissive and\n"
+    "dotted when it is disabled, and an arrow for each transition that is granted, with the "
+    "object\n"
+    "and the kind. With --domain, one domain and what it may reach: other domains, objects, "
+    "paths,\n"
+    "capabilities and the rest. 'dot' is the language of Graphviz; 'svg' is drawn by Graphviz.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy graph --format svg >policy.svg\n"
+    "  secpolicy graph --domain sshDom --format svg >sshDom.svg\n"
+    "  secpolicy graph | dot -Tpdf >policy.pdf",
+    Define, KeepSystemRoot};
+
+}  // namespace SecPolicyCli
