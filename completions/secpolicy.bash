@@ -2,18 +2,18 @@
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display why who-can graph diff save history rollback settings'
+  local verbs='boot check load load-early restore status display why who-can diff save history rollback label settings'
   local questions='read write exec call use access enter create create-socket pass'
   local verb='' kind='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable ]]; then
+    if [[ $word == --root || $word == --format || $word == --disable || $word == --policy ]]; then
       index=$((index + 1))
     elif [[ $word == -* ]]; then
       continue
     elif [[ -z $verb ]]; then
       verb=$word
-    elif [[ $verb == settings && -z $kind ]]; then
+    elif [[ ($verb == settings || $verb == label) && -z $kind ]]; then
       kind=$word
     else
       positional=$((positional + 1))
@@ -21,17 +21,13 @@ _secpolicy() {
   done
 
   COMPREPLY=()
-  if [[ $previous == --root ]]; then
+  if [[ $previous == --root || $previous == --policy ]]; then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
-  elif [[ $verb == graph && $previous == --format ]]; then
-    mapfile -t COMPREPLY < <(compgen -W 'dot svg' -- "$current")
-  elif [[ $verb == graph && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--domain --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
       installed-only long-line missing-path no-tardisk nul-byte second-policy skipped-entry star-in-path
@@ -41,9 +37,15 @@ _secpolicy() {
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--plan --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
+  elif [[ $kind == relabel && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--dry-run --policy --root --help -n -h' -- "$current")
+  elif [[ $kind == verify && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--policy --root --help -h' -- "$current")
+  elif [[ $verb == label && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--recursive --root --help -R -h' -- "$current")
   elif [[ $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
   elif [[ -z $verb ]]; then
@@ -59,6 +61,11 @@ _secpolicy() {
   elif [[ $verb == diff ]] && ((positional < 2)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -W installed -- "$current"; compgen -d -- "$current")
+  elif [[ $verb == label && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'get set verify relabel' -- "$current")
+  elif [[ $verb == label ]] && [[ $kind != set || $positional -gt 0 ]]; then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == settings && -z $kind ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'option enforcement' -- "$current")
   elif [[ $kind == option ]] && ((positional == 0)); then

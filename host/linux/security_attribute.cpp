@@ -68,6 +68,16 @@ int GiveFirstLabel(const char* path, std::uint32_t id) {
   return lsetxattr(path, LabelAttribute().c_str(), &id, sizeof id, 0);
 }
 
+std::optional<std::uint32_t> ReadLabel(const char* path) {
+  std::uint32_t id = 0;
+  if (lgetxattr(path, LabelAttribute().c_str(), &id, sizeof id) < 0) return std::nullopt;
+  return id;
+}
+
+int ReplaceLabel(const char* path, std::uint32_t id) {
+  return lsetxattr(path, LabelAttribute().c_str(), &id, sizeof id, XATTR_REPLACE);
+}
+
 }  // namespace LinuxHost
 
 namespace Zorvan::Kernel {

@@ -3,6 +3,7 @@
 #include <sys/types.h>
 
 #include <cstdint>
+#include <optional>
 #include <string>
 
 // The attribute "zorvan.security" as stock Linux can hold it.
@@ -20,5 +21,13 @@ bool CanCarryLabel(mode_t mode);
 // Gives the file at `path`, which is not a link, the label `id` whether or not it had one. Returns
 // 0, or -1 with errno set. Links on the way to the file are followed, the last one is not.
 int GiveFirstLabel(const char* path, std::uint32_t id);
+
+// The label of the file at `path`; nothing, with errno set, when it has none or it cannot be read.
+// Links on the way to the file are followed, the last one is not.
+__attribute__((visibility("default"))) std::optional<std::uint32_t> ReadLabel(const char* path);
+
+// Gives the file at `path` the label `id` in place of the one it has. Returns 0, or -1 with errno
+// set; ENODATA when it had none. Links on the way to the file are followed, the last one is not.
+__attribute__((visibility("default"))) int ReplaceLabel(const char* path, std::uint32_t id);
 
 }  // namespace LinuxHost

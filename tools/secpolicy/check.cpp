@@ -11,6 +11,7 @@
 #include "library_call.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
+#include "text/count.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -47,10 +48,6 @@ void CheckPolicy(CheckRun& run, const std::string& root) {
   if (IsDirectory(tardisks)) CheckTardisks(run, tardisks);
   CheckFileLabels(run, root + "/" + SecPolicy::kFileLabelsDir);
   CheckUse(run, domains);
-}
-
-std::string CountOf(std::size_t count, const std::string& noun) {
-  return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
 }
 
 void WriteSummary(const std::string& text) {

@@ -1,0 +1,351 @@
+# secpolicy label
+
+load helper
+
+labels=/etc/zorvan/secpolicy/fileLabels
+
+# the_label PATH: the label that the command says a file has.
+the_label() {
+  "$SECPOLICY" --root "$root" label get "$1" 2>/dev/null | sed "s|^$1: ||"
+}
+
+# on_a_terminal ARGUMENT...: the command on a terminal of its own; $output is what that shows, with
+# every return of the carriage as a line.
+on_a_terminal() {
+  run script -qec "'$SECPOLICY' --root '$root' $*" /dev/null
+  output=$(tr -s '\r' '\n' <<<"$output")
+}
+
+@test "get prints the label of each file" {
+  boot
+  secpolicy label get /usr/sbin/sshd /etc/ssh/host_key /opt
+  exits 0
+  [[ $output == "/usr/sbin/sshd: sshProgram
+/etc/ssh/host_key: sshKey
+/opt: unlabeled" ]]
+  [[ $stderr == "secpolicy: label get: done" ]]
+}
+
+@test "get -R prints a tree in order of name, without its links and sockets" {
+  boot
+  ln -s host_key "$root/etc/ssh/alias"
+  python3 -c 'import socket, sys; socket.socket(socket.AF_UNIX).bind(sys.argv[1])' "$root/etc/ssh/socket"
+  secpolicy label get -R /etc/ssh /usr/sbin/sshd
+  exits 0
+  [[ $output == "/etc/ssh: hostConfig
+/etc/ssh/host_key: sshKey
+/usr/sbin/sshd: sshProgram" ]]
+}
+
+@test "get of what has no label, and of what is not there, fails and shows the rest" {
+  boot
+  touch "$root/etc/new"
+  secpolicy label get /etc/new /no/such /opt
+  exits 1
+  [[ $output == "/opt: unlabeled" ]]
+  [[ $stderr == "Error: /etc/new: has no label; 'secpolicy boot' gives every file its first one
+Error: /no/such: No such file or directory
+secpolicy: label get: failed (2 errors above)" ]]
+}
+
+@test "get of a label that the policy has dropped says so" {
+  boot
+  sed -i /hostConfig/d "$policy/objects/base" "$policy/fileLabels/base" "$policy/domains/"*Dom
+  secpolicy load
+  secpolicy label get /etc/services.conf
+  exits 1
+  [[ $stderr =~ ^"Error: /etc/services.conf: has a label that is gone ("[0-9]+")" ]]
+}
+
+@test "a control character in a name does not reach the terminal" {
+  boot
+  touch "$root/etc/a"$'\n'"b"
+  secpolicy boot
+  secpolicy label get -R /etc
+  shows '/etc/a^Jb: hostConfig'
+}
+
+@test "set gives files a label, and with -R trees" {
+  boot
+  secpolicy label set sshKey /etc/services.conf /etc/ssh
+  exits 0
+  [[ $stderr == "secpolicy: label set: done" ]]
+  [[ $(the_label /etc/services.conf) == sshKey && $(the_label /etc/ssh) == sshKey ]]
+  secpolicy label set -R vmDisk /opt
+  exits 0
+  secpolicy label get -R /opt
+  [[ $output != *unlabeled* && $(grep -c ': vmDisk$' <<<"$output") -eq $(find "$root/opt" | wc -l) ]]
+}
+
+@test "set of a label that there is not changes nothing and says what was meant" {
+  boot
+  secpolicy label set sshKye /etc
+  exits 1
+  [[ $stderr == "secpolicy: label set: there is no object label 'sshKye'. Did you mean 'sshKey'?" ]]
+  secpolicy label set entirelyDifferent /etc
+  exits 1
+  [[ $stderr == "secpolicy: label set: there is no object label 'entirelyDifferent'. 'secpolicy display' shows all labels" ]]
+  secpolicy label set /etc sshKey
+  exits 1
+  [[ $stderr == "secpolicy: label set: there is no object label '/etc'. The label comes first: secpolicy label set sshKey /etc" ]]
+  [[ $(the_label /etc) == hostConfig ]]
+}
+
+@test "set does the other files when one fails" {
+  boot
+  touch "$root/etc/new"
+  secpolicy label set sshKey /etc/new /no/such /opt
+  exits 1
+  [[ $stderr == "Error: Unable to set file label (sshKey) for file /etc/new: No data available: it has no label; 'secpolicy boot' gives every file its first one
+Error: Unable to set file label (sshKey) for file /no/such: No such file or directory
+secpolicy: label set: failed (2 errors above)" ]]
+  [[ $(the_label /opt) == sshKey ]]
+}
+
+@test "verify after a boot finds no difference" {
+  boot
+  secpolicy label verify
+  exits 0
+  [[ -z $output ]]
+  [[ $stderr =~ ^"secpolicy: label verify: done ("[1-9][0-9]*" files, all as the policy says)"$ ]]
+}
+
+@test "verify prints each difference with the line that decides, and changes nothing" {
+  boot
+  secpolicy label set hostConfig /etc/ssh/host_key
+  secpolicy label set vmDisk /opt/monitor/bin/agent
+  touch "$root/opt/monitor/etc/new"
+  local line
+  line=$(grep -n /etc/ssh/host_key "$policy/fileLabels/base" | cut -d: -f1)
+  local bin etc
+  bin=$(grep -n /opt/monitor/bin "$policy/fileLabels/monitor" | cut -d: -f1)
+  etc=$(grep -n /opt/monitor/etc "$policy/fileLabels/monitor" | cut -d: -f1)
+  secpolicy label verify
+  exits 1
+  [[ $(sort <<<"$output") == "/etc/ssh/host_key: has hostConfig, the policy says sshKey ($labels/base:$line)
+/opt/monitor/bin/agent: has vmDisk, the policy says monitorProgram ($labels/monitor:$bin)
+/opt/monitor/etc/new: has no label, the policy says monitorConfig ($labels/monitor:$etc)" ]]
+  [[ $stderr =~ ^"secpolicy: label verify: 3 of "[0-9]+" files differ from the policy. 'secpolicy label relabel' gives the policy's labels again"$ ]]
+  [[ $(the_label /etc/ssh/host_key) == hostConfig ]]
+}
+
+@test "verify of paths looks at what is at or below them" {
+  boot
+  secpolicy label set hostConfig /etc/ssh/host_key
+  secpolicy label set vmDisk /opt/monitor/bin/agent
+  secpolicy label verify /opt /etc/services.conf
+  exits 1
+  [[ $output == "/opt/monitor/bin/agent: has vmDisk, "* ]]
+  [[ $(wc -l <<<"$output") -eq 1 ]]
+  secpolicy label verify /etc/services.conf
+  exits 0
+  [[ $stderr == "secpolicy: label verify: done (1 file, all as the policy says)" ]]
+  secpolicy label verify /tardisks
+  exits 0
+  [[ $stderr == "secpolicy: label verify: done (the policy names no file there)" ]]
+  secpolicy label verify /no/such
+  exits 1
+  [[ $stderr == "Error: /no/such: No such file or directory
+secpolicy: label verify: failed (1 error above)" ]]
+}
+
+@test "where files without a label are all that differs, verify sends the user to boot" {
+  boot
+  touch "$root/etc/new"
+  secpolicy label verify /etc/new
+  exits 1
+  ends_with "secpolicy: label verify: 1 of 1 file differs from the policy. 'secpolicy boot' gives every file its first label"
+}
+
+@test "verify, relabel and load agree on trees, later lines, hard links and links" {
+  mkdir -p "$root/data/deep/er" "$root/elsewhere"
+  touch "$root/data/one" "$root/data/deep/two" "$root/data/deep/er/three" "$root/elsewhere/four"
+  ln "$root/data/one" "$root/elsewhere/one"
+  ln -s ../elsewhere "$root/data/link"
+  ln -s data "$root/alias"
+  cat >"$policy/fileLabels/order" <<'END'
+/data/deep/two sshKey
+/data/* hostConfig
+/alias/deep/er vmDisk
+/elsewhere/one sshProgram
+/data/deep/er/* hostProgram
+/alias/deep/er/three monitorConfig
+END
+  boot
+  secpolicy label verify
+  exits 0
+  local loaded
+  loaded=$("$SECPOLICY" --root "$root" label get -R /data /elsewhere 2>/dev/null)
+  [[ $loaded == "/data: hostConfig
+/data/deep: hostConfig
+/data/deep/er: hostProgram
+/data/deep/er/three: monitorConfig
+/data/deep/two: hostConfig
+/data/one: sshProgram
+/elsewhere: unlabeled
+/elsewhere/four: unlabeled
+/elsewhere/one: sshProgram" ]]
+  secpolicy label set -R vmDisk /data
+  secpolicy label relabel
+  exits 0
+  [[ $("$SECPOLICY" --root "$root" label get -R /data /elsewhere 2>/dev/null) == "$loaded" ]]
+}
+
+@test "relabel gives the labels again and counts by label" {
+  boot
+  secpolicy label set unlabeled /opt/monitor/bin/agent /etc/ssh/host_key /opt
+  secpolicy label relabel
+  exits 0
+  shows "monitorProgram: 1 of 2 files relabelled"
+  shows "sshKey: 1 of 1 file relabelled"
+  shows "sshProgram: 0 of 1 file relabelled"
+  [[ $stderr =~ ^"secpolicy: label relabel: done (2 of "[0-9]+" files relabelled)"$ ]]
+  [[ $(the_label /opt/monitor/bin/agent) == monitorProgram && $(the_label /opt) == unlabeled ]]
+  secpolicy label verify
+  exits 0
+}
+
+@test "relabel of a path leaves the others alone" {
+  boot
+  secpolicy label set unlabeled /opt/monitor/bin/agent /etc/ssh/host_key
+  secpolicy label relabel /etc/ssh
+  exits 0
+  [[ $output == "hostConfig: 0 of 1 file relabelled
+sshKey: 1 of 1 file relabelled" ]]
+  [[ $(the_label /opt/monitor/bin/agent) == unlabeled ]]
+}
+
+@test "relabel --dry-run prints what would change, and changes nothing" {
+  boot
+  secpolicy label set unlabeled /opt/monitor/bin/agent
+  secpolicy label relabel --dry-run /opt/monitor/bin
+  exits 0
+  local line
+  line=$(grep -n /opt/monitor/bin "$policy/fileLabels/monitor" | cut -d: -f1)
+  [[ $output == "/opt/monitor/bin/agent: unlabeled -> monitorProgram ($labels/monitor:$line)
+monitorProgram: 1 of 2 files would be relabelled" ]]
+  [[ $stderr == "secpolicy: label relabel: done (1 of 2 files would be relabelled)" ]]
+  [[ $(the_label /opt/monitor/bin/agent) == unlabeled ]]
+}
+
+@test "relabel reports what fails and does the rest" {
+  cat >>"$policy/fileLabels/monitor" <<'END'
+/no/such hostConfig
+/etc/services.conf/* hostConfig
+/* hostConfig
+/etc appDom
+/etc noSuchLabel
+END
+  boot || true
+  touch "$root/opt/monitor/bin/a-new-one"
+  secpolicy label set unlabeled /opt/monitor/bin/agent
+  local last
+  last=$(wc -l <"$policy/fileLabels/monitor")
+  secpolicy label relabel
+  exits 1
+  says "Error: Error parsing file $labels/monitor"
+  [[ $stderr == *"'noSuchLabel'"* ]]
+  says "Error: $labels/monitor:$((last - 4)) : /no/such: No such file or directory"
+  says "Error: $labels/monitor:$((last - 3)) : /etc/services.conf: Not a directory"
+  says "Error: $labels/monitor:$((last - 2)) : : No such file or directory"
+  says "Error: $labels/monitor:$((last - 1)) : Invalid label (appDom) for file /etc"
+  says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy boot' gives every file its first one"
+  ends_with "secpolicy: label relabel: failed (7 errors above)"
+  [[ $(the_label /opt/monitor/bin/agent) == monitorProgram ]]
+}
+
+@test "relabel does not follow links that are planted meanwhile" {
+  # The files come between the listing of the directory and its last entries.
+  mkdir -p "$root/var/lib/vms/y" "$root/secret"
+  touch "$root/var/lib/vms/"{1..2000} "$root/var/lib/vms/y/file" "$root/var/lib/vms/z" "$root/secret/file"
+  boot
+  python3 - "$root" <<'END' &
+import os, sys, time
+os.chdir(sys.argv[1] + "/var/lib/vms")
+os.symlink("/secret", "link-y")
+os.symlink("/secret/file", "link-z")
+while True:
+    for name in "y", "z":
+        os.rename(name, "aside")
+        os.rename("link-" + name, name)
+        time.sleep(0.002)
+        os.rename(name, "link-" + name)
+        os.rename("aside", name)
+END
+  local swapper=$!
+  for _ in {1..20}; do
+    "$SECPOLICY" --root "$root" label relabel >/dev/null 2>&1 || true
+  done
+  kill "$swapper"
+  secpolicy label get -R /secret
+  [[ $output == "/secret: unlabeled
+/secret/file: unlabeled" ]]
+}
+
+@test "relabel needs few open files in a tree of any depth" {
+  boot
+  python3 - "$root/var/lib/vms" <<'END'
+import os, sys
+os.chdir(sys.argv[1])
+for _ in range(3000):
+    os.mkdir("d")
+    os.chdir("d")
+END
+  # The load that ends the boot does not get to the bottom.
+  boot || true
+  run --separate-stderr bash -c "ulimit -n 32; '$SECPOLICY' --root '$root' label relabel /var/lib/vms"
+  exits 0
+  [[ $output =~ "vmDisk: "[0-9]+" of "([0-9]+)" files relabelled" && ${BASH_REMATCH[1]} -gt 3000 ]]
+  secpolicy label verify /var/lib/vms
+  exits 0
+}
+
+@test "another policy directory is taken with --policy" {
+  boot
+  mkdir -p "$root/other/fileLabels"
+  echo "/opt/* vmDisk" >"$root/other/fileLabels/all"
+  secpolicy label relabel --policy /other
+  exits 0
+  [[ $(the_label /opt/monitor) == vmDisk && $(the_label /etc) == hostConfig ]]
+  secpolicy label verify --policy /no/such
+  exits 1
+  ends_with "secpolicy: label verify: Unable to open policy directory /no/such/fileLabels"
+}
+
+@test "the progress shows on a terminal, and its line is gone at the end" {
+  boot
+  secpolicy label set unlabeled /etc/ssh/host_key
+  on_a_terminal label relabel
+  [[ $status -eq 0 ]]
+  [[ $output =~ $'\n'"relabelling [................] 0/"([0-9]+)" files, 0 files/s"$'\n' ]]
+  local total=${BASH_REMATCH[1]}
+  [[ $output =~ $'\n'"relabelling [################] $total/$total files, "[0-9]+" files/s, 0:00 left" ]]
+  [[ $output == *"sshKey: 1 of 1 file relabelled"* ]]
+}
+
+@test "no progress shows elsewhere" {
+  boot
+  secpolicy label relabel
+  [[ $(wc -l <<<"$stderr") -eq 1 ]]
+  run script -qec "'$SECPOLICY' --root '$root' label relabel 2>'$BATS_TEST_TMPDIR/errors'" /dev/null
+  [[ $output != *"["* && $(wc -l <"$BATS_TEST_TMPDIR/errors") -eq 1 ]]
+}
+
+@test "a root that was not booted has no labels" {
+  for kind in "get /etc" "set sshKey /etc" verify relabel; do
+    secpolicy label $kind
+    exits 1
+    [[ $stderr == "secpolicy: label ${kind%% *}: nothing is installed below this root, so there are no labels. Run 'secpolicy boot' first, or name the root that was booted (--root DIR)." ]]
+  done
+  [[ ! -e $root/run/secpolicy ]]
+}
+
+@test "label without a kind, a file or a label is wrong usage" {
+  for arguments in "" "get" "set" "set sshKey" "lod /etc"; do
+    secpolicy label $arguments
+    exits 2
+  done
+  secpolicy label get --help
+  exits 0
+  [[ $output == *"Examples:"*"secpolicy label get -R /etc"* ]]
+}

@@ -1,0 +1,56 @@
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+#include "label_actions.h"
+#include "text/suggestion.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Braxo::Lib::BraxoException;
+
+[[noreturn]] void RefuseLabel(LabelRun& run, const std::string& label,
+                              const std::vector<std::string>& paths) {
+  const std::string problem = "there is no object label '" + label + "'";
+  if (label.starts_with('/') && run.FindLabel(paths.back()) != kNoSuchLabel) {
+    throw BraxoException(problem + ". The label comes first: secpolicy label set " + paths.back() +
+                         " " + label);
+  }
+  std::vector<std::string> labels;
+  for (const auto& [name, id] :
+       run.access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL)) {
+    labels.push_back(name);
+  }
+  const std::string nearest = NearestWord(label, labels);
+  throw BraxoException(problem + (nearest.empty() ? ". 'secpolicy display' shows all labels"
+                                                  : ". Did you mean '" + nearest + "'?"));
+}
+
+void GiveLabelTo(LabelRun& run, const std::string& label, const std::string& path,
+                 bool wholeTrees) {
+  std::error_code ignored;
+  try {
+    if (wholeTrees && std::filesystem::is_directory(path, ignored)) {
+      SecPolicy::SetDirLabelRecursive(path, label, run.access);
+    } else {
+      SecPolicy::SetFileLabel(path, label, run.access);
+    }
+  } catch (const BraxoException& failure) {
+    const std::string message = failure.what();
+    const bool hasNone = message.ends_with(std::strerror(ENODATA));
+    run.Error(message + (hasNone ? ": it " + WhyNoLabel(ENODATA) : ""));
+  }
+}
+
+}  // namespace
+
+std::string GiveLabel(LabelRun& run, const std::string& label,
+                      const std::vector<std::string>& paths, bool wholeTrees) {
+  if (run.FindLabel(label) == kNoSuchLabel) RefuseLabel(run, label, paths);
+  for (const std::string& path : paths) GiveLabelTo(run, label, path, wholeTrees);
+  return "done";
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,71 @@
+#include <cerrno>
+#include <cstring>
+#include <map>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/security_attribute.h"
+#include "label_actions.h"
+#include "label_plan.h"
+#include "text/count.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Braxo::Misc::StrCat;
+
+struct Count {
+  std::size_t files = 0;
+  std::size_t changed = 0;
+};
+
+class Relabelling {
+ public:
+  Relabelling(LabelRun& labelRun, bool onlyTry) : run(labelRun), dryRun(onlyTry) {}
+
+  void Visit(const WalkedFile& file, const LabelLine& line) {
+    Count& count = counts[line.label.label];
+    ++count.files;
+    // Reading is much cheaper than writing, and most files have their label already.
+    const auto before = LinuxHost::ReadLabel(file.name);
+    if (before == line.id) return;
+    if (!before) return run.Error(file.path + ": " + WhyNoLabel(errno));
+    if (dryRun) {
+      run.Print(StrCat(file.path, ": ", run.NameOf(*before), " -> ", line.label.label, " (",
+                       line.Place(), ")"));
+    } else if (LinuxHost::ReplaceLabel(file.name, line.id) != 0) {
+      return run.Error(StrCat(file.path, ": cannot be given the label ", line.label.label, ": ",
+                              std::strerror(errno)));
+    }
+    ++count.changed;
+  }
+
+  std::string Summarize() {
+    const std::string verb = dryRun ? "would be relabelled" : "relabelled";
+    Count all;
+    for (const auto& [label, count] : counts) {
+      run.Print(
+          StrCat(label, ": ", count.changed, " of ", CountOf(count.files, "file"), " ", verb));
+      all.files += count.files;
+      all.changed += count.changed;
+    }
+    return StrCat("done (", all.changed, " of ", CountOf(all.files, "file"), " ", verb, ")");
+  }
+
+ private:
+  LabelRun& run;
+  const bool dryRun;
+  std::map<std::string, Count> counts;
+};
+
+}  // namespace
+
+std::string Relabel(LabelRun& run, const std::string& dir, const std::vector<std::string>& paths,
+                    bool dryRun) {
+  Relabelling relabelling(run, dryRun);
+  LabelPlan(run, dir).ForEachFile(
+      paths, dryRun ? "comparing" : "relabelling",
+      [&](const WalkedFile& file, const LabelLine& line) { relabelling.Visit(file, line); });
+  return relabelling.Summarize();
+}
+
+}  // namespace SecPolicyCli

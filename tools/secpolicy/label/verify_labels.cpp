@@ -1,0 +1,40 @@
+#include <cerrno>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/security_attribute.h"
+#include "label_actions.h"
+#include "label_plan.h"
+#include "text/count.h"
+
+namespace SecPolicyCli {
+
+using Braxo::Misc::StrCat;
+
+std::string VerifyLabels(LabelRun& run, const std::string& dir,
+                         const std::vector<std::string>& paths) {
+  std::size_t files = 0;
+  std::size_t different = 0;
+  std::size_t withoutLabel = 0;
+  LabelPlan(run, dir).ForEachFile(
+      paths, "verifying", [&](const WalkedFile& file, const LabelLine& line) {
+        ++files;
+        const auto id = LinuxHost::ReadLabel(file.name);
+        if (id == line.id) return;
+        if (!id && errno != ENODATA) return run.Error(file.path + ": " + WhyNoLabel(errno));
+        ++different;
+        if (!id) ++withoutLabel;
+        run.Print(StrCat(file.path, ": has ", id ? run.NameOf(*id) : "no label",
+                         ", the policy says ", line.label.label, " (", line.Place(), ")"));
+      });
+  if (different > 0) {
+    throw Braxo::Lib::BraxoException(StrCat(
+        different, " of ", CountOf(files, "file"), different == 1 ? " differs" : " differ",
+        " from the policy. ",
+        different == withoutLabel ? "'secpolicy boot' gives every file its first label"
+                                  : "'secpolicy label relabel' gives the policy's labels again"));
+  }
+  if (files == 0) return "done (the policy names no file there)";
+  return StrCat("done (", CountOf(files, "file"), ", all as the policy says)");
+}
+
+}  // namespace SecPolicyCli
