@@ -45,7 +45,9 @@ foreach(unit boot restore load)
   install(FILES "${CMAKE_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
 install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md docs/diagnostics.md
+  docs/json.md docs/queries.md docs/graph.svg
   DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 
 # `cpack` in the build directory makes a Debian package.
 set(CPACK_GENERATOR DEB)

@@ -309,8 +309,9 @@ fileLabels/zz:3 [unknown-word]" ]]
   add objects/base "lonelyObject"
   secpolicy check --format json
   exits 1
+  fits_schema check
   jq -e --argjson line "$(wc -l <"$policy/domains/appDom")" '
-    .version == 1 and .errors == 1 and .warnings == 1 and (.problems | length) == 2 and
+    .schema == "secpolicy.check/1" and .errors == 1 and .warnings == 1 and (.problems | length) == 2 and
     .problems[1] == {file: "/etc/zorvan/secpolicy/domains/appDom", line: $line, column: 4,
       length: 4, source: "-s reed grant", severity: "error", code: "unknown-word",
       message: "unknown system call '"'reed'"'", hint: "did you mean '"'read'"'?"}' <<<"$output"
@@ -319,6 +320,7 @@ fileLabels/zz:3 [unknown-word]" ]]
 @test "--format json of a policy without problems, and of bytes that are no text" {
   secpolicy check --format json
   exits 0
+  fits_schema check
   jq -e '.problems == [] and .errors == 0' <<<"$output"
   printf -- '-s \xff\xfe grant\n' >>"$policy/domains/appDom"
   secpolicy check --format json

@@ -7,8 +7,6 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr int kVersion = 1;
-
 Json ToJson(const Diagnostic& diagnostic) {
   Json json = {{"file", diagnostic.file}};
   if (diagnostic.line > 0) {
@@ -29,7 +27,7 @@ Json ToJson(const Diagnostic& diagnostic) {
 void WriteJson(const DiagnosticList& diagnostics, std::ostream& output) {
   Json problems = Json::array();
   for (const Diagnostic& diagnostic : diagnostics.All()) problems.push_back(ToJson(diagnostic));
-  const Json report = {{"version", kVersion},
+  const Json report = {{"schema", "secpolicy.check/1"},
                        {"errors", diagnostics.Count(Severity::kError)},
                        {"warnings", diagnostics.Count(Severity::kWarning)},
                        {"problems", problems}};
