@@ -2,12 +2,12 @@
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display why who-can diff save history rollback label settings'
+  local verbs='boot check load load-early restore status display why who-can graph diff save history rollback label settings'
   local questions='read write exec call use access enter create create-socket pass'
   local verb='' kind='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root || $word == --format || $word == --disable || $word == --policy ]]; then
+    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy ]]; then
       index=$((index + 1))
     elif [[ $word == -* ]]; then
       continue
@@ -28,6 +28,10 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
+  elif [[ $verb == graph && $previous == --format ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'dot svg' -- "$current")
+  elif [[ $verb == graph && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--domain --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
       installed-only long-line missing-path no-tardisk nul-byte second-policy skipped-entry star-in-path
@@ -37,7 +41,7 @@ _secpolicy() {
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--plan --format --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $kind == relabel && $current == -* ]]; then

@@ -42,6 +42,7 @@ extern const Verb kSave;
 extern const Verb kHistory;
 extern const Verb kRollback;
 extern const Verb kSettings;
+extern const Verb kGraph;
 extern const Verb kLabel;
 extern const Verb kStatus;
 extern const Verb kWhoCan;
