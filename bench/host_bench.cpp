@@ -110,14 +110,27 @@ class LabelledTree {
   ScratchDir scratch;
 };
 
+// One tree for ours and the bare loop, with the number of times it was labelled: another label each
+// time, since a file system may skip a value that is there already.
+struct SharedTree {
+  explicit SharedTree(const fs::path& parent) : tree(parent) {}
+
+  LabelledTree tree;
+  long round = 0;
+};
+
+SharedTree& TreeIn(const fs::path& parent) {
+  static std::map<fs::path, SharedTree> trees;
+  return trees.try_emplace(parent, parent).first->second;
+}
+
 void LabelTree(benchmark::State& state, const fs::path& parent) {
   const FreshState host;
-  static std::map<fs::path, LabelledTree> trees;
-  const fs::path& tree = trees.try_emplace(parent, parent).first->second.Path();
+  SharedTree& shared = TreeIn(parent);
   TeskAccessInterfaceImpl access;
-  long round = 0;
-  // Another label each time: a file system may skip a value that is there already.
-  for (auto _ : state) SecPolicy::SetDirLabelRecursive(tree, Label(++round % 2), access);
+  for (auto _ : state) {
+    SecPolicy::SetDirLabelRecursive(shared.tree.Path(), Label(++shared.round % 2), access);
+  }
 }
 
 void LabelBare(char* path, std::size_t length, std::uint32_t id) {
@@ -135,12 +148,14 @@ void LabelBare(char* path, std::size_t length, std::uint32_t id) {
 }
 
 void LabelTreeBare(benchmark::State& state, const fs::path& parent) {
-  static std::map<fs::path, LabelledTree> trees;
-  const std::string tree = trees.try_emplace(parent, parent).first->second.Path().string();
+  SharedTree& shared = TreeIn(parent);
+  const std::string tree = shared.tree.Path().string();
   std::array<char, 4096> path{};
   tree.copy(path.data(), path.size() - 1);
-  std::uint32_t round = 0;
-  for (auto _ : state) LabelBare(path.data(), tree.size(), 4 + ++round % 2);
+  for (auto _ : state) {
+    // The identifiers of the two labels: the first ones behind those that are built in.
+    LabelBare(path.data(), tree.size(), 4 + static_cast<std::uint32_t>(++shared.round % 2));
+  }
 }
 
 // ---- Installing rules -------------------------------------------------------------------------
