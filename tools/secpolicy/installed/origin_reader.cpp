@@ -122,7 +122,7 @@ void OriginReader::ReadDomain(const std::string& path, const std::string& name) 
 }
 
 void OriginReader::ReadTardisks(const std::string& dir) {
-  for (const auto& [path, name] : FilesOf(dir)) Quietly([&] { ReadTardisk(path); });
+  for (const auto& file : FilesOf(dir)) Quietly([&] { ReadTardisk(file.first); });
 }
 
 void OriginReader::ReadTardisk(const std::string& path) {

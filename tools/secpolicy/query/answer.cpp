@@ -30,7 +30,7 @@ std::string AnswerText(const Question& question, const InstalledDomain& domain,
                        const Decision& decision) {
   const std::string asked = question.Text();
   if (!decision.IsAllowed()) return "no: " + domain.name + " may not " + asked;
-  const std::string yes = "yes: " + domain.name + " may " + asked;
+  std::string yes = "yes: " + domain.name + " may " + asked;
   if (decision.refuses) return yes;
   return yes + ": it is " + domain.level + ", so nothing is refused to it" +
          (decision.granted ? "" : "; its rules would refuse this");
