@@ -152,18 +152,18 @@ void RefuseHomelessWorlds(HostState& state) {
 // Domains may have changed places since, so what belongs to worlds follows the names; by way of
 // negative numbers, as two domains may have swapped theirs.
 constexpr Sql kMoveWorlds[] = {
-    "DELETE FROM main.world WHERE domain_id NOT IN "
-    "(SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name)",
-    "UPDATE main.world SET domain_id = (SELECT s.id FROM main.domain AS d "
-    "JOIN saved.domain AS s ON s.name = d.name WHERE d.id = world.domain_id)",
-    "DELETE FROM main.file_policy WHERE world = 0 OR domain_id NOT IN "
-    "(SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name)",
-    "UPDATE main.file_policy SET domain_id = -1 - (SELECT s.id FROM main.domain AS d "
-    "JOIN saved.domain AS s ON s.name = d.name WHERE d.id = file_policy.domain_id)",
-    "UPDATE main.file_policy SET domain_id = -1 - domain_id",
-    "INSERT INTO main.file_policy (domain_id, world, path, permission, line) "
-    "SELECT domain_id, world, path, permission, line FROM saved.file_policy WHERE world = 0 "
-    "ORDER BY id",
+    R"(DELETE FROM main.world WHERE domain_id NOT IN
+       (SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name))",
+    R"(UPDATE main.world SET domain_id = (SELECT s.id FROM main.domain AS d
+       JOIN saved.domain AS s ON s.name = d.name WHERE d.id = world.domain_id))",
+    R"(DELETE FROM main.file_policy WHERE world = 0 OR domain_id NOT IN
+       (SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name))",
+    R"(UPDATE main.file_policy SET domain_id = -1 - (SELECT s.id FROM main.domain AS d
+       JOIN saved.domain AS s ON s.name = d.name WHERE d.id = file_policy.domain_id))",
+    R"(UPDATE main.file_policy SET domain_id = -1 - domain_id)",
+    R"(INSERT INTO main.file_policy (domain_id, world, path, permission, line)
+       SELECT domain_id, world, path, permission, line FROM saved.file_policy WHERE world = 0
+       ORDER BY id)",
 };
 
 // The tables that come back as they were. Their rows are read in the order of their numbers.

@@ -44,7 +44,7 @@ class InterruptsIgnored {
   // For the child.
   void Restore() const {
     for (std::size_t index = 0; index < kSignals.size(); ++index) {
-      std::signal(kSignals[index], before[index]);
+      static_cast<void>(std::signal(kSignals[index], before[index]));
     }
   }
 
