@@ -86,6 +86,17 @@ std::vector<std::string_view> Components(std::string_view path) {
   return components;
 }
 
+// The path of an entry as it is found in the root: behind a link, "/" and "/." would lead on to
+// what the link points to.
+std::string PlainPath(std::string_view path) {
+  std::string plain;
+  for (const std::string_view component : Components(path)) {
+    if (!plain.empty()) plain += '/';
+    plain += component;
+  }
+  return plain;
+}
+
 // One archive on its way into the working directory.
 class Unpacking {
  public:
@@ -142,7 +153,7 @@ class Unpacking {
     if (archive_read_extract2(reader.get(), entry, writer.get()) != ARCHIVE_OK) {
       Fail(archive_errno(reader.get()), StrCat(path, ": ", ReasonOf(reader.get())));
     }
-    Settle(path);
+    Settle(PlainPath(path));
   }
 
   // The root itself, and a running system's directory, which another file system may cover by now.

@@ -97,7 +97,7 @@ TEST_F(UnpackTardisk, TellsWhereEachInodeCameFrom) {
   });
   EXPECT_EQ(told,
             "disk.tgz /etc same\n"
-            "disk.tgz /./etc/file same\n"
+            "disk.tgz /etc/file same\n"
             "disk.tgz /etc/link same\n");
 }
 
@@ -200,6 +200,25 @@ TEST_F(UnpackTardisk, SetsNoModeThroughDirectoryThatBecameLink) {
   EXPECT_EQ(Unpack(image), "unpacked");
   EXPECT_EQ(std::filesystem::status(scratch.Directory()).permissions(),
             std::filesystem::perms(0700));
+}
+
+TEST_F(UnpackTardisk, LabelsNothingBehindLinkWhoseNameEndsInSlash) {
+  for (const char* name : {"out/", "out/.", "out//./"}) {
+    TarImage image;
+    image.SymbolicLink(name, "..");
+    scratch.Write("../disk.tgz", image.Bytes());
+    EXPECT_EQ(scratch.RunBeneath([] {
+      std::vector<LinuxHost::InodeOrigin> origins;
+      LinuxHost::UnpackTardisk("../disk.tgz", kUnlabeled, origins);
+      struct stat link {};
+      const bool same = lstat("out", &link) == 0 && origins.size() == 1 &&
+                        origins[0].inode == link.st_ino && origins[0].path == "/out";
+      return std::string(same ? "the link itself" : "another file");
+    }),
+              "the link itself")
+        << name;
+    EXPECT_LT(listxattr(scratch.Directory().c_str(), nullptr, 0), 1) << name;
+  }
 }
 
 TEST_F(UnpackTardisk, RefusesHardLinkOutOfTheRoot) {
