@@ -109,6 +109,11 @@ load helper
   exits 0
   jq -e '[.domains[].rules[] | select(.keyword == "-r") | .words] |
     any(. == ["/odd\tpath", ""]) and any(. == ["/none", ""])' <<<"$output"
+  # A program can make rules that no file can hold.
+  sqlite3 "$root/run/secpolicy/host.db" \
+    "UPDATE file_policy SET path = '/two' || char(10) || 'lines' || char(10) WHERE path = '/none'"
+  secpolicy display --format json
+  jq -e '[.domains[].rules[] | select(.keyword == "-r") | .words] | any(. == ["/two\nlines\n", ""])' <<<"$output"
 }
 
 @test "--format json of a tardisk whose label cannot be read" {
