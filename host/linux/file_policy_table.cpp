@@ -163,8 +163,8 @@ std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
 
 Rows FilePolicyTable::Read(unsigned int domainId) {
   return state.Database().Select(
-      "SELECT path, permission, line FROM file_policy WHERE id IN "
-      "(SELECT id FROM file_policy WHERE domain_id = ?1 AND world = 0) ORDER BY id",
+      "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
+      "ORDER BY id",
       domainId);
 }
 

@@ -99,7 +99,7 @@ void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
 Rows ParameterRuleTable::Read(unsigned int domainId) {
   return state.Database().Select(
       "SELECT parameter_check, first_word, last_word, granted, line FROM parameter_rule "
-      "WHERE id IN (SELECT id FROM parameter_rule WHERE domain_id = ?1) ORDER BY id",
+      "WHERE domain_id = ?1 ORDER BY id",
       domainId);
 }
 

@@ -79,12 +79,11 @@ void RuleTable::Install(const Rule& rule) {
 }
 
 Rows RuleTable::Read(unsigned int domainId, RuleKind kind) {
-  // The inner query is answered by the unique index alone, so that only identifiers are sorted. Of
-  // a bare ?2 the engine would look whether it fits the condition of transition_target, and prepare
-  // the statement again for each other kind.
+  // Of a bare ?2 the engine would look whether it fits the condition of transition_target, and
+  // prepare the statement again for each other kind.
   return state.Database().Select(
-      "SELECT word1, word2, word3, granted, line FROM rule WHERE id IN "
-      "(SELECT id FROM rule WHERE domain_id = ?1 AND kind = +?2) ORDER BY id",
+      "SELECT word1, word2, word3, granted, line FROM rule WHERE domain_id = ?1 AND kind = +?2 "
+      "ORDER BY id",
       domainId, ShapeOf(kind).name);
 }
 
