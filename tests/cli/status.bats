@@ -109,6 +109,17 @@ rules_of() {
   [[ $output == *"             Unable to unpack tardisk broken.tgz: "* ]]
 }
 
+@test "status names the saved state that was put back" {
+  boot
+  "$SECPOLICY" --root "$root" save before 2>/dev/null
+  "$SECPOLICY" --root "$root" rollback before 2>/dev/null
+  secpolicy status
+  exits 0
+  [[ $output =~ latest\ load\ \ rollback\ from\ before\ at\ [0-9:\ -]+UTC:\ done ]]
+  secpolicy status --format json
+  fits_schema status
+}
+
 @test "--format json" {
   boot
   secpolicy status --format json

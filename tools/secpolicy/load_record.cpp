@@ -41,17 +41,22 @@ void RecordOrigins(const std::string& verb, const std::string& dir) {
   LinuxHost::RecordOrigins(origins.Rules(), origins.Labels());
 }
 
+void RecordEnding(const std::string& verb, const std::string& source, const std::string& ending,
+                  const std::vector<std::string>& errors) {
+  LinuxHost::RecordLoad({.verb = verb,
+                         .directory = source,
+                         .time = std::time(nullptr),
+                         .ending = ending,
+                         .errorCount = errors.size(),
+                         .errors = errors});
+}
+
 }  // namespace
 
 void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
                 const std::vector<std::string>& errors) {
   try {
-    LinuxHost::RecordLoad({.verb = verb,
-                           .directory = policyDir,
-                           .time = std::time(nullptr),
-                           .ending = ending,
-                           .errorCount = errors.size(),
-                           .errors = errors});
+    RecordEnding(verb, policyDir, ending, errors);
     RecordOrigins(verb, policyDir);
   } catch (const Braxo::Lib::BraxoException& failure) {
     if (ending != "done") return;
@@ -59,5 +64,7 @@ void RecordLoad(const std::string& verb, const std::string& policyDir, const std
               << "explain it: " << failure.what() << std::endl;
   }
 }
+
+void RecordRollback(const std::string& name) { RecordEnding(kRollback.name, name, "done", {}); }
 
 }  // namespace SecPolicyCli

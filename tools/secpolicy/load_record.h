@@ -12,4 +12,7 @@ namespace SecPolicyCli {
 void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
                 const std::vector<std::string>& errors);
 
+// Keeps, for `status`, that the saved state `name` was put back.
+void RecordRollback(const std::string& name);
+
 }  // namespace SecPolicyCli

@@ -5,6 +5,7 @@
 
 #include "host/linux/saved_policy.h"
 #include "library_call.h"
+#include "load_record.h"
 #include "root.h"
 #include "saved/saved_name.h"
 #include "saved/saved_state.h"
@@ -28,6 +29,7 @@ void PutBack(const std::string& name) {
   } catch (const std::exception& reason) {
     throw std::runtime_error(problem + reason.what());
   }
+  RecordRollback(name);
 }
 
 ExitCode RollBack(const std::string& name) {
