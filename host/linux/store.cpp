@@ -25,8 +25,8 @@ constexpr unsigned int kLongWaitMicroseconds = 1000;
 constexpr int kShortWaits = 100;
 constexpr int kWaits = 30'000;
 
-// The first waits are short, since a call holds the database for microseconds; a batch may hold it
-// for a second. Gives up after half a minute.
+// The first waits are short, since most calls hold the database for one row only; a batch may hold
+// it far longer. Gives up after half a minute.
 int WaitForOthers(void* /*unused*/, int waits) {
   usleep(waits < kShortWaits ? kShortWaitMicroseconds : kLongWaitMicroseconds);
   return waits < kWaits ? 1 : 0;

@@ -2,6 +2,7 @@
 // busy machine can hide.
 #include <dlfcn.h>
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 
 #include <list>
 #include <string>
@@ -13,11 +14,10 @@
 #include "state_directory.h"
 #include "teskctl/security.h"
 
-struct sqlite3_stmt;
-
 namespace {
 
 int steps = 0;
+int preparations = 0;  // of statements that had been prepared before
 
 }  // namespace
 
@@ -26,7 +26,9 @@ extern "C" int sqlite3_step(sqlite3_stmt* statement) {
   using Step = int (*)(sqlite3_stmt*);
   static const auto step = reinterpret_cast<Step>(dlsym(RTLD_NEXT, "sqlite3_step"));
   ++steps;
-  return step(statement);
+  const int result = step(statement);
+  preparations += sqlite3_stmt_status(statement, SQLITE_STMTSTATUS_REPREPARE, 1);
+  return result;
 }
 
 namespace LinuxHostTest {
@@ -107,6 +109,16 @@ TEST_F(StatementsOfACall, AreOneForEachRuleThatIsRead) {
   std::list<TeskAccess_ObjectAccessRule> rules;
   access.GetObjectAccessRules(domain, rules);
   EXPECT_EQ(Steps([&] { access.GetObjectAccessRules(domain, rules); }), 2);
+}
+
+TEST_F(StatementsOfACall, AreNotPreparedAnewForRulesOfAnotherKind) {
+  std::list<TeskAccess_ObjectAccessRule> objectAccess;
+  std::list<TeskCtl::Security::TeskAccess_SyscallRule> syscalls;
+  access.GetObjectAccessRules(domain, objectAccess);
+  preparations = 0;
+  access.GetSyscallRules(domain, syscalls);
+  access.GetObjectAccessRules(domain, objectAccess);
+  EXPECT_EQ(preparations, 0);
 }
 
 }  // namespace
