@@ -178,3 +178,18 @@ old  "*" UTC  Unable to use the host state /var/lib/secpolicy/saved/old.db: it h
   [[ $stderr == "secpolicy: rollback: the saved state 'good' cannot be put back, so nothing was changed: worlds run in the domain 'lateDom', which it does not have. End them, and run it again" ]]
   [[ -n $(domain_id lateDom) ]]
 }
+
+@test "a state that belongs to somebody else is not taken for none" {
+  [[ $EUID -eq 0 ]] || skip "only root can become somebody else"
+  setpriv --reuid=65534 --clear-groups test -x "$SECPOLICY" -a -r "$SOURCE" -a -x "$root/.." ||
+    skip "others may not read this place"
+  chmod 700 "$root/run/secpolicy"
+  run --separate-stderr setpriv --reuid=65534 --clear-groups env SECPOLICY_HOST_STATE="$root/run/secpolicy/host.db" \
+    "$SECPOLICY" save good
+  exits 1
+  [[ $stderr == "secpolicy: save: "*". You are not root: run it as root, or give --root DIR to work below a directory of yours." ]]
+  run --separate-stderr setpriv --reuid=65534 --clear-groups env SECPOLICY_HOST_STATE="$root/run/secpolicy/host.db" \
+    "$SECPOLICY" diff installed "$SOURCE/examples/host/etc/zorvan/secpolicy"
+  exits 2
+  [[ $stderr == "secpolicy: diff: the state $root/run/secpolicy/host.db cannot be read: unable to open database file" ]]
+}

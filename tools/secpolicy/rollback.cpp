@@ -1,5 +1,3 @@
-#include <unistd.h>
-
 #include <CLI/App.hpp>
 #include <stdexcept>
 
@@ -33,7 +31,7 @@ void PutBack(const std::string& name) {
 }
 
 ExitCode RollBack(const std::string& name) {
-  if (access(StatePath().c_str(), F_OK) != 0) return RefuseWithoutState("rollback");
+  if (IsStateMissing()) return RefuseWithoutState("rollback");
   if (!IsSaved(name)) {
     return Refuse("rollback", "there is no saved state '" + name +
                                   "'. 'secpolicy history' lists what is saved.");

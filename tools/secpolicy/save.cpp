@@ -1,5 +1,3 @@
-#include <unistd.h>
-
 #include <CLI/App.hpp>
 #include <memory>
 
@@ -15,7 +13,7 @@ namespace SecPolicyCli {
 namespace {
 
 ExitCode Save(const std::string& name, bool force) {
-  if (access(StatePath().c_str(), F_OK) != 0) return RefuseWithoutState("save");
+  if (IsStateMissing()) return RefuseWithoutState("save");
   if (!force && IsSaved(name)) {
     return Refuse("save", "there is a saved state '" + name +
                               "' already. Give --force to replace it, or choose another name.");

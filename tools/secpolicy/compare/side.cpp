@@ -1,7 +1,5 @@
 #include "side.h"
 
-#include <unistd.h>
-
 #include <stdexcept>
 
 #include "compare/policy_directory.h"
@@ -36,23 +34,22 @@ Side ReadStateOf(const std::string& name, const std::string& path) {
   return {.name = name, .policy = ReadStateAt(path), .labels = std::nullopt};
 }
 
-void RequireThere(const std::string& path, const std::string& otherwise) {
-  if (access(path.c_str(), F_OK) != 0) throw std::runtime_error(otherwise);
-}
-
 Side ReadInstalled() {
-  RequireThere(StatePath(),
-               "nothing is installed below this root. Name the root that was booted (--root DIR), "
-               "or run 'secpolicy boot' first.");
+  if (IsStateMissing()) {
+    throw std::runtime_error(
+        "nothing is installed below this root. Name the root that was booted (--root DIR), or run "
+        "'secpolicy boot' first.");
+  }
   return ReadStateOf(kInstalled, StatePath());
 }
 
 Side ReadSaved(const std::string& name) {
-  const std::string path = SavedStatePath(name);
-  RequireThere(path, "there is no saved state '" + name +
-                         "', and no such directory. 'secpolicy history' lists what is saved; "
-                         "'installed' is what is installed now.");
-  return ReadStateOf(name, path);
+  if (!IsSaved(name)) {
+    throw std::runtime_error("there is no saved state '" + name +
+                             "', and no such directory. 'secpolicy history' lists what is saved; "
+                             "'installed' is what is installed now.");
+  }
+  return ReadStateOf(name, SavedStatePath(name));
 }
 
 }  // namespace

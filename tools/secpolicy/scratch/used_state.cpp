@@ -26,6 +26,10 @@ std::string PathIn(const char* variable, const char* otherwise) {
 
 std::string StatePath() { return PathIn(kStateVariable, kInstalledState); }
 
+bool IsStateMissing() {
+  return access(StatePath().c_str(), F_OK) != 0 && (errno == ENOENT || errno == ENOTDIR);
+}
+
 std::string CopyState(const std::string& from, const std::string& to) {
   std::string failure = LinuxHost::CopyDatabase(from, to);
   std::error_code ignored;

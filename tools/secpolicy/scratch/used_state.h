@@ -7,6 +7,9 @@ namespace SecPolicyCli {
 // The path of the host's state that this process works with; there may be none yet.
 std::string StatePath();
 
+// True when there is surely no such state: one that this user may not look for counts as there.
+bool IsStateMissing();
+
 // Copies the state at `from`, which is only read, to the new file `to`, such that the host works
 // with the copy. Returns why it could not, and leaves no file then; empty when it could.
 std::string CopyState(const std::string& from, const std::string& to);
