@@ -40,8 +40,10 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
+  elif [[ ($verb == boot || $verb == load-early) && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--timing --root --verbose --help -v -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--timing --plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $kind == relabel && $current == -* ]]; then

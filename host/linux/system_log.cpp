@@ -28,7 +28,11 @@ constexpr char kInformationTag[] = "[INFO]";
 constexpr std::size_t kMaxRecordText = 900;
 
 bool informationShown = false;
+std::function<void(const std::string&)> logWatcher;
 bool dropped = false;
+
+// Where the library must not go to the system log past the host.
+bool TakesEveryLine() { return informationShown || logWatcher; }
 
 // Never waits: a daemon with a full queue does not take messages.
 bool AcceptsConnection(const char* path, int type) {
@@ -119,6 +123,10 @@ void WriteToSyslog(const std::string& message, const std::string& tag) {
 
 void ShowInformation() { informationShown = true; }
 
+void WatchLog(const std::function<void(const std::string& message)>& watcher) {
+  logWatcher = watcher;
+}
+
 void DropLog() { dropped = true; }
 
 void LogInformation(const std::string& message) {
@@ -131,15 +139,16 @@ void LogInformation(const std::string& message) {
 namespace TeskCtl::System {
 
 bool SyslogIsRunning() {
-  return !LinuxHost::dropped && !LinuxHost::informationShown && LinuxHost::SyslogDaemonListens();
+  return !LinuxHost::dropped && !LinuxHost::TakesEveryLine() && LinuxHost::SyslogDaemonListens();
 }
 
 void WriteToKlog(const std::string& message, const std::string& tag) {
+  if (LinuxHost::logWatcher) LinuxHost::logWatcher(message);
   if (LinuxHost::dropped) return;
   if (LinuxHost::informationShown && tag == LinuxHost::kInformationTag) {
     std::cerr << message << std::endl;
   }
-  if (LinuxHost::informationShown && LinuxHost::SyslogDaemonListens()) {
+  if (LinuxHost::TakesEveryLine() && LinuxHost::SyslogDaemonListens()) {
     return LinuxHost::WriteToSyslog(message, tag);
   }
   LinuxHost::WriteToKernelLog(message, tag);

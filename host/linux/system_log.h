@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <string>
 
 // Where this host's log lines go, and what the command may ask of it.
@@ -10,6 +11,11 @@ namespace LinuxHost {
 // WriteToKlog() hands the line on to a running system log daemon in the form that the library
 // would have given it, else to the kernel log. So each line still reaches the log it belongs to.
 __attribute__((visibility("default"))) void ShowInformation();
+
+// From now on hands every line, errors included, to `watcher` before it goes to its log; an empty
+// function ends that. The host takes every line itself meanwhile, as while information is shown.
+__attribute__((visibility("default"))) void WatchLog(
+    const std::function<void(const std::string& message)>& watcher);
 
 // From now on drops every line, those that are shown included: what a process only rehearses has
 // not happened.

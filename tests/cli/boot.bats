@@ -6,7 +6,7 @@ load helper
   secpolicy boot
   exits 0
   [[ -z $output ]]
-  [[ $stderr == "secpolicy: boot: done" ]]
+  is_done boot
 }
 
 @test "boot unpacks the tardisks into the root" {
@@ -73,7 +73,7 @@ load helper
   secpolicy -v boot
   exits 0
   says "No early policy: there is no directory /etc/zorvan/secpolicy/early"
-  ends_with "secpolicy: boot: done"
+  ends_done boot
   [[ -n $(domain_id sshDom) ]]
 }
 
@@ -81,6 +81,34 @@ load helper
   rm -r "$policy/early/domains"
   secpolicy boot
   exits 1
-  [[ $stderr == "Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
-secpolicy: boot: failed (1 error above)" ]]
+  [[ $stderr =~ ^"Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
+/etc/zorvan/secpolicy/early/domains: 1 error
+installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
+secpolicy: boot: failed (1 error above)"$ ]]
+}
+
+@test "--timing prints each phase of a boot to standard output" {
+  secpolicy boot --timing
+  exits 0
+  is_done boot
+  [[ $(sed 's/  *[0-9.]* s$//' <<<"$output") == "unpacking
+first labels
+early objects
+early domains
+early file labels
+objects
+domains
+partner domains
+tardisks
+file labels
+all" ]]
+}
+
+@test "a file of the early policy that fails is told from one of the full policy" {
+  echo "-s no_such_call grant" >>"$policy/early/domains/hostDom"
+  echo "-s no_such_call grant" >>"$policy/domains/hostDom"
+  secpolicy boot
+  exits 1
+  says "/etc/zorvan/secpolicy/early/domains/hostDom: 1 error"
+  says "/etc/zorvan/secpolicy/domains/hostDom: 1 error"
 }

@@ -55,6 +55,19 @@ ends_with() {
   return 1
 }
 
+# ends_done VERB: the last line to standard error says that all was done, and counts what is
+# installed.
+ends_done() {
+  [[ ${stderr##*$'\n'} =~ ^"secpolicy: $1: done ("[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects)"$ ]] && return
+  printf 'the last line is not that of a %s that was done:\n%s\n' "$1" "$stderr"
+  return 1
+}
+
+# is_done VERB: that line is all that the latest command wrote to standard error.
+is_done() {
+  [[ $stderr != *$'\n'* ]] && ends_done "$1"
+}
+
 # domain_id NAME: the identifier that display gives the domain.
 domain_id() {
   "$SECPOLICY" --root "$root" display 2>/dev/null |

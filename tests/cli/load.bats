@@ -7,7 +7,7 @@ load helper
   secpolicy load
   exits 0
   [[ -z $output ]]
-  [[ $stderr == "secpolicy: load: done" ]]
+  is_done load
 }
 
 @test "load installs what was added to a file" {
@@ -88,7 +88,7 @@ load helper
   says "Using policy dir /etc/zorvan/secpolicy"
   says "Domain policies set"
   says "System security policy has been set successfully"
-  ends_with "secpolicy: load: done"
+  ends_done load
   secpolicy load -v
   says "Using policy dir /etc/zorvan/secpolicy"
 }
@@ -113,7 +113,7 @@ load helper
   boot
   secpolicy load-early
   exits 0
-  [[ $stderr == "secpolicy: load-early: done" ]]
+  is_done load-early
 }
 
 @test "load-early fails although the library returns normally" {
@@ -121,8 +121,10 @@ load helper
   rm -r "$policy/early/domains"
   secpolicy load-early
   exits 1
-  [[ $stderr == "Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
-secpolicy: load-early: failed (1 error above)" ]]
+  [[ $stderr =~ ^"Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
+/etc/zorvan/secpolicy/early/domains: 1 error
+installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
+secpolicy: load-early: failed (1 error above)"$ ]]
 }
 
 @test "two loads at once both end well" {
@@ -131,6 +133,92 @@ secpolicy: load-early: failed (1 error above)" ]]
   local other=$!
   "$SECPOLICY" --root "$root" load 2>"$BATS_TEST_TMPDIR/two"
   wait "$other"
-  [[ $(cat "$BATS_TEST_TMPDIR/one") == "secpolicy: load: done" ]]
-  [[ $(cat "$BATS_TEST_TMPDIR/two") == "secpolicy: load: done" ]]
+  stderr=$(cat "$BATS_TEST_TMPDIR/one")
+  is_done load
+  stderr=$(cat "$BATS_TEST_TMPDIR/two")
+  is_done load
+}
+
+@test "the summary counts what display shows" {
+  boot
+  secpolicy load
+  local counted=$stderr domains rules objects
+  secpolicy display
+  domains=$(grep -c '^Domain Name: ' <<<"$output")
+  rules=$(grep -c '^-[a-z] ' <<<"$output")
+  objects=$(sed -n '/^Objects Defined/,/^Tardisk Path/p' <<<"$output" | grep -c '^[A-Za-z]* ([0-9]*)$')
+  [[ $counted == "secpolicy: load: done ($domains domains, $rules rules, $objects objects)" ]]
+}
+
+@test "after a failed load each file that failed is counted, and what is installed" {
+  boot
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  echo "-c no_such_capability grant" >>"$policy/domains/plugins/cache"
+  echo "two words" >>"$policy/objects/base"
+  echo "/etc/lonely" >>"$policy/fileLabels/base"
+  echo "/no/such hostConfig" >>"$policy/fileLabels/monitor"
+  echo "/no/such/either hostConfig" >>"$policy/fileLabels/monitor"
+  secpolicy load
+  exits 1
+  [[ $(grep -e '^/' -e '^installed' <<<"$stderr") =~ ^"$(cat <<'END'
+/etc/zorvan/secpolicy/domains/appDom: 1 error
+/etc/zorvan/secpolicy/domains/plugins/cache: 1 error
+/etc/zorvan/secpolicy/fileLabels/base: 1 error
+/etc/zorvan/secpolicy/fileLabels/monitor: 2 errors
+/etc/zorvan/secpolicy/objects/base: 1 error
+END
+)"$'\n'"installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects"$ ]]
+}
+
+@test "the files of a tardisk's policy and of two conflicting rules are counted too" {
+  boot
+  printf '%s\n' "-p bind_port 1 100 grant" "-p bind_port 50 revoke" >>"$policy/domains/appDom"
+  cp "$policy/tardisks/monitor" "$policy/tardisks/other"
+  secpolicy load
+  exits 1
+  says "/etc/zorvan/secpolicy/domains/appDom: 1 error"
+  says "/etc/zorvan/secpolicy/tardisks/other: 1 error"
+}
+
+@test "--timing prints each phase of a load to standard output" {
+  boot
+  secpolicy load --timing
+  exits 0
+  is_done load
+  [[ $(sed 's/  *[0-9.]* s$//' <<<"$output") == "objects
+domains
+partner domains
+tardisks
+file labels
+all" ]]
+  secpolicy load-early --timing
+  exits 0
+  [[ $(sed 's/  *[0-9.]* s$//' <<<"$output") == "objects
+domains
+file labels
+all" ]]
+}
+
+@test "--timing of a load that fails shows the phases all the same" {
+  boot
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  echo "/no/such hostConfig" >>"$policy/fileLabels/base"
+  secpolicy load --timing
+  exits 1
+  [[ $(sed 's/  *[0-9.]* s$//' <<<"$output") == "objects
+domains
+partner domains
+tardisks
+file labels
+all" ]]
+}
+
+@test "--timing does not keep the log of the host from its lines" {
+  boot
+  [[ ! -e $root/dev/kmsg ]] || skip "the root has a kernel log device"
+  rm "$root/run/secpolicy/kernel.log"
+  secpolicy load
+  mv "$root/run/secpolicy/kernel.log" "$BATS_TEST_TMPDIR/quiet.log"
+  secpolicy load --timing
+  cmp "$root/run/secpolicy/kernel.log" "$BATS_TEST_TMPDIR/quiet.log"
 }

@@ -3,6 +3,9 @@
 #include "host/linux/archive_library.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
+#include "load_summary.h"
+#include "load_timing.h"
+#include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
@@ -20,22 +23,35 @@ void LoadEarly() {
                            SecPolicy::kEarlyPolicyRoot);
 }
 
-void BootAndLoad() {
+void BootAndLoad(LoadTiming& timing) {
   LinuxHost::Boot();
+  timing.EndPhase("first labels");
+  timing.BeginPart("early ");
   LoadEarly();
+  EndEarlyLoad();
+  timing.BeginPart("");
   SecPolicy::LoadPolicy(SecPolicy::kPolicyRoot);
 }
 
-ExitCode Boot() {
+ExitCode Boot(bool timing) {
   if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) {
     return Refuse("boot", std::string("there is no directory ") + SecPolicy::kTardiskImagesDir +
                               " below this root, so nothing was changed. Put the tardisks there, "
                               "or name the root that they are in (--root DIR).");
   }
-  return CallLibrary("boot", SecPolicy::kPolicyRoot, BootAndLoad, AdviseOnPrivilege);
+  return CallLibrary(
+      "boot", SecPolicy::kPolicyRoot,
+      [&] {
+        LoadTiming phases(timing);
+        BootAndLoad(phases);
+      },
+      AdviseOnPrivilege, DescribeInstalled);
 }
 
-Action Define(CLI::App&) { return Boot; }
+Action Define(CLI::App& app) {
+  const auto timing = AddTiming(app);
+  return [timing] { return Boot(*timing); };
+}
 
 }  // namespace
 
@@ -46,9 +62,10 @@ const Verb kBoot = {
     "A root without /etc/zorvan/secpolicy/early is booted without an early policy.\n"
     "It writes into the root that it is given, so try it on a root of your own first.\n"
     "\n"
-    "Example:\n"
+    "Examples:\n"
     "  mkdir -p r/tardisks && cp base.tgz r/tardisks/\n"
-    "  secpolicy --root ./r boot",
+    "  secpolicy --root ./r boot\n"
+    "  secpolicy --root ./r boot --timing   how long does each phase take?",
     Define, LinuxHost::LoadArchiveLibrary};
 
 }  // namespace SecPolicyCli

@@ -7,9 +7,11 @@
 #include <iostream>
 #include <string_view>
 
+#include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
 #include "error_watch.h"
 #include "load_record.h"
+#include "load_summary.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -32,6 +34,7 @@ struct RunningCall {
   std::string verb;
   std::string policyDir;
   const ErrorWatch* errors;
+  std::size_t earlyErrors = 0;
   std::terminate_handler otherwise;
 };
 
@@ -47,6 +50,21 @@ void Record(const RunningCall& call, const std::string& ending,
   if (!call.policyDir.empty()) RecordLoad(call.verb, call.policyDir, ending, errors);
 }
 
+void WriteErrorsByFile(const RunningCall& call) {
+  if (call.policyDir.empty()) return;
+  SecPolicyCli::WriteErrorsByFile(call.errors->Messages(), call.earlyErrors, call.policyDir);
+}
+
+// A load carries on after an error, so what is installed is seldom what was before.
+void WriteInstalled(const RunningCall& call) {
+  if (call.policyDir.empty()) return;
+  try {
+    std::cerr << "installed now: " + CountInstalled() << std::endl;
+  } catch (const Braxo::Lib::BraxoException&) {
+    return;  // what keeps the load from its state has been said
+  }
+}
+
 // The library stops a load by rethrowing while no exception is being handled. Whatever else ends
 // the process keeps its usual way, core dump included.
 void OnTerminate() {
@@ -57,6 +75,7 @@ void OnTerminate() {
       if (messages.back() != domain.message) continue;
       std::cout.flush();
       Record(running, "stopped", messages);
+      WriteErrorsByFile(running);
       WriteSummary(running.verb,
                    Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
                                        ", so the load ended before tardisks and file labels. Put a "
@@ -96,7 +115,8 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
                      const std::function<std::string()>& ending) {
   std::string failure;
   ErrorWatch errors(std::cerr);
-  RunningCall running{verb, policyDir, &errors, nullptr};
+  RunningCall running{
+      .verb = verb, .policyDir = policyDir, .errors = &errors, .otherwise = nullptr};
   const TerminateGuard guard(running);
   try {
     call();
@@ -112,12 +132,16 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   }
   Record(running, "failed",
          errors.Count() > 0 ? errors.Messages() : std::vector<std::string>{failure});
+  WriteErrorsByFile(running);
+  WriteInstalled(running);
   std::string summary = failure.empty() ? "failed" : failure;
   if (errors.Count() > 0) summary += " (" + ErrorsAbove(errors.Count()) + ")";
   const std::string next = advice();
   WriteSummary(verb, next.empty() ? summary : summary + ". " + next);
   return kFailed;
 }
+
+void EndEarlyLoad() { runningCall->earlyErrors = runningCall->errors->Count(); }
 
 ExitCode Refuse(const std::string& verb, const std::string& why) {
   WriteSummary(verb, why);

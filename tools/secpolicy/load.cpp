@@ -13,13 +13,14 @@ namespace {
 struct Options {
   bool plan = false;
   bool allOrNothing = false;
+  bool timing = false;
   PlanOptions planOptions;
 };
 
 ExitCode Load(const std::string& dir, const Options& options) {
   if (options.plan) return PlanLoad(dir, options.planOptions);
   if (options.allOrNothing) return LoadAllOrNothing(dir);
-  return LoadFrom("load", dir, SecPolicy::LoadPolicy);
+  return LoadFrom("load", dir, SecPolicy::LoadPolicy, options.timing);
 }
 
 Action Define(CLI::App& app) {
@@ -36,8 +37,11 @@ Action Define(CLI::App& app) {
          "--all-or-nothing", options->allOrNothing,
          "Load only when a rehearsal ends well, and put everything back when the load does not")
       ->excludes(plan);
+  const auto timing = AddTiming(app);
+  app.get_option("--timing")->excludes(plan)->excludes("--all-or-nothing");
   const CLI::Option* const verbose = app.get_parent()->get_option("--verbose");
   return [=] {
+    options->timing = *timing;
     options->planOptions.showAll = verbose->count() > 0;
     return Load(*dir, *options);
   };
@@ -59,6 +63,7 @@ const Verb kLoad = {
     "  secpolicy load                       install the host's policy again after an edit\n"
     "  secpolicy --root /srv/r load -v      the same below /srv/r, and show the progress\n"
     "  secpolicy load /root/new-policy      objects, domains and labels of another directory\n"
+    "  secpolicy load --timing              how long does each phase take?\n"
     "  secpolicy load --plan                what would change? -v shows every file\n"
     "  secpolicy load --all-or-nothing      never half a policy",
     Define};

@@ -8,7 +8,8 @@ namespace {
 
 Action Define(CLI::App& app) {
   const auto dir = AddPolicyDir(app, SecPolicy::kEarlyPolicyRoot);
-  return [dir] { return LoadFrom("load-early", *dir, SecPolicy::LoadPolicyEarly); };
+  const auto timing = AddTiming(app);
+  return [=] { return LoadFrom("load-early", *dir, SecPolicy::LoadPolicyEarly, *timing); };
 }
 
 }  // namespace

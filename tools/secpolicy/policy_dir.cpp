@@ -4,6 +4,8 @@
 
 #include "kitlibs/file.h"
 #include "library_call.h"
+#include "load_summary.h"
+#include "load_timing.h"
 #include "root.h"
 
 namespace SecPolicyCli {
@@ -14,6 +16,12 @@ std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string
   return dir;
 }
 
+std::shared_ptr<const bool> AddTiming(CLI::App& app) {
+  const auto timing = std::make_shared<bool>(false);
+  app.add_flag("--timing", *timing, "Print the time that each phase took to standard output");
+  return timing;
+}
+
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir) {
   if (File_IsDirectory(dir.c_str())) return std::nullopt;
   return Refuse(verb, "there is no directory " + dir +
@@ -22,10 +30,15 @@ std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::str
 }
 
 ExitCode LoadFrom(const std::string& verb, const std::string& dir,
-                  void (*load)(const std::string& dir)) {
+                  void (*load)(const std::string& dir), bool timing) {
   if (const auto refusal = RefuseMissingDir(verb, dir)) return *refusal;
   return CallLibrary(
-      verb, dir, [&] { load(dir); }, AdviseOnPrivilege);
+      verb, dir,
+      [&] {
+        LoadTiming phases(timing);
+        load(dir);
+      },
+      AdviseOnPrivilege, DescribeInstalled);
 }
 
 }  // namespace SecPolicyCli

@@ -72,12 +72,18 @@ std::list<std::string> ListTardisks() {
 
 }  // namespace
 
-InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
-  InstalledPolicy policy;
+std::vector<InstalledDomain> ReadInstalledDomains(TeskAccessInterfaceImpl& access) {
+  std::vector<InstalledDomain> domains;
   const unsigned int slots = access.GetMaxDomains();
   for (unsigned int id = 0; id < slots; ++id) {
-    if (auto domain = ReadDomain(id, access)) policy.domains.push_back(std::move(*domain));
+    if (auto domain = ReadDomain(id, access)) domains.push_back(std::move(*domain));
   }
+  return domains;
+}
+
+InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
+  InstalledPolicy policy;
+  policy.domains = ReadInstalledDomains(access);
   for (const auto& [name, id] :
        access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL)) {
     policy.objects.emplace(name, static_cast<unsigned int>(id));

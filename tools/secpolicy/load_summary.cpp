@@ -1,0 +1,86 @@
+#include "load_summary.h"
+
+#include <array>
+#include <iostream>
+#include <map>
+#include <string_view>
+
+#include "installed/installed_policy.h"
+#include "secpolicy/policy_root.h"
+#include "text/count.h"
+#include "text/visible.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr std::string_view kPartnerPrefix = "plugin-";
+constexpr std::string_view kEnd = " : ";
+
+// What stands before the name of a domain, or before the file of a tardisk's policy.
+constexpr std::array<std::string_view, 3> kBeforeDomain = {
+    "Error in parsing policy for domain: ", "Error in setting policy for domain: ",
+    "Policy constraint error for domain: "};
+
+// What stands before a path that ends the message.
+constexpr std::array<std::string_view, 6> kBeforePath = {
+    "Unable to open policy file ",         "Unable to open policy directory for tardisks ",
+    "Unable to open policy directory ",    "Unable to get attributes for policy file ",
+    "No backing tardisk for policy file ", "Ignoring "};
+
+template <class Beginnings>
+std::string_view Behind(const Beginnings& beginnings, std::string_view message) {
+  for (const std::string_view beginning : beginnings) {
+    if (message.starts_with(beginning)) return message.substr(beginning.size());
+  }
+  return {};
+}
+
+// "NAME: LINE : REASON", or "NAME : REASON" where the whole domain is meant.
+std::string DomainFile(std::string_view text, const std::string& policyDir) {
+  const std::string_view name = text.substr(0, text.find_first_of(" :"));
+  if (name.starts_with('/')) return std::string(name);
+  if (name.starts_with(kPartnerPrefix)) {
+    return SecPolicy::kPartnerDomainsDir + ("/" + std::string(name.substr(kPartnerPrefix.size())));
+  }
+  return policyDir + "/" + SecPolicy::kDomainsDir + "/" + std::string(name);
+}
+
+// The file that a message is about; empty when it is about none.
+std::string FileOf(std::string_view message, const std::string& policyDir) {
+  const std::string_view domain = Behind(kBeforeDomain, message);
+  if (!domain.empty()) return DomainFile(domain, policyDir);
+  if (!message.starts_with('/')) return std::string(Behind(kBeforePath, message));
+  // "FILE:LINE : REASON"
+  const std::string_view place = message.substr(0, message.find(kEnd));
+  return std::string(place.substr(0, place.rfind(':')));
+}
+
+}  // namespace
+
+void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t earlyErrors,
+                       const std::string& policyDir) {
+  std::map<std::string, std::size_t> errors;
+  for (std::size_t index = 0; index < messages.size(); ++index) {
+    const bool isEarly = index < earlyErrors;
+    const std::string file =
+        FileOf(messages[index], isEarly ? SecPolicy::kEarlyPolicyRoot : policyDir);
+    if (!file.empty()) ++errors[file];
+  }
+  for (const auto& [file, count] : errors) {
+    std::cerr << Visible(file) << ": " << CountOf(count, "error") << std::endl;
+  }
+}
+
+std::string CountInstalled() {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  const std::vector<InstalledDomain> domains = ReadInstalledDomains(access);
+  const auto objects = access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL);
+  std::size_t rules = 0;
+  for (const InstalledDomain& domain : domains) rules += domain.rules.size();
+  return CountOf(domains.size(), "domain") + ", " + CountOf(rules, "rule") + ", " +
+         CountOf(objects.size(), "object");
+}
+
+std::string DescribeInstalled() { return "done (" + CountInstalled() + ")"; }
+
+}  // namespace SecPolicyCli

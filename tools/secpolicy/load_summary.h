@@ -1,0 +1,21 @@
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+namespace SecPolicyCli {
+
+// Writes "FILE: N errors" to standard error for each policy file and directory that `messages`, the
+// errors of a load of `policyDir`, are about; nothing for those that only sum up. The first
+// `earlyErrors` of them are those of the early policy.
+void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t earlyErrors,
+                       const std::string& policyDir);
+
+// How much is installed now: "9 domains, 137 rules, 17 objects". Throws what the host throws.
+std::string CountInstalled();
+
+// What the summary of a load that ended well says.
+std::string DescribeInstalled();
+
+}  // namespace SecPolicyCli
