@@ -27,7 +27,7 @@ __attribute__((visibility("default"))) std::vector<LabelChange> RehearsedLabels(
 
 // For the attribute itself: whether labels are only noted, and what then stands in for setxattr(2)
 // and getxattr(2) with the attribute `name`.
-bool IsRehearsing();
+__attribute__((visibility("default"))) bool IsRehearsing();
 int RehearseSetting(const char* path, const char* name, const void* value, std::size_t size,
                     int flags);
 ssize_t ReadRehearsed(const char* path, const char* name, void* value, std::size_t size);

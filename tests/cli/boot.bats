@@ -83,6 +83,7 @@ load helper
   exits 1
   [[ $stderr =~ ^"Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
 /etc/zorvan/secpolicy/early/domains: 1 error
+'secpolicy check /etc/zorvan/secpolicy' shows the lines, and what may be meant
 installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
 secpolicy: boot: failed (1 error above)"$ ]]
 }

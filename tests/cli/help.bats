@@ -34,7 +34,7 @@ load helper
   [[ -z $output ]]
   run --separate-stderr "$SECPOLICY" lod
   exits 2
-  [[ $stderr == "secpolicy: there is no verb or option 'lod'
+  [[ $stderr == "secpolicy: there is no verb or option 'lod'; did you mean 'load'?
 'secpolicy --help' explains the usage." ]]
   run --separate-stderr "$SECPOLICY" load --rot /x
   exits 2

@@ -10,6 +10,7 @@
 #include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
 #include "error_watch.h"
+#include "host/linux/label_rehearsal.h"
 #include "load_record.h"
 #include "load_summary.h"
 
@@ -57,7 +58,7 @@ void WriteErrorsByFile(const RunningCall& call) {
 
 // A load carries on after an error, so what is installed is seldom what was before.
 void WriteInstalled(const RunningCall& call) {
-  if (call.policyDir.empty()) return;
+  if (call.policyDir.empty() || LinuxHost::IsRehearsing()) return;
   try {
     std::cerr << "installed now: " + CountInstalled() << std::endl;
   } catch (const Braxo::Lib::BraxoException&) {

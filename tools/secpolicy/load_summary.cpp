@@ -69,6 +69,11 @@ void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t ear
   for (const auto& [file, count] : errors) {
     std::cerr << Visible(file) << ": " << CountOf(count, "error") << std::endl;
   }
+  if (errors.empty()) return;
+  // A check of the policy looks at the early policy in it too.
+  const bool isEarly = policyDir == SecPolicy::kEarlyPolicyRoot;
+  std::cerr << "'secpolicy check " << Visible(isEarly ? SecPolicy::kPolicyRoot : policyDir)
+            << "' shows the lines, and what may be meant" << std::endl;
 }
 
 std::string CountInstalled() {

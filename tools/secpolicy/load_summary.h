@@ -7,8 +7,8 @@
 namespace SecPolicyCli {
 
 // Writes "FILE: N errors" to standard error for each policy file and directory that `messages`, the
-// errors of a load of `policyDir`, are about; nothing for those that only sum up. The first
-// `earlyErrors` of them are those of the early policy.
+// errors of a load of `policyDir`, are about, and how to see the lines; nothing for those that only
+// sum up. The first `earlyErrors` of them are those of the early policy.
 void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t earlyErrors,
                        const std::string& policyDir);
 

@@ -8,6 +8,7 @@
 
 #include "host/linux/system_log.h"
 #include "root.h"
+#include "text/suggestion.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -47,15 +48,24 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
+std::vector<std::string> VerbNames() {
+  std::vector<std::string> names;
+  for (const Verb* verb : kVerbs) names.emplace_back(verb->name);
+  return names;
+}
+
 // The message for a command line that cannot be understood, and where to read on.
 std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   std::string command = "secpolicy";
   for (const CLI::App* verb : app->get_subcommands())
     command += std::string(" ") + verb->get_name();
   const std::vector<std::string> unknown = app->remaining();
-  const std::string problem = app->get_subcommands().empty() && !unknown.empty()
-                                  ? "there is no verb or option '" + unknown.front() + "'"
-                                  : error.what();
+  std::string problem = error.what();
+  if (app->get_subcommands().empty() && !unknown.empty()) {
+    problem = "there is no verb or option '" + unknown.front() + "'";
+    const std::string nearest = NearestWord(unknown.front(), VerbNames());
+    if (!nearest.empty()) problem += "; did you mean '" + nearest + "'?";
+  }
   return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
 }
 
