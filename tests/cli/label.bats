@@ -345,6 +345,9 @@ END
     secpolicy label $arguments
     exits 2
   done
+  secpolicy label
+  [[ $stderr == "secpolicy: A subcommand is required: one of get, set, verify, relabel
+'secpolicy label --help' explains the usage." ]]
   secpolicy label get --help
   exits 0
   [[ $output == *"Examples:"*"secpolicy label get -R /etc"* ]]

@@ -54,6 +54,16 @@ std::vector<std::string> VerbNames() {
   return names;
 }
 
+// ": one of A, B" for a verb that has kinds and was given none; else nothing.
+std::string KindsOf(const CLI::App& verb) {
+  if (!verb.get_subcommands().empty()) return "";
+  std::string kinds;
+  for (const CLI::App* kind : verb.get_subcommands([](const CLI::App*) { return true; })) {
+    kinds += (kinds.empty() ? ": one of " : ", ") + kind->get_name();
+  }
+  return kinds;
+}
+
 // The message for a command line that cannot be understood, and where to read on.
 std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   std::string command = "secpolicy";
@@ -65,6 +75,8 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
     problem = "there is no verb or option '" + unknown.front() + "'";
     const std::string nearest = NearestWord(unknown.front(), VerbNames());
     if (!nearest.empty()) problem += "; did you mean '" + nearest + "'?";
+  } else if (!app->get_subcommands().empty() && error.get_name() == "RequiredError") {
+    problem += KindsOf(*app->get_subcommands().front());
   }
   return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
 }

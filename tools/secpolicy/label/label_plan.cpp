@@ -5,7 +5,7 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
-#include <ranges>
+#include <map>
 
 #include "braxo/misc/strcat.h"
 
@@ -49,7 +49,8 @@ void LabelPlan::ForEachFile(const std::vector<std::string>& paths, const std::st
   const FileIds chosen = FilesBelow(paths);
   FileIds decided;
   run.progress.Begin(job, run.progress.IsShown() ? CountVisits() : 0);
-  for (const LabelLine& line : lines | std::views::reverse) {
+  for (auto next = lines.crbegin(); next != lines.crend(); ++next) {
+    const LabelLine& line = *next;
     ForEachBelow(line.label.path, line.label.recursive, line.Place() + " : ",
                  [&](const WalkedFile& file, const FileId& id) {
                    const bool isChosen = paths.empty() || chosen.contains(id);

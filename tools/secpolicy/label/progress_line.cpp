@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 
 #include "braxo/misc/strcat.h"
@@ -86,7 +87,7 @@ std::string ProgressLine::Text() const {
       StrCat(job, " ", Bar(count, totalCount), " ", count, "/", totalCount, " files, ", pace);
   if (count == 0 || rate <= 0) return text;
   const double left = static_cast<double>(totalCount - std::min(count, totalCount)) / rate;
-  return StrCat(text, ", ", Minutes(static_cast<std::size_t>(left + 0.5)), " left");
+  return StrCat(text, ", ", Minutes(static_cast<std::size_t>(std::lround(left))), " left");
 }
 
 }  // namespace SecPolicyCli
