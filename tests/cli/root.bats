@@ -77,3 +77,12 @@ as_nobody() {
 job7: /srv/jobs/7 0x3
 job7: /usr/bin/convert 0x11" ]]
 }
+
+@test "where nothing is installed, the verbs that look say what to do" {
+  mkdir "$BATS_TEST_TMPDIR/empty"
+  for verb in status "why sshDom read /etc" graph; do
+    run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" $verb
+    exits 1
+    [[ $stderr == *". Nothing is installed below this root: run 'secpolicy boot' first, or name the root that was booted (--root DIR)." ]]
+  done
+}

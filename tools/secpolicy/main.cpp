@@ -1,6 +1,9 @@
+#include <unistd.h>
+
 #include <CLI/App.hpp>
 #include <CLI/Config.hpp>
 #include <CLI/Formatter.hpp>
+#include <cerrno>
 #include <exception>
 #include <iostream>
 #include <string>
@@ -8,6 +11,7 @@
 
 #include "host/linux/system_log.h"
 #include "root.h"
+#include "scratch/used_state.h"
 #include "text/suggestion.h"
 #include "verb.h"
 
@@ -81,6 +85,16 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
 }
 
+// What to do about a failure that no verb has explained; may be nothing.
+std::string Advise() {
+  if (access(StatePath().c_str(), F_OK) != 0 && errno == ENOENT) {
+    return ". Nothing is installed below this root: run 'secpolicy boot' first, or name the root "
+           "that was booted (--root DIR).";
+  }
+  const std::string advice = AdviseOnPrivilege();
+  return advice.empty() ? "" : ". " + advice;
+}
+
 int Run(int argc, char** argv) {
   CLI::App app(kAbout, "secpolicy");
   std::string root;
@@ -111,13 +125,15 @@ int Run(int argc, char** argv) {
   } catch (const CLI::ParseError& error) {
     return app.exit(error) == 0 ? kWell : kUsage;
   }
+  bool isInRoot = false;
   try {
     if (prepare != nullptr) prepare();
     if (rootOption->count() > 0) EnterRoot(root);
+    isInRoot = true;
     if (verbose) LinuxHost::ShowInformation();
     return action();
   } catch (const std::exception& failure) {
-    std::cerr << "secpolicy: " << failure.what() << std::endl;
+    std::cerr << "secpolicy: " << failure.what() << (isInRoot ? Advise() : "") << std::endl;
     return kFailed;
   }
 }
