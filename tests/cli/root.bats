@@ -78,11 +78,28 @@ job7: /srv/jobs/7 0x3
 job7: /usr/bin/convert 0x11" ]]
 }
 
-@test "where nothing is installed, the verbs that look say what to do" {
-  mkdir "$BATS_TEST_TMPDIR/empty"
-  for verb in status "why sshDom read /etc" graph; do
+@test "where nothing is installed, the verbs that look say what to do and make nothing" {
+  mkdir -p "$BATS_TEST_TMPDIR/empty/run"
+  for verb in "why sshDom read /etc" "who-can read /etc" graph; do
     run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" $verb
     exits 1
-    [[ $stderr == *". Nothing is installed below this root: run 'secpolicy boot' first, or name the root that was booted (--root DIR)." ]]
+    ends_with "secpolicy: ${verb%% *}: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy boot' first."
+    [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
+  done
+  run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" status
+  exits 1
+  ends_with "secpolicy: status: no policy is loaded. 'secpolicy load' loads one"
+  [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
+}
+
+@test "output that cannot be written is an error of every verb" {
+  boot
+  "$SECPOLICY" --root "$root" save good
+  for verb in status "status --format json" display "display --format json" graph \
+    "label get -R /etc" "why sshDom read /etc/ssh" "who-can read /etc" history; do
+    # shellcheck disable=SC2016
+    run --separate-stderr bash -c '"$SECPOLICY" --root "$1" $2 >/dev/full' - "$root" "$verb"
+    exits 1
+    ends_with "secpolicy: standard output could not be written, so it is not complete"
   done
 }

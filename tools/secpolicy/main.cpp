@@ -1,9 +1,6 @@
-#include <unistd.h>
-
 #include <CLI/App.hpp>
 #include <CLI/Config.hpp>
 #include <CLI/Formatter.hpp>
-#include <cerrno>
 #include <exception>
 #include <iostream>
 #include <string>
@@ -11,7 +8,6 @@
 
 #include "host/linux/system_log.h"
 #include "root.h"
-#include "scratch/used_state.h"
 #include "text/suggestion.h"
 #include "verb.h"
 
@@ -85,14 +81,13 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
 }
 
-// What to do about a failure that no verb has explained; may be nothing.
-std::string Advise() {
-  if (access(StatePath().c_str(), F_OK) != 0 && errno == ENOENT) {
-    return ". Nothing is installed below this root: run 'secpolicy boot' first, or name the root "
-           "that was booted (--root DIR).";
-  }
-  const std::string advice = AdviseOnPrivilege();
-  return advice.empty() ? "" : ". " + advice;
+// A verb that ended well has failed all the same when its output is lost.
+ExitCode FlushOutput(ExitCode code) {
+  std::cout.flush();
+  if (std::cout.good()) return code;
+  std::cerr << "secpolicy: standard output could not be written, so it is not complete"
+            << std::endl;
+  return code == kWell ? kFailed : code;
 }
 
 int Run(int argc, char** argv) {
@@ -131,9 +126,11 @@ int Run(int argc, char** argv) {
     if (rootOption->count() > 0) EnterRoot(root);
     isInRoot = true;
     if (verbose) LinuxHost::ShowInformation();
-    return action();
+    return FlushOutput(action());
   } catch (const std::exception& failure) {
-    std::cerr << "secpolicy: " << failure.what() << (isInRoot ? Advise() : "") << std::endl;
+    const std::string advice = isInRoot ? AdviseOnPrivilege() : "";
+    std::cerr << "secpolicy: " << failure.what() << (advice.empty() ? "" : ". ") << advice
+              << std::endl;
     return kFailed;
   }
 }

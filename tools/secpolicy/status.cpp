@@ -14,6 +14,7 @@
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "installed/rule_words.h"
+#include "scratch/scratch_state.h"
 #include "text/count.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -185,6 +186,9 @@ Action Define(CLI::App& app) {
       ->type_name("FORMAT")
       ->capture_default_str();
   return [format] {
+    // The host would make a state of its own.
+    std::optional<ScratchState> scratch;
+    if (IsStateMissing()) scratch.emplace(true);
     const Status status = ReadStatus();
     (*format == "json" ? WriteJson : WriteText)(status);
     return Summarize(status);

@@ -4,6 +4,8 @@
 #include <iostream>
 
 #include "question.h"
+#include "saved/saved_name.h"
+#include "scratch/used_state.h"
 
 namespace SecPolicyCli {
 
@@ -17,6 +19,8 @@ std::shared_ptr<const std::string> AddAnswerFormat(CLI::App& app) {
 }
 
 ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer) {
+  // The host would make a state of its own.
+  if (IsStateMissing()) return RefuseWithoutState(verb);
   try {
     return answer();
   } catch (const QuestionError& error) {
