@@ -27,33 +27,58 @@ namespace {
                      " first, or choose another place"));
 }
 
-void RequirePrivate(const struct stat& status, const std::string& path,
-                    const std::string& purpose) {
+// What a file is for, and what else there is to do about one that is refused.
+struct Use {
+  const std::string& purpose;
+  const char* alternative;
+};
+
+constexpr char kElsewhere[] = ", or choose another place";
+constexpr char kAnew[] = ", and make it anew";
+
+void RequirePrivate(const struct stat& status, const std::string& path, const Use& use) {
   if (status.st_uid != geteuid() && status.st_uid != 0) {
-    throw HostError(EACCES, StrCat("Refusing the ", purpose, ": ", path,
-                                   " belongs to another user. Remove it, or choose another place"));
+    throw HostError(EACCES, StrCat("Refusing the ", use.purpose, ": ", path,
+                                   " belongs to another user. Remove it", use.alternative));
   }
   if ((status.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
-    throw HostError(EACCES, StrCat("Refusing the ", purpose, ": other users may write ", path,
-                                   ". Take that right from them (chmod go-w), or choose another "
-                                   "place"));
+    throw HostError(EACCES, StrCat("Refusing the ", use.purpose, ": other users may write ", path,
+                                   ". Take that right from them (chmod go-w)", use.alternative));
   }
 }
 
-void PrepareDirectory(const std::string& directory, const std::string& purpose) {
-  if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
-    if (errno == ENOENT) ThrowParentMissing(directory, purpose);
-    ThrowSystemError(StrCat("Unable to create the directory ", directory, " for the ", purpose));
-  }
+// Looks at a link itself, never at what it leads to.
+struct stat Examine(const std::string& path) {
   struct stat status {};
-  if (lstat(directory.c_str(), &status) != 0) {
-    ThrowSystemError(StrCat("Unable to examine ", directory));
-  }
+  if (lstat(path.c_str(), &status) != 0) ThrowSystemError(StrCat("Unable to examine ", path));
+  return status;
+}
+
+void RequireDirectory(const std::string& directory, const Use& use) {
+  const struct stat status = Examine(directory);
   if (!S_ISDIR(status.st_mode)) {
     throw HostError(ENOTDIR,
-                    StrCat("Refusing the ", purpose, ": ", directory, " is not a directory"));
+                    StrCat("Refusing the ", use.purpose, ": ", directory, " is not a directory"));
   }
-  RequirePrivate(status, directory, purpose);
+  RequirePrivate(status, directory, use);
+}
+
+void RequireFile(const std::string& path, const Use& use) {
+  const struct stat status = Examine(path);
+  if (!S_ISREG(status.st_mode)) {
+    throw HostError(EINVAL, StrCat("Refusing the ", use.purpose, ": ", path,
+                                   " is not a regular file. Remove it", use.alternative));
+  }
+  RequirePrivate(status, path, use);
+}
+
+void PrepareDirectory(const std::string& directory, const Use& use) {
+  if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
+    if (errno == ENOENT) ThrowParentMissing(directory, use.purpose);
+    ThrowSystemError(
+        StrCat("Unable to create the directory ", directory, " for the ", use.purpose));
+  }
+  RequireDirectory(directory, use);
 }
 
 // Only ever opens a file that it has just created: closing another descriptor of a database in use
@@ -68,27 +93,33 @@ void CreateFile(const std::string& path, const std::string& purpose) {
   if (errno != EEXIST) ThrowSystemError(StrCat("Unable to create the ", purpose, " ", path));
 }
 
-}  // namespace
+bool IsMissing(const std::string& path) {
+  struct stat status {};
+  return lstat(path.c_str(), &status) != 0 && errno == ENOENT;
+}
 
-void PreparePrivateFile(const std::string& path, const std::string& purpose) {
+std::string DirectoryOf(const std::string& path, const std::string& purpose) {
   const auto slash = path.rfind('/');
   if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
     throw HostError(
         EINVAL, StrCat("The ", purpose, " needs the absolute path of a file, not \"", path, "\""));
   }
-  PrepareDirectory(slash == 0 ? "/" : path.substr(0, slash), purpose);
+  return slash == 0 ? "/" : path.substr(0, slash);
+}
 
-  struct stat status {};
-  if (lstat(path.c_str(), &status) != 0) {
-    if (errno != ENOENT) ThrowSystemError(StrCat("Unable to examine ", path));
-    CreateFile(path, purpose);
-    if (lstat(path.c_str(), &status) != 0) ThrowSystemError(StrCat("Unable to examine ", path));
-  }
-  if (!S_ISREG(status.st_mode)) {
-    throw HostError(EINVAL, StrCat("Refusing the ", purpose, ": ", path,
-                                   " is not a regular file. Remove it, or choose another place"));
-  }
-  RequirePrivate(status, path, purpose);
+}  // namespace
+
+void PreparePrivateFile(const std::string& path, const std::string& purpose) {
+  const Use use{.purpose = purpose, .alternative = kElsewhere};
+  PrepareDirectory(DirectoryOf(path, purpose), use);
+  if (IsMissing(path)) CreateFile(path, purpose);
+  RequireFile(path, use);
+}
+
+void RequirePrivateFile(const std::string& path, const std::string& purpose) {
+  const Use use{.purpose = purpose, .alternative = kAnew};
+  RequireDirectory(DirectoryOf(path, purpose), use);
+  RequireFile(path, use);
 }
 
 }  // namespace LinuxHost

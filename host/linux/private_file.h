@@ -10,4 +10,7 @@ namespace LinuxHost {
 // nothing, when something else is there.
 void PreparePrivateFile(const std::string& path, const std::string& purpose);
 
+// The same for a file that is only read: makes nothing, and throws also when there is no such file.
+void RequirePrivateFile(const std::string& path, const std::string& purpose);
+
 }  // namespace LinuxHost

@@ -212,6 +212,8 @@ void SaveState(const std::string& from, const std::string& to, bool replace) {
   file.TakeName(replace);
 }
 
+void RequireTrustedState(const std::string& path) { RequirePrivateFile(path, kPurpose); }
+
 void RestorePolicy(const std::string& copy, LabelNumbers numbers) {
   HostState& state = HostState::Current();
   Store& store = state.Database();

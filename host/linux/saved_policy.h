@@ -11,6 +11,10 @@ namespace LinuxHost {
 __attribute__((visibility("default"))) void SaveState(const std::string& from,
                                                       const std::string& to, bool replace);
 
+// Throws unless the saved state `path` is a regular file that only this user and the superuser may
+// change, in such a directory: whoever else may write it decides what comes back.
+__attribute__((visibility("default"))) void RequireTrustedState(const std::string& path);
+
 // The numbers that labels get which the copy has and the state has no longer.
 enum class LabelNumbers {
   kNew,     // files that carry the old number have another label since, or none

@@ -158,6 +158,42 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
 old  "*" UTC  Unable to use the host state /var/lib/secpolicy/saved/old.db: it has schema 1, "* ]]
 }
 
+# refuses REASON: no verb uses the saved state 'good', and all say why.
+refuses() {
+  installed >"$BATS_TEST_TMPDIR/before"
+  secpolicy rollback good
+  exits 1
+  ends_with "secpolicy: rollback: the saved state 'good' cannot be put back, so nothing was changed: $1"
+  installed | diff "$BATS_TEST_TMPDIR/before" -
+  secpolicy diff good installed
+  exits 2
+  ends_with "secpolicy: diff: $1"
+  secpolicy history
+  exits 1
+  [[ $output == "good  "*"  $1" ]]
+}
+
+@test "a saved state that others may have written is refused" {
+  local anew="Take that right from them (chmod go-w), and make it anew"
+  secpolicy save good
+  chmod 777 "$saved"
+  refuses "Refusing the saved state: other users may write /var/lib/secpolicy/saved. $anew"
+  chmod 700 "$saved"
+  chmod 666 "$saved/good.db"
+  refuses "Refusing the saved state: other users may write /var/lib/secpolicy/saved/good.db. $anew"
+  chmod 600 "$saved/good.db"
+  mv "$saved/good.db" "$saved/elsewhere"
+  ln -s elsewhere "$saved/good.db"
+  refuses "Refusing the saved state: /var/lib/secpolicy/saved/good.db is not a regular file. Remove it, and make it anew"
+}
+
+@test "a saved state that somebody else owns is refused" {
+  [[ $EUID -eq 0 ]] || skip "only root can give files away"
+  secpolicy save good
+  chown 65534 "$saved/good.db"
+  refuses "Refusing the saved state: /var/lib/secpolicy/saved/good.db belongs to another user. Remove it, and make it anew"
+}
+
 @test "a rollback that would leave a process without its domain is refused" {
   secpolicy save good
   touch "$policy/domains/lateDom"

@@ -17,15 +17,13 @@ namespace {
 void PutBack(const std::string& name) {
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("saved.db");
-  const std::string failure = CopyState(SavedStatePath(name), copy);
-  const std::string problem = "the saved state '" + name +
-                              "' cannot be put back, so nothing was "
-                              "changed: ";
-  if (!failure.empty()) throw std::runtime_error(problem + failure);
   try {
+    const std::string failure = CopyState(TrustedStatePath(name), copy);
+    if (!failure.empty()) throw std::runtime_error(failure);
     LinuxHost::RestorePolicy(copy, LinuxHost::LabelNumbers::kNew);
   } catch (const std::exception& reason) {
-    throw std::runtime_error(problem + reason.what());
+    throw std::runtime_error("the saved state '" + name +
+                             "' cannot be put back, so nothing was changed: " + reason.what());
   }
   RecordRollback(name);
 }

@@ -26,6 +26,7 @@ namespace {
 using LinuxHost::CopyDatabase;
 using LinuxHost::HostState;
 using LinuxHost::LabelNumbers;
+using LinuxHost::RequireTrustedState;
 using LinuxHost::RestorePolicy;
 using LinuxHost::RuleKind;
 using LinuxHost::SaveState;
@@ -394,6 +395,41 @@ TEST_F(SavedPolicy, RefusesAPlaceThatOthersMayWrite) {
             "Refusing the saved state: other users may write " + place +
                 ". Take that right from them (chmod go-w), or choose another place");
   EXPECT_TRUE(std::filesystem::is_empty(place));
+}
+
+TEST_F(SavedPolicy, IsTrustedOnlyWhereNobodyElseMayWrite) {
+  const std::string place = directory.Path() + "/saved";
+  const std::string path = place + "/one.db";
+  SaveState(directory.Database(), path, false);
+  EXPECT_NO_THROW(RequireTrustedState(path));
+
+  std::filesystem::permissions(path, std::filesystem::perms(0620));
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+            "Refusing the saved state: other users may write " + path +
+                ". Take that right from them (chmod go-w), and make it anew");
+  std::filesystem::permissions(path, std::filesystem::perms(0600));
+  std::filesystem::permissions(place, std::filesystem::perms::all);
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+            "Refusing the saved state: other users may write " + place +
+                ". Take that right from them (chmod go-w), and make it anew");
+  std::filesystem::permissions(place, std::filesystem::perms::owner_all);
+
+  std::filesystem::create_symlink("one.db", place + "/link.db");
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(place + "/link.db"); }),
+            "Refusing the saved state: " + place +
+                "/link.db is not a regular file. Remove it, and make it anew");
+  std::filesystem::create_directory_symlink("saved", directory.Path() + "/linked");
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(directory.Path() + "/linked/one.db"); }),
+            "Refusing the saved state: " + directory.Path() + "/linked is not a directory");
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(place + "/none.db"); }),
+            "Unable to examine " + place + "/none.db: No such file or directory");
+  EXPECT_FALSE(std::filesystem::exists(place + "/none.db"));
+
+  if (geteuid() != 0) return;  // only root can give files away
+  ASSERT_EQ(chown(path.c_str(), 65534, 65534), 0);
+  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+            "Refusing the saved state: " + path +
+                " belongs to another user. Remove it, and make it anew");
 }
 
 TEST_F(SavedPolicy, IsNotSavedFromWhatIsNoState) {

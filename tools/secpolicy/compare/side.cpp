@@ -49,7 +49,7 @@ Side ReadSaved(const std::string& name) {
                              "', and no such directory. 'secpolicy history' lists what is saved; "
                              "'installed' is what is installed now.");
   }
-  return ReadStateOf(name, SavedStatePath(name));
+  return ReadStateOf(name, TrustedStatePath(name));
 }
 
 }  // namespace

@@ -6,6 +6,8 @@
 #include <filesystem>
 #include <tuple>
 
+#include "host/linux/saved_policy.h"
+
 namespace SecPolicyCli {
 namespace {
 
@@ -33,6 +35,12 @@ std::string WhyNoSavedName(const std::string& name) {
 
 std::string SavedStatePath(const std::string& name) {
   return std::string(kSavedStatesDir) + "/" + name + kEnding;
+}
+
+std::string TrustedStatePath(const std::string& name) {
+  std::string path = SavedStatePath(name);
+  LinuxHost::RequireTrustedState(path);
+  return path;
 }
 
 bool IsSaved(const std::string& name) {

@@ -20,6 +20,10 @@ std::string WhyNoSavedName(const std::string& name);
 // The file of the saved state `name`, which may not be there.
 std::string SavedStatePath(const std::string& name);
 
+// The same for a saved state that is to be used. Throws Braxo::Lib::BraxoException when others may
+// have changed it.
+std::string TrustedStatePath(const std::string& name);
+
 bool IsSaved(const std::string& name);
 
 // The saved states, the oldest first. Throws std::system_error when they cannot be listed.
