@@ -223,3 +223,43 @@ all" ]]
   secpolicy load --timing
   cmp "$root/run/secpolicy/kernel.log" "$BATS_TEST_TMPDIR/quiet.log"
 }
+
+# without_memory: from now on a load has no memory left for recording where the rules are written.
+without_memory() {
+  cat >"$BATS_TEST_TMPDIR/memory.cpp" <<'END'
+#include <new>
+#include "host/linux/rule_origins.h"
+void LinuxHost::RecordOrigins(std::span<const RuleOrigin>, std::span<const LabelOrigin>) {
+  throw std::bad_alloc();
+}
+END
+  ${CXX:-c++} -std=c++20 -shared -fPIC -I "$SOURCE" -o "$BATS_TEST_TMPDIR/memory.so" \
+    "$BATS_TEST_TMPDIR/memory.cpp"
+  breakage=(env "LD_PRELOAD=$BATS_TEST_TMPDIR/memory.so" ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0)
+}
+
+@test "a load that cannot be recorded ends with its summary all the same" {
+  boot
+  without_memory
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load
+  exits 0
+  [[ $stderr == "secpolicy: load: this load cannot be recorded for the verbs that explain it: "*$'\n'* ]]
+  ends_done load
+  rm "$policy/domains/ioFilterDom"
+  sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
+  rm "$root/run/secpolicy/"*
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load
+  exits 3
+  [[ ${stderr##*$'\n'} == "secpolicy: load: stopped: there is no domain ioFilterDom, "* ]]
+}
+
+@test "a load after which nothing can be counted is done all the same" {
+  boot
+  sqlite3 "$root/run/secpolicy/host.db" "CREATE TRIGGER breakage AFTER INSERT ON load_record BEGIN
+    UPDATE domain SET id = 600 WHERE name = 'appDom';
+    UPDATE state SET domain_version = domain_version + 1; END"
+  secpolicy load
+  exits 0
+  says "secpolicy: load: what is installed cannot be counted: the host state holds a domain 600 beyond the last slot"
+  ends_with "secpolicy: load: done"
+}

@@ -7,8 +7,6 @@
 #include <iostream>
 #include <string_view>
 
-#include "braxo/lib/exception.h"
-#include "braxo/misc/strcat.h"
 #include "error_watch.h"
 #include "host/linux/label_rehearsal.h"
 #include "load_record.h"
@@ -51,6 +49,16 @@ void Record(const RunningCall& call, const std::string& ending,
   if (!call.policyDir.empty()) RecordLoad(call.verb, call.policyDir, ending, errors);
 }
 
+// Takes a step that only explains the summary after it, which is written whatever happens.
+template <class Step>
+void Attempt(Step step) {
+  try {
+    step();
+  } catch (const std::exception&) {
+    return;  // what is wrong has been said
+  }
+}
+
 void WriteErrorsByFile(const RunningCall& call) {
   if (call.policyDir.empty()) return;
   SecPolicyCli::WriteErrorsByFile(call.errors->Messages(), call.earlyErrors, call.policyDir);
@@ -59,11 +67,31 @@ void WriteErrorsByFile(const RunningCall& call) {
 // A load carries on after an error, so what is installed is seldom what was before.
 void WriteInstalled(const RunningCall& call) {
   if (call.policyDir.empty() || LinuxHost::IsRehearsing()) return;
+  std::cerr << "installed now: " + CountInstalled() << std::endl;
+}
+
+// What is done is done, also when it cannot be counted.
+std::string Describe(const std::string& verb, const std::function<std::string()>& ending) {
+  if (!ending) return "done";
   try {
-    std::cerr << "installed now: " + CountInstalled() << std::endl;
-  } catch (const Braxo::Lib::BraxoException&) {
-    return;  // what keeps the load from its state has been said
+    return ending();
+  } catch (const std::exception& failure) {
+    std::cerr << "secpolicy: " << verb
+              << ": what is installed cannot be counted: " << failure.what() << std::endl;
+    return "done";
   }
+}
+
+// An exception that left the terminate handler would be an abort without a summary.
+[[noreturn]] void EndStopped(const RunningCall& running, std::string_view missing) {
+  std::cout.flush();
+  Record(running, "stopped", running.errors->Messages());
+  Attempt([&] { WriteErrorsByFile(running); });
+  std::cerr << "secpolicy: " << running.verb << ": stopped: there is no domain " << missing
+            << ", so the load ended before tardisks and file labels. Put a policy file named "
+            << missing << " into " << running.policyDir << "/domains and run it again."
+            << std::endl;
+  _exit(kStopped);
 }
 
 // The library stops a load by rethrowing while no exception is being handled. Whatever else ends
@@ -73,17 +101,7 @@ void OnTerminate() {
   const std::vector<std::string>& messages = running.errors->Messages();
   if (!std::current_exception() && !messages.empty()) {
     for (const WellKnownDomain& domain : kWellKnownDomains) {
-      if (messages.back() != domain.message) continue;
-      std::cout.flush();
-      Record(running, "stopped", messages);
-      WriteErrorsByFile(running);
-      WriteSummary(running.verb,
-                   Braxo::Misc::StrCat("stopped: there is no domain ", domain.name,
-                                       ", so the load ended before tardisks and file labels. Put a "
-                                       "policy file named ",
-                                       domain.name, " into ", running.policyDir,
-                                       "/domains and run it again."));
-      _exit(kStopped);
+      if (messages.back() == domain.message) EndStopped(running, domain.name);
     }
   }
   running.otherwise();
@@ -128,13 +146,13 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   std::cout.flush();
   if (failure.empty() && errors.Count() == 0) {
     Record(running, "done", {});
-    WriteSummary(verb, ending ? ending() : "done");
+    WriteSummary(verb, Describe(verb, ending));
     return kWell;
   }
   Record(running, "failed",
          errors.Count() > 0 ? errors.Messages() : std::vector<std::string>{failure});
-  WriteErrorsByFile(running);
-  WriteInstalled(running);
+  Attempt([&] { WriteErrorsByFile(running); });
+  Attempt([&] { WriteInstalled(running); });
   std::string summary = failure.empty() ? "failed" : failure;
   if (errors.Count() > 0) summary += " (" + ErrorsAbove(errors.Count()) + ")";
   const std::string next = advice();

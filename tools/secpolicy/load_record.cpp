@@ -1,9 +1,9 @@
 #include "load_record.h"
 
 #include <ctime>
+#include <exception>
 #include <iostream>
 
-#include "braxo/lib/exception.h"
 #include "host/linux/load_record.h"
 #include "installed/origin_reader.h"
 #include "secpolicy/policy_root.h"
@@ -58,7 +58,7 @@ void RecordLoad(const std::string& verb, const std::string& policyDir, const std
   try {
     RecordEnding(verb, policyDir, ending, errors);
     RecordOrigins(verb, policyDir);
-  } catch (const Braxo::Lib::BraxoException& failure) {
+  } catch (const std::exception& failure) {
     if (ending != "done") return;
     std::cerr << "secpolicy: " << verb << ": this load cannot be recorded for the verbs that "
               << "explain it: " << failure.what() << std::endl;
