@@ -20,15 +20,9 @@ namespace {
 // A file has one label, whatever its names.
 using FileId = std::pair<dev_t, ino_t>;
 
-struct NotedLabel {
-  std::string path;
-  std::string before;
-  std::string after;
-};
-
 bool rehearsing = false;
-std::map<FileId, NotedLabel>& Noted() {
-  static std::map<FileId, NotedLabel> noted;
+std::map<FileId, LabelChange>& Noted() {
+  static std::map<FileId, LabelChange> noted;
   return noted;
 }
 
@@ -64,10 +58,8 @@ void StartLabelRehearsal() { rehearsing = true; }
 
 std::vector<LabelChange> RehearsedLabels() {
   std::vector<LabelChange> changes;
-  for (const auto& [file, label] : Noted()) {
-    if (label.before == label.after) continue;
-    changes.push_back({label.path, Identifier(label.before), Identifier(label.after)});
-  }
+  changes.reserve(Noted().size());
+  for (const auto& [file, change] : Noted()) changes.push_back(change);
   std::sort(changes.begin(), changes.end(),
             [](const LabelChange& one, const LabelChange& other) { return one.path < other.path; });
   return changes;
@@ -79,17 +71,21 @@ int RehearseSetting(const char* path, const char* name, const void* value, std::
                     int flags) {
   const auto file = IdentityOf(path);
   if (!file) return -1;
-  std::string label(static_cast<const char*>(value), size);
+  std::uint32_t id = 0;
+  if (size != sizeof id) return Fail(EINVAL);
+  std::memcpy(&id, value, sizeof id);
   const auto noted = Noted().find(*file);
-  const auto real = noted == Noted().end() ? ReadReal(path, name) : noted->second.before;
-  if (!real && (errno != ENODATA || flags == XATTR_REPLACE)) return -1;
-  if (real && flags == XATTR_CREATE) return Fail(EEXIST);
+  const bool isNoted = noted != Noted().end();
+  const auto real = isNoted ? std::nullopt : ReadReal(path, name);
+  const bool isLabelled = isNoted || real;
+  if (!isLabelled && (errno != ENODATA || flags == XATTR_REPLACE)) return -1;
+  if (isLabelled && flags == XATTR_CREATE) return Fail(EEXIST);
   // Tells read-only file systems and immutable files too.
   if (faccessat(AT_FDCWD, path, W_OK, AT_EACCESS) != 0) return -1;
-  if (noted != Noted().end()) {
-    noted->second.after = std::move(label);
+  if (isNoted) {
+    noted->second.after = id;
   } else {
-    Noted().emplace(*file, NotedLabel{path, real.value_or(""), std::move(label)});
+    Noted().emplace(*file, LabelChange{path, Identifier(real.value_or("")), id});
   }
   return 0;
 }
@@ -99,11 +95,11 @@ ssize_t ReadRehearsed(const char* path, const char* name, void* value, std::size
   if (!file) return -1;
   const auto noted = Noted().find(*file);
   if (noted == Noted().end()) return getxattr(path, name, value, size);
-  const std::string& label = noted->second.after;
-  if (size == 0) return static_cast<ssize_t>(label.size());
-  if (size < label.size()) return Fail(ERANGE);
-  std::memcpy(value, label.data(), label.size());
-  return static_cast<ssize_t>(label.size());
+  const std::uint32_t id = noted->second.after;
+  if (size == 0) return sizeof id;
+  if (size < sizeof id) return Fail(ERANGE);
+  std::memcpy(value, &id, sizeof id);
+  return sizeof id;
 }
 
 }  // namespace LinuxHost

@@ -10,19 +10,22 @@
 // What giving labels would do, without doing it.
 namespace LinuxHost {
 
-// A file whose label would change.
+// A file that would be labelled.
 struct LabelChange {
   std::string path;          // the one by which the file was reached first
   std::uint32_t before = 0;  // 0: what the file carries is no identifier
   std::uint32_t after = 0;
+
+  // False when the file would have its old label again in the end, whatever it had on the way.
+  bool IsLasting() const { return before != after; }
 };
 
 // From now on this process only notes the labels that it gives to files, and reads them back as if
 // they had been given; the files stay as they are. A label that a file could not be given fails as
-// it would.
+// it would. What is no identifier is no label (EINVAL).
 __attribute__((visibility("default"))) void StartLabelRehearsal();
 
-// The files whose label would be another one by now, in ascending order of their paths.
+// The files that would have been labelled by now, in ascending order of their paths.
 __attribute__((visibility("default"))) std::vector<LabelChange> RehearsedLabels();
 
 // For the attribute itself: whether labels are only noted, and what then stands in for setxattr(2)

@@ -30,8 +30,9 @@ END
   "$SECPOLICY" --root "$root" display 2>&1
 }
 
-# break_labels HOW PATH: from now on the kernel's answer to the second label of PATH is HOW, "fail"
-# or "die". A rehearsal gives no labels, so it does not notice.
+# break_labels HOW PATH [CALL]: from now on the kernel's answer to the second label of PATH, or to
+# the one that CALL counts to, is HOW, "fail" or "die"; PATH "*" is any file. A rehearsal gives no
+# labels, so it does not notice.
 break_labels() {
   cat >"$BATS_TEST_TMPDIR/break.c" <<'END'
 #define _GNU_SOURCE
@@ -44,7 +45,9 @@ break_labels() {
 #include <unistd.h>
 int setxattr(const char* path, const char* name, const void* value, size_t size, int flags) {
   static int calls = 0;
-  if (strcmp(path, getenv("BREAK_PATH")) == 0 && ++calls == 2) {
+  const char* wanted = getenv("BREAK_PATH");
+  const int isWanted = strcmp(wanted, "*") == 0 || strcmp(path, wanted) == 0;
+  if (isWanted && ++calls == atoi(getenv("BREAK_CALL"))) {
     if (strcmp(getenv("BREAK_HOW"), "die") == 0) {
       kill(getppid(), SIGINT);
       kill(getpid(), SIGKILL);
@@ -58,6 +61,7 @@ int setxattr(const char* path, const char* name, const void* value, size_t size,
 END
   cc -shared -fPIC -o "$BATS_TEST_TMPDIR/break.so" "$BATS_TEST_TMPDIR/break.c"
   breakage=(env "LD_PRELOAD=$BATS_TEST_TMPDIR/break.so" "BREAK_HOW=$1" "BREAK_PATH=$2"
+    "BREAK_CALL=${3:-2}"
     ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0)
 }
 
@@ -128,6 +132,32 @@ END
   exits 1
   [[ $stderr == "secpolicy: load: the load died: Killed
 secpolicy: load: failed on the way, so everything was put back as it was (the state, and 1 file label)" ]]
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+}
+
+@test "a load that is killed between two labels of one file is undone" {
+  everything >"$BATS_TEST_TMPDIR/before"
+  local call
+  for call in 6 12 20; do
+    break_labels die "*" "$call"
+    run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing
+    exits 1
+    says "secpolicy: load: the load died: Killed"
+    everything | diff "$BATS_TEST_TMPDIR/before" -
+  done
+}
+
+@test "a label that is no identifier is put back too" {
+  python3 - "$root/etc/services.conf" <<'END'
+import os, sys
+for name in os.listxattr(sys.argv[1]):
+    if "zorvan" in name:
+        os.setxattr(sys.argv[1], name, b"a\0 label of its own")
+END
+  everything >"$BATS_TEST_TMPDIR/before"
+  break_labels die /usr/bin/supervise
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 1
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 

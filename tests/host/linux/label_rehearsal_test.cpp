@@ -46,8 +46,8 @@ std::string RealLabel(const char* path) {
 std::string Changes() {
   std::string text;
   for (const auto& change : LinuxHost::RehearsedLabels()) {
-    text += change.path + ":" + std::to_string(change.before) + ">" + std::to_string(change.after) +
-            " ";
+    text += change.path + ":" + std::to_string(change.before) + (change.IsLasting() ? ">" : "=") +
+            std::to_string(change.after) + " ";
   }
   return text;
 }
@@ -122,14 +122,14 @@ TEST_F(LabelRehearsal, TellsChangesInTheOrderOfPaths) {
             "another:3>5 labelled:7>8 ");
 }
 
-TEST_F(LabelRehearsal, TellsNoChangeWhereTheLabelIsTheSameInTheEnd) {
+TEST_F(LabelRehearsal, TellsAlsoAFileWhoseLabelIsTheSameInTheEnd) {
   EXPECT_EQ(Run([] {
               StartLabelRehearsal();
               Give("labelled", 8);
               Give("labelled", 7);
               return Changes();
             }),
-            "");
+            "labelled:7=7 ");
 }
 
 TEST_F(LabelRehearsal, KnowsAFileByAllItsNames) {

@@ -88,6 +88,7 @@ LoadPlan MakeLoadPlan(const std::string& policyDir, const LoadRehearsal& rehears
   const LabelNames oldNames = LabelNamesOf(before);
   const LabelNames newNames = LabelNamesOf(after);
   for (const auto& change : rehearsal.Labels()) {
+    if (!change.IsLasting()) continue;
     plan.labels.push_back(
         {change.path, NameOf(change.before, oldNames), NameOf(change.after, newNames)});
   }

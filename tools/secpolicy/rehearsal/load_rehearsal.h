@@ -23,7 +23,7 @@ class LoadRehearsal {
   // What it would write to standard error, its summary line included.
   const std::string& Messages() const { return messages; }
 
-  // The files whose label it would change.
+  // The files that it would label, by path. Not all of them would have another label in the end.
   const std::vector<LinuxHost::LabelChange>& Labels() const { return labels; }
 
   // The copy of the state that was installed, and the state that the load would leave. There is no

@@ -1,5 +1,6 @@
 #include "whole_load.h"
 
+#include <linux/limits.h>
 #include <sys/xattr.h>
 
 #include <array>
@@ -8,12 +9,17 @@
 #include <cstring>
 #include <exception>
 #include <filesystem>
+#include <fstream>
 #include <iostream>
+#include <optional>
+#include <stdexcept>
+#include <string>
 
 #include "forked.h"
 #include "host/linux/saved_policy.h"
 #include "load_rehearsal.h"
 #include "policy_dir.h"
+#include "scratch/scratch_directory.h"
 #include "scratch/used_state.h"
 #include "secpolicy/secpolicy.h"
 #include "text/count.h"
@@ -71,51 +77,77 @@ bool PutStateBack(const LoadRehearsal& rehearsal) {
   }
 }
 
-bool Carries(const std::string& path, std::uint32_t label) {
-  std::uint32_t id = 0;
-  return Zorvan::Kernel::GetXattr(path.c_str(), kAttribute, &id, sizeof id) == sizeof id &&
-         id == label;
+// The bytes that the file carries; empty when it carries nothing, or cannot be read.
+std::optional<std::string> RawLabel(const std::string& path) {
+  std::array<char, XATTR_SIZE_MAX> value;
+  const ssize_t size =
+      Zorvan::Kernel::GetXattr(path.c_str(), kAttribute, value.data(), value.size());
+  if (size < 0) return std::nullopt;
+  return std::string(value.data(), static_cast<std::size_t>(size));
 }
 
-bool PutLabelBack(const LinuxHost::LabelChange& change) {
-  if (Zorvan::Kernel::SetXattr(change.path.c_str(), kAttribute, &change.before,
-                               sizeof change.before, XATTR_REPLACE) == 0) {
+// Writes down what the files carry that a load is to label. It labels no file that carries nothing.
+void KeepLabels(const LoadRehearsal& rehearsal, const std::string& path) {
+  std::ofstream file(path, std::ios::binary);
+  for (const LinuxHost::LabelChange& change : rehearsal.Labels()) {
+    const auto label = RawLabel(change.path);
+    if (label) file << label->size() << ' ' << *label << change.path << '\0';
+  }
+  file.flush();
+  if (!file) throw std::runtime_error("cannot write " + path);
+}
+
+struct KeptLabel {
+  std::string path;
+  std::string value;
+};
+
+// False at the end of the file, and where the writer has died.
+bool ReadKept(std::istream& file, KeptLabel& kept) {
+  std::size_t size = 0;
+  if (!(file >> size) || size > XATTR_SIZE_MAX || file.get() != ' ') return false;
+  kept.value.resize(size);
+  file.read(kept.value.data(), static_cast<std::streamsize>(size));
+  return std::getline(file, kept.path, '\0') && !file.eof();
+}
+
+bool PutLabelBack(const KeptLabel& kept) {
+  if (Zorvan::Kernel::SetXattr(kept.path.c_str(), kAttribute, kept.value.data(), kept.value.size(),
+                               XATTR_REPLACE) == 0) {
     return true;
   }
   const int error = errno;
-  WriteSummary("the label of " + change.path + " cannot be put back: " + std::strerror(error));
+  WriteSummary("the label of " + kept.path + " cannot be put back: " + std::strerror(error));
   return false;
 }
 
 struct LabelsPutBack {
   std::size_t done = 0;
-  bool isAll = true;
+  std::size_t failed = 0;
 };
 
-// Only the labels that the load has come to.
-LabelsPutBack PutLabelsBack(const LoadRehearsal& rehearsal) {
+// Every label that is not as it was: the load may have come to any of the lines about a file.
+LabelsPutBack PutLabelsBack(const std::string& path) {
   LabelsPutBack back;
-  for (const LinuxHost::LabelChange& change : rehearsal.Labels()) {
-    if (!Carries(change.path, change.after)) continue;
-    if (PutLabelBack(change)) {
-      ++back.done;
-    } else {
-      back.isAll = false;
-    }
+  std::ifstream file(path, std::ios::binary);
+  KeptLabel kept;
+  while (ReadKept(file, kept)) {
+    if (RawLabel(kept.path) == kept.value) continue;
+    ++(PutLabelBack(kept) ? back.done : back.failed);
   }
   return back;
 }
 
-ExitCode PutBack(const LoadRehearsal& rehearsal, ExitCode code) {
+ExitCode PutBack(const LoadRehearsal& rehearsal, const std::string& labelFile, ExitCode code) {
   const bool isStateBack = PutStateBack(rehearsal);
-  const LabelsPutBack labels = PutLabelsBack(rehearsal);
-  if (isStateBack && labels.isAll) {
+  const LabelsPutBack labels = PutLabelsBack(labelFile);
+  if (isStateBack && labels.failed == 0) {
     WriteSummary("failed on the way, so everything was put back as it was (the state, and " +
                  CountOf(labels.done, "file label") + ")");
   } else {
-    WriteSummary(
-        "failed on the way, and not everything could be put back (above). Mend that, and "
-        "load again.");
+    WriteSummary("failed on the way, and not everything could be put back (above: " +
+                 std::string(isStateBack ? "" : "the state, and ") +
+                 CountOf(labels.failed, "file label") + "). Mend that, and load again.");
   }
   return code == kWell ? kFailed : code;
 }
@@ -132,13 +164,16 @@ ExitCode LoadAllOrNothing(const std::string& policyDir) {
         "installs what has no errors.");
     return rehearsal.Ending();
   }
+  const ScratchDirectory scratch;
+  const std::string labelFile = scratch.File("labels");
   const InterruptsIgnored interrupts;
   const ForkedEnd end = RunForked([&] {
     interrupts.Restore();
+    KeepLabels(rehearsal, labelFile);
     return LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
   });
   if (!end.death.empty()) WriteSummary("the load died: " + end.death);
-  return end.death.empty() && end.code == kWell ? kWell : PutBack(rehearsal, end.code);
+  return end.death.empty() && end.code == kWell ? kWell : PutBack(rehearsal, labelFile, end.code);
 }
 
 }  // namespace SecPolicyCli
