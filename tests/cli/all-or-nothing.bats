@@ -161,6 +161,20 @@ END
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 
+@test "a load whose messages nobody reads is undone" {
+  everything >"$BATS_TEST_TMPDIR/before"
+  break_labels fail /var/lib/vms/demo/settings
+  # The message about the label meets a pipe that nobody reads.
+  run python3 - "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new <<'END'
+import os, subprocess, sys
+reader, writer = os.pipe()
+os.close(reader)
+sys.exit(subprocess.run(sys.argv[1:], stderr=writer).returncode)
+END
+  exits 1
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+}
+
 @test "where nothing was installed, nothing is afterwards" {
   rm "$root/run/secpolicy/"*
   break_labels fail /var/lib/vms/demo/settings

@@ -14,6 +14,7 @@
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
 #include "forked.h"
 #include "host/linux/saved_policy.h"
@@ -34,8 +35,8 @@ void WriteSummary(const std::string& text) {
   std::cerr << "secpolicy: load: " << text << std::endl;
 }
 
-// What a terminal sends to a whole group of processes is to end the load, and not what puts
-// everything back after it.
+// What a terminal sends to a whole group of processes, or who reads the messages by not doing so
+// any more, is to end the load, and not what puts everything back after it.
 class InterruptsIgnored {
  public:
   InterruptsIgnored() {
@@ -55,7 +56,7 @@ class InterruptsIgnored {
   }
 
  private:
-  static constexpr std::array kSignals = {SIGINT, SIGTERM, SIGHUP, SIGQUIT};
+  static constexpr std::array kSignals = {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE};
   std::array<void (*)(int), kSignals.size()> before{};
 };
 
@@ -66,14 +67,14 @@ void MakeIfMissing(const std::string& path) {
   const SecPolicy::TeskAccessInterfaceImpl access;
 }
 
-bool PutStateBack(const LoadRehearsal& rehearsal) {
+// Returns why the state cannot be put back; empty when it was.
+std::string PutStateBack(const LoadRehearsal& rehearsal) {
   try {
     MakeIfMissing(rehearsal.StateBefore());
     LinuxHost::RestorePolicy(rehearsal.StateBefore(), LinuxHost::LabelNumbers::kAsSaved);
-    return true;
+    return "";
   } catch (const std::exception& failure) {
-    WriteSummary(std::string("the state from before cannot be put back: ") + failure.what());
-    return false;
+    return failure.what();
   }
 }
 
@@ -111,20 +112,22 @@ bool ReadKept(std::istream& file, KeptLabel& kept) {
   return std::getline(file, kept.path, '\0') && !file.eof();
 }
 
-bool PutLabelBack(const KeptLabel& kept) {
-  if (Zorvan::Kernel::SetXattr(kept.path.c_str(), kAttribute, kept.value.data(), kept.value.size(),
-                               XATTR_REPLACE) == 0) {
-    return true;
-  }
-  const int error = errno;
-  WriteSummary("the label of " + kept.path + " cannot be put back: " + std::strerror(error));
-  return false;
-}
-
+// What of the labels was put back, and what of them cannot be.
 struct LabelsPutBack {
   std::size_t done = 0;
-  std::size_t failed = 0;
+  std::vector<std::string> failures;
 };
+
+void PutLabelBack(const KeptLabel& kept, LabelsPutBack& back) {
+  if (Zorvan::Kernel::SetXattr(kept.path.c_str(), kAttribute, kept.value.data(), kept.value.size(),
+                               XATTR_REPLACE) == 0) {
+    ++back.done;
+    return;
+  }
+  const int error = errno;
+  back.failures.push_back("the label of " + kept.path +
+                          " cannot be put back: " + std::strerror(error));
+}
 
 // Every label that is not as it was: the load may have come to any of the lines about a file.
 LabelsPutBack PutLabelsBack(const std::string& path) {
@@ -132,24 +135,34 @@ LabelsPutBack PutLabelsBack(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
   KeptLabel kept;
   while (ReadKept(file, kept)) {
-    if (RawLabel(kept.path) == kept.value) continue;
-    ++(PutLabelBack(kept) ? back.done : back.failed);
+    if (RawLabel(kept.path) != kept.value) PutLabelBack(kept, back);
   }
   return back;
 }
 
-ExitCode PutBack(const LoadRehearsal& rehearsal, const std::string& labelFile, ExitCode code) {
-  const bool isStateBack = PutStateBack(rehearsal);
-  const LabelsPutBack labels = PutLabelsBack(labelFile);
-  if (isStateBack && labels.failed == 0) {
+void WritePutBack(const std::string& stateFailure, const LabelsPutBack& labels) {
+  if (!stateFailure.empty()) {
+    WriteSummary("the state from before cannot be put back: " + stateFailure);
+  }
+  for (const std::string& failure : labels.failures) WriteSummary(failure);
+  if (stateFailure.empty() && labels.failures.empty()) {
     WriteSummary("failed on the way, so everything was put back as it was (the state, and " +
                  CountOf(labels.done, "file label") + ")");
-  } else {
-    WriteSummary("failed on the way, and not everything could be put back (above: " +
-                 std::string(isStateBack ? "" : "the state, and ") +
-                 CountOf(labels.failed, "file label") + "). Mend that, and load again.");
+    return;
   }
-  return code == kWell ? kFailed : code;
+  WriteSummary("failed on the way, and not everything could be put back (above: " +
+               std::string(stateFailure.empty() ? "" : "the state, and ") +
+               CountOf(labels.failures.size(), "file label") + "). Mend that, and load again.");
+}
+
+// Writes nothing before all is done: a terminal may keep the writer waiting.
+ExitCode PutBack(const LoadRehearsal& rehearsal, const std::string& labelFile,
+                 const ForkedEnd& end) {
+  const std::string stateFailure = PutStateBack(rehearsal);
+  const LabelsPutBack labels = PutLabelsBack(labelFile);
+  if (!end.death.empty()) WriteSummary("the load died: " + end.death);
+  WritePutBack(stateFailure, labels);
+  return end.code == kWell ? kFailed : end.code;
 }
 
 }  // namespace
@@ -172,8 +185,8 @@ ExitCode LoadAllOrNothing(const std::string& policyDir) {
     KeepLabels(rehearsal, labelFile);
     return LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
   });
-  if (!end.death.empty()) WriteSummary("the load died: " + end.death);
-  return end.death.empty() && end.code == kWell ? kWell : PutBack(rehearsal, labelFile, end.code);
+  if (end.death.empty() && end.code == kWell) return kWell;
+  return PutBack(rehearsal, labelFile, end);
 }
 
 }  // namespace SecPolicyCli
