@@ -224,6 +224,25 @@ all" ]]
   cmp "$root/run/secpolicy/kernel.log" "$BATS_TEST_TMPDIR/quiet.log"
 }
 
+@test "a policy directory is recorded by its whole name, however it is typed" {
+  boot
+  cp -r "$policy" "$root/other"
+  rm "$root"/other/fileLabels/*
+  ln -s etc/zorvan "$root/link"
+  local typed
+  for typed in other/ ./other //other/. etc/../other///; do
+    secpolicy load "$typed"
+    exits 0
+    secpolicy status --format json
+    [[ $(jq -r .latestLoad.directory <<<"$output") == /other ]]
+    secpolicy why sshDom call listen
+    [[ $output == *$'\n'"/other/domains/sshDom:"* ]]
+  done
+  secpolicy load link/../zorvan/secpolicy/
+  secpolicy why sshDom call listen
+  [[ $output == *$'\n'"/link/../zorvan/secpolicy//domains/sshDom:"* ]]
+}
+
 # without_memory: from now on a load has no memory left for recording where the rules are written.
 without_memory() {
   cat >"$BATS_TEST_TMPDIR/memory.cpp" <<'END'

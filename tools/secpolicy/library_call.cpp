@@ -87,7 +87,8 @@ std::string Describe(const std::string& verb, const std::function<std::string()>
   std::cout.flush();
   Record(running, "stopped", running.errors->Messages());
   Attempt([&] { WriteErrorsByFile(running); });
-  std::cerr << "secpolicy: " << running.verb << ": stopped: there is no domain " << missing
+  std::cerr << "secpolicy: " << running.verb << ": "
+            << "stopped: there is no domain " << missing
             << ", so the load ended before tardisks and file labels. Put a policy file named "
             << missing << " into " << running.policyDir << "/domains and run it again."
             << std::endl;

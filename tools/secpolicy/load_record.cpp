@@ -2,6 +2,7 @@
 
 #include <ctime>
 #include <exception>
+#include <filesystem>
 #include <iostream>
 
 #include "host/linux/load_record.h"
@@ -26,6 +27,16 @@ void ReadPolicy(const std::string& dir, OriginReader& origins) {
   origins.ReadDomains(SecPolicy::kPartnerDomainsDir, kPartnerPrefix);
   origins.ReadTardisks(Join(SecPolicy::kPolicyRoot, SecPolicy::kTardisksDir));
   origins.ReadFileLabels(Join(dir, SecPolicy::kFileLabelsDir));
+}
+
+// The directory under a name that means the same from everywhere and does not vary with the way it
+// was typed.
+std::string CanonicalName(const std::string& dir) {
+  const std::filesystem::path path = std::filesystem::absolute(dir);
+  const std::filesystem::path name = (path / ".").lexically_normal().parent_path();
+  std::error_code ignored;
+  // ".." behind a link leads elsewhere than its name says.
+  return std::filesystem::equivalent(name, path, ignored) ? name : path;
 }
 
 // Reads the files that the verb loads, in its order.
@@ -56,8 +67,9 @@ void RecordEnding(const std::string& verb, const std::string& source, const std:
 void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
                 const std::vector<std::string>& errors) {
   try {
-    RecordEnding(verb, policyDir, ending, errors);
-    RecordOrigins(verb, policyDir);
+    const std::string dir = CanonicalName(policyDir);
+    RecordEnding(verb, dir, ending, errors);
+    RecordOrigins(verb, dir);
   } catch (const std::exception& failure) {
     if (ending != "done") return;
     std::cerr << "secpolicy: " << verb << ": this load cannot be recorded for the verbs that "
