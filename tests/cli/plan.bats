@@ -94,6 +94,17 @@ END
   fingerprint | diff "$BATS_TEST_TMPDIR/before" -
 }
 
+@test "a plan needs no place in the root directory" {
+  mkdir -p "$root/tmp"
+  local place
+  for place in "-u TMPDIR" TMPDIR=; do
+    touch -d @1000000000 "$root"
+    run env $place "$SECPOLICY" --root "$root" load --plan
+    exits 0
+    [[ $(stat -c %Y "$root") -eq 1000000000 ]]
+  done
+}
+
 @test "the problems of the load are told as the load tells them" {
   echo "-s no_such_call grant" >>"$policy/domains/appDom"
   echo "/no/such hostConfig" >"$policy/fileLabels/zz"

@@ -4,15 +4,17 @@
 #include <cstdlib>
 #include <filesystem>
 #include <system_error>
+#include <vector>
 
 namespace SecPolicyCli {
 namespace {
 
-// A root that was never booted has none of the usual places.
+// A root that was never booted has none of the usual places, so that only the root itself is left.
 std::string MakePrivateDirectory() {
+  std::vector<std::string> places = {"/tmp", "/var/tmp", "/run", ""};
   const char* const wanted = secure_getenv("TMPDIR");
-  for (const std::string place :
-       {wanted == nullptr ? "" : wanted, "/tmp", "/var/tmp", "/run", ""}) {
+  if (wanted != nullptr && *wanted != '\0') places.emplace(places.begin(), wanted);
+  for (const std::string& place : places) {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
   }
