@@ -215,6 +215,26 @@ refuses() {
   [[ -n $(domain_id lateDom) ]]
 }
 
+@test "saved states that this user may not see are not taken for missing ones" {
+  [[ $EUID -eq 0 ]] || skip "only root can become somebody else"
+  setpriv --reuid=65534 --clear-groups test -x "$SECPOLICY" -a -r "$SOURCE" ||
+    skip "others may not read this place"
+  mkdir -m 755 "$BATS_TEST_TMPDIR/var"
+  mkdir -p "$BATS_TEST_TMPDIR/var/secpolicy/saved"
+  chmod 700 "$BATS_TEST_TMPDIR/var/secpolicy"
+  touch "$BATS_TEST_TMPDIR/host.db"
+  local problem="Permission denied. You are not root: run it as root, or give --root DIR to work below a directory of yours."
+  local command
+  for command in "rollback good" "save good" "history" "diff good installed"; do
+    run --separate-stderr unshare --mount bash -c "mount --bind '$BATS_TEST_TMPDIR/var' /var/lib &&
+      SECPOLICY_HOST_STATE='$BATS_TEST_TMPDIR/host.db' \
+      setpriv --reuid=65534 --regid=65534 --clear-groups '$SECPOLICY' $command"
+    [[ $stderr != *"unshare failed"* && $stderr != *"mount:"* ]] || skip "no mounts here"
+    [[ $status -ne 0 && ${#lines[@]} -eq 0 ]]
+    [[ $stderr == "secpolicy: ${command%% *}: cannot look for /var/lib/secpolicy/saved"*": $problem" ]]
+  done
+}
+
 @test "a state that belongs to somebody else is not taken for none" {
   [[ $EUID -eq 0 ]] || skip "only root can become somebody else"
   setpriv --reuid=65534 --clear-groups test -x "$SECPOLICY" -a -r "$SOURCE" ||

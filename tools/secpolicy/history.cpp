@@ -4,6 +4,7 @@
 #include <iostream>
 
 #include "library_call.h"
+#include "saved/saved_name.h"
 #include "saved/saved_state.h"
 #include "scratch/state_reader.h"
 #include "text/count.h"
@@ -45,7 +46,9 @@ ExitCode ShowHistory() {
   return allUsable ? kWell : kFailed;
 }
 
-Action Define(CLI::App&) { return ShowHistory; }
+Action Define(CLI::App&) {
+  return [] { return RunOrRefuse("history", ShowHistory); };
+}
 
 }  // namespace
 

@@ -44,7 +44,7 @@ ExitCode RollBack(const std::string& name) {
 
 Action Define(CLI::App& app) {
   const auto name = AddSavedName(app, "The saved state to put back");
-  return [name] { return RollBack(*name); };
+  return [name] { return RunOrRefuse("rollback", [&] { return RollBack(*name); }); };
 }
 
 }  // namespace

@@ -27,7 +27,7 @@ Action Define(CLI::App& app) {
   const auto name = AddSavedName(app, "The name to save it under");
   const auto force = std::make_shared<bool>(false);
   app.add_flag("--force", *force, "Replace a saved state of this name");
-  return [name, force] { return Save(*name, *force); };
+  return [name, force] { return RunOrRefuse("save", [&] { return Save(*name, *force); }); };
 }
 
 }  // namespace

@@ -10,6 +10,9 @@ namespace SecPolicyCli {
 // Adds the required argument NAME, the name of a saved state, to `app`.
 std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string& meaning);
 
+// Does what `action` does, and ends `verb` with the message of what it throws.
+ExitCode RunOrRefuse(const std::string& verb, const Action& action);
+
 // Refuses what needs an installed state where there is none.
 ExitCode RefuseWithoutState(const std::string& verb);
 

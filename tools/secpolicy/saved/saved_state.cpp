@@ -3,10 +3,15 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <filesystem>
+#include <optional>
+#include <stdexcept>
+#include <system_error>
 #include <tuple>
 
 #include "host/linux/saved_policy.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -18,6 +23,37 @@ constexpr std::size_t kMaxNameSize = 64;
 bool IsAllowed(char letter) {
   return (letter >= 'A' && letter <= 'Z') || (letter >= 'a' && letter <= 'z') ||
          (letter >= '0' && letter <= '9') || letter == '.' || letter == '_' || letter == '-';
+}
+
+bool IsMissing(const std::error_code& failure) {
+  return failure == std::errc::no_such_file_or_directory || failure == std::errc::not_a_directory;
+}
+
+[[noreturn]] void ThrowUnreadable(const std::string& path, const std::error_code& failure) {
+  const std::string advice = AdviseOnPrivilege();
+  throw std::runtime_error("cannot look for " + path + ": " + failure.message() +
+                           (advice.empty() ? "" : ". " + advice));
+}
+
+// What lies at `path`; nothing when nothing does.
+std::optional<struct stat> Examine(const std::string& path) {
+  struct stat status {};
+  if (stat(path.c_str(), &status) == 0) return status;
+  const std::error_code failure(errno, std::generic_category());
+  if (!IsMissing(failure)) ThrowUnreadable(path, failure);
+  return std::nullopt;
+}
+
+// The names of what lies in the directory of the saved states.
+std::vector<std::filesystem::path> ListFiles() {
+  std::vector<std::filesystem::path> files;
+  std::error_code failure;
+  std::filesystem::directory_iterator entry(kSavedStatesDir, failure);
+  for (; !failure && entry != std::filesystem::directory_iterator(); entry.increment(failure)) {
+    files.push_back(entry->path());
+  }
+  if (failure && !IsMissing(failure)) ThrowUnreadable(kSavedStatesDir, failure);
+  return files;
 }
 
 }  // namespace
@@ -43,20 +79,16 @@ std::string TrustedStatePath(const std::string& name) {
   return path;
 }
 
-bool IsSaved(const std::string& name) {
-  struct stat status {};
-  return stat(SavedStatePath(name).c_str(), &status) == 0;
-}
+bool IsSaved(const std::string& name) { return Examine(SavedStatePath(name)).has_value(); }
 
 std::vector<SavedState> ListSavedStates() {
   std::vector<SavedState> states;
-  if (!std::filesystem::exists(kSavedStatesDir)) return states;
-  for (const auto& entry : std::filesystem::directory_iterator(kSavedStatesDir)) {
-    struct stat status {};
-    const std::string name = entry.path().stem();
-    if (entry.path().extension() != kEnding || !WhyNoSavedName(name).empty()) continue;
-    if (stat(entry.path().c_str(), &status) != 0 || !S_ISREG(status.st_mode)) continue;
-    states.push_back({.name = name, .time = status.st_mtim.tv_sec});
+  for (const std::filesystem::path& file : ListFiles()) {
+    const std::string name = file.stem();
+    if (file.extension() != kEnding || !WhyNoSavedName(name).empty()) continue;
+    const std::optional<struct stat> status = Examine(file);
+    if (!status || !S_ISREG(status->st_mode)) continue;
+    states.push_back({.name = name, .time = status->st_mtim.tv_sec});
   }
   std::ranges::sort(states, {},
                     [](const SavedState& state) { return std::tie(state.time, state.name); });

@@ -24,9 +24,11 @@ std::string SavedStatePath(const std::string& name);
 // have changed it.
 std::string TrustedStatePath(const std::string& name);
 
+// Throws std::runtime_error, with what to do about it, when this user may not look.
 bool IsSaved(const std::string& name);
 
-// The saved states, the oldest first. Throws std::system_error when they cannot be listed.
+// The saved states, the oldest first. Throws std::runtime_error, with what to do about it, when
+// they cannot be listed.
 std::vector<SavedState> ListSavedStates();
 
 }  // namespace SecPolicyCli
