@@ -23,7 +23,9 @@ struct LabelChange {
 // From now on this process only notes the labels that it gives to files, and reads them back as if
 // they had been given; the files stay as they are. A label that a file could not be given fails as
 // it would. What is no identifier is no label (EINVAL).
-__attribute__((visibility("default"))) void StartLabelRehearsal();
+// The directory `passedOver`, and the files right in it, are of the rehearsal: they can be given
+// any label, and none is noted.
+__attribute__((visibility("default"))) void StartLabelRehearsal(const std::string& passedOver = "");
 
 // The files that would have been labelled by now, in ascending order of their paths.
 __attribute__((visibility("default"))) std::vector<LabelChange> RehearsedLabels();

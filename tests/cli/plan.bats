@@ -105,6 +105,18 @@ END
   done
 }
 
+@test "a plan labels the place that it works in" {
+  mkdir -p "$root/tmp"
+  touch "$root/tmp/file"
+  boot
+  echo "/tmp/* hostConfig" >"$policy/fileLabels/zz"
+  run --separate-stderr env TMPDIR=/tmp/ "$SECPOLICY" --root "$root" load --plan /new
+  exits 0
+  [[ $output == "files to label anew (2):
+  /tmp: unlabeled -> hostConfig
+  /tmp/file: unlabeled -> hostConfig" ]]
+}
+
 @test "the problems of the load are told as the load tells them" {
   echo "-s no_such_call grant" >>"$policy/domains/appDom"
   echo "/no/such hostConfig" >"$policy/fileLabels/zz"

@@ -98,6 +98,15 @@ TEST_F(LabelRehearsal, FailsWhereGivingWould) {
             "ENODATA ENOENT ENOTDIR EEXIST ENODATA");
 }
 
+TEST_F(LabelRehearsal, TakesOnlyIdentifiers) {
+  EXPECT_EQ(Run([] {
+              StartLabelRehearsal();
+              return Told(Zorvan::Kernel::SetXattr("labelled", kName, "odd", 3, XATTR_REPLACE)) +
+                     Changes();
+            }),
+            "EINVAL");
+}
+
 TEST_F(LabelRehearsal, NeedsBufferThatIsLargeEnough) {
   EXPECT_EQ(Run([] {
               StartLabelRehearsal();
@@ -153,6 +162,22 @@ TEST_F(LabelRehearsal, TellsAFirstLabelAndOneThatIsNoIdentifier) {
               return Changes() + RealLabel("bare");
             }),
             "bare:0>8 labelled:0>8 none");
+}
+
+TEST_F(LabelRehearsal, PassesOverADirectory) {
+  std::filesystem::create_directory(scratch.Root() / "own");
+  scratch.Write("own/file", "text");
+  std::filesystem::create_symlink("own", scratch.Root() / "link");
+  EXPECT_EQ(
+      Run([] {
+        StartLabelRehearsal("own");
+        std::string given;
+        for (const char* path : {"own", "own/file", "link//file", "own/gone", "bare", "labelled"}) {
+          given += Give(path, 8) + " ";
+        }
+        return given + Changes() + RealLabel("own/file");
+      }),
+      "0 0 0 0 ENODATA 0 labelled:7>8 none");
 }
 
 TEST_F(LabelRehearsal, FailsOnAFileThatCannotBeChanged) {

@@ -75,7 +75,7 @@ LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
     Redirect(STDOUT_FILENO, scratch.File("output"));
     Redirect(STDERR_FILENO, messageFile);
     LinuxHost::DropLog();
-    LinuxHost::StartLabelRehearsal();
+    LinuxHost::StartLabelRehearsal(scratch.Path());
     UseCopyOfSettings(scratch.File("config.db"));
     const UsedState state(StateAfter());
     const ExitCode code = LoadFrom("load", policyDir, SecPolicy::LoadPolicy);

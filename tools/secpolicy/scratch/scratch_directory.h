@@ -13,6 +13,8 @@ class ScratchDirectory {
   ScratchDirectory& operator=(const ScratchDirectory&) = delete;
   ~ScratchDirectory();
 
+  const std::string& Path() const { return path; }
+
   // The path of the file `name` in it.
   std::string File(const std::string& name) const { return path + "/" + name; }
 
