@@ -95,6 +95,20 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   exits 0
 }
 
+@test "a saved state comes before a directory of its name" {
+  secpolicy save new
+  echo "newObject" >>"$policy/objects/base"
+  secpolicy diff new installed
+  exits 0
+  [[ $stderr == "secpolicy: diff: the same" ]]
+  secpolicy diff ./new installed
+  exits 1
+  rm "$saved/new.db"
+  secpolicy diff new installed
+  exits 1
+  [[ $output == "--- new"$'\n'* ]]
+}
+
 @test "a taken name is refused without --force" {
   secpolicy save good
   echo "newObject" >>"$policy/objects/base"

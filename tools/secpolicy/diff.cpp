@@ -66,12 +66,12 @@ Action Define(CLI::App& app) {
 const Verb kDiff = {
     "diff", "Compare two policies: directories, what is installed, saved states",
     "Prints how B differs from A: domains, enforcement levels, rules, objects, and of two\n"
-    "directories the file labels. A name with a slash, or of a directory, is a policy directory;\n"
-    "'installed' is what is installed now; any other name is a saved state. A directory is what "
-    "it\n"
-    "installs on an empty host, with its early and partner domains; compared with a state, the\n"
-    "transitions of tardisks are left out. Changes nothing. Exit status: 0 the same, 1 different,\n"
-    "2 not compared.\n"
+    "directories the file labels. A name with a slash is a policy directory; 'installed' is what\n"
+    "is installed now; any other name is a saved state or, where there is none of that name, a\n"
+    "policy directory (./NAME is always one). A directory is what it installs on an empty host,\n"
+    "with its early and partner domains; compared with a state, the transitions of tardisks are\n"
+    "left out. Changes nothing. Exit status: 0 the same, 1 different, 2 not\n"
+    "compared.\n"
     "\n"
     "Examples:\n"
     "  secpolicy diff installed /etc/zorvan/secpolicy     what was edited since the load?\n"

@@ -52,12 +52,25 @@ Side ReadSaved(const std::string& name) {
   return ReadStateOf(name, TrustedStatePath(name));
 }
 
+// Where there is a directory, a saved state that this user may not look for is not meant.
+bool IsKnownToBeSaved(const std::string& name) {
+  try {
+    return IsSaved(name);
+  } catch (const std::runtime_error&) {
+    return false;
+  }
+}
+
+bool MeansDirectory(const std::string& name) {
+  if (name.find('/') != std::string::npos) return true;
+  return IsDirectory(name) && !IsKnownToBeSaved(name);
+}
+
 }  // namespace
 
 Side ReadSide(const std::string& name) {
   if (name == kInstalled) return ReadInstalled();
-  if (name.find('/') != std::string::npos || IsDirectory(name)) return ReadDirectory(name);
-  return ReadSaved(name);
+  return MeansDirectory(name) ? ReadDirectory(name) : ReadSaved(name);
 }
 
 }  // namespace SecPolicyCli
