@@ -95,6 +95,20 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   exits 0
 }
 
+@test "a rollback that cannot be recorded is done all the same" {
+  secpolicy save good
+  echo "newObject" >>"$policy/objects/base"
+  secpolicy load /new
+  sqlite3 "$root/run/secpolicy/host.db" \
+    "CREATE TRIGGER breakage BEFORE INSERT ON load_record BEGIN SELECT RAISE(ABORT, 'no'); END"
+  secpolicy rollback good
+  exits 0
+  says "secpolicy: rollback: this rollback cannot be recorded for 'status': Unable to use the host state /run/secpolicy/host.db: no"
+  ends_with "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy label verify' compares them with the policy"
+  secpolicy diff good installed
+  exits 0
+}
+
 @test "a saved state comes before a directory of its name" {
   secpolicy save new
   echo "newObject" >>"$policy/objects/base"

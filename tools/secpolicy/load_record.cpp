@@ -77,6 +77,13 @@ void RecordLoad(const std::string& verb, const std::string& policyDir, const std
   }
 }
 
-void RecordRollback(const std::string& name) { RecordEnding(kRollback.name, name, "done", {}); }
+void RecordRollback(const std::string& name) {
+  try {
+    RecordEnding(kRollback.name, name, "done", {});
+  } catch (const std::exception& failure) {
+    std::cerr << "secpolicy: " << kRollback.name << ": this rollback cannot be recorded for "
+              << "'status': " << failure.what() << std::endl;
+  }
+}
 
 }  // namespace SecPolicyCli

@@ -12,7 +12,8 @@ namespace SecPolicyCli {
 void RecordLoad(const std::string& verb, const std::string& policyDir, const std::string& ending,
                 const std::vector<std::string>& errors);
 
-// Keeps, for `status`, that the saved state `name` was put back.
+// Keeps, for `status`, that the saved state `name` was put back. That it cannot be kept is said on
+// standard error; nothing is thrown.
 void RecordRollback(const std::string& name);
 
 }  // namespace SecPolicyCli
