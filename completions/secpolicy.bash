@@ -1,14 +1,23 @@
 # bash completion for secpolicy(8)
 
+# The names of the saved states below the root $1.
+_secpolicy_saved() {
+  local file
+  for file in "$1"/var/lib/secpolicy/saved/*.db; do
+    [[ -f $file ]] && basename "$file" .db
+  done
+}
+
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
   local verbs='boot check load load-early restore status display why who-can graph diff save history rollback label settings'
   local questions='read write exec call use access enter create create-socket pass'
-  local verb='' kind='' word index positional=0
+  local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
     if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy ]]; then
       index=$((index + 1))
+      [[ $word == --root ]] && root=${COMP_WORDS[index]}
     elif [[ $word == -* ]]; then
       continue
     elif [[ -z $verb ]]; then
@@ -66,7 +75,9 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == diff ]] && ((positional < 2)); then
     compopt -o filenames
-    mapfile -t COMPREPLY < <(compgen -W installed -- "$current"; compgen -d -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W "installed $(_secpolicy_saved "$root")" -- "$current"; compgen -d -- "$current")
+  elif [[ $verb == rollback ]] && ((positional == 0)); then
+    mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_saved "$root")" -- "$current")
   elif [[ $verb == label && -z $kind ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'get set verify relabel' -- "$current")
   elif [[ $verb == label ]] && [[ $kind != set || $positional -gt 0 ]]; then

@@ -277,3 +277,21 @@ refuses() {
   exits 2
   [[ $stderr == "secpolicy: diff: the state $root/run/secpolicy/host.db cannot be read: unable to open database file" ]]
 }
+
+@test "the completion of bash knows the saved states" {
+  source "$SOURCE/completions/secpolicy.bash"
+  compopt() { :; }
+  complete_line() {
+    COMP_WORDS=("$@")
+    COMP_CWORD=$(($# - 1))
+    _secpolicy
+  }
+  secpolicy save good
+  secpolicy save nightly
+  complete_line secpolicy --root "$root" rollback ''
+  [[ ${COMPREPLY[*]} == "good nightly" ]]
+  complete_line secpolicy --root "$root" diff nig
+  [[ ${COMPREPLY[*]} == nightly ]]
+  complete_line secpolicy --root "$root/no/such" rollback ''
+  [[ -z ${COMPREPLY[*]} ]]
+}
