@@ -31,8 +31,8 @@ END
 }
 
 # break_labels HOW PATH [CALL]: from now on the kernel's answer to the second label of PATH, or to
-# the one that CALL counts to, is HOW, "fail" or "die"; PATH "*" is any file. A rehearsal gives no
-# labels, so it does not notice.
+# the one that CALL counts to, is HOW: "fail", "die", or the name of a signal that then comes to the
+# command; PATH "*" is any file. A rehearsal gives no labels, so it does not notice.
 break_labels() {
   cat >"$BATS_TEST_TMPDIR/break.c" <<'END'
 #define _GNU_SOURCE
@@ -48,6 +48,12 @@ int setxattr(const char* path, const char* name, const void* value, size_t size,
   const char* wanted = getenv("BREAK_PATH");
   const int isWanted = strcmp(wanted, "*") == 0 || strcmp(path, wanted) == 0;
   if (isWanted && ++calls == atoi(getenv("BREAK_CALL"))) {
+    const int signal = atoi(getenv("BREAK_SIGNAL"));
+    if (signal != 0) {
+      kill(getppid(), signal);
+      usleep(100000);
+      return 0;
+    }
     if (strcmp(getenv("BREAK_HOW"), "die") == 0) {
       kill(getppid(), SIGINT);
       kill(getpid(), SIGKILL);
@@ -61,7 +67,7 @@ int setxattr(const char* path, const char* name, const void* value, size_t size,
 END
   cc -shared -fPIC -o "$BATS_TEST_TMPDIR/break.so" "$BATS_TEST_TMPDIR/break.c"
   breakage=(env "LD_PRELOAD=$BATS_TEST_TMPDIR/break.so" "BREAK_HOW=$1" "BREAK_PATH=$2"
-    "BREAK_CALL=${3:-2}"
+    "BREAK_CALL=${3:-2}" "BREAK_SIGNAL=$(kill -l "$1" 2>/dev/null || true)"
     ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0)
 }
 
@@ -173,6 +179,29 @@ sys.exit(subprocess.run(sys.argv[1:], stderr=writer).returncode)
 END
   exits 1
   everything | diff "$BATS_TEST_TMPDIR/before" -
+}
+
+@test "a load is undone when the command alone is asked to end" {
+  everything >"$BATS_TEST_TMPDIR/before"
+  local signal
+  for signal in HUP INT QUIT TERM; do
+    break_labels "$signal" /var/lib/vms/demo/settings
+    run --separate-stderr python3 - "${breakage[@]}" "$SECPOLICY" --root "$root" \
+      load --all-or-nothing /new <<'PYTHON'
+import resource, subprocess, sys
+resource.setrlimit(resource.RLIMIT_CORE, (0, 0))
+sys.exit(subprocess.run(sys.argv[1:]).returncode)
+PYTHON
+    exits 1
+    ends_with "secpolicy: load: failed on the way, so everything was put back as it was (the state, and 2 file labels)"
+    everything | diff "$BATS_TEST_TMPDIR/before" -
+  done
+}
+
+@test "what the command ignores does not end the load" {
+  break_labels HUP /var/lib/vms/demo/settings
+  run --separate-stderr nohup "${breakage[@]}" "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 0
 }
 
 @test "where nothing was installed, nothing is afterwards" {

@@ -5,7 +5,6 @@
 
 #include <array>
 #include <cerrno>
-#include <csignal>
 #include <cstring>
 #include <exception>
 #include <filesystem>
@@ -34,31 +33,6 @@ constexpr char kAttribute[] = "zorvan.security";
 void WriteSummary(const std::string& text) {
   std::cerr << "secpolicy: load: " << text << std::endl;
 }
-
-// What a terminal sends to a whole group of processes, or who reads the messages by not doing so
-// any more, is to end the load, and not what puts everything back after it.
-class InterruptsIgnored {
- public:
-  InterruptsIgnored() {
-    for (std::size_t index = 0; index < kSignals.size(); ++index) {
-      before[index] = std::signal(kSignals[index], SIG_IGN);
-    }
-  }
-  InterruptsIgnored(const InterruptsIgnored&) = delete;
-  InterruptsIgnored& operator=(const InterruptsIgnored&) = delete;
-  ~InterruptsIgnored() { Restore(); }
-
-  // For the child.
-  void Restore() const {
-    for (std::size_t index = 0; index < kSignals.size(); ++index) {
-      static_cast<void>(std::signal(kSignals[index], before[index]));
-    }
-  }
-
- private:
-  static constexpr std::array kSignals = {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE};
-  std::array<void (*)(int), kSignals.size()> before{};
-};
 
 // Where nothing was installed, the host makes the state that a boot starts from.
 void MakeIfMissing(const std::string& path) {
@@ -179,9 +153,8 @@ ExitCode LoadAllOrNothing(const std::string& policyDir) {
   }
   const ScratchDirectory scratch;
   const std::string labelFile = scratch.File("labels");
-  const InterruptsIgnored interrupts;
-  const ForkedEnd end = RunForked([&] {
-    interrupts.Restore();
+  InterruptibleChild child;
+  const ForkedEnd end = child.Run([&] {
     KeepLabels(rehearsal, labelFile);
     return LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
   });
