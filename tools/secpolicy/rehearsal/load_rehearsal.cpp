@@ -63,8 +63,10 @@ std::string ReadAll(const std::string& path) {
 
 }  // namespace
 
+void CopyInstalledState(const std::string& to) { RequireCopied(CopyUsedState(to)); }
+
 LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
-  RequireCopied(CopyUsedState(StateBefore()));
+  CopyInstalledState(StateBefore());
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
     RequireCopied(CopyState(StateBefore(), StateAfter()));

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "host/linux/label_rehearsal.h"
@@ -8,6 +9,10 @@
 #include "verb.h"
 
 namespace SecPolicyCli {
+
+// Copies the installed state to the new file `to`, if there is one. Throws std::runtime_error with
+// advice when it cannot be read.
+void CopyInstalledState(const std::string& to);
 
 // A whole load of a policy directory on a copy of the host's state. Neither the installed state nor
 // a file is changed, and nothing is logged.
@@ -25,6 +30,9 @@ class LoadRehearsal {
 
   // The files that it would label, by path. Not all of them would have another label in the end.
   const std::vector<LinuxHost::LabelChange>& Labels() const { return labels; }
+
+  // The same, for who needs them longer than the rehearsal; it has none afterwards.
+  std::vector<LinuxHost::LabelChange> TakeLabels() { return std::move(labels); }
 
   // The copy of the state that was installed, and the state that the load would leave. There is no
   // file for the first one where nothing is installed yet.

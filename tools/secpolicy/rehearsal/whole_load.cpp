@@ -34,6 +34,32 @@ void WriteSummary(const std::string& text) {
   std::cerr << "secpolicy: load: " << text << std::endl;
 }
 
+using Labels = std::vector<LinuxHost::LabelChange>;
+
+// Returns how the rehearsal ended when that was not well. Else returns nothing, and `labels`
+// becomes what the load is to label.
+std::optional<ExitCode> Rehearse(const std::string& policyDir, Labels& labels) {
+  LoadRehearsal rehearsal(policyDir);
+  if (rehearsal.Ending() == kWell) {
+    labels = rehearsal.TakeLabels();
+    return std::nullopt;
+  }
+  std::cerr << rehearsal.Messages() << std::flush;
+  WriteSummary(
+      "nothing was changed: this was the rehearsal. Without --all-or-nothing, a load "
+      "installs what has no errors.");
+  return rehearsal.Ending();
+}
+
+// What a load is undone with: copies of what it finds, which go with this object.
+struct WayBack {
+  WayBack() { CopyInstalledState(state); }
+
+  ScratchDirectory scratch;
+  std::string state = scratch.File("host.db");
+  std::string labels = scratch.File("labels");
+};
+
 // Where nothing was installed, the host makes the state that a boot starts from.
 void MakeIfMissing(const std::string& path) {
   if (std::filesystem::exists(path)) return;
@@ -42,10 +68,10 @@ void MakeIfMissing(const std::string& path) {
 }
 
 // Returns why the state cannot be put back; empty when it was.
-std::string PutStateBack(const LoadRehearsal& rehearsal) {
+std::string PutStateBack(const WayBack& back) {
   try {
-    MakeIfMissing(rehearsal.StateBefore());
-    LinuxHost::RestorePolicy(rehearsal.StateBefore(), LinuxHost::LabelNumbers::kAsSaved);
+    MakeIfMissing(back.state);
+    LinuxHost::RestorePolicy(back.state, LinuxHost::LabelNumbers::kAsSaved);
     return "";
   } catch (const std::exception& failure) {
     return failure.what();
@@ -62,14 +88,23 @@ std::optional<std::string> RawLabel(const std::string& path) {
 }
 
 // Writes down what the files carry that a load is to label. It labels no file that carries nothing.
-void KeepLabels(const LoadRehearsal& rehearsal, const std::string& path) {
+void KeepLabels(const Labels& labels, const std::string& path) {
   std::ofstream file(path, std::ios::binary);
-  for (const LinuxHost::LabelChange& change : rehearsal.Labels()) {
+  for (const LinuxHost::LabelChange& change : labels) {
     const auto label = RawLabel(change.path);
     if (label) file << label->size() << ' ' << *label << change.path << '\0';
   }
   file.flush();
   if (!file) throw std::runtime_error("cannot write " + path);
+}
+
+// A load may label the place that the way back is in, and replaces labels only. The label goes with
+// the files, so that any will do.
+void LabelOwnFiles(const WayBack& back) {
+  const std::uint32_t id = 0;
+  for (const std::string& path : {back.scratch.Path(), back.state, back.labels}) {
+    static_cast<void>(Zorvan::Kernel::SetXattr(path.c_str(), kAttribute, &id, sizeof id, 0));
+  }
 }
 
 struct KeptLabel {
@@ -130,10 +165,9 @@ void WritePutBack(const std::string& stateFailure, const LabelsPutBack& labels) 
 }
 
 // Writes nothing before all is done: a terminal may keep the writer waiting.
-ExitCode PutBack(const LoadRehearsal& rehearsal, const std::string& labelFile,
-                 const ForkedEnd& end) {
-  const std::string stateFailure = PutStateBack(rehearsal);
-  const LabelsPutBack labels = PutLabelsBack(labelFile);
+ExitCode PutBack(const WayBack& back, const ForkedEnd& end) {
+  const std::string stateFailure = PutStateBack(back);
+  const LabelsPutBack labels = PutLabelsBack(back.labels);
   if (!end.death.empty()) WriteSummary("the load died: " + end.death);
   WritePutBack(stateFailure, labels);
   return end.code == kWell ? kFailed : end.code;
@@ -143,23 +177,18 @@ ExitCode PutBack(const LoadRehearsal& rehearsal, const std::string& labelFile,
 
 ExitCode LoadAllOrNothing(const std::string& policyDir) {
   if (const auto refusal = RefuseMissingDir("load", policyDir)) return *refusal;
-  const LoadRehearsal rehearsal(policyDir);
-  if (rehearsal.Ending() != kWell) {
-    std::cerr << rehearsal.Messages() << std::flush;
-    WriteSummary(
-        "nothing was changed: this was the rehearsal. Without --all-or-nothing, a load "
-        "installs what has no errors.");
-    return rehearsal.Ending();
-  }
-  const ScratchDirectory scratch;
-  const std::string labelFile = scratch.File("labels");
+  Labels labels;
+  if (const auto ending = Rehearse(policyDir, labels)) return *ending;
+  // Not the copy of the rehearsal: what has changed since is not the load's to undo.
+  const WayBack back;
   InterruptibleChild child;
   const ForkedEnd end = child.Run([&] {
-    KeepLabels(rehearsal, labelFile);
+    KeepLabels(labels, back.labels);
+    LabelOwnFiles(back);
     return LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
   });
   if (end.death.empty() && end.code == kWell) return kWell;
-  return PutBack(rehearsal, labelFile, end);
+  return PutBack(back, end);
 }
 
 }  // namespace SecPolicyCli
