@@ -18,8 +18,8 @@ struct Side {
 };
 
 // Reads what `name` means: a policy directory, when it has a slash; "installed"; or a saved state
-// or, where there is none of that name, a policy directory. Nothing is changed, and nothing logged. Throws std::runtime_error when there is no
-// such thing, and when it cannot be read or has errors.
+// or, where there is none of that name, a policy directory. Nothing is changed, and nothing logged.
+// Throws std::runtime_error when there is no such thing, and when it cannot be read or has errors.
 Side ReadSide(const std::string& name);
 
 }  // namespace SecPolicyCli
