@@ -60,18 +60,19 @@ struct WayBack {
   std::string labels = scratch.File("labels");
 };
 
-// Where nothing was installed, the host makes the state that a boot starts from.
-void MakeIfMissing(const std::string& path) {
-  if (std::filesystem::exists(path)) return;
-  const UsedState used(path);
-  const SecPolicy::TeskAccessInterfaceImpl access;
+// Where there was no state, there is to be none; its journal goes with it.
+void RemoveState() {
+  for (const char* part : {"", "-wal", "-shm"}) std::filesystem::remove(StatePath() + part);
 }
 
 // Returns why the state cannot be put back; empty when it was.
 std::string PutStateBack(const WayBack& back) {
   try {
-    MakeIfMissing(back.state);
-    LinuxHost::RestorePolicy(back.state, LinuxHost::LabelNumbers::kAsSaved);
+    if (std::filesystem::exists(back.state)) {
+      LinuxHost::RestorePolicy(back.state, LinuxHost::LabelNumbers::kAsSaved);
+    } else {
+      RemoveState();
+    }
     return "";
   } catch (const std::exception& failure) {
     return failure.what();
@@ -166,8 +167,9 @@ void WritePutBack(const std::string& stateFailure, const LabelsPutBack& labels) 
 
 // Writes nothing before all is done: a terminal may keep the writer waiting.
 ExitCode PutBack(const WayBack& back, const ForkedEnd& end) {
-  const std::string stateFailure = PutStateBack(back);
+  // The state tells which attribute carries labels, and may go.
   const LabelsPutBack labels = PutLabelsBack(back.labels);
+  const std::string stateFailure = PutStateBack(back);
   if (!end.death.empty()) WriteSummary("the load died: " + end.death);
   WritePutBack(stateFailure, labels);
   return end.code == kWell ? kFailed : end.code;
