@@ -168,4 +168,10 @@ ExitCode Refuse(const std::string& verb, const std::string& why) {
   return kFailed;
 }
 
+ExitCode RefuseWithoutState(const std::string& verb) {
+  return Refuse(verb,
+                "nothing is installed below this root. Name the root that was booted (--root "
+                "DIR), or run 'secpolicy boot' first.");
+}
+
 }  // namespace SecPolicyCli

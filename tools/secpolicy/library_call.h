@@ -27,4 +27,7 @@ void EndEarlyLoad();
 // Prints the summary line of a verb that was not done.
 ExitCode Refuse(const std::string& verb, const std::string& why);
 
+// Refuses what needs an installed state where there is none.
+ExitCode RefuseWithoutState(const std::string& verb);
+
 }  // namespace SecPolicyCli

@@ -3,8 +3,8 @@
 #include <CLI/App.hpp>
 #include <iostream>
 
+#include "library_call.h"
 #include "question.h"
-#include "saved/saved_name.h"
 #include "scratch/used_state.h"
 
 namespace SecPolicyCli {

@@ -22,10 +22,4 @@ ExitCode RunOrRefuse(const std::string& verb, const Action& action) {
   }
 }
 
-ExitCode RefuseWithoutState(const std::string& verb) {
-  return Refuse(verb,
-                "nothing is installed below this root. Name the root that was booted (--root "
-                "DIR), or run 'secpolicy boot' first.");
-}
-
 }  // namespace SecPolicyCli

@@ -13,7 +13,4 @@ std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string
 // Does what `action` does, and ends `verb` with the message of what it throws.
 ExitCode RunOrRefuse(const std::string& verb, const Action& action);
 
-// Refuses what needs an installed state where there is none.
-ExitCode RefuseWithoutState(const std::string& verb);
-
 }  // namespace SecPolicyCli
