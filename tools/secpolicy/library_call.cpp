@@ -11,6 +11,7 @@
 #include "host/linux/label_rehearsal.h"
 #include "load_record.h"
 #include "load_summary.h"
+#include "text/count.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -124,10 +125,6 @@ class TerminateGuard {
   }
 };
 
-std::string ErrorsAbove(std::size_t count) {
-  return std::to_string(count) + (count == 1 ? " error above" : " errors above");
-}
-
 }  // namespace
 
 ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
@@ -155,7 +152,7 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   Attempt([&] { WriteErrorsByFile(running); });
   Attempt([&] { WriteInstalled(running); });
   std::string summary = failure.empty() ? "failed" : failure;
-  if (errors.Count() > 0) summary += " (" + ErrorsAbove(errors.Count()) + ")";
+  if (errors.Count() > 0) summary += " (" + CountOf(errors.Count(), "error") + " above)";
   const std::string next = advice();
   WriteSummary(verb, next.empty() ? summary : summary + ". " + next);
   return kFailed;

@@ -1,5 +1,6 @@
 #include <nlohmann/json.hpp>
 
+#include "installed/installed_json.h"
 #include "report_format.h"
 
 namespace SecPolicyCli {
@@ -32,7 +33,7 @@ void WriteJson(const DiagnosticList& diagnostics, std::ostream& output) {
                        {"warnings", diagnostics.Count(Severity::kWarning)},
                        {"problems", problems}};
   // Bytes of a policy file that are no text are replaced, not refused.
-  output << report.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+  output << DumpJson(report);
 }
 
 }  // namespace SecPolicyCli

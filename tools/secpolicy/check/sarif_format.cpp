@@ -2,6 +2,7 @@
 #include <nlohmann/json.hpp>
 #include <string_view>
 
+#include "installed/installed_json.h"
 #include "report_format.h"
 
 namespace SecPolicyCli {
@@ -78,7 +79,7 @@ void WriteSarif(const DiagnosticList& diagnostics, std::ostream& output) {
   const Json run = {
       {"tool", {{"driver", driver}}}, {"columnKind", "unicodeCodePoints"}, {"results", results}};
   const Json log = {{"$schema", kSchema}, {"version", kSarifVersion}, {"runs", Json::array({run})}};
-  output << log.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+  output << DumpJson(log);
 }
 
 }  // namespace SecPolicyCli

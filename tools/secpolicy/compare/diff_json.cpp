@@ -1,5 +1,6 @@
 #include <nlohmann/json.hpp>
 
+#include "installed/installed_json.h"
 #include "policy_diff.h"
 
 namespace SecPolicyCli {
@@ -45,7 +46,7 @@ void WriteDiffJson(const PolicyDiff& diff, std::ostream& output) {
       {"labels", diff.labels ? ToJson(*diff.labels) : Json()},
   };
   // A path need not be text.
-  output << document.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+  output << DumpJson(document);
 }
 
 }  // namespace SecPolicyCli

@@ -1,6 +1,7 @@
 #include <nlohmann/json.hpp>
 #include <sstream>
 
+#include "installed/installed_json.h"
 #include "load_plan.h"
 
 namespace SecPolicyCli {
@@ -90,7 +91,7 @@ void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
       {"labels", Labels(plan)},
   };
   // A path need not be text.
-  output << document.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+  output << DumpJson(document);
 }
 
 }  // namespace SecPolicyCli
