@@ -150,19 +150,16 @@ bool TeskAccessInterfaceImpl::GetCompleteDomainInfo(unsigned int id, std::string
     throw HostError(
         EINVAL, StrCat("domain ", id, " is beyond the last slot ", LinuxHost::kDomainSlots - 1));
   }
-  // Most slots are empty, which takes no lock to see.
+  // Most slots are empty, which takes no query to see.
   if (impl->Fresh().Domains().Find(id) == nullptr) return false;
-  const LinuxHost::Transaction transaction(impl->Any().Database());
-  auto& domains = impl->Fresh().Domains();
-  const Domain* domain = domains.Find(id);
-  if (domain == nullptr) return false;
-  name = domain->name;
-  const auto references = domains.CountReferences(*domain);
-  enforcementLevel = domain->level;
-  state = domains.StateWord(*domain);
-  refCount = references.Sum();
-  worldRefCount = references.worlds;
-  dflt = domain->defaultRules;
+  const auto description = impl->Any().Domains().Describe(id);
+  if (!description) return false;
+  name = description->domain.name;
+  enforcementLevel = description->domain.level;
+  state = description->StateWord();
+  refCount = description->references.Sum();
+  worldRefCount = description->references.worlds;
+  dflt = description->domain.defaultRules;
   return true;
 }
 

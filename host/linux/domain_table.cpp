@@ -41,6 +41,15 @@ const char* NameOf(DomainRole role) {
       ->name;
 }
 
+// The domain of a row of id, name, level, default_rules, created_at_run_time.
+Domain ReadDomain(const Rows& rows) {
+  return {.id = static_cast<unsigned int>(rows.Integer(0)),
+          .name = rows.Text(1),
+          .level = rows.Text(2),
+          .defaultRules = static_cast<TeskAccessKsi_DefaultDom>(rows.Integer(3)),
+          .createdAtRunTime = rows.Integer(4) != 0};
+}
+
 void RequireText(const std::string& text, const char* what, std::size_t maxLength) {
   if (text.empty()) throw HostError(EINVAL, StrCat("a ", what, " must not be empty"));
   if (text.find('\0') != std::string::npos) {
@@ -95,14 +104,13 @@ void DomainTable::Load() {
   Rows rows = state.Database().Select(
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain");
   while (rows.Next()) {
-    const auto id = static_cast<unsigned int>(rows.Integer(0));
+    Domain domain = ReadDomain(rows);
+    const unsigned int id = domain.id;
     if (id >= slots.size())
       throw HostError(EUCLEAN,
                       StrCat("the host state holds a domain ", id, " beyond the last slot"));
-    slots[id] =
-        Domain{id, rows.Text(1), rows.Text(2),
-               static_cast<TeskAccessKsi_DefaultDom>(rows.Integer(3)), rows.Integer(4) != 0};
-    identifiers.emplace(rows.Text(1), id);
+    identifiers.emplace(domain.name, id);
+    slots[id] = std::move(domain);
   }
   loaded = true;
 }
@@ -244,12 +252,16 @@ bool DomainTable::HasRole(DomainRole role, unsigned int id) {
   return rows.Next();
 }
 
-unsigned int DomainTable::StateWord(const Domain& domain) {
-  unsigned int word = domain.createdAtRunTime ? kCreatedAtRunTime : 0;
-  for (const auto& row : kRoles) {
-    if (HasRole(row.role, domain.id)) word |= row.bit;
+unsigned int DomainTable::RolesOf(unsigned int id) {
+  unsigned int roles = 0;
+  Rows rows = state.Database().Select("SELECT name FROM role WHERE domain_id = ?1", id);
+  while (rows.Next()) {
+    const std::string name = rows.Text(0);
+    for (const auto& row : kRoles) {
+      if (row.name == name) roles |= row.bit;
+    }
   }
-  return word;
+  return roles;
 }
 
 void DomainTable::AddGuestService(unsigned int id, const std::string& service) {
@@ -273,13 +285,27 @@ DomainReferences DomainTable::CountReferences(const Domain& domain) {
   DomainReferences references;
   references.worlds = state.Worlds().CountIn(domain.id);
   Rows rows = state.Database().Select(
-      "SELECT (SELECT count(*) FROM rule WHERE kind = 'domain transition' AND word2 = ?1 AND "
-      "granted AND domain_id <> ?2), (SELECT count(*) FROM role WHERE domain_id = ?2)",
+      "SELECT count(*) FROM rule WHERE kind = 'domain transition' AND word2 = ?1 AND granted AND "
+      "domain_id <> ?2",
       domain.name, domain.id);
   rows.Next();
   references.transitions = static_cast<unsigned int>(rows.Integer(0));
-  references.roles = static_cast<unsigned int>(rows.Integer(1));
+  references.roles = RolesOf(domain.id);
   return references;
+}
+
+std::optional<DomainDescription> DomainTable::Describe(unsigned int id) {
+  const Snapshot snapshot(state.Database());
+  // Not the one in memory, which may be older than what is counted.
+  Rows rows = state.Database().Select(
+      "SELECT id, name, level, default_rules, created_at_run_time FROM domain WHERE id = ?1", id);
+  if (!rows.Next()) return std::nullopt;
+  const Domain domain = ReadDomain(rows);
+  return DomainDescription{.domain = domain, .references = CountReferences(domain)};
+}
+
+unsigned int DomainDescription::StateWord() const {
+  return references.roles | (domain.createdAtRunTime ? kCreatedAtRunTime : 0);
 }
 
 std::vector<unsigned int> DomainTable::Leaked() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <bit>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -39,9 +40,20 @@ struct Domain {
 struct DomainReferences {
   unsigned int worlds = 0;       // living worlds that were placed in it
   unsigned int transitions = 0;  // granted transitions into it from other domains
-  unsigned int roles = 0;        // parts that it plays
+  unsigned int roles = 0;        // parts that it plays: bit n - 1 for the one with the number n
 
-  unsigned int Sum() const { return worlds + transitions + roles; }
+  unsigned int Sum() const {
+    return worlds + transitions + static_cast<unsigned int>(std::popcount(roles));
+  }
+};
+
+// A domain as it was at one moment.
+struct DomainDescription {
+  Domain domain;
+  DomainReferences references;
+
+  // The parts that it plays; bit 3 is set when it was created at run time.
+  unsigned int StateWord() const;
 };
 
 // The domains, as of the last HostState::Refresh(); what changes them looks again itself. Failures
@@ -81,14 +93,13 @@ class DomainTable {
   void SetRole(DomainRole role, unsigned int id);
   bool HasRole(DomainRole role, unsigned int id);
 
-  // Bit n - 1 is set when the domain plays the part with the number n; bit 3 when the domain was
-  // created at run time.
-  unsigned int StateWord(const Domain& domain);
-
   void AddGuestService(unsigned int id, const std::string& service);
   std::vector<std::string> GuestServices(unsigned int id);
 
   DomainReferences CountReferences(const Domain& domain);
+
+  // The domain as it is now, with what refers to it; empty when there is none.
+  std::optional<DomainDescription> Describe(unsigned int id);
 
   // The domains that were created at run time and that nothing refers to now, in ascending order.
   std::vector<unsigned int> Leaked();
@@ -102,6 +113,7 @@ class DomainTable {
 
   void Load();
   unsigned int LowestFreeSlot() const;
+  unsigned int RolesOf(unsigned int id);
   unsigned int Insert(const std::string& name,
                       TeskCtl::Security::TeskAccessKsi_DefaultDom defaultRules,
                       bool createdAtRunTime);

@@ -165,16 +165,14 @@ void Store::Open() {
 }
 
 bool Store::IsReady() {
-  // One look at all of it: another process may be setting the file up.
-  RunScript("BEGIN");
+  // Another process may be setting the file up.
+  const Snapshot snapshot(*this);
   const auto applicationId = ReadInteger("PRAGMA application_id");
   // Known only now that the head of the file was read.
   if (sqlite3_db_readonly(database, "main") == 1) Refuse(EPROTO, "is of a format for reading only");
   const auto version = ReadInteger("PRAGMA user_version");
   const bool isEmpty =
       applicationId == 0 && version == 0 && ReadInteger("SELECT count(*) FROM sqlite_schema") == 0;
-  RunScript("COMMIT");
-
   if (isEmpty) return false;
   if (applicationId != layout.applicationId) Refuse(EPROTO, "is the database of something else");
   if (version == layout.version) return true;
@@ -213,7 +211,6 @@ void Store::SwitchToWriteAheadLog() {
 // header that each commit rewrites, and by which the engine itself tells whether its cache is
 // valid; the format is part of the engine's published file formats.
 void Store::FindCommitHeader() {
-  ReadInteger("PRAGMA user_version");
   sqlite3_file* main = nullptr;
   if (sqlite3_file_control(database, "main", SQLITE_FCNTL_FILE_POINTER, &main) != SQLITE_OK) return;
   if (main->pMethods == nullptr || main->pMethods->iVersion < 2) return;
@@ -299,6 +296,16 @@ void Store::Fail(int result) const {
 void Store::Refuse(int code, const std::string& reason) const {
   throw HostError(code, StrCat("Unable to use the ", layout.purpose, " ", file, ": it ", reason,
                                ". ", layout.remedy));
+}
+
+Snapshot::Snapshot(Store& source) : store(source) { store.Run("BEGIN"); }
+
+Snapshot::~Snapshot() {
+  try {
+    store.Run("COMMIT");
+  } catch (const HostError&) {
+    // Nothing was written that could be lost.
+  }
 }
 
 Transaction::Transaction(Store& target) : store(target) { store.Run("BEGIN IMMEDIATE"); }

@@ -102,6 +102,7 @@ class Store {
 
  private:
   friend class Rows;
+  friend class Snapshot;
   friend class Transaction;
 
   template <class... Args>
@@ -143,6 +144,18 @@ class Store {
   sqlite3* database = nullptr;
   const volatile std::uint32_t* commitHeader = nullptr;
   std::unordered_map<const char*, sqlite3_stmt*> statements;
+};
+
+// While it lives, all that is read was there at one moment. Keeps no one from writing.
+class Snapshot {
+ public:
+  explicit Snapshot(Store& source);
+  Snapshot(const Snapshot&) = delete;
+  Snapshot& operator=(const Snapshot&) = delete;
+  ~Snapshot();
+
+ private:
+  Store& store;
 };
 
 // A write transaction: waits for the other writers, and is undone unless committed.

@@ -108,9 +108,10 @@ int Run(int argc, char** argv) {
   app.add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
   for (const Verb* verb : kVerbs) {
     CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
-    subcommand->footer(verb->help);
-    subcommand->parse_complete_callback([&, verb, chosen = verb->define(*subcommand)] {
-      action = chosen;
+    // Only the verb that is asked for: to define them all is most of what they share to start.
+    subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
+      subcommand->footer(verb->help);
+      action = verb->define(*subcommand);
       prepare = verb->prepare;
     });
   }

@@ -206,13 +206,13 @@ TEST_F(Domains, NameTheLevelsWhenAnotherIsWanted) {
 }
 
 TEST_F(Domains, ShowTheirPartsInTheirStateWord) {
-  const Domain plain = state.Domains().Get(Create("plain"));
-  const Domain busy = state.Domains().Get(Create("busy", true));
-  state.Domains().SetRole(DomainRole::GlobalVm, busy.id);
-  state.Domains().SetRole(DomainRole::IoFilter, busy.id);
-  state.Domains().SetRole(DomainRole::DaemonFramework, busy.id);
-  EXPECT_EQ(state.Domains().StateWord(plain), 0U);
-  EXPECT_EQ(state.Domains().StateWord(busy), 0xfU);
+  const unsigned int plain = Create("plain");
+  const unsigned int busy = Create("busy", true);
+  state.Domains().SetRole(DomainRole::GlobalVm, busy);
+  state.Domains().SetRole(DomainRole::IoFilter, busy);
+  state.Domains().SetRole(DomainRole::DaemonFramework, busy);
+  EXPECT_EQ(state.Domains().Describe(plain)->StateWord(), 0U);
+  EXPECT_EQ(state.Domains().Describe(busy)->StateWord(), 0xfU);
 }
 
 TEST_F(Domains, MustExistToPlayAPart) {
@@ -247,6 +247,43 @@ TEST_F(Domains, CountWhatRefersToThem) {
   EXPECT_EQ(references.transitions, 2U);
   EXPECT_EQ(references.roles, 1U);
   EXPECT_EQ(references.Sum(), 4U);
+}
+
+TEST_F(Domains, CountEachPartTheyPlay) {
+  const unsigned int id = Create("a");
+  state.Domains().SetRole(DomainRole::GlobalVm, id);
+  state.Domains().SetRole(DomainRole::DaemonFramework, id);
+  EXPECT_EQ(state.Domains().CountReferences(state.Domains().Get(id)).Sum(), 2U);
+}
+
+// ---- Descriptions.
+
+TEST_F(Domains, AreDescribedWithWhatRefersToThem) {
+  const unsigned int id = Create("a", true);
+  GrantTransition(0, id);
+  state.Domains().SetLevel("a", "disabled");
+  const auto description = state.Domains().Describe(id);
+  ASSERT_TRUE(description);
+  EXPECT_EQ(description->domain.id, id);
+  EXPECT_EQ(description->domain.name, "a");
+  EXPECT_EQ(description->domain.level, "disabled");
+  EXPECT_EQ(description->domain.defaultRules, TESKACCESS_DEFAULT_DOM_NONE);
+  EXPECT_TRUE(description->domain.createdAtRunTime);
+  EXPECT_EQ(description->references.Sum(), 1U);
+  EXPECT_FALSE(state.Domains().Describe(id + 1));
+}
+
+TEST_F(Domains, AreDescribedAsOthersLeftThem) {
+  const unsigned int id = Create("a");
+  ASSERT_EQ(RunInChild([] { HostState::Current().Domains().SetLevel("a", "disabled"); }), "");
+  EXPECT_EQ(state.Domains().Get(id).level, "enforcing");
+  EXPECT_EQ(state.Domains().Describe(id)->domain.level, "disabled");
+}
+
+TEST_F(Domains, AreDescribedWhileSomeoneWrites) {
+  const unsigned int id = Create("a");
+  const LinuxHost::Transaction writing(state.Database());
+  EXPECT_EQ(RunInChild([&] { HostState::Current().Domains().Describe(id).value(); }), "");
 }
 
 TEST_F(Domains, LeakWhenNothingRefersToThemAndThePolicyDoesNot) {
