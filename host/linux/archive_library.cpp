@@ -25,23 +25,8 @@ void ReadConversions() {
   if (conversion != reinterpret_cast<iconv_t>(-1)) iconv_close(conversion);
 }
 
-// A program with sanitizers opens libraries on behalf of its own runtime, which does not know where
-// this library looks for others.
-std::string PathBesideThis() {
-  Dl_info self{};
-  const std::string path =
-      dladdr(reinterpret_cast<void*>(&LoadArchiveLibrary), &self) == 0 ? "" : self.dli_fname;
-  return path.substr(0, path.rfind('/') + 1) + kLibrary;
-}
-
-// Looked for as what this library is linked to is: beside it first of all.
-void* Open() {
-  void* const library = dlopen(PathBesideThis().c_str(), RTLD_NOW | RTLD_LOCAL);
-  return library != nullptr ? library : dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
-}
-
 Unpack Load() {
-  void* const library = Open();
+  void* const library = dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
   void* const entryPoint = library == nullptr ? nullptr : dlsym(library, kEntryPoint);
   if (entryPoint != nullptr) return reinterpret_cast<Unpack>(entryPoint);
   throw HostError(ELIBACC, Braxo::Misc::StrCat("Unable to load what unpacks tardisks: ", dlerror(),

@@ -6,6 +6,6 @@ namespace LinuxHost {
 // what it brings along would make up most of the start of programs that do not boot. A boot loads
 // it by itself; who changes the root directory calls this before, while the library is still in
 // sight. Throws Braxo::Lib::BraxoException when it is missing.
-__attribute__((visibility("default"))) void LoadArchiveLibrary();
+void LoadArchiveLibrary();
 
 }  // namespace LinuxHost

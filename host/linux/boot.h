@@ -15,7 +15,7 @@ namespace LinuxHost {
 // May be called again at any time; changes the working directory while it runs.
 // Throws Braxo::Lib::BraxoException at the first archive that cannot be unpacked, naming the entry,
 // or, after all others were labelled, for files that could not be; what was done until then stays.
-__attribute__((visibility("default"))) void Boot();
+void Boot();
 
 // Unpacks the archive `image` into the working directory, which stands for the root, and gives
 // what it brings its first label, `unlabeled`. Appends the origin of every inode to `origins`,
@@ -23,8 +23,7 @@ __attribute__((visibility("default"))) void Boot();
 // absolute paths, "..", ways through links, hard links to what this archive has not brought,
 // device nodes and sockets are refused, and so is what belongs to the running system or to the
 // images. Throws Braxo::Lib::BraxoException at the first bad entry; earlier ones are kept.
-__attribute__((visibility("default"))) void UnpackTardisk(const std::string& image,
-                                                          unsigned int unlabeled,
-                                                          std::vector<InodeOrigin>& origins);
+void UnpackTardisk(const std::string& image, unsigned int unlabeled,
+                   std::vector<InodeOrigin>& origins);
 
 }  // namespace LinuxHost

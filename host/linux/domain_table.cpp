@@ -99,17 +99,18 @@ void DomainTable::Notice(std::int64_t currentVersion) {
 
 void DomainTable::Load() {
   if (loaded) return;
-  slots.assign(kDomainSlots, std::nullopt);
+  slots.clear();
+  slots.resize(kDomainSlots);
   identifiers.clear();
   Rows rows = state.Database().Select(
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain");
   while (rows.Next()) {
-    Domain domain = ReadDomain(rows);
-    const unsigned int id = domain.id;
+    auto domain = std::make_unique<Domain>(ReadDomain(rows));
+    const unsigned int id = domain->id;
     if (id >= slots.size())
       throw HostError(EUCLEAN,
                       StrCat("the host state holds a domain ", id, " beyond the last slot"));
-    identifiers.emplace(domain.name, id);
+    identifiers.emplace(domain->name, id);
     slots[id] = std::move(domain);
   }
   loaded = true;
@@ -123,7 +124,7 @@ const Domain* DomainTable::Find(std::string_view name) {
 
 const Domain* DomainTable::Find(unsigned int id) {
   Load();
-  return id < slots.size() && slots[id] ? &*slots[id] : nullptr;
+  return id < slots.size() ? slots[id].get() : nullptr;
 }
 
 const Domain& DomainTable::Get(std::string_view name) {
@@ -174,7 +175,8 @@ unsigned int DomainTable::Insert(const std::string& name, TeskAccessKsi_DefaultD
   }
   state.Database().Run("INSERT INTO domain VALUES (?1, ?2, ?3, ?4, ?5)", id, name, kFirstLevel,
                        static_cast<int>(defaultRules), createdAtRunTime);
-  slots[id] = Domain{id, name, kFirstLevel, defaultRules, createdAtRunTime};
+  slots[id] =
+      std::make_unique<Domain>(Domain{id, name, kFirstLevel, defaultRules, createdAtRunTime});
   identifiers.emplace(name, id);
   return id;
 }

@@ -2,6 +2,7 @@
 
 #include <bit>
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -122,7 +123,7 @@ class DomainTable {
   HostState& state;
   std::int64_t version = 0;
   bool loaded = false;
-  std::vector<std::optional<Domain>> slots;
+  std::vector<std::unique_ptr<Domain>> slots;
   TextMap<unsigned int> identifiers;
 };
 

@@ -156,10 +156,10 @@ HostState::HostState(const std::string& path)
 HostState::~HostState() = default;
 
 void HostState::Refresh() {
+  if (marked && store.IsAt(seen)) return;
   // The mark is taken first: what is then read is at least as new.
   Store::CommitMark now{};
   const bool told = store.ReadCommitMark(&now);
-  if (told && marked && now == seen) return;
   Rows rows = store.Select("SELECT domain_version, label_version, label_attribute FROM state");
   rows.Next();
   domains->Notice(rows.Integer(0));

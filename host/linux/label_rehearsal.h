@@ -25,14 +25,14 @@ struct LabelChange {
 // it would. What is no identifier is no label (EINVAL).
 // The directory `passedOver`, and the files right in it, are of the rehearsal: they can be given
 // any label, and none is noted.
-__attribute__((visibility("default"))) void StartLabelRehearsal(const std::string& passedOver = "");
+void StartLabelRehearsal(const std::string& passedOver = "");
 
 // The files that would have been labelled by now, in ascending order of their paths.
-__attribute__((visibility("default"))) std::vector<LabelChange> RehearsedLabels();
+std::vector<LabelChange> RehearsedLabels();
 
 // For the attribute itself: whether labels are only noted, and what then stands in for setxattr(2)
 // and getxattr(2) with the attribute `name`.
-__attribute__((visibility("default"))) bool IsRehearsing();
+bool IsRehearsing();
 int RehearseSetting(const char* path, const char* name, const void* value, std::size_t size,
                     int flags);
 ssize_t ReadRehearsed(const char* path, const char* name, void* value, std::size_t size);

@@ -21,9 +21,9 @@ struct LoadRecord {
 constexpr std::size_t kKeptErrors = 100;
 
 // Takes the place of the earlier record.
-__attribute__((visibility("default"))) void RecordLoad(const LoadRecord& record);
+void RecordLoad(const LoadRecord& record);
 
 // Empty when nothing was recorded since the boot.
-__attribute__((visibility("default"))) std::optional<LoadRecord> LatestLoad();
+std::optional<LoadRecord> LatestLoad();
 
 }  // namespace LinuxHost

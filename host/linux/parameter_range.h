@@ -17,7 +17,6 @@ struct ParameterRange {
 
 // Reads the range from the words of a rule: unsigned numbers, decimal or hexadecimal with "0x".
 // Without `lastWord` the range is one value. Throws HostError for anything else.
-__attribute__((visibility("default"))) ParameterRange ParseParameterRange(
-    const std::string& firstWord, const std::string& lastWord);
+ParameterRange ParseParameterRange(const std::string& firstWord, const std::string& lastWord);
 
 }  // namespace LinuxHost

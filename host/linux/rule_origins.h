@@ -27,16 +27,13 @@ struct LabelOrigin {
 
 // Records origins, all or none. A later one of the same rule of a domain, and of the same path,
 // takes the place of an earlier one.
-__attribute__((visibility("default"))) void RecordOrigins(std::span<const RuleOrigin> rules,
-                                                          std::span<const LabelOrigin> labels);
+void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels);
 
 // The origins of the rules of a domain, in no particular order.
-__attribute__((visibility("default"))) std::vector<RuleOrigin> FindRuleOrigins(
-    const std::string& domain);
+std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain);
 
 // The line that labels the file at the absolute path `path`: of those for the path and for the
 // trees around it, the one that was recorded last.
-__attribute__((visibility("default"))) std::optional<LabelOrigin> FindLabelOrigin(
-    const std::string& path);
+std::optional<LabelOrigin> FindLabelOrigin(const std::string& path);
 
 }  // namespace LinuxHost

@@ -8,12 +8,11 @@ namespace LinuxHost {
 // Copies the state at `from`, which is only read and may be in use, to the file `to` (mode 0600) in
 // a directory of its own (0700), which is made if it is missing. The file is there whole, and to
 // stay, or not at all. Throws when there is such a file already, unless `replace` is set.
-__attribute__((visibility("default"))) void SaveState(const std::string& from,
-                                                      const std::string& to, bool replace);
+void SaveState(const std::string& from, const std::string& to, bool replace);
 
 // Throws unless the saved state `path` is a regular file that only this user and the superuser may
 // change, in such a directory: whoever else may write it decides what comes back.
-__attribute__((visibility("default"))) void RequireTrustedState(const std::string& path);
+void RequireTrustedState(const std::string& path);
 
 // The numbers that labels get which the copy has and the state has no longer.
 enum class LabelNumbers {
@@ -30,7 +29,6 @@ enum class LabelNumbers {
 // `copy` is a copy for this alone, made by CopyDatabase. Changes nothing and throws, with a reason
 // that goes on a sentence about the copy, when it cannot be used, and when worlds run in a domain
 // that it does not have.
-__attribute__((visibility("default"))) void RestorePolicy(const std::string& copy,
-                                                          LabelNumbers numbers);
+void RestorePolicy(const std::string& copy, LabelNumbers numbers);
 
 }  // namespace LinuxHost

@@ -24,10 +24,10 @@ int GiveFirstLabel(const char* path, std::uint32_t id);
 
 // The label of the file at `path`; nothing, with errno set, when it has none or it cannot be read.
 // Links on the way to the file are followed, the last one is not.
-__attribute__((visibility("default"))) std::optional<std::uint32_t> ReadLabel(const char* path);
+std::optional<std::uint32_t> ReadLabel(const char* path);
 
 // Gives the file at `path` the label `id` in place of the one it has. Returns 0, or -1 with errno
 // set; ENODATA when it had none. Links on the way to the file are followed, the last one is not.
-__attribute__((visibility("default"))) int ReplaceLabel(const char* path, std::uint32_t id);
+int ReplaceLabel(const char* path, std::uint32_t id);
 
 }  // namespace LinuxHost

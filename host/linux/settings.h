@@ -14,26 +14,22 @@ namespace LinuxHost {
 using OptionValue = std::variant<long, std::string>;
 
 // The value that `text` stands for: an integer if it is one in decimal, else the text itself.
-__attribute__((visibility("default"))) OptionValue ParseOptionValue(const std::string& text);
+OptionValue ParseOptionValue(const std::string& text);
 
 // The advanced option at `path` (such as "/UserVars/Name"), empty when it is not set.
-__attribute__((visibility("default"))) std::optional<OptionValue> FindWantedOption(
-    const std::string& path);
+std::optional<OptionValue> FindWantedOption(const std::string& path);
 
 // Sets the advanced option at `path`, which begins with "/".
-__attribute__((visibility("default"))) void StoreWantedOption(const std::string& path,
-                                                              const OptionValue& value);
+void StoreWantedOption(const std::string& path, const OptionValue& value);
 
 // The enforcement level that the domain `domain` is to have, empty when none is set.
-__attribute__((visibility("default"))) std::optional<std::string> FindWantedEnforcement(
-    const std::string& domain);
+std::optional<std::string> FindWantedEnforcement(const std::string& domain);
 
 // Sets the level, "enforcing", "permissive" or "disabled" in any case, that the domain `domain`
 // gets when enforcement is restored. The domain need not exist yet.
-__attribute__((visibility("default"))) void StoreWantedEnforcement(const std::string& domain,
-                                                                   const std::string& level);
+void StoreWantedEnforcement(const std::string& domain, const std::string& level);
 
 // True when the level of the domain `domain` was applied in this boot.
-__attribute__((visibility("default"))) bool WasEnforcementApplied(const std::string& domain);
+bool WasEnforcementApplied(const std::string& domain);
 
 }  // namespace LinuxHost

@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <cstring>
@@ -229,6 +230,12 @@ bool Store::ReadCommitMark(CommitMark* mark) const {
     second[word] = commitHeader[mark->size() + word];
   }
   return *mark == second;
+}
+
+// The copy that is written last is enough: as long as it stands, no commit has ended.
+bool Store::IsAt(const CommitMark& mark) const {
+  if (commitHeader == nullptr) return false;
+  return std::equal(mark.begin(), mark.end(), commitHeader);
 }
 
 sqlite3_stmt* Store::Prepared(Sql sql) {

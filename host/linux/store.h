@@ -100,6 +100,9 @@ class Store {
   // system call. Two equal marks mean that nothing was committed between them.
   bool ReadCommitMark(CommitMark* mark) const;
 
+  // True when nothing was committed since `mark` was read. Makes no system call either.
+  bool IsAt(const CommitMark& mark) const;
+
  private:
   friend class Rows;
   friend class Snapshot;

@@ -6,7 +6,6 @@ namespace LinuxHost {
 
 // Copies the database at `from`, which is only read and may be in use, to a new file `to`. Returns
 // why it could not; empty when it could. The copy survives no power loss.
-__attribute__((visibility("default"))) std::string CopyDatabase(const std::string& from,
-                                                                const std::string& to);
+std::string CopyDatabase(const std::string& from, const std::string& to);
 
 }  // namespace LinuxHost

@@ -10,16 +10,15 @@ namespace LinuxHost {
 // While they are shown the host takes every line itself: SyslogIsRunning() answers false, and
 // WriteToKlog() hands the line on to a running system log daemon in the form that the library
 // would have given it, else to the kernel log. So each line still reaches the log it belongs to.
-__attribute__((visibility("default"))) void ShowInformation();
+void ShowInformation();
 
 // From now on hands every line, errors included, to `watcher` before it goes to its log; an empty
 // function ends that. The host takes every line itself meanwhile, as while information is shown.
-__attribute__((visibility("default"))) void WatchLog(
-    const std::function<void(const std::string& message)>& watcher);
+void WatchLog(const std::function<void(const std::string& message)>& watcher);
 
 // From now on drops every line, those that are shown included: what a process only rehearses has
 // not happened.
-__attribute__((visibility("default"))) void DropLog();
+void DropLog();
 
 // Logs one information line of the host's own, by the same road as those of the library.
 void LogInformation(const std::string& message);

@@ -48,6 +48,9 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
+constexpr char kHelpFlag[] = "-h,--help";
+constexpr char kHelpText[] = "Print this help message and exit";
+
 std::vector<std::string> VerbNames() {
   std::vector<std::string> names;
   for (const Verb* verb : kVerbs) names.emplace_back(verb->name);
@@ -99,6 +102,19 @@ int Run(int argc, char** argv) {
 
   app.require_subcommand(1);
   app.fallthrough();
+  // Each verb would inherit one, whether it is asked for or not.
+  app.set_help_flag();
+  for (const Verb* verb : kVerbs) {
+    CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
+    // Only the verb that is asked for: to define them all would be most of the start.
+    subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
+      subcommand->set_help_flag(kHelpFlag, kHelpText);
+      subcommand->footer(verb->help);
+      action = verb->define(*subcommand);
+      prepare = verb->prepare;
+    });
+  }
+  app.set_help_flag(kHelpFlag, kHelpText);
   app.footer(kFooter);
   app.failure_message(ExplainUsage);
   app.set_version_flag("--version", "secpolicy " SECPOLICY_VERSION);
@@ -106,15 +122,6 @@ int Run(int argc, char** argv) {
       app.add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
           ->type_name("DIR");
   app.add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
-  for (const Verb* verb : kVerbs) {
-    CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
-    // Only the verb that is asked for: to define them all is most of what they share to start.
-    subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
-      subcommand->footer(verb->help);
-      action = verb->define(*subcommand);
-      prepare = verb->prepare;
-    });
-  }
 
   try {
     app.parse(argc, argv);

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/capability.h>
 
 #include "host/linux/host_state.h"
 #include "message_of.h"
@@ -45,6 +46,14 @@ TEST_F(KeywordTables, NumberTheCapabilities) {
   EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
   EXPECT_EQ(LinuxHost::CapabilityWord(18), "cap_sys_boot");
   EXPECT_EQ(MessageOf([] { LinuxHost::CapabilityWord(19); }), "unknown capability 19");
+}
+
+TEST_F(KeywordTables, NameTheCapabilitiesAsLinuxDoes) {
+  for (const auto& [word, number] :
+       Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY)) {
+    cap_value_t capability = 0;
+    EXPECT_EQ(cap_from_name(word.c_str(), &capability), 0) << word;
+  }
 }
 
 TEST_F(KeywordTables, NumberTheParameterChecks) {
