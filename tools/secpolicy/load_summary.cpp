@@ -5,7 +5,7 @@
 #include <map>
 #include <string_view>
 
-#include "installed/installed_policy.h"
+#include "host/linux/policy_count.h"
 #include "secpolicy/policy_root.h"
 #include "text/count.h"
 #include "text/visible.h"
@@ -77,13 +77,9 @@ void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t ear
 }
 
 std::string CountInstalled() {
-  SecPolicy::TeskAccessInterfaceImpl access;
-  const std::vector<InstalledDomain> domains = ReadInstalledDomains(access);
-  const auto objects = access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL);
-  std::size_t rules = 0;
-  for (const InstalledDomain& domain : domains) rules += domain.rules.size();
-  return CountOf(domains.size(), "domain") + ", " + CountOf(rules, "rule") + ", " +
-         CountOf(objects.size(), "object");
+  const LinuxHost::PolicyCount count = LinuxHost::CountPolicy();
+  return CountOf(count.domains, "domain") + ", " + CountOf(count.rules, "rule") + ", " +
+         CountOf(count.objects, "object");
 }
 
 std::string DescribeInstalled() { return "done (" + CountInstalled() + ")"; }

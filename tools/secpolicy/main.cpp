@@ -48,8 +48,7 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
-constexpr char kHelpFlag[] = "-h,--help";
-constexpr char kHelpText[] = "Print this help message and exit";
+void AddHelp(CLI::App& app) { app.set_help_flag("-h,--help", "Print this help message and exit"); }
 
 std::vector<std::string> VerbNames() {
   std::vector<std::string> names;
@@ -102,19 +101,18 @@ int Run(int argc, char** argv) {
 
   app.require_subcommand(1);
   app.fallthrough();
-  // Each verb would inherit one, whether it is asked for or not.
+  // Only the verb that is asked for gets its options: to define them all would be most of a start.
   app.set_help_flag();
   for (const Verb* verb : kVerbs) {
     CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
-    // Only the verb that is asked for: to define them all would be most of the start.
     subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
-      subcommand->set_help_flag(kHelpFlag, kHelpText);
+      AddHelp(*subcommand);
       subcommand->footer(verb->help);
       action = verb->define(*subcommand);
       prepare = verb->prepare;
     });
   }
-  app.set_help_flag(kHelpFlag, kHelpText);
+  AddHelp(app);
   app.footer(kFooter);
   app.failure_message(ExplainUsage);
   app.set_version_flag("--version", "secpolicy " SECPOLICY_VERSION);

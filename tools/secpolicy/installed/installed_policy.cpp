@@ -70,9 +70,7 @@ std::list<std::string> ListTardisks() {
   return paths;
 }
 
-}  // namespace
-
-std::vector<InstalledDomain> ReadInstalledDomains(TeskAccessInterfaceImpl& access) {
+std::vector<InstalledDomain> ReadDomains(TeskAccessInterfaceImpl& access) {
   std::vector<InstalledDomain> domains;
   const unsigned int slots = access.GetMaxDomains();
   for (unsigned int id = 0; id < slots; ++id) {
@@ -81,9 +79,11 @@ std::vector<InstalledDomain> ReadInstalledDomains(TeskAccessInterfaceImpl& acces
   return domains;
 }
 
+}  // namespace
+
 InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
   InstalledPolicy policy;
-  policy.domains = ReadInstalledDomains(access);
+  policy.domains = ReadDomains(access);
   for (const auto& [name, id] :
        access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL)) {
     policy.objects.emplace(name, static_cast<unsigned int>(id));

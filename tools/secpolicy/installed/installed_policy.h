@@ -47,7 +47,4 @@ struct InstalledPolicy {
 // the host throws.
 InstalledPolicy ReadInstalledPolicy(SecPolicy::TeskAccessInterfaceImpl& access);
 
-// Only its domains.
-std::vector<InstalledDomain> ReadInstalledDomains(SecPolicy::TeskAccessInterfaceImpl& access);
-
 }  // namespace SecPolicyCli
