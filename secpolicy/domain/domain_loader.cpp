@@ -21,8 +21,7 @@ std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceI
   std::map<std::string, std::string> files;
   GetFileList(dir, files);
 
-  // Partner domains cannot take the name of one of the host's own.
-  const std::string prefix = dir == kPartnerDomainsDir ? "plugin-" : "";
+  const std::string prefix = dir == kPartnerDomainsDir ? kPartnerPrefix : "";
   std::list<DomainPolicy> domains;
   for (const auto& [path, file] : files) {
     const std::string name = prefix + file;

@@ -17,7 +17,6 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr char kPartnerPrefix[] = "plugin-";
 constexpr char kPartnerDir[] = "plugins";
 
 using Write = void (*)(const DiagnosticList& diagnostics, std::ostream& output);
@@ -32,8 +31,6 @@ struct Options {
   std::vector<std::string> unwanted;
 };
 
-bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
-
 // In the order in which a boot comes to the files. The directories of early boot, partners and
 // tardisks may be missing.
 void CheckPolicy(CheckRun& run, const std::string& root) {
@@ -42,10 +39,10 @@ void CheckPolicy(CheckRun& run, const std::string& root) {
   const std::string partners = domains + "/" + kPartnerDir;
   const std::string tardisks = root + "/" + SecPolicy::kTardisksDir;
   CheckObjects(run, root + "/" + SecPolicy::kObjectsDir);
-  if (IsDirectory(earlyDomains)) CheckDomains(run, earlyDomains, "");
+  if (File_IsDirectory(earlyDomains.c_str())) CheckDomains(run, earlyDomains, "");
   CheckDomains(run, domains, "", kPartnerDir);
-  if (IsDirectory(partners)) CheckDomains(run, partners, kPartnerPrefix);
-  if (IsDirectory(tardisks)) CheckTardisks(run, tardisks);
+  if (File_IsDirectory(partners.c_str())) CheckDomains(run, partners, SecPolicy::kPartnerPrefix);
+  if (File_IsDirectory(tardisks.c_str())) CheckTardisks(run, tardisks);
   CheckFileLabels(run, root + "/" + SecPolicy::kFileLabelsDir);
   CheckUse(run, domains);
 }
@@ -55,7 +52,7 @@ void WriteSummary(const std::string& text) {
 }
 
 ExitCode Check(const std::string& dir, const Options& options) {
-  if (!IsDirectory(dir)) {
+  if (!File_IsDirectory(dir.c_str())) {
     return Refuse("check", "there is no directory " + dir +
                                " below this root. Name the directory of the policy, or the root "
                                "that it is in (--root DIR).");

@@ -13,8 +13,6 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr char kPartnerPrefix[] = "plugin-";
-
 std::string Join(const std::string& root, const char* directory) { return root + "/" + directory; }
 
 void ReadEarlyPolicy(const std::string& earlyDir, OriginReader& origins) {
@@ -24,7 +22,7 @@ void ReadEarlyPolicy(const std::string& earlyDir, OriginReader& origins) {
 
 void ReadPolicy(const std::string& dir, OriginReader& origins) {
   origins.ReadDomains(Join(dir, SecPolicy::kDomainsDir), "");
-  origins.ReadDomains(SecPolicy::kPartnerDomainsDir, kPartnerPrefix);
+  origins.ReadDomains(SecPolicy::kPartnerDomainsDir, SecPolicy::kPartnerPrefix);
   origins.ReadTardisks(Join(SecPolicy::kPolicyRoot, SecPolicy::kTardisksDir));
   origins.ReadFileLabels(Join(dir, SecPolicy::kFileLabelsDir));
 }

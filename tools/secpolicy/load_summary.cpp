@@ -5,6 +5,7 @@
 #include <map>
 #include <string_view>
 
+#include "domain_file.h"
 #include "host/linux/policy_count.h"
 #include "secpolicy/policy_root.h"
 #include "text/count.h"
@@ -13,7 +14,6 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr std::string_view kPartnerPrefix = "plugin-";
 constexpr std::string_view kEnd = " : ";
 
 // What stands before the name of a domain, or before the file of a tardisk's policy.
@@ -36,19 +36,16 @@ std::string_view Behind(const Beginnings& beginnings, std::string_view message) 
 }
 
 // "NAME: LINE : REASON", or "NAME : REASON" where the whole domain is meant.
-std::string DomainFile(std::string_view text, const std::string& policyDir) {
+std::string FileOfDomain(std::string_view text, const std::string& policyDir) {
   const std::string_view name = text.substr(0, text.find_first_of(" :"));
   if (name.starts_with('/')) return std::string(name);
-  if (name.starts_with(kPartnerPrefix)) {
-    return SecPolicy::kPartnerDomainsDir + ("/" + std::string(name.substr(kPartnerPrefix.size())));
-  }
-  return policyDir + "/" + SecPolicy::kDomainsDir + "/" + std::string(name);
+  return DomainFile(name, policyDir);
 }
 
 // The file that a message is about; empty when it is about none.
 std::string FileOf(std::string_view message, const std::string& policyDir) {
   const std::string_view domain = Behind(kBeforeDomain, message);
-  if (!domain.empty()) return DomainFile(domain, policyDir);
+  if (!domain.empty()) return FileOfDomain(domain, policyDir);
   if (!message.starts_with('/')) return std::string(Behind(kBeforePath, message));
   // "FILE:LINE : REASON"
   const std::string_view place = message.substr(0, message.find(kEnd));

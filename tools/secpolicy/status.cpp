@@ -1,12 +1,10 @@
 #include <CLI/App.hpp>
 #include <algorithm>
 #include <array>
-#include <ctime>
 #include <iomanip>
 #include <iostream>
 #include <map>
 #include <optional>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -16,6 +14,7 @@
 #include "installed/rule_words.h"
 #include "scratch/scratch_state.h"
 #include "text/count.h"
+#include "text/utc_time.h"
 #include "text/visible.h"
 #include "verb.h"
 
@@ -70,23 +69,13 @@ Status ReadStatus() {
   return status;
 }
 
-std::string FormatTime(std::int64_t seconds, const char* format) {
-  const std::time_t time = seconds;
-  std::tm parts{};
-  gmtime_r(&time, &parts);
-  std::ostringstream text;
-  text << std::put_time(&parts, format);
-  return text.str();
-}
-
 // A line of the screen: what it is about, and what there is to say.
 void WriteLine(const std::string& title, const std::string& text) {
   std::cout << std::left << std::setw(kTitleWidth) << title << Visible(text) << '\n';
 }
 
 std::string DescribeLoad(const LinuxHost::LoadRecord& load) {
-  return load.verb + " from " + load.directory + " at " +
-         FormatTime(load.time, "%Y-%m-%d %H:%M:%S UTC") + ": " + load.ending +
+  return load.verb + " from " + load.directory + " at " + UtcTime(load.time) + ": " + load.ending +
          (load.errorCount > 0 ? ", " + CountOf(load.errorCount, "error") : "");
 }
 
@@ -139,12 +128,8 @@ void WriteText(const Status& status) {
 }
 
 Json ToJson(const LinuxHost::LoadRecord& load) {
-  return {{"verb", load.verb},
-          {"directory", load.directory},
-          {"time", FormatTime(load.time, "%Y-%m-%dT%H:%M:%SZ")},
-          {"ending", load.ending},
-          {"errorCount", load.errorCount},
-          {"errors", load.errors}};
+  return {{"verb", load.verb},     {"directory", load.directory},   {"time", IsoTime(load.time)},
+          {"ending", load.ending}, {"errorCount", load.errorCount}, {"errors", load.errors}};
 }
 
 void WriteJson(const Status& status) {

@@ -14,10 +14,6 @@ namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
 
-constexpr char kPartnerPrefix[] = "plugin-";
-
-bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
-
 std::map<std::string, std::string> FilesOf(const std::string& dir) {
   std::map<std::string, std::string> files;
   SecPolicy::GetFileList(dir, files);
@@ -30,7 +26,7 @@ void InstallPartners(const std::string& dir, const std::string& copies,
                      TeskAccessInterfaceImpl& access) {
   std::filesystem::create_directory(copies);
   for (const auto& [path, name] : FilesOf(dir)) {
-    std::filesystem::copy_file(path, copies + "/" + kPartnerPrefix + name);
+    std::filesystem::copy_file(path, copies + "/" + SecPolicy::kPartnerPrefix + name);
   }
   SecPolicy::LoadPolicyDomains(copies, access);
 }
@@ -63,11 +59,11 @@ WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& par
 
   const std::string earlyDomains = dir + "/early/" + SecPolicy::kDomainsDir;
   step([&] { SecPolicy::LoadPolicyObjects(dir + "/" + SecPolicy::kObjectsDir, access); });
-  if (IsDirectory(earlyDomains)) {
+  if (File_IsDirectory(earlyDomains.c_str())) {
     step([&] { SecPolicy::LoadPolicyDomains(earlyDomains, access); });
   }
   step([&] { SecPolicy::LoadPolicyDomains(dir + "/" + SecPolicy::kDomainsDir, access); });
-  if (IsDirectory(partnerDir)) {
+  if (File_IsDirectory(partnerDir.c_str())) {
     step([&] { InstallPartners(partnerDir, scratch.File("partners"), access); });
   }
   step([&] {

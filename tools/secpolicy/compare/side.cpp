@@ -13,10 +13,8 @@ namespace {
 
 constexpr char kInstalled[] = "installed";
 
-bool IsDirectory(const std::string& path) { return File_IsDirectory(path.c_str()); }
-
 Side ReadDirectory(const std::string& dir) {
-  if (!IsDirectory(dir)) {
+  if (!File_IsDirectory(dir.c_str())) {
     throw std::runtime_error("there is no directory " + dir +
                              " below this root. Name a policy directory, a saved state, or "
                              "'installed'.");
@@ -63,7 +61,7 @@ bool IsKnownToBeSaved(const std::string& name) {
 
 bool MeansDirectory(const std::string& name) {
   if (name.find('/') != std::string::npos) return true;
-  return IsDirectory(name) && !IsKnownToBeSaved(name);
+  return File_IsDirectory(name.c_str()) && !IsKnownToBeSaved(name);
 }
 
 }  // namespace

@@ -5,12 +5,12 @@
 #include <span>
 
 #include "printed_rules.h"
+#include "real_path.h"
 #include "secpolicy/domain/dom_trans_rules.h"
 #include "secpolicy/domain/domain_policy.h"
 #include "secpolicy/domain/file_path_access_rules.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
-#include "zorvan/kernel.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -62,14 +62,6 @@ std::string InKernelOrder(const std::string& permissions) {
     if (permissions.find(letter) != std::string::npos) ordered += letter;
   }
   return ordered;
-}
-
-// The path that it resolves to; empty when it leads nowhere.
-std::string RealPathOf(const std::string& path) {
-  SecPolicy::TeskAccess_FileRule resolved{};
-  const bool found = path.size() < sizeof resolved.path &&
-                     Zorvan::Kernel::RealPath(path.c_str(), resolved.path) == 0;
-  return found ? resolved.path : "";
 }
 
 // A path rule is displayed as the kernel keeps it: with the letters in its order, and once more for

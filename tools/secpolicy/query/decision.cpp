@@ -4,6 +4,7 @@
 #include <set>
 #include <string_view>
 
+#include "domain_file.h"
 #include "host/linux/parameter_range.h"
 #include "installed/rule_words.h"
 #include "secpolicy/policy_root.h"
@@ -19,7 +20,6 @@ constexpr std::string_view kExecTransition = "exec";
 constexpr char kExecLetter = 'x';
 constexpr std::string_view kPermissionLetters = "rwx";
 constexpr char kEnforcing[] = "enforcing";
-constexpr std::string_view kPartnerPrefix = "plugin-";
 
 // A rule of the domain, with its words.
 struct ReadRule {
@@ -219,16 +219,12 @@ Decision Decide(const Question& question, const InstalledDomain& domain,
 
 // A domain that the early policy has as well has its full policy in the usual place.
 std::string PolicyFileOf(const InstalledDomain& domain) {
-  const bool isPartner = domain.name.starts_with(kPartnerPrefix);
-  const std::string name = isPartner ? domain.name.substr(kPartnerPrefix.size()) : domain.name;
-  const std::string directory =
-      isPartner ? SecPolicy::kPartnerDomainsDir
-                : std::string(SecPolicy::kPolicyRoot) + "/" + SecPolicy::kDomainsDir;
-  std::string file = directory + "/" + name;
+  std::string file = DomainFile(domain.name, SecPolicy::kPolicyRoot);
+  const std::string name = file.substr(file.rfind('/'));
   std::string elsewhere;
   for (const InstalledRule& rule : domain.rules) {
     if (rule.origin.file == file) return file;
-    if (rule.origin.file.ends_with("/" + name)) elsewhere = rule.origin.file;
+    if (rule.origin.file.ends_with(name)) elsewhere = rule.origin.file;
   }
   return elsewhere.empty() ? file : elsewhere;
 }

@@ -6,8 +6,8 @@
 #include <map>
 
 #include "host/linux/parameter_range.h"
+#include "installed/real_path.h"
 #include "text/suggestion.h"
-#include "zorvan/kernel.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -108,12 +108,6 @@ const QuestionForm& FormOf(const std::string& action) {
 std::string WithoutTrailingSlashes(std::string path) {
   while (path.size() > 1 && path.ends_with('/')) path.pop_back();
   return path;
-}
-
-// The path that it resolves to; empty when it leads nowhere.
-std::string RealPathOf(const std::string& path) {
-  SecPolicy::TeskAccess_FileRule resolved{};
-  return Zorvan::Kernel::RealPath(path.c_str(), resolved.path) == 0 ? resolved.path : "";
 }
 
 // The line for one of the paths that gave the label that the file has now.
