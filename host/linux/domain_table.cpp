@@ -302,8 +302,9 @@ std::optional<DomainDescription> DomainTable::Describe(unsigned int id) {
   Rows rows = state.Database().Select(
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain WHERE id = ?1", id);
   if (!rows.Next()) return std::nullopt;
-  const Domain domain = ReadDomain(rows);
-  return DomainDescription{.domain = domain, .references = CountReferences(domain)};
+  DomainDescription description{.domain = ReadDomain(rows), .references = {}};
+  description.references = CountReferences(description.domain);
+  return description;
 }
 
 unsigned int DomainDescription::StateWord() const {

@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <cstdlib>
 #include <span>
-#include <vector>
 
 #include "braxo/misc/strcat.h"
 #include "domain_table.h"

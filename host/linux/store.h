@@ -149,7 +149,8 @@ class Store {
   std::unordered_map<const char*, sqlite3_stmt*> statements;
 };
 
-// While it lives, all that is read was there at one moment. Keeps no one from writing.
+// While it lives, all that is read was there at one moment. Keeps others from nothing. Not within a
+// transaction, and what remembers a commit mark must not read within it: the mark may be newer.
 class Snapshot {
  public:
   explicit Snapshot(Store& source);

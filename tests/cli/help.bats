@@ -20,6 +20,17 @@ load helper
   done
 }
 
+@test "help and the version need no arguments of the verb" {
+  for words in "--help why" "why --help" "label --help"; do
+    run --separate-stderr "$SECPOLICY" $words
+    exits 0
+    [[ $output == *"Usage: secpolicy ${words/ --help}"* || $output == *"Usage: secpolicy ${words/--help }"* ]]
+  done
+  run --separate-stderr "$SECPOLICY" why --version
+  exits 0
+  [[ $output == "secpolicy "[0-9]* ]]
+}
+
 @test "--version names the version" {
   run --separate-stderr "$SECPOLICY" --version
   exits 0

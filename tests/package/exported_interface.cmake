@@ -8,6 +8,9 @@ add_test(NAME package.exported_symbols
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-exported-symbols"
     "$<TARGET_FILE:secpolicy>" "${CMAKE_CURRENT_LIST_DIR}/exported_symbols.txt")
 
+add_test(NAME package.host_symbols
+  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-host-symbols" "$<TARGET_FILE:secpolicyhost>")
+
 # What it needs at run time: the host, the C++ runtime and the C library.
 add_test(NAME package.needed_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-needed-libraries" "$<TARGET_FILE:secpolicy>")

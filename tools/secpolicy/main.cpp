@@ -48,8 +48,6 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
-void AddHelp(CLI::App& app) { app.set_help_flag("-h,--help", "Print this help message and exit"); }
-
 std::vector<std::string> VerbNames() {
   std::vector<std::string> names;
   for (const Verb* verb : kVerbs) names.emplace_back(verb->name);
@@ -101,18 +99,6 @@ int Run(int argc, char** argv) {
 
   app.require_subcommand(1);
   app.fallthrough();
-  // Only the verb that is asked for gets its options: to define them all would be most of a start.
-  app.set_help_flag();
-  for (const Verb* verb : kVerbs) {
-    CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
-    subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
-      AddHelp(*subcommand);
-      subcommand->footer(verb->help);
-      action = verb->define(*subcommand);
-      prepare = verb->prepare;
-    });
-  }
-  AddHelp(app);
   app.footer(kFooter);
   app.failure_message(ExplainUsage);
   app.set_version_flag("--version", "secpolicy " SECPOLICY_VERSION);
@@ -120,6 +106,15 @@ int Run(int argc, char** argv) {
       app.add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
           ->type_name("DIR");
   app.add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
+  // Only the verb that is asked for gets its options: to define them all would slow every start.
+  for (const Verb* verb : kVerbs) {
+    CLI::App* const subcommand = app.add_subcommand(verb->name, verb->summary);
+    subcommand->preparse_callback([&, verb, subcommand](std::size_t /*rest*/) {
+      subcommand->footer(verb->help);
+      action = verb->define(*subcommand);
+      prepare = verb->prepare;
+    });
+  }
 
   try {
     app.parse(argc, argv);

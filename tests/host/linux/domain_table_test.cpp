@@ -184,6 +184,14 @@ TEST_F(Domains, StayWhileWorldsRunInThem) {
   EXPECT_EQ(MessageOf([&] { state.Domains().Destroy(id); }), "");
 }
 
+TEST_F(Domains, AreRefusedBeyondTheLastSlot) {
+  state.Database().Run("INSERT INTO domain VALUES (600, 'far', 'enforcing', 0, 0)");
+  state.Database().Run("UPDATE state SET domain_version = domain_version + 1");
+  state.Refresh();
+  EXPECT_EQ(MessageOf([&] { state.Domains().Find("far"); }),
+            "the host state holds a domain 600 beyond the last slot");
+}
+
 // ---- Levels, parts and services.
 
 TEST_F(Domains, TakeTheThreeLevels) {

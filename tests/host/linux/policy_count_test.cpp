@@ -5,7 +5,6 @@
 
 #include "host/linux/file_policy_table.h"
 #include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
 #include "state_directory.h"
 #include "teskctl/security.h"
 

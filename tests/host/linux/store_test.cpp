@@ -284,6 +284,7 @@ TEST_F(StoreFile, HasAMarkThatEveryCommitChanges) {
   EXPECT_EQ(before, after);
   for (int item = 0; item < 5000; ++item) {
     writer.Run("INSERT INTO item VALUES (?1, ?1)", item);
+    ASSERT_FALSE(watcher.IsAt(before)) << "after commit " << item;
     ASSERT_TRUE(watcher.ReadCommitMark(&after));
     ASSERT_NE(before, after) << "after commit " << item;
     before = after;
@@ -298,6 +299,7 @@ TEST_F(StoreFile, HasAMarkThatReadingLeavesAlone) {
   ASSERT_TRUE(store.ReadCommitMark(&before));
   CountOf(other, "milk");
   CountOf(store, "milk");
+  EXPECT_TRUE(store.IsAt(before));
   ASSERT_TRUE(store.ReadCommitMark(&after));
   EXPECT_EQ(before, after);
 }
