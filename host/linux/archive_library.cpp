@@ -10,6 +10,8 @@
 #include "host_error.h"
 #include "tardisk_archive.h"
 
+using Braxo::Misc::StrCat;
+
 namespace LinuxHost {
 namespace {
 
@@ -25,13 +27,21 @@ void ReadConversions() {
   if (conversion != reinterpret_cast<iconv_t>(-1)) iconv_close(conversion);
 }
 
+// Out of the installation that the command belongs to, or else as any library is found. A run path
+// would find it too, and slow every start of the command.
+void* Open() {
+  const std::string installed = StrCat("$ORIGIN/../" SECPOLICY_LIBDIR "/", kLibrary);
+  void* const library = dlopen(installed.c_str(), RTLD_NOW | RTLD_LOCAL);
+  return library != nullptr ? library : dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
+}
+
 Unpack Load() {
-  void* const library = dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
+  void* const library = Open();
   void* const entryPoint = library == nullptr ? nullptr : dlsym(library, kEntryPoint);
   if (entryPoint != nullptr) return reinterpret_cast<Unpack>(entryPoint);
-  throw HostError(ELIBACC, Braxo::Misc::StrCat("Unable to load what unpacks tardisks: ", dlerror(),
-                                               ". It belongs beside libsecpolicyhost.so.1: "
-                                               "install that again"));
+  throw HostError(ELIBACC, StrCat("Unable to load what unpacks tardisks: ", dlerror(),
+                                  ". It belongs beside libsecpolicyhost.so.1: "
+                                  "install that again"));
 }
 
 Unpack Loaded() {

@@ -305,9 +305,12 @@ void Store::Refuse(int code, const std::string& reason) const {
                                ". ", layout.remedy));
 }
 
-Snapshot::Snapshot(Store& source) : store(source) { store.Run("BEGIN"); }
+Snapshot::Snapshot(Store& source) : end(source.Prepared("COMMIT")) { source.Run("BEGIN"); }
 
-Snapshot::~Snapshot() { sqlite3_exec(store.database, "COMMIT", nullptr, nullptr, nullptr); }
+Snapshot::~Snapshot() {
+  sqlite3_step(end);
+  sqlite3_reset(end);
+}
 
 Transaction::Transaction(Store& target) : store(target) { store.Run("BEGIN IMMEDIATE"); }
 

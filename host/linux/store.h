@@ -159,7 +159,7 @@ class Snapshot {
   ~Snapshot();
 
  private:
-  Store& store;
+  sqlite3_stmt* end;  // prepared before it begins, so that it can always end
 };
 
 // A write transaction: waits for the other writers, and is undone unless committed.
