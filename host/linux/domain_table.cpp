@@ -35,10 +35,9 @@ constexpr std::array<RoleName, 3> kRoles = {{
     {DomainRole::DaemonFramework, 0x4, "daemon framework"},
 }};
 
-const char* NameOf(DomainRole role) {
-  return std::find_if(kRoles.begin(), kRoles.end(),
-                      [&](const auto& row) { return row.role == role; })
-      ->name;
+const RoleName& RowOf(DomainRole role) {
+  return *std::find_if(kRoles.begin(), kRoles.end(),
+                       [&](const auto& row) { return row.role == role; });
 }
 
 // The domain of a row of id, name, level, default_rules, created_at_run_time.
@@ -244,14 +243,12 @@ void DomainTable::SetRole(DomainRole role, unsigned int id) {
   Transaction transaction(state.Database());
   state.Refresh();
   Get(id);
-  state.Database().Run("INSERT OR REPLACE INTO role VALUES (?1, ?2)", NameOf(role), id);
+  state.Database().Run("INSERT OR REPLACE INTO role VALUES (?1, ?2)", RowOf(role).name, id);
   transaction.Commit();
 }
 
 bool DomainTable::HasRole(DomainRole role, unsigned int id) {
-  Rows rows = state.Database().Select("SELECT 1 FROM role WHERE name = ?1 AND domain_id = ?2",
-                                      NameOf(role), id);
-  return rows.Next();
+  return (RolesOf(id) & RowOf(role).bit) != 0;
 }
 
 unsigned int DomainTable::RolesOf(unsigned int id) {

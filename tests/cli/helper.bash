@@ -83,3 +83,12 @@ jsonschema.Draft202012Validator.check_schema(schema)
 jsonschema.Draft202012Validator(schema).validate(json.load(sys.stdin))' \
     "$SOURCE/docs/schema/$1.json" <<<"$output"
 }
+
+# complete_line WORD...: sets COMPREPLY to what bash offers for the last word of this command line.
+complete_line() {
+  source "$SOURCE/completions/secpolicy.bash"
+  compopt() { :; }
+  COMP_WORDS=("$@")
+  COMP_CWORD=$(($# - 1))
+  _secpolicy
+}

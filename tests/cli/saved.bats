@@ -279,13 +279,6 @@ refuses() {
 }
 
 @test "the completion of bash knows the saved states" {
-  source "$SOURCE/completions/secpolicy.bash"
-  compopt() { :; }
-  complete_line() {
-    COMP_WORDS=("$@")
-    COMP_CWORD=$(($# - 1))
-    _secpolicy
-  }
   secpolicy save good
   secpolicy save nightly
   complete_line secpolicy --root "$root" rollback ''
