@@ -354,6 +354,47 @@ fileLabels/zz:3 [unknown-word]" ]]
   [[ $output != *$'\033'* && $output == *'-s ^[[2J grant'* ]]
 }
 
+@test "neither do other characters that command a terminal, or bytes that are none" {
+  # U+009B, a byte that is no character, U+202E, U+2066, and a long form of an escape.
+  printf -- '-s \xc2\x9b31m\x9b\xe2\x80\xae\xe2\x81\xa6\xc0\x9b grant\n' >>"$policy/domains/appDom"
+  secpolicy check
+  exits 1
+  [[ $output == *'-s <U+009B>31m<9B><U+202E><U+2066><C0><9B> grant
+       ^^^^^^^^~~~~~~~~~~~~~~~~~~~~~~~~~~~~~~~' ]]
+}
+
+@test "letters of any language are shown as they are, and columns count them" {
+  printf -- '-s gr\xc3\xbc\xc3\x9fe grnt\n' >>"$policy/domains/appDom"
+  number=$(wc -l <"$policy/domains/appDom")
+  finds "$shown/domains/appDom:$number:10: error: invalid keyword grnt [grant-word]"
+  [[ $output == *'-s grüße grnt'* ]]
+}
+
+@test "thousands of misspelt words beside thousands of objects take seconds" {
+  seq -f 'thing%.0f' 20000 >"$policy/objects/things"
+  seq -f '-a thimg%.0f read grant' 2000 >>"$policy/domains/appDom"
+  run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" check --disable unused-object
+  exits 1
+  shows "    hint: did you mean 'thing1999'?"
+  [[ $stderr == "secpolicy: check: 2000 errors, 0 warnings" ]]
+}
+
+@test "a hint is the nearest word, the first of several, and none for what is far" {
+  add objects/base webSite webSiteOld abcdefghijklmnopqrstuvwxyz
+  add domains/appDom "-a wbeSite read grant" "-a WEBSITES read grant" "-a webSideOlt read grant" \
+    "-a abcdefghijklmnopqrst read grant" "-a bacedfghijklmnopqrstuvwxw read grant"
+  secpolicy check --disable unused-object
+  exits 1
+  diff <(printf '    hint: %s\n' "did you mean 'webSite'?" "did you mean 'webSite'?" "did you mean 'webSiteOld'?" \
+    "labels are declared in objects/" "did you mean 'abcdefghijklmnopqrstuvwxyz'?") <(grep hint: <<<"$output")
+}
+
+@test "of a file without line ends, no more is read than a load reads" {
+  truncate -s 8G "$policy/domains/hugeDom"
+  run --separate-stderr bash -c 'ulimit -v 2000000; exec timeout 60 "$@"' - "$SECPOLICY" --root "$root" check
+  [[ $output == *"$shown/domains/hugeDom:1:1024: warning: this line has more than 1023 characters"* ]]
+}
+
 @test "what is installed counts, but not with --fresh" {
   add domains/appDom "-d hostProgram sshDom exec grant"
   rm "$policy/domains/sshDom"

@@ -209,6 +209,7 @@ std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>
     run.domains[name] = named.file;
     domains.push_back({named.file, name, id});
   }
+  run.vocabularies.erase(WordKind::kDomain);
   return domains;
 }
 

@@ -2,8 +2,6 @@
 
 #include <algorithm>
 
-#include "text/suggestion.h"
-
 namespace SecPolicyCli {
 namespace {
 
@@ -46,32 +44,39 @@ TeskAccess_KeywordType TableOf(WordKind kind) {
   }
 }
 
-std::vector<std::string> Candidates(CheckRun& run, WordKind kind) {
-  std::vector<std::string> candidates;
-  if (kind == kFree) return candidates;
+std::vector<std::string> WordsOf(CheckRun& run, WordKind kind) {
+  std::vector<std::string> words;
+  if (kind == kFree) return words;
   if (kind == kDomain) {
-    for (const auto& [name, file] : run.domains) candidates.push_back(name);
-    return candidates;
+    for (const auto& [name, file] : run.domains) words.push_back(name);
+    return words;
   }
-  for (const auto& [word, id] : run.access.GetKeywordsMap(TableOf(kind)))
-    candidates.push_back(word);
-  return candidates;
+  for (const auto& [word, id] : run.access.GetKeywordsMap(TableOf(kind))) words.push_back(word);
+  return words;
 }
 
-std::string Suggest(const std::string& word, const std::vector<std::string>& candidates) {
-  const std::string nearest = NearestWord(word, candidates);
+Vocabulary& VocabularyOf(CheckRun& run, WordKind kind) {
+  const auto known = run.vocabularies.find(kind);
+  if (known != run.vocabularies.end()) return known->second;
+  return run.vocabularies.emplace(kind, WordsOf(run, kind)).first->second;
+}
+
+std::string AskFor(const std::string& nearest) {
   return nearest.empty() ? "" : "did you mean '" + nearest + "'?";
 }
 
+std::string Suggest(CheckRun& run, WordKind kind, const std::string& word) {
+  return AskFor(VocabularyOf(run, kind).Nearest(word));
+}
+
 // A short table is told as a whole when no word of it is near.
-std::string SuggestOrList(const std::string& word, const std::vector<std::string>& candidates) {
+std::string SuggestOrList(CheckRun& run, WordKind kind, const std::string& word) {
   constexpr std::size_t kShortTable = 10;
-  std::string suggestion = Suggest(word, candidates);
-  if (!suggestion.empty() || candidates.empty() || candidates.size() > kShortTable) {
-    return suggestion;
-  }
+  std::string suggestion = Suggest(run, kind, word);
+  const Vocabulary& table = VocabularyOf(run, kind);
+  if (!suggestion.empty() || table.Size() == 0 || table.Size() > kShortTable) return suggestion;
   std::string list = "one of";
-  for (const std::string& candidate : candidates) list += " " + candidate;
+  for (const std::string& candidate : WordsOf(run, kind)) list += " " + candidate;
   return list;
 }
 
@@ -92,17 +97,17 @@ std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words
   if (&code == &Codes::kArgumentCount) return std::string("write: ") + form->usage;
   if (index == 0 || index >= words.size()) return "";
   if (&code == &Codes::kGrantWord) {
-    const std::string suggestion = Suggest(words[index], {"grant", "revoke"});
+    const std::string suggestion = AskFor(NearestWord(words[index], {"grant", "revoke"}));
     return suggestion.empty() ? "the last word is 'grant' or 'revoke'" : suggestion;
   }
   if (index > form->words.size()) return "";
   const WordKind kind = form->words[index - 1];
   if (kind == kLabel) return HintForLabel(run, words[index]);
-  return SuggestOrList(words[index], Candidates(run, kind));
+  return SuggestOrList(run, kind, words[index]);
 }
 
 std::string HintForLabel(CheckRun& run, const std::string& word) {
-  const std::string suggestion = Suggest(word, Candidates(run, kLabel));
+  const std::string suggestion = Suggest(run, kLabel, word);
   return suggestion.empty() ? "labels are declared in objects/" : suggestion;
 }
 

@@ -1,12 +1,12 @@
 #include "source_file.h"
 
-#include <algorithm>
+#include <array>
 #include <fstream>
-#include <iterator>
 #include <queue>
 #include <utility>
 
 #include "secpolicy/secpolicy.h"
+#include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -14,14 +14,20 @@ namespace {
 // What fits the reader's buffer.
 constexpr std::size_t kLongestLine = 1023;
 
-std::vector<std::string_view> SplitLines(std::string_view contents) {
-  std::vector<std::string_view> texts;
-  while (true) {
-    const std::size_t end = contents.find('\n');
-    texts.push_back(contents.substr(0, end));
-    if (end == std::string_view::npos) return texts;
-    contents.remove_prefix(end + 1);
+// Up to the first line that is too long, of which one character too many is kept: a file may hold
+// anything, and the reader stops there too.
+std::vector<std::string> ReadLines(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  std::array<char, kLongestLine + 2> buffer;
+  std::vector<std::string> texts;
+  while (file.good()) {
+    file.getline(buffer.data(), buffer.size());
+    const auto taken = static_cast<std::size_t>(file.gcount());
+    const bool hasLineFeed = taken > 0 && file.good();
+    texts.emplace_back(buffer.data(), taken - (hasLineFeed ? 1 : 0));
+    if (texts.back().size() > kLongestLine) break;
   }
+  return texts;
 }
 
 SourceFile::Words ToWords(std::queue<std::string>& queue) {
@@ -32,20 +38,11 @@ SourceFile::Words ToWords(std::queue<std::string>& queue) {
 
 }  // namespace
 
-std::size_t CountCharacters(std::string_view text) {
-  return static_cast<std::size_t>(std::count_if(text.begin(), text.end(), [](char byte) {
-    return (static_cast<unsigned char>(byte) & 0xc0) != 0x80;
-  }));
-}
-
 SourceFile::SourceFile(const std::string& filePath) : path(filePath) {
   std::map<unsigned int, std::queue<std::string>> parsed;
   SecPolicy::ParseFile(path, parsed);
   for (auto& [number, words] : parsed) lines.emplace(number, ToWords(words));
-
-  std::ifstream file(path, std::ios::binary);
-  contents.assign(std::istreambuf_iterator<char>(file), {});
-  texts = SplitLines(contents);
+  texts = ReadLines(path);
 }
 
 Diagnostic SourceFile::About(const Code& code, std::string message, std::string hint) const {
@@ -92,7 +89,7 @@ void SourceFile::CheckBytes(DiagnosticList& diagnostics) const {
                               "a NUL byte ends this line; what follows it is not read"));
     }
     if (text.size() <= kLongestLine) continue;
-    diagnostics.Add(AtBytes(Codes::kLongLine, number, kLongestLine, text.size() - kLongestLine,
+    diagnostics.Add(AtBytes(Codes::kLongLine, number, kLongestLine, 1,
                             "this line has more than 1023 characters: the rest of it and all lines "
                             "below it are not read"));
     break;

@@ -9,7 +9,8 @@
 
 namespace SecPolicyCli {
 
-// A policy file: its words as the library reads them, and its bytes to point into.
+// A policy file: its words as the library reads them, and its bytes to point into, as far as the
+// library reads them.
 class SourceFile {
  public:
   using Words = std::vector<std::string>;
@@ -22,7 +23,7 @@ class SourceFile {
   // The lines that have words, by number from 1, as far as the library reads the file.
   const std::map<unsigned int, Words>& Lines() const { return lines; }
 
-  // The bytes of the line `number`, without its line feed.
+  // The bytes of the line `number`, without its line feed; of one that is too long, its beginning.
   std::string_view Text(unsigned int number) const { return texts.at(number - 1); }
 
   // A problem of the whole file.
@@ -47,12 +48,8 @@ class SourceFile {
   void CheckWords(unsigned int number, const Words& words, DiagnosticList& diagnostics) const;
 
   std::string path;
-  std::string contents;
-  std::vector<std::string_view> texts;
+  std::vector<std::string> texts;
   std::map<unsigned int, Words> lines;
 };
-
-// The number of characters in `text`; a byte that belongs to none counts as one.
-std::size_t CountCharacters(std::string_view text);
 
 }  // namespace SecPolicyCli

@@ -22,11 +22,9 @@ void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
   for (std::size_t column = 1; !rest.empty() && column < first + kShownWidth; ++column) {
     const std::string_view character = TakeCharacter(rest);
     if (column < first) continue;
-    AppendVisible(excerpt, character);
+    const std::size_t columns = AppendVisible(excerpt, character);
     const bool marked = column >= diagnostic.column && column < end;
-    marks.append(IsControl(character.front()) ? 2 : 1, !marked                       ? ' '
-                                                       : column == diagnostic.column ? '^'
-                                                                                     : '~');
+    marks.append(columns, !marked ? ' ' : column == diagnostic.column ? '^' : '~');
   }
   if (!rest.empty()) excerpt += "...";
   marks.erase(marks.find_last_not_of(' ') + 1);

@@ -1,20 +1,23 @@
 #pragma once
 
+#include <cstddef>
 #include <string>
 #include <string_view>
 
-// What comes from files may hold anything: control characters are shown as ^I and the like, so that
-// none reaches the terminal.
+// What comes from files and command lines may hold anything. Before people see it, it is made safe:
+// control characters are shown as ^I, other characters that command a terminal or turn the
+// direction of the text as <U+202E>, and bytes that are no UTF-8 as <9B>.
 namespace SecPolicyCli {
 
-// True for the characters that are shown in two columns.
-bool IsControl(char byte);
-
-// Appends `character`, which TakeCharacter took, as it can be shown.
-void AppendVisible(std::string& text, std::string_view character);
-
-// Takes the first character off `text`, which is UTF-8 and not empty.
+// Takes the first character off `text`, which is not empty; of what is no UTF-8, one byte.
 std::string_view TakeCharacter(std::string_view& text);
+
+// Appends `character`, which TakeCharacter took, as it can be shown, and returns in how many
+// columns.
+std::size_t AppendVisible(std::string& text, std::string_view character);
+
+// The number of characters in `text`; a byte that belongs to none counts as one.
+std::size_t CountCharacters(std::string_view text);
 
 // The whole text as it can be shown.
 std::string Visible(std::string_view text);
