@@ -48,8 +48,9 @@ ExitCode Boot(bool timing) {
       AdviseOnPrivilege, DescribeInstalled);
 }
 
-Action Define(CLI::App& app) {
-  const auto timing = AddTiming(app);
+Action Define(Syntax& syntax) {
+  const auto timing = std::make_shared<bool>(false);
+  AddTiming(syntax, *timing);
   return [timing] { return Boot(*timing); };
 }
 

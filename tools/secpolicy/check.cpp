@@ -1,4 +1,3 @@
-#include <CLI/App.hpp>
 #include <filesystem>
 #include <iostream>
 #include <map>
@@ -7,10 +6,12 @@
 
 #include "check/check_run.h"
 #include "check/report_format.h"
+#include "command_line.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
+#include "summary.h"
 #include "text/count.h"
 #include "verb.h"
 
@@ -27,7 +28,7 @@ const std::map<std::string, Write> kFormats = {
 struct Options {
   bool fresh = false;
   bool warningsAreErrors = false;
-  std::string format = "text";
+  std::string format;
   std::vector<std::string> unwanted;
 };
 
@@ -47,10 +48,6 @@ void CheckPolicy(CheckRun& run, const std::string& root) {
   CheckUse(run, domains);
 }
 
-void WriteSummary(const std::string& text) {
-  std::cerr << "secpolicy: check: " << text << std::endl;
-}
-
 ExitCode Check(const std::string& dir, const Options& options) {
   if (!File_IsDirectory(dir.c_str())) {
     return Refuse("check", "there is no directory " + dir +
@@ -59,19 +56,18 @@ ExitCode Check(const std::string& dir, const Options& options) {
   }
   CheckRun run(options.fresh, options.unwanted);
   if (!run.scratch.CopyFailure().empty()) {
-    WriteSummary("the installed state cannot be read (" + run.scratch.CopyFailure() +
-                 "): checked as after a boot");
+    Summarize("check", "the installed state cannot be read (" + run.scratch.CopyFailure() +
+                           "): checked as after a boot");
   }
   CheckPolicy(run, dir);
   run.diagnostics.Sort();
   kFormats.at(options.format)(run.diagnostics, std::cout);
-  std::cout.flush();
 
   const std::size_t errors = run.diagnostics.Count(Severity::kError);
   const std::size_t warnings = run.diagnostics.Count(Severity::kWarning);
-  WriteSummary(errors + warnings == 0
-                   ? "no problems"
-                   : CountOf(errors, "error") + ", " + CountOf(warnings, "warning"));
+  Summarize("check", errors + warnings == 0
+                         ? "no problems"
+                         : CountOf(errors, "error") + ", " + CountOf(warnings, "warning"));
   return errors > 0 || (options.warningsAreErrors && warnings > 0) ? kFailed : kWell;
 }
 
@@ -84,20 +80,16 @@ std::string CheckWarningName(const std::string& name) {
   return "there is no warning '" + name + "'";
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  const auto dir = AddPolicyDir(app, SecPolicy::kPolicyRoot);
-  app.add_flag("--fresh", options->fresh,
-               "Check as after a boot, whatever is installed on this host now");
-  app.add_option("--format", options->format, "How to write the problems: text, json or sarif")
-      ->check(CLI::IsMember({"text", "json", "sarif"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
-  app.add_flag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
-  app.add_option("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
-      ->check(CLI::Validator(CheckWarningName, ""))
-      ->type_name("CODE")
-      ->allow_extra_args(false);
+  const auto dir = AddPolicyDir(syntax, SecPolicy::kPolicyRoot);
+  syntax.AddFlag("--fresh", options->fresh,
+                 "Check as after a boot, whatever is installed on this host now");
+  syntax.AddFormat(options->format, "the problems", {"text", "json", "sarif"});
+  syntax.AddFlag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
+  syntax.AddList("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
+      .Check(CheckWarningName)
+      .NameValue("CODE");
   return [dir, options] { return Check(*dir, *options); };
 }
 

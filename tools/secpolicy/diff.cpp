@@ -1,9 +1,10 @@
-#include <CLI/App.hpp>
 #include <exception>
 #include <iostream>
 
+#include "command_line.h"
 #include "compare/policy_diff.h"
 #include "host/linux/system_log.h"
+#include "summary.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -12,21 +13,17 @@ namespace {
 struct Options {
   std::string before;
   std::string after;
-  std::string format = "text";
+  std::string format;
 };
-
-void WriteSummary(const std::string& text) {
-  std::cerr << "secpolicy: diff: " << text << std::endl;
-}
 
 ExitCode Compare(const Options& options) {
   LinuxHost::DropLog();
   Side before = ReadSide(options.before);
   Side after = ReadSide(options.after);
   if (before.labels.has_value() != after.labels.has_value()) {
-    WriteSummary(
-        "file labels and the transitions of tardisks are left out: a directory has the "
-        "labels only, and a state the transitions");
+    Summarize("diff",
+              "file labels and the transitions of tardisks are left out: a directory has the "
+              "labels only, and a state the transitions");
   }
   const PolicyDiff diff = Diff(std::move(before), std::move(after));
   if (options.format == "json") {
@@ -34,8 +31,7 @@ ExitCode Compare(const Options& options) {
   } else {
     WriteDiffText(diff, std::cout);
   }
-  std::cout.flush();
-  WriteSummary(diff.IsSame() ? "the same" : "different");
+  Summarize("diff", diff.IsSame() ? "the same" : "different");
   return diff.IsSame() ? kWell : kFailed;
 }
 
@@ -44,20 +40,17 @@ ExitCode CompareOrRefuse(const Options& options) {
   try {
     return Compare(options);
   } catch (const std::exception& failure) {
-    WriteSummary(failure.what());
+    Summarize("diff", failure.what());
     return kUsage;
   }
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  app.add_option("A", options->before, "A policy directory, 'installed', or a saved state")
-      ->required();
-  app.add_option("B", options->after, "What it is compared with; the same")->required();
-  app.add_option("--format", options->format, "How to write the differences: text or json")
-      ->check(CLI::IsMember({"text", "json"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
+  syntax.AddOption("A", options->before, "A policy directory, 'installed', or a saved state")
+      .Require();
+  syntax.AddOption("B", options->after, "What it is compared with; the same").Require();
+  syntax.AddFormat(options->format, "the differences", {"text", "json"});
   return [options] { return CompareOrRefuse(*options); };
 }
 

@@ -1,8 +1,8 @@
-#include <CLI/App.hpp>
 #include <charconv>
 #include <iostream>
 #include <list>
 
+#include "command_line.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
@@ -46,20 +46,17 @@ void WriteJson(const std::string& domainId) {
     std::erase_if(policy.domains,
                   [&](const InstalledDomain& domain) { return domain.id != std::stoul(domainId); });
   }
-  nlohmann::ordered_json json = {{"schema", "secpolicy.display/1"}};
-  json.update(ToJson(policy));
-  std::cout << DumpJson(json);
+  Json json = {{"schema", "secpolicy.display/1"}};
+  json.Add(ToJson(policy));
+  std::cout << json.Text();
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
-  const auto format = std::make_shared<std::string>("text");
-  app.add_option("DOMAIN_ID", *domain, "The number of one domain; all domains without it")
-      ->check(CLI::Validator(CheckDomainId, ""));
-  app.add_option("--format", *format, "How to write it: text or json")
-      ->check(CLI::IsMember({"text", "json"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
+  const auto format = std::make_shared<std::string>();
+  syntax.AddOption("DOMAIN_ID", *domain, "The number of one domain; all domains without it")
+      .Check(CheckDomainId);
+  syntax.AddFormat(*format, "it", {"text", "json"});
   return [domain, format] {
     const auto show = *format == "json" ? WriteJson : SecPolicy::DisplayPolicy;
     return CallLibrary(

@@ -1,8 +1,8 @@
-#include <CLI/App.hpp>
 #include <iostream>
 #include <memory>
 #include <string>
 
+#include "command_line.h"
 #include "graph/graphviz.h"
 #include "graph/policy_graph.h"
 #include "installed/installed_policy.h"
@@ -34,15 +34,12 @@ ExitCode Graph(const std::string& name, const std::string& format) {
   return kWell;
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
-  const auto format = std::make_shared<std::string>("dot");
-  app.add_option("--domain", *domain, "Draw only this domain, with all that it may reach")
-      ->type_name("DOMAIN");
-  app.add_option("--format", *format, "How to write the graph: dot or svg")
-      ->check(CLI::IsMember({"dot", "svg"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
+  const auto format = std::make_shared<std::string>();
+  syntax.AddOption("--domain", *domain, "Draw only this domain, with all that it may reach")
+      .NameValue("DOMAIN");
+  syntax.AddFormat(*format, "the graph", {"dot", "svg"});
   return [=] { return Ask("graph", [=] { return Graph(*domain, *format); }); };
 }
 

@@ -7,6 +7,7 @@
 #include "saved/saved_name.h"
 #include "saved/saved_state.h"
 #include "scratch/state_reader.h"
+#include "summary.h"
 #include "text/count.h"
 #include "text/utc_time.h"
 #include "verb.h"
@@ -39,14 +40,11 @@ ExitCode ShowHistory() {
     std::cout << std::left << std::setw(static_cast<int>(width)) << state.name << "  "
               << UtcTime(state.time) << "  " << DescribeSaved(state.name, allUsable) << '\n';
   }
-  std::cout.flush();
-  std::cerr << "secpolicy: history: "
-            << (states.empty() ? "nothing is saved" : CountOf(states.size(), "saved state"))
-            << std::endl;
+  Summarize("history", states.empty() ? "nothing is saved" : CountOf(states.size(), "saved state"));
   return allUsable ? kWell : kFailed;
 }
 
-Action Define(CLI::App&) {
+Action Define(Syntax&) {
   return [] { return RunOrRefuse("history", ShowHistory); };
 }
 

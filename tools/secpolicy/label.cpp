@@ -1,10 +1,10 @@
 #include <unistd.h>
 
-#include <CLI/App.hpp>
 #include <cerrno>
 #include <string>
 #include <vector>
 
+#include "command_line.h"
 #include "label/label_actions.h"
 #include "library_call.h"
 #include "root.h"
@@ -26,29 +26,29 @@ struct Arguments {
 };
 
 // One thing to do with labels.
-struct Kind {
+struct LabelKind {
   const char* name;
   const char* summary;
   const char* help;
-  void (*addArguments)(CLI::App& app, Arguments& arguments);
+  void (*addArguments)(Syntax& syntax, Arguments& arguments);
   std::string (*run)(LabelRun& run, const Arguments& arguments);
 };
 
-void AddPaths(CLI::App& app, Arguments& arguments, const char* meaning, bool required) {
-  app.add_option("PATH", arguments.paths, meaning)->required(required);
+void AddPaths(Syntax& syntax, Arguments& arguments, const char* meaning, bool required) {
+  syntax.AddList("PATH", arguments.paths, meaning).Require(required);
 }
 
-void AddWholeTrees(CLI::App& app, Arguments& arguments) {
-  app.add_flag("-R,--recursive", arguments.wholeTrees, "Everything below the directories too");
+void AddWholeTrees(Syntax& syntax, Arguments& arguments) {
+  syntax.AddFlag("-R,--recursive", arguments.wholeTrees, "Everything below the directories too");
 }
 
-void AddPolicy(CLI::App& app, Arguments& arguments) {
-  app.add_option("--policy", arguments.policy, "The policy directory, as seen from the root")
-      ->type_name("DIR")
-      ->capture_default_str();
+void AddPolicy(Syntax& syntax, Arguments& arguments) {
+  syntax.AddOption("--policy", arguments.policy, "The policy directory, as seen from the root")
+      .NameValue("DIR")
+      .ShowDefault();
 }
 
-constexpr Kind kKinds[] = {
+constexpr LabelKind kLabelKinds[] = {
     {"get", "Print the labels of files",
      "Prints 'PATH: LABEL' for each file. In a tree, links and sockets are left out: they carry "
      "no\n"
@@ -57,9 +57,9 @@ constexpr Kind kKinds[] = {
      "Examples:\n"
      "  secpolicy label get /usr/sbin/sshd\n"
      "  secpolicy label get -R /etc | grep -v ': unlabeled$'",
-     [](CLI::App& app, Arguments& arguments) {
-       AddWholeTrees(app, arguments);
-       AddPaths(app, arguments, "The files", true);
+     [](Syntax& syntax, Arguments& arguments) {
+       AddWholeTrees(syntax, arguments);
+       AddPaths(syntax, arguments, "The files", true);
      },
      [](LabelRun& run, const Arguments& arguments) {
        return ShowLabels(run, arguments.paths, arguments.wholeTrees);
@@ -73,10 +73,10 @@ constexpr Kind kKinds[] = {
      "Examples:\n"
      "  secpolicy label set sshKey /etc/ssh/new_key\n"
      "  secpolicy label set -R ioFilterData /var/cache/io-filters",
-     [](CLI::App& app, Arguments& arguments) {
-       AddWholeTrees(app, arguments);
-       app.add_option("LABEL", arguments.label, "The object label")->required();
-       AddPaths(app, arguments, "The files", true);
+     [](Syntax& syntax, Arguments& arguments) {
+       AddWholeTrees(syntax, arguments);
+       syntax.AddOption("LABEL", arguments.label, "The object label").Require();
+       AddPaths(syntax, arguments, "The files", true);
      },
      [](LabelRun& run, const Arguments& arguments) {
        return GiveLabel(run, arguments.label, arguments.paths, arguments.wholeTrees);
@@ -89,9 +89,9 @@ constexpr Kind kKinds[] = {
      "Examples:\n"
      "  secpolicy label verify                    all files that the policy names\n"
      "  secpolicy label verify /etc /usr/sbin     those that are there",
-     [](CLI::App& app, Arguments& arguments) {
-       AddPolicy(app, arguments);
-       AddPaths(app, arguments, "Only what is at or below one of these", false);
+     [](Syntax& syntax, Arguments& arguments) {
+       AddPolicy(syntax, arguments);
+       AddPaths(syntax, arguments, "Only what is at or below one of these", false);
      },
      [](LabelRun& run, const Arguments& arguments) {
        return VerifyLabels(run, arguments.LabelDir(), arguments.paths);
@@ -105,18 +105,18 @@ constexpr Kind kKinds[] = {
      "  secpolicy label relabel --dry-run         print what would change, and change nothing\n"
      "  secpolicy label relabel\n"
      "  secpolicy label relabel /var              only what is at or below /var",
-     [](CLI::App& app, Arguments& arguments) {
-       AddPolicy(app, arguments);
-       app.add_flag("-n,--dry-run", arguments.dryRun,
-                    "Print what would change, and change nothing");
-       AddPaths(app, arguments, "Only what is at or below one of these", false);
+     [](Syntax& syntax, Arguments& arguments) {
+       AddPolicy(syntax, arguments);
+       syntax.AddFlag("-n,--dry-run", arguments.dryRun,
+                      "Print what would change, and change nothing");
+       AddPaths(syntax, arguments, "Only what is at or below one of these", false);
      },
      [](LabelRun& run, const Arguments& arguments) {
        return Relabel(run, arguments.LabelDir(), arguments.paths, arguments.dryRun);
      }},
 };
 
-ExitCode Run(const Kind& kind, const Arguments& arguments) {
+ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   const std::string verb = std::string("label ") + kind.name;
   if (access(StatePath().c_str(), F_OK) != 0 && errno == ENOENT) {
     return Refuse(verb,
@@ -133,18 +133,19 @@ ExitCode Run(const Kind& kind, const Arguments& arguments) {
       AdviseOnPrivilege, [&] { return ending; });
 }
 
-Action Define(CLI::App& app) {
-  app.require_subcommand(1);
+Action DefineKind(const LabelKind& kind, Syntax& syntax) {
   const auto arguments = std::make_shared<Arguments>();
-  const auto action = std::make_shared<Action>();
-  for (const Kind& kind : kKinds) {
-    CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
-    subcommand->footer(kind.help);
-    kind.addArguments(*subcommand, *arguments);
-    subcommand->parse_complete_callback(
-        [=, &kind] { *action = [=, &kind] { return Run(kind, *arguments); }; });
+  kind.addArguments(syntax, *arguments);
+  return [=, &kind] { return Run(kind, *arguments); };
+}
+
+Action Define(Syntax& syntax) {
+  std::vector<Kind> kinds;
+  for (const LabelKind& kind : kLabelKinds) {
+    kinds.push_back({kind.name, kind.summary, kind.help,
+                     [&kind](Syntax& arguments) { return DefineKind(kind, arguments); }});
   }
-  return [action] { return (*action)(); };
+  return syntax.AddKinds(kinds);
 }
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include "host/linux/label_rehearsal.h"
 #include "load_record.h"
 #include "load_summary.h"
+#include "summary.h"
 #include "text/count.h"
 
 namespace SecPolicyCli {
@@ -39,10 +40,6 @@ struct RunningCall {
 };
 
 RunningCall* runningCall = nullptr;
-
-void WriteSummary(const std::string& verb, const std::string& text) {
-  std::cerr << "secpolicy: " << verb << ": " << text << std::endl;
-}
 
 // A call without a policy directory is no load.
 void Record(const RunningCall& call, const std::string& ending,
@@ -77,8 +74,7 @@ std::string Describe(const std::string& verb, const std::function<std::string()>
   try {
     return ending();
   } catch (const std::exception& failure) {
-    std::cerr << "secpolicy: " << verb
-              << ": what is installed cannot be counted: " << failure.what() << std::endl;
+    Summarize(verb, std::string("what is installed cannot be counted: ") + failure.what());
     return "done";
   }
 }
@@ -88,11 +84,11 @@ std::string Describe(const std::string& verb, const std::function<std::string()>
   std::cout.flush();
   Record(running, "stopped", running.errors->Messages());
   Attempt([&] { WriteErrorsByFile(running); });
-  std::cerr << "secpolicy: " << running.verb << ": "
-            << "stopped: there is no domain " << missing
-            << ", so the load ended before tardisks and file labels. Put a policy file named "
-            << missing << " into " << running.policyDir << "/domains and run it again."
-            << std::endl;
+  const std::string name(missing);
+  Summarize(running.verb,
+            "stopped: there is no domain " + name +
+                ", so the load ended before tardisks and file labels. Put a policy file named " +
+                name + " into " + running.policyDir + "/domains and run it again.");
   _exit(kStopped);
 }
 
@@ -144,7 +140,7 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   std::cout.flush();
   if (failure.empty() && errors.Count() == 0) {
     Record(running, "done", {});
-    WriteSummary(verb, Describe(verb, ending));
+    Summarize(verb, Describe(verb, ending));
     return kWell;
   }
   Record(running, "failed",
@@ -154,14 +150,14 @@ ExitCode CallLibrary(const std::string& verb, const std::string& policyDir,
   std::string summary = failure.empty() ? "failed" : failure;
   if (errors.Count() > 0) summary += " (" + CountOf(errors.Count(), "error") + " above)";
   const std::string next = advice();
-  WriteSummary(verb, next.empty() ? summary : summary + ". " + next);
+  Summarize(verb, next.empty() ? summary : summary + ". " + next);
   return kFailed;
 }
 
 void EndEarlyLoad() { runningCall->earlyErrors = runningCall->errors->Count(); }
 
 ExitCode Refuse(const std::string& verb, const std::string& why) {
-  WriteSummary(verb, why);
+  Summarize(verb, why);
   return kFailed;
 }
 

@@ -1,5 +1,4 @@
-#include <CLI/App.hpp>
-
+#include "command_line.h"
 #include "policy_dir.h"
 #include "rehearsal/planned_load.h"
 #include "rehearsal/whole_load.h"
@@ -23,26 +22,22 @@ ExitCode Load(const std::string& dir, const Options& options) {
   return LoadFrom("load", dir, SecPolicy::LoadPolicy, options.timing);
 }
 
-Action Define(CLI::App& app) {
-  const auto dir = AddPolicyDir(app, SecPolicy::kPolicyRoot);
+Action Define(Syntax& syntax) {
+  const auto dir = AddPolicyDir(syntax, SecPolicy::kPolicyRoot);
   const auto options = std::make_shared<Options>();
-  CLI::Option* const plan = app.add_flag(
-      "--plan", options->plan, "Only show what the load would change; -v shows every file");
-  app.add_option("--format", options->planOptions.format, "How to write the plan: text or json")
-      ->check(CLI::IsMember({"text", "json"}))
-      ->needs(plan)
-      ->type_name("FORMAT")
-      ->capture_default_str();
-  app.add_flag(
-         "--all-or-nothing", options->allOrNothing,
-         "Load only when a rehearsal ends well, and put everything back when the load does not")
-      ->excludes(plan);
-  const auto timing = AddTiming(app);
-  app.get_option("--timing")->excludes(plan)->excludes("--all-or-nothing");
-  const CLI::Option* const verbose = app.get_parent()->get_option("--verbose");
+  const Option plan = syntax.AddFlag("--plan", options->plan,
+                                     "Only show what the load would change; -v shows every file");
+  syntax.AddFormat(options->planOptions.format, "the plan", {"text", "json"}).Need(plan);
+  const Option allOrNothing =
+      syntax
+          .AddFlag("--all-or-nothing", options->allOrNothing,
+                   "Load only when a rehearsal ends well, and put everything back when the load "
+                   "does not")
+          .Exclude(plan);
+  AddTiming(syntax, options->timing).Exclude(plan).Exclude(allOrNothing);
+  const Option verbose = syntax.Verbose();
   return [=] {
-    options->timing = *timing;
-    options->planOptions.showAll = verbose->count() > 0;
+    options->planOptions.showAll = verbose.IsGiven();
     return Load(*dir, *options);
   };
 }

@@ -6,9 +6,10 @@
 namespace SecPolicyCli {
 namespace {
 
-Action Define(CLI::App& app) {
-  const auto dir = AddPolicyDir(app, SecPolicy::kEarlyPolicyRoot);
-  const auto timing = AddTiming(app);
+Action Define(Syntax& syntax) {
+  const auto dir = AddPolicyDir(syntax, SecPolicy::kEarlyPolicyRoot);
+  const auto timing = std::make_shared<bool>(false);
+  AddTiming(syntax, *timing);
   return [=] { return LoadFrom("load-early", *dir, SecPolicy::LoadPolicyEarly, *timing); };
 }
 

@@ -1,7 +1,5 @@
 #include "policy_dir.h"
 
-#include <CLI/App.hpp>
-
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "load_summary.h"
@@ -10,16 +8,15 @@
 
 namespace SecPolicyCli {
 
-std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string& preset) {
+std::shared_ptr<const std::string> AddPolicyDir(Syntax& syntax, const std::string& preset) {
   const auto dir = std::make_shared<std::string>(preset);
-  app.add_option("DIR", *dir, "The policy directory, as seen from the root")->capture_default_str();
+  syntax.AddOption("DIR", *dir, "The policy directory, as seen from the root").ShowDefault();
   return dir;
 }
 
-std::shared_ptr<const bool> AddTiming(CLI::App& app) {
-  const auto timing = std::make_shared<bool>(false);
-  app.add_flag("--timing", *timing, "Print the time that each phase took to standard output");
-  return timing;
+Option AddTiming(Syntax& syntax, bool& timing) {
+  return syntax.AddFlag("--timing", timing,
+                        "Print the time that each phase took to standard output");
 }
 
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir) {

@@ -4,15 +4,16 @@
 #include <optional>
 #include <string>
 
-#include "verb.h"
+#include "command_line.h"
 
 namespace SecPolicyCli {
 
-// Adds the argument DIR, a policy directory, to `app`; its value is `preset` when it is not given.
-std::shared_ptr<const std::string> AddPolicyDir(CLI::App& app, const std::string& preset);
+// Adds the argument DIR, a policy directory, to `syntax`; its value is `preset` when it is not
+// given.
+std::shared_ptr<const std::string> AddPolicyDir(Syntax& syntax, const std::string& preset);
 
-// Adds the flag --timing to `app`.
-std::shared_ptr<const bool> AddTiming(CLI::App& app);
+// Adds the flag --timing to `syntax`.
+Option AddTiming(Syntax& syntax, bool& timing);
 
 // Refuses a policy directory that is not there; nothing for one that is.
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);

@@ -6,7 +6,7 @@
 namespace SecPolicyCli {
 namespace {
 
-Action Define(CLI::App&) {
+Action Define(Syntax&) {
   return [] {
     return CallLibrary(
         "restore", "", [] { SecPolicy::RestoreDomainEnforcement(); }, AdviseOnPrivilege);

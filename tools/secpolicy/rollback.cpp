@@ -1,4 +1,3 @@
-#include <CLI/App.hpp>
 #include <stdexcept>
 
 #include "host/linux/saved_policy.h"
@@ -42,8 +41,8 @@ ExitCode RollBack(const std::string& name) {
       });
 }
 
-Action Define(CLI::App& app) {
-  const auto name = AddSavedName(app, "The saved state to put back");
+Action Define(Syntax& syntax) {
+  const auto name = AddSavedName(syntax, "The saved state to put back");
   return [name] { return RunOrRefuse("rollback", [&] { return RollBack(*name); }); };
 }
 

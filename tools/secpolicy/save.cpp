@@ -1,6 +1,6 @@
-#include <CLI/App.hpp>
 #include <memory>
 
+#include "command_line.h"
 #include "host/linux/saved_policy.h"
 #include "library_call.h"
 #include "root.h"
@@ -23,10 +23,10 @@ ExitCode Save(const std::string& name, bool force) {
       AdviseOnPrivilege);
 }
 
-Action Define(CLI::App& app) {
-  const auto name = AddSavedName(app, "The name to save it under");
+Action Define(Syntax& syntax) {
+  const auto name = AddSavedName(syntax, "The name to save it under");
   const auto force = std::make_shared<bool>(false);
-  app.add_flag("--force", *force, "Replace a saved state of this name");
+  syntax.AddFlag("--force", *force, "Replace a saved state of this name");
   return [name, force] { return RunOrRefuse("save", [&] { return Save(*name, *force); }); };
 }
 

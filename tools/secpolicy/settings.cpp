@@ -1,10 +1,9 @@
 #include "host/linux/settings.h"
 
-#include <CLI/App.hpp>
-#include <functional>
 #include <iostream>
 #include <variant>
 
+#include "command_line.h"
 #include "library_call.h"
 #include "root.h"
 #include "verb.h"
@@ -12,8 +11,8 @@
 namespace SecPolicyCli {
 namespace {
 
-// One kind of setting: what names it, and how the host reads and stores it as text.
-struct Kind {
+// A kind of setting: what names it, and how the host reads and stores it as text.
+struct Setting {
   const char* name;
   const char* summary;
   const char* key;
@@ -35,7 +34,7 @@ void StoreOption(const std::string& path, const std::string& value) {
   LinuxHost::StoreWantedOption(path, LinuxHost::ParseOptionValue(value));
 }
 
-constexpr Kind kKinds[] = {
+constexpr Setting kSettingKinds[] = {
     {"option", "An advanced option of the host", "PATH",
      "The option, such as /UserVars/CheckAccessTemplateEnabled", "VALUE",
      "What to store: a whole number, or any other text", FindOption, StoreOption},
@@ -44,38 +43,39 @@ constexpr Kind kKinds[] = {
      LinuxHost::StoreWantedEnforcement},
 };
 
-ExitCode Show(const Kind& kind, const std::string& key) {
-  const auto value = kind.find(key);
+ExitCode Show(const Setting& setting, const std::string& key) {
+  const auto value = setting.find(key);
   if (!value) {
-    return Refuse("settings", std::string("nothing is stored for ") + kind.name + " " + key +
-                                  ". Store something with 'secpolicy settings " + kind.name + " " +
-                                  key + " " + kind.value + "'.");
+    return Refuse("settings", std::string("nothing is stored for ") + setting.name + " " + key +
+                                  ". Store something with 'secpolicy settings " + setting.name +
+                                  " " + key + " " + setting.value + "'.");
   }
   return CallLibrary(
       "settings", "", [&] { std::cout << *value << std::endl; }, AdviseOnPrivilege);
 }
 
-ExitCode Store(const Kind& kind, const std::string& key, const std::string& value) {
+ExitCode Store(const Setting& setting, const std::string& key, const std::string& value) {
   return CallLibrary(
-      "settings", "", [&] { kind.store(key, value); }, AdviseOnPrivilege);
+      "settings", "", [&] { setting.store(key, value); }, AdviseOnPrivilege);
 }
 
-Action Define(CLI::App& app) {
-  app.require_subcommand(1);
+Action DefineSetting(const Setting& setting, Syntax& syntax) {
   const auto key = std::make_shared<std::string>();
   const auto value = std::make_shared<std::string>();
-  const auto action = std::make_shared<Action>();
-  for (const Kind& kind : kKinds) {
-    CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
-    subcommand->add_option(kind.key, *key, kind.keyMeaning)->required();
-    const CLI::Option* const stored = subcommand->add_option(kind.value, *value, kind.valueMeaning);
-    subcommand->parse_complete_callback([=, &kind] {
-      *action = [=, &kind] {
-        return stored->count() == 0 ? Show(kind, *key) : Store(kind, *key, *value);
-      };
-    });
+  syntax.AddOption(setting.key, *key, setting.keyMeaning).Require();
+  const Option stored = syntax.AddOption(setting.value, *value, setting.valueMeaning);
+  return [=, &setting] {
+    return stored.IsGiven() ? Store(setting, *key, *value) : Show(setting, *key);
+  };
+}
+
+Action Define(Syntax& syntax) {
+  std::vector<Kind> kinds;
+  for (const Setting& setting : kSettingKinds) {
+    kinds.push_back({setting.name, setting.summary, nullptr,
+                     [&setting](Syntax& kind) { return DefineSetting(setting, kind); }});
   }
-  return [action] { return (*action)(); };
+  return syntax.AddKinds(kinds);
 }
 
 }  // namespace

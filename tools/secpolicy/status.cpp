@@ -1,4 +1,3 @@
-#include <CLI/App.hpp>
 #include <algorithm>
 #include <array>
 #include <iomanip>
@@ -8,11 +7,13 @@
 #include <string>
 #include <vector>
 
+#include "command_line.h"
 #include "host/linux/load_record.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "installed/rule_words.h"
 #include "scratch/scratch_state.h"
+#include "summary.h"
 #include "text/count.h"
 #include "text/utc_time.h"
 #include "text/visible.h"
@@ -20,8 +21,6 @@
 
 namespace SecPolicyCli {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 struct RuleKind {
   const char* keyword;
@@ -133,50 +132,47 @@ Json ToJson(const LinuxHost::LoadRecord& load) {
 }
 
 void WriteJson(const Status& status) {
-  Json levels = Json::object();
-  for (const char* const level : kLevels) levels[level] = Json::array();
+  Json levels = Json::Object();
+  for (const char* const level : kLevels) levels[level] = Json::Array();
   for (const auto& [level, names] : status.domainsByLevel) levels[level] = names;
-  Json rules = Json::object();
+  Json rules = Json::Object();
   for (const RuleKind& kind : kRuleKinds) rules[kind.keyword] = 0;
   for (const auto& [keyword, count] : status.rulesByKeyword) rules[keyword] = count;
   Json load;
   if (status.load) load = ToJson(*status.load);
-  std::cout << DumpJson({{"schema", "secpolicy.status/1"},
-                         {"loaded", status.IsLoaded()},
-                         {"latestLoad", load},
-                         {"domains", status.policy.domains.size()},
-                         {"domainsByLevel", levels},
-                         {"objects", status.policy.objects.size()},
-                         {"rules", status.ruleCount},
-                         {"rulesByKeyword", rules},
-                         {"tardisks", ToJson(status.policy)["tardisks"]}});
+  const Json screen = {{"schema", "secpolicy.status/1"},
+                       {"loaded", status.IsLoaded()},
+                       {"latestLoad", load},
+                       {"domains", status.policy.domains.size()},
+                       {"domainsByLevel", levels},
+                       {"objects", status.policy.objects.size()},
+                       {"rules", status.ruleCount},
+                       {"rulesByKeyword", rules},
+                       {"tardisks", ToJson(status.policy.tardisks)}};
+  std::cout << screen.Text();
 }
 
-ExitCode Summarize(const Status& status) {
+ExitCode EndWith(const Status& status) {
   const bool problems = status.HasProblems();
   std::string text = "the policy is loaded";
   if (!status.IsLoaded()) text = "no policy is loaded. 'secpolicy load' loads one";
   if (problems) {
     text = "the latest load did not end well. 'secpolicy check' shows every problem of the files";
   }
-  std::cout.flush();
-  std::cerr << "secpolicy: status: " << text << std::endl;
+  Summarize("status", text);
   return problems || !status.IsLoaded() ? kFailed : kWell;
 }
 
-Action Define(CLI::App& app) {
-  const auto format = std::make_shared<std::string>("text");
-  app.add_option("--format", *format, "How to write it: text or json")
-      ->check(CLI::IsMember({"text", "json"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
+Action Define(Syntax& syntax) {
+  const auto format = std::make_shared<std::string>();
+  syntax.AddFormat(*format, "it", {"text", "json"});
   return [format] {
     // The host would make a state of its own.
     std::optional<ScratchState> scratch;
     if (IsStateMissing()) scratch.emplace(true);
     const Status status = ReadStatus();
     (*format == "json" ? WriteJson : WriteText)(status);
-    return Summarize(status);
+    return EndWith(status);
   };
 }
 

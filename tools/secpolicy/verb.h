@@ -2,11 +2,9 @@
 
 #include <functional>
 
-namespace CLI {
-class App;
-}
-
 namespace SecPolicyCli {
+
+class Syntax;
 
 enum ExitCode : int {
   kWell = 0,
@@ -24,8 +22,9 @@ struct Verb {
   const char* summary;  // one line of the list of verbs
   const char* help;     // what a user has to know, with an example
 
-  // Adds the verb's arguments to `app` and returns its action, which keeps their values.
-  Action (*define)(CLI::App& app);
+  // Adds what may stand behind the verb to `syntax` and returns the verb's action, which keeps the
+  // values.
+  Action (*define)(Syntax& syntax);
 
   // What has to be done before the root is entered, if anything; may throw as an action may.
   void (*prepare)() = nullptr;

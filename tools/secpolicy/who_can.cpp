@@ -1,22 +1,21 @@
-#include <CLI/App.hpp>
 #include <iostream>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "command_line.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "query/answer.h"
 #include "query/ask.h"
 #include "query/decision.h"
 #include "query/question.h"
+#include "summary.h"
 #include "text/count.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 // A domain that may.
 struct Found {
@@ -38,11 +37,12 @@ void WriteText(const std::vector<Found>& found) {
 }
 
 void WriteJson(const Question& question, const std::vector<Found>& found) {
-  Json domains = Json::array();
-  for (const auto& [domain, decision] : found) domains.push_back(AnswerToJson(domain, decision));
-  std::cout << DumpJson({{"schema", "secpolicy.who-can/1"},
-                         {"question", QuestionToJson(question)},
-                         {"domains", domains}});
+  Json domains = Json::Array();
+  for (const auto& [domain, decision] : found) domains.Append(AnswerToJson(domain, decision));
+  const Json answer = {{"schema", "secpolicy.who-can/1"},
+                       {"question", QuestionToJson(question)},
+                       {"domains", domains}};
+  std::cout << answer.Text();
 }
 
 ExitCode Answer(const std::vector<std::string>& words, const std::string& format) {
@@ -55,16 +55,14 @@ ExitCode Answer(const std::vector<std::string>& words, const std::string& format
   } else {
     WriteText(found);
   }
-  std::cout.flush();
-  std::cerr << "secpolicy: who-can: " << CountOf(found.size(), "domain") << " may "
-            << question.Text() << std::endl;
+  Summarize("who-can", CountOf(found.size(), "domain") + " may " + question.Text());
   return found.empty() ? kFailed : kWell;
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto words = std::make_shared<std::vector<std::string>>();
-  app.add_option("WHAT", *words, "What is done, as for 'secpolicy why'")->required();
-  const auto format = AddAnswerFormat(app);
+  syntax.AddList("WHAT", *words, "What is done, as for 'secpolicy why'").Require();
+  const auto format = AddAnswerFormat(syntax);
   return [=] { return Ask("who-can", [=] { return Answer(*words, *format); }); };
 }
 

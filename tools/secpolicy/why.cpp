@@ -1,9 +1,9 @@
-#include <CLI/App.hpp>
 #include <iostream>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "command_line.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "query/answer.h"
@@ -23,22 +23,21 @@ ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
   const Question question = ReadQuestion(words, policy, access);
   const Decision decision = Decide(question, domain, policy);
   if (format == "json") {
-    nlohmann::ordered_json json = {{"schema", "secpolicy.why/1"},
-                                   {"question", QuestionToJson(question)}};
-    json.update(AnswerToJson(domain, decision));
-    std::cout << DumpJson(json);
+    Json json = {{"schema", "secpolicy.why/1"}, {"question", QuestionToJson(question)}};
+    json.Add(AnswerToJson(domain, decision));
+    std::cout << json.Text();
   } else {
     WriteAnswer(question, domain, decision, std::cout);
   }
   return decision.IsAllowed() ? kWell : kFailed;
 }
 
-Action Define(CLI::App& app) {
+Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
   const auto words = std::make_shared<std::vector<std::string>>();
-  app.add_option("DOMAIN", *domain, "The domain that is asked about")->required();
-  app.add_option("WHAT", *words, "What it does, see below")->required();
-  const auto format = AddAnswerFormat(app);
+  syntax.AddOption("DOMAIN", *domain, "The domain that is asked about").Require();
+  syntax.AddList("WHAT", *words, "What it does, see below").Require();
+  const auto format = AddAnswerFormat(syntax);
   return [=] { return Ask("why", [=] { return Answer(*domain, *words, *format); }); };
 }
 

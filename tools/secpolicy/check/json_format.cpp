@@ -1,12 +1,8 @@
-#include <nlohmann/json.hpp>
-
-#include "installed/installed_json.h"
+#include "json.h"
 #include "report_format.h"
 
 namespace SecPolicyCli {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 Json ToJson(const Diagnostic& diagnostic) {
   Json json = {{"file", diagnostic.file}};
@@ -26,14 +22,13 @@ Json ToJson(const Diagnostic& diagnostic) {
 }  // namespace
 
 void WriteJson(const DiagnosticList& diagnostics, std::ostream& output) {
-  Json problems = Json::array();
-  for (const Diagnostic& diagnostic : diagnostics.All()) problems.push_back(ToJson(diagnostic));
+  Json problems = Json::Array();
+  for (const Diagnostic& diagnostic : diagnostics.All()) problems.Append(ToJson(diagnostic));
   const Json report = {{"schema", "secpolicy.check/1"},
                        {"errors", diagnostics.Count(Severity::kError)},
                        {"warnings", diagnostics.Count(Severity::kWarning)},
                        {"problems", problems}};
-  // Bytes of a policy file that are no text are replaced, not refused.
-  output << DumpJson(report);
+  output << report.Text();
 }
 
 }  // namespace SecPolicyCli

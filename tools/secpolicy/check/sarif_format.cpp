@@ -1,14 +1,11 @@
 #include <algorithm>
-#include <nlohmann/json.hpp>
 #include <string_view>
 
-#include "installed/installed_json.h"
+#include "json.h"
 #include "report_format.h"
 
 namespace SecPolicyCli {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 // The form of identifiers of the OASIS standard, by which readers know it.
 constexpr char kSchema[] =
@@ -37,12 +34,18 @@ std::string ToUri(const std::string& path) {
   return uri;
 }
 
+Json OneOf(Json element) {
+  Json list = Json::Array();
+  list.Append(std::move(element));
+  return list;
+}
+
 Json Rules() {
-  Json rules = Json::array();
+  Json rules = Json::Array();
   for (const Code* code : AllCodes()) {
-    rules.push_back({{"id", code->name},
-                     {"shortDescription", {{"text", code->summary}}},
-                     {"defaultConfiguration", {{"level", SeverityName(code->severity)}}}});
+    rules.Append({{"id", code->name},
+                  {"shortDescription", {{"text", code->summary}}},
+                  {"defaultConfiguration", {{"level", SeverityName(code->severity)}}}});
   }
   return rules;
 }
@@ -67,19 +70,19 @@ Json Result(const Diagnostic& diagnostic) {
           {"ruleIndex", std::find(codes.begin(), codes.end(), diagnostic.code) - codes.begin()},
           {"level", SeverityName(diagnostic.code->severity)},
           {"message", {{"text", text}}},
-          {"locations", Json::array({Location(diagnostic)})}};
+          {"locations", OneOf(Location(diagnostic))}};
 }
 
 }  // namespace
 
 void WriteSarif(const DiagnosticList& diagnostics, std::ostream& output) {
-  Json results = Json::array();
-  for (const Diagnostic& diagnostic : diagnostics.All()) results.push_back(Result(diagnostic));
+  Json results = Json::Array();
+  for (const Diagnostic& diagnostic : diagnostics.All()) results.Append(Result(diagnostic));
   const Json driver = {{"name", "secpolicy"}, {"version", SECPOLICY_VERSION}, {"rules", Rules()}};
   const Json run = {
       {"tool", {{"driver", driver}}}, {"columnKind", "unicodeCodePoints"}, {"results", results}};
-  const Json log = {{"$schema", kSchema}, {"version", kSarifVersion}, {"runs", Json::array({run})}};
-  output << DumpJson(log);
+  const Json log = {{"$schema", kSchema}, {"version", kSarifVersion}, {"runs", OneOf(run)}};
+  output << log.Text();
 }
 
 }  // namespace SecPolicyCli

@@ -1,20 +1,16 @@
-#include <nlohmann/json.hpp>
-
-#include "installed/installed_json.h"
+#include "json.h"
 #include "policy_diff.h"
 
 namespace SecPolicyCli {
 namespace {
 
-using Json = nlohmann::ordered_json;
-
 // Null where there is nothing on that side.
 Json TextOrNull(const std::string& text) { return text.empty() ? Json() : Json(text); }
 
 Json ToJson(const DomainDifference& domain) {
-  Json changed = Json::array();
+  Json changed = Json::Array();
   for (const auto& [before, after] : domain.changed) {
-    changed.push_back({{"before", before}, {"after", after}});
+    changed.Append({{"before", before}, {"after", after}});
   }
   return {{"name", domain.name},
           {"level",
@@ -23,9 +19,9 @@ Json ToJson(const DomainDifference& domain) {
 }
 
 Json ToJson(const std::vector<LabelDifference>& labels) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const auto& [path, before, after] : labels) {
-    list.push_back({{"path", path}, {"before", TextOrNull(before)}, {"after", TextOrNull(after)}});
+    list.Append({{"path", path}, {"before", TextOrNull(before)}, {"after", TextOrNull(after)}});
   }
   return list;
 }
@@ -33,8 +29,8 @@ Json ToJson(const std::vector<LabelDifference>& labels) {
 }  // namespace
 
 void WriteDiffJson(const PolicyDiff& diff, std::ostream& output) {
-  Json domains = Json::array();
-  for (const DomainDifference& domain : diff.difference.domains) domains.push_back(ToJson(domain));
+  Json domains = Json::Array();
+  for (const DomainDifference& domain : diff.difference.domains) domains.Append(ToJson(domain));
   const Json document = {
       {"schema", "secpolicy.diff/1"},
       {"before", diff.before},
@@ -45,8 +41,7 @@ void WriteDiffJson(const PolicyDiff& diff, std::ostream& output) {
        {{"removed", diff.difference.objectsRemoved}, {"added", diff.difference.objectsAdded}}},
       {"labels", diff.labels ? ToJson(*diff.labels) : Json()},
   };
-  // A path need not be text.
-  output << DumpJson(document);
+  output << document.Text();
 }
 
 }  // namespace SecPolicyCli

@@ -4,8 +4,6 @@
 
 namespace SecPolicyCli {
 
-using Json = nlohmann::ordered_json;
-
 Json ToJson(const InstalledRule& rule) {
   const RuleWords words = SplitRule(rule.text);
   Json json = {{"text", rule.text}, {"keyword", words.keyword}, {"words", words.words}};
@@ -18,8 +16,8 @@ Json ToJson(const InstalledRule& rule) {
 }
 
 Json ToJson(const InstalledDomain& domain) {
-  Json rules = Json::array();
-  for (const InstalledRule& rule : domain.rules) rules.push_back(ToJson(rule));
+  Json rules = Json::Array();
+  for (const InstalledRule& rule : domain.rules) rules.Append(ToJson(rule));
   return {{"name", domain.name},
           {"id", domain.id},
           {"level", domain.level},
@@ -30,22 +28,22 @@ Json ToJson(const InstalledDomain& domain) {
           {"rules", rules}};
 }
 
-Json ToJson(const InstalledPolicy& policy) {
-  Json domains = Json::array();
-  for (const InstalledDomain& domain : policy.domains) domains.push_back(ToJson(domain));
-  Json objects = Json::array();
-  for (const auto& [name, id] : policy.objects) objects.push_back({{"name", name}, {"id", id}});
-  Json tardisks = Json::array();
-  for (const InstalledTardisk& tardisk : policy.tardisks) {
+Json ToJson(const std::vector<InstalledTardisk>& tardisks) {
+  Json list = Json::Array();
+  for (const InstalledTardisk& tardisk : tardisks) {
     Json label;
     if (!tardisk.label.empty()) label = tardisk.label;
-    tardisks.push_back({{"path", tardisk.path}, {"label", label}});
+    list.Append({{"path", tardisk.path}, {"label", label}});
   }
-  return {{"domains", domains}, {"objects", objects}, {"tardisks", tardisks}};
+  return list;
 }
 
-std::string DumpJson(const Json& json) {
-  return json.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+Json ToJson(const InstalledPolicy& policy) {
+  Json domains = Json::Array();
+  for (const InstalledDomain& domain : policy.domains) domains.Append(ToJson(domain));
+  Json objects = Json::Array();
+  for (const auto& [name, id] : policy.objects) objects.Append({{"name", name}, {"id", id}});
+  return {{"domains", domains}, {"objects", objects}, {"tardisks", ToJson(policy.tardisks)}};
 }
 
 }  // namespace SecPolicyCli

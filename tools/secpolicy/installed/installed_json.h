@@ -1,18 +1,17 @@
 #pragma once
 
-#include <nlohmann/json.hpp>
-#include <string>
+#include <vector>
 
 #include "installed_policy.h"
+#include "json.h"
 
 namespace SecPolicyCli {
 
-// What docs/json.md calls a rule, a domain and a policy; of the policy without its schema.
-nlohmann::ordered_json ToJson(const InstalledRule& rule);
-nlohmann::ordered_json ToJson(const InstalledDomain& domain);
-nlohmann::ordered_json ToJson(const InstalledPolicy& policy);
-
-// The text of a JSON document. Bytes that are no UTF-8 are replaced, not refused.
-std::string DumpJson(const nlohmann::ordered_json& json);
+// What docs/json.md calls a rule, a domain, tardisks and a policy; of the policy without its
+// schema.
+Json ToJson(const InstalledRule& rule);
+Json ToJson(const InstalledDomain& domain);
+Json ToJson(const std::vector<InstalledTardisk>& tardisks);
+Json ToJson(const InstalledPolicy& policy);
 
 }  // namespace SecPolicyCli

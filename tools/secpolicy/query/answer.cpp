@@ -6,8 +6,6 @@
 namespace SecPolicyCli {
 namespace {
 
-using Json = nlohmann::ordered_json;
-
 std::string PlaceOf(const std::string& file, unsigned int line) {
   return file + ":" + std::to_string(line) + ": ";
 }
@@ -95,11 +93,11 @@ Json QuestionToJson(const Question& question) {
 }
 
 Json AnswerToJson(const InstalledDomain& domain, const Decision& decision) {
-  Json rules = Json::array();
+  Json rules = Json::Array();
   for (const Vote& vote : decision.votes) {
     Json rule = ToJson(vote.rule);
     if (!vote.grants) rule["instead"] = vote.instead;
-    rules.push_back(rule);
+    rules.Append(rule);
   }
   return {{"domain", domain.name},
           {"level", domain.level},

@@ -1,10 +1,10 @@
 #pragma once
 
-#include <nlohmann/json.hpp>
 #include <ostream>
 
 #include "decision.h"
 #include "installed/installed_policy.h"
+#include "json.h"
 #include "question.h"
 
 namespace SecPolicyCli {
@@ -18,7 +18,7 @@ void WriteAnswer(const Question& question, const InstalledDomain& domain, const 
 void WriteAnswerLine(const InstalledDomain& domain, const Decision& decision, std::ostream& output);
 
 // The same for programs; see docs/json.md.
-nlohmann::ordered_json QuestionToJson(const Question& question);
-nlohmann::ordered_json AnswerToJson(const InstalledDomain& domain, const Decision& decision);
+Json QuestionToJson(const Question& question);
+Json AnswerToJson(const InstalledDomain& domain, const Decision& decision);
 
 }  // namespace SecPolicyCli

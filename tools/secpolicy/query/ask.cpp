@@ -1,20 +1,17 @@
 #include "ask.h"
 
-#include <CLI/App.hpp>
 #include <iostream>
 
+#include "command_line.h"
 #include "library_call.h"
 #include "question.h"
 #include "scratch/used_state.h"
 
 namespace SecPolicyCli {
 
-std::shared_ptr<const std::string> AddAnswerFormat(CLI::App& app) {
-  const auto format = std::make_shared<std::string>("text");
-  app.add_option("--format", *format, "How to write the answer: text or json")
-      ->check(CLI::IsMember({"text", "json"}))
-      ->type_name("FORMAT")
-      ->capture_default_str();
+std::shared_ptr<const std::string> AddAnswerFormat(Syntax& syntax) {
+  const auto format = std::make_shared<std::string>();
+  syntax.AddFormat(*format, "the answer", {"text", "json"});
   return format;
 }
 

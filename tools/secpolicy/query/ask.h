@@ -8,8 +8,8 @@
 
 namespace SecPolicyCli {
 
-// Adds --format text|json to `app`; its value is "text" when it is not given.
-std::shared_ptr<const std::string> AddAnswerFormat(CLI::App& app);
+// Adds --format text|json to `syntax`; its value is "text" when it is not given.
+std::shared_ptr<const std::string> AddAnswerFormat(Syntax& syntax);
 
 // Runs `answer` for the verb `verb`; a question that it cannot understand is wrong usage.
 ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer);

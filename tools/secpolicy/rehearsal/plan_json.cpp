@@ -1,55 +1,52 @@
-#include <nlohmann/json.hpp>
 #include <sstream>
 
-#include "installed/installed_json.h"
+#include "json.h"
 #include "load_plan.h"
 
 namespace SecPolicyCli {
 namespace {
 
-using Json = nlohmann::ordered_json;
-
 Json RulesOf(const PolicyDifference& difference,
              std::vector<std::string> DomainDifference::*rules) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
     for (const std::string& rule : domain.*rules) {
-      list.push_back({{"domain", domain.name}, {"rule", rule}});
+      list.Append({{"domain", domain.name}, {"rule", rule}});
     }
   }
   return list;
 }
 
 Json ChangesOf(const PolicyDifference& difference) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
     for (const auto& [before, after] : domain.changed) {
-      list.push_back({{"domain", domain.name}, {"before", before}, {"after", after}});
+      list.Append({{"domain", domain.name}, {"before", before}, {"after", after}});
     }
   }
   return list;
 }
 
 Json NewDomains(const PolicyDifference& difference) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
-    if (domain.IsNew()) list.push_back(domain.name);
+    if (domain.IsNew()) list.Append(domain.name);
   }
   return list;
 }
 
 Json StayingRules(const LoadPlan& plan) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const auto& [domain, rule] : plan.stayingRules) {
-    list.push_back({{"domain", domain}, {"rule", rule}});
+    list.Append({{"domain", domain}, {"rule", rule}});
   }
   return list;
 }
 
 Json Labels(const LoadPlan& plan) {
-  Json list = Json::array();
+  Json list = Json::Array();
   for (const auto& [path, before, after] : plan.labels) {
-    list.push_back({{"path", path}, {"before", before}, {"after", after}});
+    list.Append({{"path", path}, {"before", before}, {"after", after}});
   }
   return list;
 }
@@ -57,10 +54,10 @@ Json Labels(const LoadPlan& plan) {
 // The errors among the lines that a load writes to standard error.
 Json Errors(const std::string& messages) {
   constexpr std::string_view kPrefix = "Error: ";
-  Json list = Json::array();
+  Json list = Json::Array();
   std::istringstream lines(messages);
   for (std::string line; std::getline(lines, line);) {
-    if (line.starts_with(kPrefix)) list.push_back(line.substr(kPrefix.size()));
+    if (line.starts_with(kPrefix)) list.Append(line.substr(kPrefix.size()));
   }
   return list;
 }
@@ -90,8 +87,7 @@ void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
         {"stay", StayingRules(plan)}}},
       {"labels", Labels(plan)},
   };
-  // A path need not be text.
-  output << DumpJson(document);
+  output << document.Text();
 }
 
 }  // namespace SecPolicyCli

@@ -6,16 +6,13 @@
 #include "host/linux/system_log.h"
 #include "load_plan.h"
 #include "policy_dir.h"
+#include "summary.h"
 
 namespace SecPolicyCli {
 namespace {
 
 // More files fill a screen without telling more.
 constexpr std::size_t kShownLabels = 20;
-
-void WriteSummary(const std::string& text) {
-  std::cerr << "secpolicy: load: " << text << std::endl;
-}
 
 }  // namespace
 
@@ -31,9 +28,8 @@ ExitCode PlanLoad(const std::string& policyDir, const PlanOptions& options) {
     const auto all = std::numeric_limits<std::size_t>::max();
     WritePlanText(plan, options.showAll ? all : kShownLabels, std::cout);
   }
-  std::cout.flush();
-  WriteSummary(plan.ChangesNothing() ? "nothing would change"
-                                     : "this was a plan: nothing was changed");
+  Summarize("load", plan.ChangesNothing() ? "nothing would change"
+                                          : "this was a plan: nothing was changed");
   return rehearsal.Ending();
 }
 

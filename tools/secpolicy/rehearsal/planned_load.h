@@ -7,8 +7,8 @@
 namespace SecPolicyCli {
 
 struct PlanOptions {
-  std::string format = "text";  // or "json"
-  bool showAll = false;         // every file whose label would change, however many
+  std::string format;    // "text" or "json"
+  bool showAll = false;  // every file whose label would change, however many
 };
 
 // Prints to standard output what a load of `policyDir` would change, and changes nothing. The

@@ -22,6 +22,7 @@
 #include "scratch/scratch_directory.h"
 #include "scratch/used_state.h"
 #include "secpolicy/secpolicy.h"
+#include "summary.h"
 #include "text/count.h"
 #include "zorvan/kernel.h"
 
@@ -29,10 +30,6 @@ namespace SecPolicyCli {
 namespace {
 
 constexpr char kAttribute[] = "zorvan.security";
-
-void WriteSummary(const std::string& text) {
-  std::cerr << "secpolicy: load: " << text << std::endl;
-}
 
 using Labels = std::vector<LinuxHost::LabelChange>;
 
@@ -45,9 +42,9 @@ std::optional<ExitCode> Rehearse(const std::string& policyDir, Labels& labels) {
     return std::nullopt;
   }
   std::cerr << rehearsal.Messages() << std::flush;
-  WriteSummary(
-      "nothing was changed: this was the rehearsal. Without --all-or-nothing, a load "
-      "installs what has no errors.");
+  Summarize("load",
+            "nothing was changed: this was the rehearsal. Without --all-or-nothing, a load "
+            "installs what has no errors.");
   return rehearsal.Ending();
 }
 
@@ -152,17 +149,18 @@ LabelsPutBack PutLabelsBack(const std::string& path) {
 
 void WritePutBack(const std::string& stateFailure, const LabelsPutBack& labels) {
   if (!stateFailure.empty()) {
-    WriteSummary("the state from before cannot be put back: " + stateFailure);
+    Summarize("load", "the state from before cannot be put back: " + stateFailure);
   }
-  for (const std::string& failure : labels.failures) WriteSummary(failure);
+  for (const std::string& failure : labels.failures) Summarize("load", failure);
   if (stateFailure.empty() && labels.failures.empty()) {
-    WriteSummary("failed on the way, so everything was put back as it was (the state, and " +
-                 CountOf(labels.done, "file label") + ")");
+    Summarize("load", "failed on the way, so everything was put back as it was (the state, and " +
+                          CountOf(labels.done, "file label") + ")");
     return;
   }
-  WriteSummary("failed on the way, and not everything could be put back (above: " +
-               std::string(stateFailure.empty() ? "" : "the state, and ") +
-               CountOf(labels.failures.size(), "file label") + "). Mend that, and load again.");
+  Summarize("load", "failed on the way, and not everything could be put back (above: " +
+                        std::string(stateFailure.empty() ? "" : "the state, and ") +
+                        CountOf(labels.failures.size(), "file label") +
+                        "). Mend that, and load again.");
 }
 
 // Writes nothing before all is done: a terminal may keep the writer waiting.
@@ -170,7 +168,7 @@ ExitCode PutBack(const WayBack& back, const ForkedEnd& end) {
   // The state tells which attribute carries labels, and may go.
   const LabelsPutBack labels = PutLabelsBack(back.labels);
   const std::string stateFailure = PutStateBack(back);
-  if (!end.death.empty()) WriteSummary("the load died: " + end.death);
+  if (!end.death.empty()) Summarize("load", "the load died: " + end.death);
   WritePutBack(stateFailure, labels);
   return end.code == kWell ? kFailed : end.code;
 }

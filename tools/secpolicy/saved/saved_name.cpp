@@ -1,16 +1,16 @@
 #include "saved_name.h"
 
-#include <CLI/App.hpp>
 #include <exception>
 
+#include "command_line.h"
 #include "library_call.h"
 #include "saved_state.h"
 
 namespace SecPolicyCli {
 
-std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string& meaning) {
+std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning) {
   const auto name = std::make_shared<std::string>();
-  app.add_option("NAME", *name, meaning)->required()->check(CLI::Validator(WhyNoSavedName, ""));
+  syntax.AddOption("NAME", *name, meaning).Require().Check(WhyNoSavedName);
   return name;
 }
 

@@ -7,8 +7,8 @@
 
 namespace SecPolicyCli {
 
-// Adds the required argument NAME, the name of a saved state, to `app`.
-std::shared_ptr<const std::string> AddSavedName(CLI::App& app, const std::string& meaning);
+// Adds the required argument NAME, the name of a saved state, to `syntax`.
+std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning);
 
 // Does what `action` does, and ends `verb` with the message of what it throws.
 ExitCode RunOrRefuse(const std::string& verb, const Action& action);

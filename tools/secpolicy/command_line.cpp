@@ -1,0 +1,169 @@
+#include "command_line.h"
+
+#include <CLI/App.hpp>
+#include <CLI/Config.hpp>
+#include <CLI/Formatter.hpp>
+
+#include "text/suggestion.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// ": one of A, B" for a verb that has kinds and was given none; else nothing.
+std::string KindsOf(const CLI::App& verb) {
+  if (!verb.get_subcommands().empty()) return "";
+  std::string kinds;
+  for (const CLI::App* kind : verb.get_subcommands([](const CLI::App*) { return true; })) {
+    kinds += (kinds.empty() ? ": one of " : ", ") + kind->get_name();
+  }
+  return kinds;
+}
+
+std::vector<std::string> VerbNames(const CLI::App& app) {
+  std::vector<std::string> names;
+  for (const CLI::App* verb : app.get_subcommands([](const CLI::App*) { return true; })) {
+    names.push_back(verb->get_name());
+  }
+  return names;
+}
+
+// The message for a command line that cannot be understood, and where to read on.
+std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
+  std::string command = "secpolicy";
+  for (const CLI::App* verb : app->get_subcommands())
+    command += std::string(" ") + verb->get_name();
+  const std::vector<std::string> unknown = app->remaining();
+  std::string problem = error.what();
+  if (app->get_subcommands().empty() && !unknown.empty()) {
+    problem = "there is no verb or option '" + unknown.front() + "'";
+    const std::string nearest = NearestWord(unknown.front(), VerbNames(*app));
+    if (!nearest.empty()) problem += "; did you mean '" + nearest + "'?";
+  } else if (!app->get_subcommands().empty() && error.get_name() == "RequiredError") {
+    problem += KindsOf(*app->get_subcommands().front());
+  }
+  return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
+}
+
+// "A, B or C".
+std::string JoinChoices(const std::vector<std::string>& choices) {
+  std::string text = choices.front();
+  for (std::size_t index = 1; index < choices.size(); ++index) {
+    text += (index + 1 < choices.size() ? ", " : " or ") + choices[index];
+  }
+  return text;
+}
+
+}  // namespace
+
+Option& Option::Require(bool isRequired) {
+  option->required(isRequired);
+  return *this;
+}
+
+Option& Option::NameValue(const char* name) {
+  option->type_name(name);
+  return *this;
+}
+
+Option& Option::ShowDefault() {
+  option->capture_default_str();
+  return *this;
+}
+
+Option& Option::Check(std::string (*whyNot)(const std::string& value)) {
+  option->check(CLI::Validator(whyNot, ""));
+  return *this;
+}
+
+Option& Option::Need(const Option& other) {
+  option->needs(other.option);
+  return *this;
+}
+
+Option& Option::Exclude(const Option& other) {
+  option->excludes(other.option);
+  return *this;
+}
+
+bool Option::IsGiven() const { return option->count() > 0; }
+
+Option Syntax::AddFlag(const char* name, bool& value, const char* meaning) {
+  return Option(*app.add_flag(name, value, meaning));
+}
+
+Option Syntax::AddOption(const char* name, std::string& value, const std::string& meaning) {
+  return Option(*app.add_option(name, value, meaning));
+}
+
+Option Syntax::AddList(const char* name, std::vector<std::string>& values,
+                       const std::string& meaning) {
+  CLI::Option* const list = app.add_option(name, values, meaning);
+  if (name[0] == '-') list->allow_extra_args(false);
+  return Option(*list);
+}
+
+Option Syntax::AddFormat(std::string& value, const std::string& what,
+                         const std::vector<std::string>& formats) {
+  value = formats.front();
+  CLI::Option* const format =
+      app.add_option("--format", value, "How to write " + what + ": " + JoinChoices(formats));
+  format->check(CLI::IsMember(formats))->type_name("FORMAT")->capture_default_str();
+  return Option(*format);
+}
+
+Action Syntax::AddKinds(std::span<const Kind> kinds) {
+  app.require_subcommand(1);
+  const auto chosen = std::make_shared<Action>();
+  for (const Kind& kind : kinds) {
+    CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
+    if (kind.help != nullptr) subcommand->footer(kind.help);
+    Syntax syntax(*subcommand);
+    subcommand->parse_complete_callback(
+        [chosen, action = kind.define(syntax)] { *chosen = action; });
+  }
+  return [chosen] { return (*chosen)(); };
+}
+
+Option Syntax::Verbose() const { return Option(*app.get_parent()->get_option("--verbose")); }
+
+CommandLine::CommandLine(const Description& description, std::span<const Verb* const> verbs)
+    : app(std::make_unique<CLI::App>(description.about, "secpolicy")) {
+  app->require_subcommand(1);
+  app->fallthrough();
+  app->footer(description.footer);
+  app->failure_message(ExplainUsage);
+  app->set_version_flag("--version", description.version);
+  rootOption = app->add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
+                   ->type_name("DIR");
+  app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
+  for (const Verb* each : verbs) AddVerb(*each);
+}
+
+CommandLine::~CommandLine() = default;
+
+// Only the verb that is asked for gets its options: to define them all would slow every start.
+void CommandLine::AddVerb(const Verb& added) {
+  CLI::App* const subcommand = app->add_subcommand(added.name, added.summary);
+  subcommand->preparse_callback([this, &added, subcommand](std::size_t /*rest*/) {
+    subcommand->footer(added.help);
+    Syntax syntax(*subcommand);
+    action = added.define(syntax);
+    verb = &added;
+  });
+}
+
+std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {
+  try {
+    app->parse(argc, argv);
+    return std::nullopt;
+  } catch (const CLI::ParseError& error) {
+    return app->exit(error) == 0 ? kWell : kUsage;
+  }
+}
+
+std::optional<std::string> CommandLine::Root() const {
+  if (rootOption->count() == 0) return std::nullopt;
+  return root;
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,118 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "verb.h"
+
+// The only file that knows the library for command lines is command_line.cpp: its headers cost
+// seconds to compile.
+namespace CLI {
+class App;
+class Option;
+}  // namespace CLI
+
+namespace SecPolicyCli {
+
+// An option or argument that was added to a verb, for what is to be said about it beside its name
+// and meaning. It lasts as long as the command line.
+class Option {
+ public:
+  explicit Option(CLI::Option& added) : option(&added) {}
+
+  Option& Require(bool isRequired = true);
+  Option& NameValue(const char* name);
+  Option& ShowDefault();
+
+  // `whyNot` says of a value why it cannot be taken; nothing of one that can.
+  Option& Check(std::string (*whyNot)(const std::string& value));
+
+  Option& Need(const Option& other);
+  Option& Exclude(const Option& other);
+
+  bool IsGiven() const;
+
+ private:
+  friend class Syntax;
+
+  CLI::Option* option;
+};
+
+class Syntax;
+
+// One of several things that a verb does, such as `get` of `label get`.
+struct Kind {
+  const char* name;
+  const char* summary;
+  const char* help;  // null: that of the verb
+  std::function<Action(Syntax& syntax)> define;
+};
+
+// What may stand behind a verb. The values that are handed in have to last until the action is
+// done: they become what is given, and stay as they are when nothing is.
+class Syntax {
+ public:
+  explicit Syntax(CLI::App& verb) : app(verb) {}
+
+  Option AddFlag(const char* name, bool& value, const char* meaning);
+
+  // With dashes in its name an option, without an argument.
+  Option AddOption(const char* name, std::string& value, const std::string& meaning);
+
+  // An argument takes all that is there; an option is given once for each value.
+  Option AddList(const char* name, std::vector<std::string>& values, const std::string& meaning);
+
+  // Adds --format, how to write `what`; the first of `formats` is taken when it is not given.
+  Option AddFormat(std::string& value, const std::string& what,
+                   const std::vector<std::string>& formats);
+
+  // Returns an action that does what the kind does that is given.
+  Action AddKinds(std::span<const Kind> kinds);
+
+  // The option -v, which may stand anywhere.
+  Option Verbose() const;
+
+ private:
+  CLI::App& app;
+};
+
+// What the command says about itself.
+struct Description {
+  const char* about;
+  const char* footer;
+  const char* version;
+};
+
+// The command line as a whole.
+class CommandLine {
+ public:
+  CommandLine(const Description& description, std::span<const Verb* const> verbs);
+  CommandLine(const CommandLine&) = delete;
+  CommandLine& operator=(const CommandLine&) = delete;
+  ~CommandLine();
+
+  // Returns the exit code when there is nothing to do: help is printed, or what is wrong with the
+  // usage.
+  std::optional<ExitCode> Read(int argc, char** argv);
+
+  // What was read.
+  std::optional<std::string> Root() const;
+  bool IsVerbose() const { return verbose; }
+  const Verb& AskedVerb() const { return *verb; }
+  ExitCode Act() const { return action(); }
+
+ private:
+  void AddVerb(const Verb& added);
+
+  std::unique_ptr<CLI::App> app;
+  CLI::Option* rootOption = nullptr;
+  std::string root;
+  bool verbose = false;
+  const Verb* verb = nullptr;
+  Action action;
+};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,137 @@
+#include "json.h"
+
+#include <algorithm>
+#include <string_view>
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr std::size_t kIndent = 2;
+constexpr std::string_view kReplacement = "\xef\xbf\xbd";  // U+FFFD
+
+// What a text begins with: a character of UTF-8, or bytes that are none, of which those that could
+// have become one count as one mistake.
+struct Character {
+  std::size_t size;
+  bool isValid;
+};
+
+Character FirstCharacter(std::string_view text) {
+  const auto byte = [text](std::size_t index) {
+    return index < text.size() ? static_cast<unsigned char>(text[index]) : 0;
+  };
+  const int lead = byte(0);
+  if (lead < 0x80) return {1, true};
+  if (lead < 0xc2 || lead > 0xf4) return {1, false};
+  // The second byte tells longer forms, surrogates and what is beyond Unicode.
+  int lowest = lead == 0xe0 ? 0xa0 : lead == 0xf0 ? 0x90 : 0x80;
+  int highest = lead == 0xed ? 0x9f : lead == 0xf4 ? 0x8f : 0xbf;
+  const std::size_t size = lead < 0xe0 ? 2 : lead < 0xf0 ? 3 : 4;
+  for (std::size_t index = 1; index < size; ++index) {
+    if (byte(index) < lowest || byte(index) > highest) return {index, false};
+    lowest = 0x80;
+    highest = 0xbf;
+  }
+  return {size, true};
+}
+
+// The letter that stands for `byte` behind a backslash; 0 when there is none.
+char ShortEscape(char byte) {
+  constexpr std::string_view kBytes = "\"\\\b\f\n\r\t";
+  constexpr std::string_view kLetters = "\"\\bfnrt";
+  const std::size_t place = kBytes.find(byte);
+  return place == std::string_view::npos ? '\0' : kLetters[place];
+}
+
+void WriteByte(char byte, std::string& output) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  if (const char letter = ShortEscape(byte)) {
+    output += '\\';
+    output += letter;
+  } else if (const auto number = static_cast<unsigned char>(byte); number < 0x20) {
+    output += "\\u00";
+    output += kDigits[number >> 4];
+    output += kDigits[number & 0xf];
+  } else {
+    output += byte;
+  }
+}
+
+void WriteText(std::string_view text, std::string& output) {
+  output += '"';
+  while (!text.empty()) {
+    const Character first = FirstCharacter(text);
+    if (!first.isValid) {
+      output += kReplacement;
+    } else if (first.size == 1) {
+      WriteByte(text.front(), output);
+    } else {
+      output += text.substr(0, first.size);
+    }
+    text.remove_prefix(first.size);
+  }
+  output += '"';
+}
+
+// Writes `items` one to a line between `open` and `close`.
+template <class Items, class WriteItem>
+void WriteLines(const Items& items, char open, char close, std::size_t indent, std::string& output,
+                WriteItem writeItem) {
+  output += open;
+  const char* separator = "\n";
+  for (const auto& item : items) {
+    output += separator;
+    output.append(indent + kIndent, ' ');
+    writeItem(item);
+    separator = ",\n";
+  }
+  if (!items.empty()) output.append("\n").append(indent, ' ');
+  output += close;
+}
+
+}  // namespace
+
+void Json::Append(Json element) { std::get<Values>(value).push_back(std::move(element)); }
+
+Json& Json::operator[](const std::string& name) {
+  Members& members = std::get<Members>(value);
+  const auto found = std::find_if(members.begin(), members.end(),
+                                  [&](const Member& member) { return member.first == name; });
+  if (found != members.end()) return found->second;
+  return members.emplace_back(name, Json()).second;
+}
+
+void Json::Add(const Json& other) {
+  Members& members = std::get<Members>(value);
+  const Members& added = std::get<Members>(other.value);
+  members.insert(members.end(), added.begin(), added.end());
+}
+
+std::string Json::Text() const {
+  std::string text;
+  Write(text, 0);
+  return text + "\n";
+}
+
+void Json::Write(std::string& output, std::size_t indent) const {
+  if (const bool* const truth = std::get_if<bool>(&value)) {
+    output += *truth ? "true" : "false";
+  } else if (const std::int64_t* const number = std::get_if<std::int64_t>(&value)) {
+    output += std::to_string(*number);
+  } else if (const std::string* const text = std::get_if<std::string>(&value)) {
+    WriteText(*text, output);
+  } else if (const Values* const values = std::get_if<Values>(&value)) {
+    WriteLines(*values, '[', ']', indent, output,
+               [&](const Json& element) { element.Write(output, indent + kIndent); });
+  } else if (const Members* const members = std::get_if<Members>(&value)) {
+    WriteLines(*members, '{', '}', indent, output, [&](const Member& member) {
+      WriteText(member.first, output);
+      output += ": ";
+      member.second.Write(output, indent + kIndent);
+    });
+  } else {
+    output += "null";
+  }
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,56 @@
+#pragma once
+
+#include <concepts>
+#include <cstdint>
+#include <initializer_list>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+namespace SecPolicyCli {
+
+// A value of a JSON document. The members of an object keep the order in which they were added.
+class Json {
+ public:
+  using Member = std::pair<std::string, Json>;
+
+  Json() = default;  // null
+  Json(std::same_as<bool> auto truth) : value(truth) {}
+  template <std::integral Number>
+  requires(!std::same_as<Number, bool>) Json(Number number)
+      : value(static_cast<std::int64_t>(number)) {}
+  Json(const char* text) : value(std::string(text)) {}
+  Json(std::string text) : value(std::move(text)) {}
+  Json(const std::vector<std::string>& texts) : value(Values(texts.begin(), texts.end())) {}
+  Json(std::initializer_list<Member> members) : value(Members(members)) {}
+
+  static Json Array() { return Json(Value(Values())); }
+  static Json Object() { return Json(Value(Members())); }
+
+  // Adds an element to an array.
+  void Append(Json element);
+
+  // The member `name` of an object, which gets it when it has none.
+  Json& operator[](const std::string& name);
+
+  // Adds the members of `other`, which has none of those that this object has.
+  void Add(const Json& other);
+
+  // The text of the document, indented, with a line end. Bytes that are no UTF-8 are replaced, not
+  // refused: a path need not be text.
+  std::string Text() const;
+
+ private:
+  using Values = std::vector<Json>;
+  using Members = std::vector<Member>;
+  using Value = std::variant<std::monostate, bool, std::int64_t, std::string, Values, Members>;
+
+  explicit Json(Value content) : value(std::move(content)) {}
+
+  void Write(std::string& output, std::size_t indent) const;
+
+  Value value;
+};
+
+}  // namespace SecPolicyCli
