@@ -28,6 +28,7 @@
 #include <vector>
 
 #include "boot.h"
+#include "security_attribute.h"
 #include "support/outcome.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
@@ -38,7 +39,6 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr int kSkipped = 77;
-constexpr unsigned int kUnlabeled = 2;
 constexpr rlim_t kLargestFile = 4 << 20;
 
 // ---- The archive.
@@ -144,8 +144,8 @@ class World {
   std::string Unpack(std::vector<LinuxHost::InodeOrigin>& origins) const {
     const bool entered = chroot(path.c_str()) == 0 && chdir("/inside/root") == 0;
     Require(entered, "the root can be entered");
-    const std::string failure =
-        FailureOf([&] { LinuxHost::UnpackTardisk("/image.tgz", kUnlabeled, origins); });
+    const std::string failure = FailureOf(
+        [&] { LinuxHost::UnpackTardisk("/image.tgz", LinuxHost::LabelAttribute(), origins); });
     struct stat here {
     }, root{};
     const bool stayed = stat(".", &here) == 0 && stat("/inside/root", &root) == 0 &&

@@ -16,7 +16,6 @@
 #include "first_labels.h"
 #include "host_error.h"
 #include "host_state.h"
-#include "label_table.h"
 #include "security_attribute.h"
 #include "system_log.h"
 #include "tardisk_archive.h"
@@ -61,11 +60,12 @@ std::vector<std::string> ListImages() {
 
 }  // namespace
 
-void UnpackTardisk(const std::string& image, unsigned int unlabeled,
+void UnpackTardisk(const std::string& image, const std::string& labelAttribute,
                    std::vector<InodeOrigin>& origins) {
   const std::string tardisk = std::filesystem::path(image).filename();
   UnpackArchive(image, [&](const std::string& path, const struct statx& status) {
-    if (CanCarryLabel(status.stx_mode) && GiveFirstLabel(path.c_str(), unlabeled) != 0) {
+    if (CanCarryLabel(status.stx_mode, labelAttribute) &&
+        GiveFirstLabel(path.c_str(), labelAttribute) != 0) {
       return errno;
     }
     origins.push_back({.device = DeviceOf(status),
@@ -77,22 +77,27 @@ void UnpackTardisk(const std::string& image, unsigned int unlabeled,
   });
 }
 
-void Boot() {
+AssembledRoot AssembleRoot() {
   const AtRoot atRoot;
   // A root that has never run has no place for what runs.
   mkdir("/run", 0755);
-  HostState::Current().Reset();
-  HostState::Current().ChooseLabelAttribute(LabelAttribute());
-  if (ConfigDatabase* settings = ConfigDatabase::Find()) settings->ClearBootStatus();
-
-  const unsigned int unlabeled = HostState::Current().Labels().Lookup(kUnlabeled);
-  std::vector<InodeOrigin> origins;
+  // A state that cannot be used is told before a file is changed.
+  AssembledRoot root;
+  root.labelAttribute = UsableLabelAttribute(HostState::Current().Directory());
   for (const std::string& image : ListImages()) {
-    UnpackTardisk(image, unlabeled, origins);
+    UnpackTardisk(image, root.labelAttribute, root.origins);
     LogInformation("Unpacked tardisk " + image);
   }
-  HostState::Current().RecordOrigins(origins);
-  GiveFirstLabels(unlabeled);
+  GiveFirstLabels(root.labelAttribute);
+  return root;
+}
+
+void StartPolicy(const AssembledRoot& root) {
+  HostState& state = HostState::Current();
+  state.Reset();
+  state.ChooseLabelAttribute(root.labelAttribute);
+  state.RecordOrigins(root.origins);
+  if (ConfigDatabase* settings = ConfigDatabase::Find()) settings->ClearBootStatus();
 }
 
 }  // namespace LinuxHost

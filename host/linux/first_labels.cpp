@@ -56,7 +56,7 @@ class Failures {
 // planted on the way nor a tree of any depth leads it astray.
 class Walk {
  public:
-  explicit Walk(std::uint32_t label) : id(label) {}
+  explicit Walk(const std::string& name) : attribute(name) {}
 
   void Run() {
     struct stat status;
@@ -85,7 +85,7 @@ class Walk {
   };
 
   void Label(const char* name, const struct stat& status) {
-    if (!CanCarryLabel(status.st_mode) || GiveFirstLabel(name, id) == 0) return;
+    if (!CanCarryLabel(status.st_mode, attribute) || GiveFirstLabel(name, attribute) == 0) return;
     failures.Add(StrCat(path, "/", name), errno);
   }
 
@@ -140,7 +140,7 @@ class Walk {
                                    "/ changed meanwhile"));
   }
 
-  const std::uint32_t id;
+  const std::string& attribute;
   dev_t rootDevice = 0;
   std::string path;  // of where the walk is, without the slash of the root
   std::vector<Level> levels;
@@ -149,6 +149,6 @@ class Walk {
 
 }  // namespace
 
-void GiveFirstLabels(std::uint32_t id) { Walk(id).Run(); }
+void GiveFirstLabels(const std::string& attribute) { Walk(attribute).Run(); }
 
 }  // namespace LinuxHost

@@ -1,6 +1,7 @@
 #include "host_state.h"
 
 #include <cstdlib>
+#include <filesystem>
 
 #include "domain_table.h"
 #include "file_policy_table.h"
@@ -154,6 +155,10 @@ HostState::HostState(const std::string& path)
 }
 
 HostState::~HostState() = default;
+
+std::string HostState::Directory() const {
+  return std::filesystem::path(store.Path()).parent_path();
+}
 
 void HostState::Refresh() {
   if (marked && store.IsAt(seen)) return;

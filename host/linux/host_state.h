@@ -36,6 +36,10 @@ class HostState : public std::enable_shared_from_this<HostState> {
   ~HostState();
 
   Store& Database() { return store; }
+
+  // The directory that the state lies in.
+  std::string Directory() const;
+
   DomainTable& Domains() { return *domains; }
   LabelTable& Labels() { return *labels; }
   RuleTable& Rules() { return *rules; }

@@ -19,6 +19,7 @@ constexpr unsigned int kNoLabel = 1;
 
 // The labels that are built into the kernel.
 constexpr char kUnlabeled[] = "unlabeled";
+constexpr unsigned int kUnlabeledId = 2;
 constexpr char kDefaultTardiskLabel[] = "tardiskDefault";
 
 // The object labels, as of the last HostState::Refresh(). Failures are HostErrors.

@@ -6,12 +6,12 @@
 
 #include <cerrno>
 #include <cstring>
-#include <filesystem>
 
 #include "descriptor.h"
 #include "host_error.h"
 #include "host_state.h"
 #include "label_rehearsal.h"
+#include "label_table.h"
 #include "zorvan/kernel.h"
 
 namespace LinuxHost {
@@ -30,11 +30,7 @@ bool MayWritePrivileged(const char* directory) {
 
 std::string RecordedOrChosen(HostState& state) {
   if (!state.LabelAttribute().empty()) return state.LabelAttribute();
-  // Labels are put on the root file system; where that takes no new files, the file system of the
-  // state tells at least what the process may do.
-  const std::string stateDirectory = std::filesystem::path(state.Database().Path()).parent_path();
-  const bool privileged = MayWritePrivileged("/") || MayWritePrivileged(stateDirectory.c_str());
-  return state.ChooseLabelAttribute(privileged ? kPrivilegedName : kOrdinaryName);
+  return state.ChooseLabelAttribute(UsableLabelAttribute(state.Directory()));
 }
 
 // The real name for `name`, or null with errno set as for a name that no file system knows.
@@ -59,13 +55,20 @@ const std::string& LabelAttribute() {
   return name;
 }
 
-bool CanCarryLabel(mode_t mode) {
-  if (S_ISLNK(mode)) return false;
-  return S_ISREG(mode) || S_ISDIR(mode) || LabelAttribute() == kPrivilegedName;
+// Labels are put on the root file system; any other tells at least what the process may do.
+std::string UsableLabelAttribute(const std::string& otherDirectory) {
+  const bool privileged = MayWritePrivileged("/") || MayWritePrivileged(otherDirectory.c_str());
+  return privileged ? kPrivilegedName : kOrdinaryName;
 }
 
-int GiveFirstLabel(const char* path, std::uint32_t id) {
-  return lsetxattr(path, LabelAttribute().c_str(), &id, sizeof id, 0);
+bool CanCarryLabel(mode_t mode, const std::string& attribute) {
+  if (S_ISLNK(mode)) return false;
+  return S_ISREG(mode) || S_ISDIR(mode) || attribute == kPrivilegedName;
+}
+
+int GiveFirstLabel(const char* path, const std::string& attribute) {
+  const std::uint32_t id = kUnlabeledId;
+  return lsetxattr(path, attribute.c_str(), &id, sizeof id, 0);
 }
 
 std::optional<std::uint32_t> ReadLabel(const char* path) {

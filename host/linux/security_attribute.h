@@ -14,13 +14,18 @@ namespace LinuxHost {
 // there; a process keeps the answer. Throws HostError when the state cannot be used.
 const std::string& LabelAttribute();
 
-// True for a file of this kind (`st_mode`) if the real attribute can be put on it: links never
-// carry a label, and what is named "user." only fits regular files and directories.
-bool CanCarryLabel(mode_t mode);
+// The name that a choice would fall on now, whatever the state has recorded; tried out on the root
+// file system or, where that takes no new files, in `otherDirectory`.
+std::string UsableLabelAttribute(const std::string& otherDirectory);
 
-// Gives the file at `path`, which is not a link, the label `id` whether or not it had one. Returns
-// 0, or -1 with errno set. Links on the way to the file are followed, the last one is not.
-int GiveFirstLabel(const char* path, std::uint32_t id);
+// True for a file of this kind (`st_mode`) if the real attribute `attribute` can be put on it:
+// links never carry a label, and what is named "user." only fits regular files and directories.
+bool CanCarryLabel(mode_t mode, const std::string& attribute);
+
+// Gives the file at `path`, which is not a link, the label "unlabeled" in the real attribute
+// `attribute`, whether or not it had one. Returns 0, or -1 with errno set. Links on the way to the
+// file are followed, the last one is not.
+int GiveFirstLabel(const char* path, const std::string& attribute);
 
 // The label of the file at `path`; nothing, with errno set, when it has none or it cannot be read.
 // Links on the way to the file are followed, the last one is not.

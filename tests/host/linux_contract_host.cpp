@@ -8,7 +8,7 @@ class ContractHost::Impl {
  public:
   Impl() : file(state.Path() + "/labelled") {
     state.Write("labelled", "");
-    LinuxHost::GiveFirstLabel(file.c_str(), 2);
+    LinuxHost::GiveFirstLabel(file.c_str(), LinuxHost::LabelAttribute());
   }
 
   LinuxHostTest::StateDirectory state;

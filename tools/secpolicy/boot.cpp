@@ -24,7 +24,7 @@ void LoadEarly() {
 }
 
 void BootAndLoad(LoadTiming& timing) {
-  LinuxHost::Boot();
+  LinuxHost::StartPolicy(LinuxHost::AssembleRoot());
   timing.EndPhase("first labels");
   timing.BeginPart("early ");
   LoadEarly();

@@ -37,7 +37,7 @@ class Boot : public ::testing::Test {
   // Boots the root, then returns what `look` sees; "well" without one.
   std::string BootAnd(const std::function<std::string()>& look = [] { return "well"; }) {
     return scratch.RunInside([&] {
-      LinuxHost::Boot();
+      LinuxHost::StartPolicy(LinuxHost::AssembleRoot());
       return look();
     });
   }
@@ -200,7 +200,7 @@ TEST_F(Boot, ReturnsToTheWorkingDirectory) {
   std::filesystem::create_directory(scratch.Root() / "here");
   EXPECT_EQ(scratch.RunInside([] {
     std::filesystem::current_path("/here");
-    LinuxHost::Boot();
+    LinuxHost::StartPolicy(LinuxHost::AssembleRoot());
     return std::filesystem::current_path().string();
   }),
             "/here");
@@ -220,6 +220,22 @@ TEST_F(Boot, NamesTheTardiskThatCannotBeUnpacked) {
   EXPECT_EQ(BootAnd(), "Unable to unpack tardisk b.tgz: ../out: Path contains '..'");
   EXPECT_EQ(Content(scratch.Root() / "first"), "text");
   EXPECT_FALSE(std::filesystem::exists(scratch.Root() / "last"));
+}
+
+TEST_F(Boot, KeepsWhatIsInstalledWhenItFails) {
+  Save("a.tgz", TarImage().File("file", "text"));
+  ASSERT_EQ(BootAnd([] {
+              TeskAccessInterfaceImpl().AddLabels({"mine"}, TESKACCESS_LABEL_OBJECT);
+              return Origin("/file");
+            }),
+            "a.tgz");
+  scratch.Write("tardisks/b.tgz", "no archive");
+  ASSERT_EQ(BootAnd(), "Unable to unpack tardisk b.tgz: Unrecognized archive format");
+  EXPECT_EQ(scratch.RunInside([] {
+    const bool found = TeskAccessInterfaceImpl().LookupLabel("mine", TESKACCESS_LABEL_OBJECT) != 1;
+    return std::string(found ? "still there" : "gone");
+  }),
+            "still there");
 }
 
 TEST_F(Boot, NeedsTheTardiskDirectory) {

@@ -6,13 +6,12 @@
 #include <set>
 
 #include "host/linux/boot.h"
+#include "host/linux/security_attribute.h"
 #include "scratch_root.h"
 #include "tar_image.h"
 
 namespace LinuxHostTest {
 namespace {
-
-constexpr unsigned int kUnlabeled = 2;
 
 // Unpacks the tardisk "disk.tgz", which lies beside the root, and looks at what it did.
 class UnpackTardisk : public ::testing::Test {
@@ -24,7 +23,7 @@ class UnpackTardisk : public ::testing::Test {
     scratch.Write("../disk.tgz", bytes);
     return scratch.RunBeneath([] {
       std::vector<LinuxHost::InodeOrigin> origins;
-      LinuxHost::UnpackTardisk("../disk.tgz", kUnlabeled, origins);
+      LinuxHost::UnpackTardisk("../disk.tgz", LinuxHost::LabelAttribute(), origins);
       return std::string("unpacked");
     });
   }
@@ -85,7 +84,7 @@ TEST_F(UnpackTardisk, TellsWhereEachInodeCameFrom) {
   scratch.Write("../disk.tgz", image.Bytes());
   const std::string told = scratch.RunBeneath([] {
     std::vector<LinuxHost::InodeOrigin> origins;
-    LinuxHost::UnpackTardisk("../disk.tgz", kUnlabeled, origins);
+    LinuxHost::UnpackTardisk("../disk.tgz", LinuxHost::LabelAttribute(), origins);
     std::string lines;
     for (const LinuxHost::InodeOrigin& origin : origins) {
       struct stat status {};
@@ -209,7 +208,7 @@ TEST_F(UnpackTardisk, LabelsNothingBehindLinkWhoseNameEndsInSlash) {
     scratch.Write("../disk.tgz", image.Bytes());
     EXPECT_EQ(scratch.RunBeneath([] {
       std::vector<LinuxHost::InodeOrigin> origins;
-      LinuxHost::UnpackTardisk("../disk.tgz", kUnlabeled, origins);
+      LinuxHost::UnpackTardisk("../disk.tgz", LinuxHost::LabelAttribute(), origins);
       struct stat link {};
       const bool same = lstat("out", &link) == 0 && origins.size() == 1 &&
                         origins[0].inode == link.st_ino && origins[0].path == "/out";
@@ -378,7 +377,7 @@ TEST_F(UnpackTardisk, RefusesLinkInPlaceOfImage) {
   scratch.Write("../disk.tgz", image.Bytes());
   EXPECT_EQ(scratch.RunBeneath([] {
     std::vector<LinuxHost::InodeOrigin> origins;
-    LinuxHost::UnpackTardisk("image", kUnlabeled, origins);
+    LinuxHost::UnpackTardisk("image", LinuxHost::LabelAttribute(), origins);
     return std::string("unpacked");
   }),
             "Unable to unpack tardisk image: Too many levels of symbolic links");
