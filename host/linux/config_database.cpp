@@ -3,16 +3,15 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <cstdlib>
 #include <filesystem>
 #include <system_error>
+
+#include "used_paths.h"
 
 namespace LinuxHost {
 namespace {
 
 using OrinConfigStore::ConfigStoreObjectId;
-
-constexpr char kDefaultPath[] = "/var/lib/secpolicy/config.db";
 
 constexpr StoreLayout kLayout{
     .purpose = "configuration",
@@ -39,11 +38,6 @@ constexpr StoreLayout kLayout{
     .survivesPowerLoss = true,
 };
 
-std::string ConfiguredPath() {
-  const char* path = secure_getenv("SECPOLICY_HOST_CONFIG");
-  return path != nullptr && *path != '\0' ? path : kDefaultPath;
-}
-
 // Anything but a missing file is for the store to judge.
 bool IsMissing(const std::string& path) {
   struct stat status;
@@ -54,7 +48,7 @@ bool IsMissing(const std::string& path) {
 
 ConfigDatabase& ConfigDatabase::Current() {
   static thread_local std::unique_ptr<ConfigDatabase> current;
-  const std::string path = ConfiguredPath();
+  const std::string path = SettingsPath();
   if (!current || current->store.Path() != path || !current->store.IsCurrent()) {
     current.reset();
     // A root that has never run lacks even /var; what cannot be made, the store reports.
@@ -66,9 +60,7 @@ ConfigDatabase& ConfigDatabase::Current() {
   return *current;
 }
 
-ConfigDatabase* ConfigDatabase::Find() {
-  return IsMissing(ConfiguredPath()) ? nullptr : &Current();
-}
+ConfigDatabase* ConfigDatabase::Find() { return IsMissing(SettingsPath()) ? nullptr : &Current(); }
 
 ConfigDatabase::ConfigDatabase(const std::string& path) : store(path, kLayout) {}
 

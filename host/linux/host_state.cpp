@@ -1,6 +1,5 @@
 #include "host_state.h"
 
-#include <cstdlib>
 #include <filesystem>
 
 #include "domain_table.h"
@@ -8,13 +7,11 @@
 #include "label_table.h"
 #include "parameter_rule_table.h"
 #include "rule_table.h"
+#include "used_paths.h"
 #include "world_table.h"
 
 namespace LinuxHost {
 namespace {
-
-constexpr char kDefaultPath[] = "/run/secpolicy/host.db";
-constexpr char kPathVariable[] = "SECPOLICY_HOST_STATE";
 
 // Rules and policies are read in the order of their `id`, which is that of their installation.
 constexpr char kSchema[] = R"sql(
@@ -126,16 +123,11 @@ constexpr StoreLayout kLayout = {
     .survivesPowerLoss = false,
 };
 
-std::string WantedPath() {
-  const char* path = secure_getenv(kPathVariable);
-  return path != nullptr && *path != '\0' ? path : kDefaultPath;
-}
-
 }  // namespace
 
 HostState& HostState::Current() {
   thread_local std::shared_ptr<HostState> current;
-  const std::string path = WantedPath();
+  const std::string path = StatePath();
   if (current == nullptr || current->store.Path() != path || !current->store.IsCurrent()) {
     current.reset();
     current = std::make_shared<HostState>(path);

@@ -25,9 +25,8 @@ class WorldTable;
 class HostState : public std::enable_shared_from_this<HostState> {
  public:
   // The calling thread's connection, opened, and the state created with its built-in contents, at
-  // first use. The state lies at /run/secpolicy/host.db unless SECPOLICY_HOST_STATE names another
-  // absolute path. A new connection replaces one whose file is gone, or that a fork left behind.
-  // The reference holds until the next call of Current().
+  // first use, of the state at StatePath(). A new connection replaces one whose file is gone, or
+  // that a fork left behind. The reference holds until the next call of Current().
   static HostState& Current();
 
   explicit HostState(const std::string& path);

@@ -1,6 +1,3 @@
-#include <unistd.h>
-
-#include <cerrno>
 #include <string>
 #include <vector>
 
@@ -118,7 +115,7 @@ constexpr LabelKind kLabelKinds[] = {
 
 ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   const std::string verb = std::string("label ") + kind.name;
-  if (access(StatePath().c_str(), F_OK) != 0 && errno == ENOENT) {
+  if (IsStateMissing()) {
     return Refuse(verb,
                   "nothing is installed below this root, so there are no labels. Run 'secpolicy "
                   "boot' first, or name the root that was booted (--root DIR).");

@@ -52,7 +52,7 @@ std::string PartnerDirOf(const std::string& dir) {
 
 WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir) {
   const ScratchDirectory scratch;
-  const UsedState state(scratch.File("host.db"));
+  const LinuxHost::UsedState state(scratch.File("host.db"));
   TeskAccessInterfaceImpl access;
   WrittenPolicy written;
   const auto step = [&](auto part) { written.isClean &= SecPolicy::CarryOn(part); };

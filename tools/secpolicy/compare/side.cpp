@@ -38,7 +38,7 @@ Side ReadInstalled() {
         "nothing is installed below this root. Name the root that was booted (--root DIR), or run "
         "'secpolicy boot' first.");
   }
-  return ReadStateOf(kInstalled, StatePath());
+  return ReadStateOf(kInstalled, LinuxHost::StatePath());
 }
 
 Side ReadSaved(const std::string& name) {

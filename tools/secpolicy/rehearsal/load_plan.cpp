@@ -30,14 +30,14 @@ class QuietErrors {
 };
 
 InstalledPolicy ReadState(const std::string& path) {
-  const UsedState state(path);
+  const LinuxHost::UsedState state(path);
   TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }
 
 // The part of a state that policy files are to bring.
 InstalledPolicy ReadFilePart(const std::string& path) {
-  const UsedState state(path);
+  const LinuxHost::UsedState state(path);
   TeskAccessInterfaceImpl access;
   InstalledPolicy policy = ReadInstalledPolicy(access);
   DropTardiskTransitions(policy, access);

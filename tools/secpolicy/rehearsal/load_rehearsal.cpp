@@ -23,8 +23,8 @@ namespace {
 void RequireCopied(const std::string& failure) {
   if (failure.empty()) return;
   const std::string advice = AdviseOnPrivilege();
-  throw std::runtime_error("the installed state " + StatePath() + " cannot be read: " + failure +
-                           (advice.empty() ? "" : ". " + advice));
+  throw std::runtime_error("the installed state " + LinuxHost::StatePath() +
+                           " cannot be read: " + failure + (advice.empty() ? "" : ". " + advice));
 }
 
 void Redirect(int descriptor, const std::string& path) {
@@ -78,8 +78,8 @@ LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
     Redirect(STDERR_FILENO, messageFile);
     LinuxHost::DropLog();
     LinuxHost::StartLabelRehearsal(scratch.Path());
-    UseCopyOfSettings(scratch.File("config.db"));
-    const UsedState state(StateAfter());
+    const CopiedSettings settings(scratch.File("config.db"));
+    const LinuxHost::UsedState state(StateAfter());
     const ExitCode code = LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
     WriteLabels(labelFile);
     return code;

@@ -59,7 +59,8 @@ struct WayBack {
 
 // Where there was no state, there is to be none; its journal goes with it.
 void RemoveState() {
-  for (const char* part : {"", "-wal", "-shm"}) std::filesystem::remove(StatePath() + part);
+  for (const char* part : {"", "-wal", "-shm"})
+    std::filesystem::remove(LinuxHost::StatePath() + part);
 }
 
 // Returns why the state cannot be put back; empty when it was.

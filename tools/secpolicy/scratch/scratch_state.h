@@ -28,7 +28,7 @@ class ScratchState {
   ScratchDirectory directory;
   std::string copyFailure;
   bool copied;
-  UsedState used;
+  LinuxHost::UsedState used;
 };
 
 }  // namespace SecPolicyCli

@@ -24,7 +24,7 @@ InstalledPolicy ReadStateAt(const std::string& path) {
   if (!failure.empty()) {
     throw std::runtime_error("the state " + path + " cannot be read: " + failure);
   }
-  const UsedState state(copy);
+  const LinuxHost::UsedState state(copy);
   try {
     SecPolicy::TeskAccessInterfaceImpl access;
     return ReadInstalledPolicy(access);

@@ -1,33 +1,19 @@
 #include "used_state.h"
 
+#include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdlib>
 #include <filesystem>
 #include <system_error>
 
 #include "host/linux/store_copy.h"
 
 namespace SecPolicyCli {
-namespace {
-
-constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
-constexpr char kInstalledState[] = "/run/secpolicy/host.db";
-constexpr char kSettingsVariable[] = "SECPOLICY_HOST_CONFIG";
-constexpr char kSettings[] = "/var/lib/secpolicy/config.db";
-
-std::string PathIn(const char* variable, const char* otherwise) {
-  const char* const path = secure_getenv(variable);
-  return path != nullptr && *path != '\0' ? path : otherwise;
-}
-
-}  // namespace
-
-std::string StatePath() { return PathIn(kStateVariable, kInstalledState); }
 
 bool IsStateMissing() {
-  return access(StatePath().c_str(), F_OK) != 0 && (errno == ENOENT || errno == ENOTDIR);
+  return faccessat(AT_FDCWD, LinuxHost::StatePath().c_str(), F_OK, AT_EACCESS) != 0 &&
+         (errno == ENOENT || errno == ENOTDIR);
 }
 
 std::string CopyState(const std::string& from, const std::string& to) {
@@ -43,20 +29,13 @@ std::string CopyState(const std::string& from, const std::string& to) {
 }
 
 std::string CopyUsedState(const std::string& to) {
-  const std::string used = StatePath();
-  if (access(used.c_str(), R_OK) == 0) return CopyState(used, to);
+  const std::string used = LinuxHost::StatePath();
+  if (faccessat(AT_FDCWD, used.c_str(), R_OK, AT_EACCESS) == 0) return CopyState(used, to);
   return errno == ENOENT ? "" : std::generic_category().message(errno);
 }
 
-UsedState::UsedState(const std::string& path) : before(StatePath()) {
-  setenv(kStateVariable, path.c_str(), 1);
-}
-
-UsedState::~UsedState() { setenv(kStateVariable, before.c_str(), 1); }
-
-void UseCopyOfSettings(const std::string& to) {
-  const std::string settings = PathIn(kSettingsVariable, kSettings);
-  if (CopyState(settings, to).empty()) setenv(kSettingsVariable, to.c_str(), 1);
+CopiedSettings::CopiedSettings(const std::string& to) {
+  if (CopyState(LinuxHost::SettingsPath(), to).empty()) used.emplace(to);
 }
 
 }  // namespace SecPolicyCli

@@ -1,13 +1,14 @@
 #pragma once
 
+#include <optional>
 #include <string>
+
+#include "host/linux/used_paths.h"
 
 namespace SecPolicyCli {
 
-// The path of the host's state that this process works with; there may be none yet.
-std::string StatePath();
-
-// True when there is surely no such state: one that this user may not look for counts as there.
+// True when there is surely no state where this process looks for it: one that this user may not
+// look for counts as there.
 bool IsStateMissing();
 
 // Copies the state at `from`, which is only read, to the new file `to`, such that the host works
@@ -18,22 +19,15 @@ std::string CopyState(const std::string& from, const std::string& to);
 // that is no failure.
 std::string CopyUsedState(const std::string& to);
 
-// Makes this process work with the state at `path`, as long as this object lives. The host makes a
-// new one where there is none.
-class UsedState {
+// As long as it lives, this process works with a copy of the wanted settings, which becomes the new
+// file `to`: even reading leaves traces beside the real ones. Settings that cannot be copied stay
+// in use, for the host to say what is wrong with them.
+class CopiedSettings {
  public:
-  explicit UsedState(const std::string& path);
-  UsedState(const UsedState&) = delete;
-  UsedState& operator=(const UsedState&) = delete;
-  ~UsedState();
+  explicit CopiedSettings(const std::string& to);
 
  private:
-  std::string before;
+  std::optional<LinuxHost::UsedSettings> used;
 };
-
-// Makes this process work with a copy of the wanted settings, which becomes the new file `to`, from
-// now on: even reading leaves traces beside the real ones. Settings that cannot be copied stay in
-// use, for the host to say what is wrong with them.
-void UseCopyOfSettings(const std::string& to);
 
 }  // namespace SecPolicyCli

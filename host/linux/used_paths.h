@@ -1,0 +1,42 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+// Where this process finds the files of the host.
+namespace LinuxHost {
+
+// The host's state: /run/secpolicy/host.db, unless SECPOLICY_HOST_STATE names another absolute
+// path.
+std::string StatePath();
+
+// The wanted settings: /var/lib/secpolicy/config.db, unless SECPOLICY_HOST_CONFIG names another
+// absolute path. Programs that run with more rights than their user ignore both variables.
+std::string SettingsPath();
+
+// As long as it lives, this process works with the state at `path`, and not with that of the host;
+// no variable can change that. The latest one counts. Not while other threads use the host.
+class UsedState {
+ public:
+  explicit UsedState(const std::string& path);
+  UsedState(const UsedState&) = delete;
+  UsedState& operator=(const UsedState&) = delete;
+  ~UsedState();
+
+ private:
+  const std::optional<std::string> before;
+};
+
+// The same for the wanted settings.
+class UsedSettings {
+ public:
+  explicit UsedSettings(const std::string& path);
+  UsedSettings(const UsedSettings&) = delete;
+  UsedSettings& operator=(const UsedSettings&) = delete;
+  ~UsedSettings();
+
+ private:
+  const std::optional<std::string> before;
+};
+
+}  // namespace LinuxHost
