@@ -15,6 +15,8 @@
 #include <optional>
 #include <utility>
 
+#include "inherited_label.h"
+
 namespace LinuxHost {
 namespace {
 
@@ -43,10 +45,13 @@ bool IsPassedOver(const char* path) {
          IdentityOf(path) == passedOverDirectory;
 }
 
-// What the file really carries; empty with errno set when it carries nothing.
+// What the file really carries or inherits; empty with errno set when that is nothing.
 std::optional<std::string> ReadReal(const char* path, const char* name) {
   std::array<char, XATTR_SIZE_MAX> value;
-  const ssize_t size = getxattr(path, name, value.data(), value.size());
+  ssize_t size = getxattr(path, name, value.data(), value.size());
+  if (size < 0 && errno == ENODATA) {
+    size = ReadInherited(path, LastLink::kFollowed, name, value.data(), value.size());
+  }
   if (size < 0) return std::nullopt;
   return std::string(value.data(), static_cast<std::size_t>(size));
 }
@@ -109,7 +114,11 @@ ssize_t ReadRehearsed(const char* path, const char* name, void* value, std::size
   const auto file = IdentityOf(path);
   if (!file) return -1;
   const auto noted = Noted().find(*file);
-  if (noted == Noted().end()) return getxattr(path, name, value, size);
+  if (noted == Noted().end()) {
+    const ssize_t result = getxattr(path, name, value, size);
+    if (result >= 0 || errno != ENODATA) return result;
+    return ReadInherited(path, LastLink::kFollowed, name, value, size);
+  }
   const std::uint32_t id = noted->second.after;
   if (size == 0) return sizeof id;
   if (size < sizeof id) return Fail(ERANGE);

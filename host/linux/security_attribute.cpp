@@ -10,6 +10,7 @@
 #include "descriptor.h"
 #include "host_error.h"
 #include "host_state.h"
+#include "inherited_label.h"
 #include "label_rehearsal.h"
 #include "label_table.h"
 #include "zorvan/kernel.h"
@@ -71,14 +72,21 @@ int GiveFirstLabel(const char* path, const std::string& attribute) {
   return lsetxattr(path, attribute.c_str(), &id, sizeof id, 0);
 }
 
-std::optional<std::uint32_t> ReadLabel(const char* path) {
-  std::uint32_t id = 0;
-  if (lgetxattr(path, LabelAttribute().c_str(), &id, sizeof id) < 0) return std::nullopt;
-  return id;
+std::optional<FileLabel> ReadLabel(const char* path) {
+  const char* name = LabelAttribute().c_str();
+  FileLabel label;
+  if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
+  if (errno != ENODATA) return std::nullopt;
+  label.isInherited = true;
+  if (ReadInherited(path, LastLink::kKept, name, &label.id, sizeof label.id) >= 0) return label;
+  return std::nullopt;
 }
 
 int ReplaceLabel(const char* path, std::uint32_t id) {
-  return lsetxattr(path, LabelAttribute().c_str(), &id, sizeof id, XATTR_REPLACE);
+  const char* name = LabelAttribute().c_str();
+  const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
+  if (result == 0 || errno != ENODATA) return result;
+  return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
 }
 
 }  // namespace LinuxHost
@@ -91,14 +99,18 @@ int SetXattr(const char* path, const char* name, const void* value, std::size_t 
   if (LinuxHost::IsRehearsing()) {
     return LinuxHost::RehearseSetting(path, realName, value, size, flags);
   }
-  return setxattr(path, realName, value, size, flags);
+  const int result = setxattr(path, realName, value, size, flags);
+  if (result == 0 || errno != ENODATA) return result;
+  return LinuxHost::ReplaceInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
 }
 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
   const char* realName = LinuxHost::RealName(name);
   if (realName == nullptr) return -1;
   if (LinuxHost::IsRehearsing()) return LinuxHost::ReadRehearsed(path, realName, value, size);
-  return getxattr(path, realName, value, size);
+  const ssize_t result = getxattr(path, realName, value, size);
+  if (result >= 0 || errno != ENODATA) return result;
+  return LinuxHost::ReadInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
 }
 
 }  // namespace Zorvan::Kernel

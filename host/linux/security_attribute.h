@@ -27,12 +27,18 @@ bool CanCarryLabel(mode_t mode, const std::string& attribute);
 // file are followed, the last one is not.
 int GiveFirstLabel(const char* path, const std::string& attribute);
 
-// The label of the file at `path`; nothing, with errno set, when it has none or it cannot be read.
-// Links on the way to the file are followed, the last one is not.
-std::optional<std::uint32_t> ReadLabel(const char* path);
+struct FileLabel {
+  std::uint32_t id = 0;
+  bool isInherited = false;  // from a directory above; the file itself carries none
+};
 
-// Gives the file at `path` the label `id` in place of the one it has. Returns 0, or -1 with errno
-// set; ENODATA when it had none. Links on the way to the file are followed, the last one is not.
+// The label of the file at `path`; nothing, with errno set, when it has none (ENODATA) or it cannot
+// be read. Links on the way to the file are followed, the last one is not.
+std::optional<FileLabel> ReadLabel(const char* path);
+
+// Gives the file at `path` the label `id` in place of the one it has, be that its own or inherited.
+// Returns 0, or -1 with errno set; ENODATA when it had none. Links on the way to the file are
+// followed, the last one is not.
 int ReplaceLabel(const char* path, std::uint32_t id);
 
 }  // namespace LinuxHost

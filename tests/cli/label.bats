@@ -9,6 +9,16 @@ the_label() {
   "$SECPOLICY" --root "$root" label get "$1" 2>/dev/null | sed "s|^$1: ||"
 }
 
+# unlabel PATH...: takes the labels off the files themselves.
+unlabel() {
+  python3 -c '
+import os, sys
+for path in sys.argv[1:]:
+    for name in os.listxattr(path):
+        if name.endswith(("security.zorvan", "zorvan.security")):
+            os.removexattr(path, name)' "${@/#/$root}"
+}
+
 # on_a_terminal ARGUMENT...: the command on a terminal of its own; $output is what that shows, with
 # every return of the carriage as a line.
 on_a_terminal() {
@@ -39,6 +49,7 @@ on_a_terminal() {
 
 @test "get of what has no label, and of what is not there, fails and shows the rest" {
   boot
+  unlabel / /etc
   touch "$root/etc/new"
   secpolicy label get /etc/new /no/such /opt
   exits 1
@@ -46,6 +57,47 @@ on_a_terminal() {
   [[ $stderr == "Error: /etc/new: has no label; 'secpolicy boot' gives every file its first one
 Error: /no/such: No such file or directory
 secpolicy: label get: failed (2 errors above)" ]]
+}
+
+@test "a file that was made or saved anew inherits the label of its directory" {
+  boot
+  touch "$root/etc/new"
+  mkdir -p "$root/opt/monitor/etc/deep/er"
+  touch "$root/opt/monitor/etc/deep/er/file"
+  cp "$root/etc/ssh/host_key" "$root/etc/ssh/saved" && mv "$root/etc/ssh/saved" "$root/etc/ssh/host_key"
+  secpolicy label get /etc/new /opt/monitor/etc/deep/er/file /etc/ssh/host_key /etc/ssh
+  answers 0 "/etc/new: hostConfig (inherited)" \
+    "/opt/monitor/etc/deep/er/file: monitorConfig (inherited)" \
+    "/etc/ssh/host_key: hostConfig (inherited)" \
+    "/etc/ssh: hostConfig"
+  secpolicy label verify /etc/new
+  exits 0
+  secpolicy label verify
+  answers 1 "/etc/ssh/host_key: has hostConfig (inherited), the policy says sshKey ($labels/base:$(grep -n /etc/ssh/host_key "$policy/fileLabels/base" | cut -d: -f1))"
+  secpolicy load
+  exits 0
+  ends_done load
+  secpolicy label get /etc/new /opt/monitor/etc/deep/er/file /etc/ssh/host_key
+  answers 0 "/etc/new: hostConfig" "/opt/monitor/etc/deep/er/file: monitorConfig" "/etc/ssh/host_key: sshKey"
+}
+
+@test "set and relabel give a file that inherits a label of its own" {
+  boot
+  touch "$root/opt/new" "$root/opt/other"
+  mv "$root/opt/monitor/bin/agent" "$root/opt/monitor/bin/aside"
+  cp "$root/opt/monitor/bin/aside" "$root/opt/monitor/bin/agent"
+  secpolicy label set sshKey /opt/new
+  exits 0
+  secpolicy label get /opt/new /opt/other
+  answers 0 "/opt/new: sshKey" "/opt/other: unlabeled (inherited)"
+  secpolicy label set unlabeled /opt/monitor/bin
+  unlabel /opt/monitor/bin/agent
+  secpolicy label relabel --dry-run /opt/monitor/bin/agent
+  exits 0
+  [[ $output == "/opt/monitor/bin/agent: unlabeled (inherited) -> monitorProgram ("* ]]
+  secpolicy label relabel /opt/monitor/bin/agent
+  exits 0
+  [[ $(the_label /opt/monitor/bin/agent) == monitorProgram ]]
 }
 
 @test "get of a label that the policy has dropped says so" {
@@ -93,6 +145,7 @@ secpolicy: label get: failed (2 errors above)" ]]
 
 @test "set does the other files when one fails" {
   boot
+  unlabel / /etc
   touch "$root/etc/new"
   secpolicy label set sshKey /etc/new /no/such /opt
   exits 1
@@ -114,6 +167,7 @@ secpolicy: label set: failed (2 errors above)" ]]
   boot
   secpolicy label set hostConfig /etc/ssh/host_key
   secpolicy label set vmDisk /opt/monitor/bin/agent
+  unlabel / /opt /opt/monitor /opt/monitor/etc
   touch "$root/opt/monitor/etc/new"
   local line
   line=$(grep -n /etc/ssh/host_key "$policy/fileLabels/base" | cut -d: -f1)
@@ -124,8 +178,9 @@ secpolicy: label set: failed (2 errors above)" ]]
   exits 1
   [[ $(sort <<<"$output") == "/etc/ssh/host_key: has hostConfig, the policy says sshKey ($labels/base:$line)
 /opt/monitor/bin/agent: has vmDisk, the policy says monitorProgram ($labels/monitor:$bin)
-/opt/monitor/etc/new: has no label, the policy says monitorConfig ($labels/monitor:$etc)" ]]
-  [[ $stderr =~ ^"secpolicy: label verify: 3 of "[0-9]+" files differ from the policy. 'secpolicy label relabel' gives the policy's labels again"$ ]]
+/opt/monitor/etc/new: has no label, the policy says monitorConfig ($labels/monitor:$etc)
+/opt/monitor/etc: has no label, the policy says monitorConfig ($labels/monitor:$etc)" ]]
+  [[ $stderr =~ ^"secpolicy: label verify: 4 of "[0-9]+" files differ from the policy. 'secpolicy label relabel' gives the policy's labels again"$ ]]
   [[ $(the_label /etc/ssh/host_key) == hostConfig ]]
 }
 
@@ -151,6 +206,7 @@ secpolicy: label verify: failed (1 error above)" ]]
 
 @test "where files without a label are all that differs, verify sends the user to boot" {
   boot
+  unlabel / /etc
   touch "$root/etc/new"
   secpolicy label verify /etc/new
   exits 1
@@ -238,6 +294,7 @@ monitorProgram: 1 of 2 files would be relabelled" ]]
 END
   boot || true
   touch "$root/opt/monitor/bin/a-new-one"
+  unlabel / /opt /opt/monitor /opt/monitor/bin
   secpolicy label set unlabeled /opt/monitor/bin/agent
   local last
   last=$(wc -l <"$policy/fileLabels/monitor")
@@ -249,8 +306,9 @@ END
   says "Error: $labels/monitor:$((last - 3)) : /etc/services.conf: Not a directory"
   says "Error: $labels/monitor:$((last - 2)) : : No such file or directory"
   says "Error: $labels/monitor:$((last - 1)) : Invalid label (appDom) for file /etc"
+  says "Error: /opt/monitor/bin: has no label; 'secpolicy boot' gives every file its first one"
   says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy boot' gives every file its first one"
-  ends_with "secpolicy: label relabel: failed (7 errors above)"
+  ends_with "secpolicy: label relabel: failed (8 errors above)"
   [[ $(the_label /opt/monitor/bin/agent) == monitorProgram ]]
 }
 

@@ -116,9 +116,25 @@ END
     "$(at domains/sshDom '-r /opt/secret')-r /opt/secret r" \
     "  instead: -r /opt/secret rx" \
     "file: leads to /opt/secret/file" \
-    "label: none"
+    "label: unlabeled (inherited)"
   secpolicy why sshDom read /usr/sbin/link/file
   exits 0
+}
+
+@test "the label that a file inherits, with the line that its directory has it from" {
+  boot
+  echo '/etc/ssh vmDisk' >>"$policy/fileLabels/monitor"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  touch "$root/etc/ssh/new"
+  secpolicy why sshDom read /etc/ssh/new
+  exits 0
+  shows "label: vmDisk (inherited)"
+  shows "$(at fileLabels/monitor '/etc/ssh vmDisk')/etc/ssh vmDisk"
+  secpolicy why --format json sshDom read /etc/ssh/new
+  fits_schema why
+  jq -e '.question.file | .label == "vmDisk" and .labelInherited' <<<"$output"
+  secpolicy why --format json sshDom read /etc/ssh
+  jq -e '.question.file | has("labelInherited") | not' <<<"$output"
 }
 
 @test "what a transition leads to can be executed" {

@@ -80,9 +80,11 @@ void HostileTree::SetUp() {
   scratch = name;
   tree = scratch + "/tree";
   outside = scratch + "/outside";
+  unlabelled = scratch + "/unlabelled";
   setenv("SECPOLICY_HOST_STATE", (scratch + "/state/host.db").c_str(), 1);
   MakeDirectory(tree);
   MakeDirectory(outside);
+  Require(mkdir(unlabelled.c_str(), 0755) == 0, unlabelled);
   access = std::make_unique<TeskAccessInterfaceImpl>();
   access->AddLabels({kLabel}, TESKACCESS_LABEL_OBJECT);
 }

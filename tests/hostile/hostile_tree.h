@@ -43,6 +43,8 @@ class HostileTree : public testing::Test {
   // The tree, and the place beside it that no walk may reach.
   const std::string& Tree() const { return tree; }
   const std::string& Outside() const { return outside; }
+  // Beside both, a directory without a label.
+  const std::string& Unlabelled() const { return unlabelled; }
   std::string operator/(const std::string& name) const { return tree + "/" + name; }
 
   void MakeFile(const std::string& path) const;
@@ -57,6 +59,7 @@ class HostileTree : public testing::Test {
   std::string scratch;
   std::string tree;
   std::string outside;
+  std::string unlabelled;
   std::unique_ptr<TeskAccessInterfaceImpl> access;
 };
 

@@ -22,6 +22,9 @@ using Change = std::function<void()>;
 std::map<std::string, Change> before;
 std::map<std::string, Change> after;
 
+// What happens right after the type of the entry of that name was looked at.
+std::map<std::string, Change> afterLook;
+
 void RunOnce(std::map<std::string, Change>& changes, const std::string& path) {
   const auto change = changes.extract(path);
   if (!change.empty()) change.mapped()();
@@ -40,6 +43,14 @@ extern "C" __attribute__((visibility("default"))) int setxattr(const char* path,
   return static_cast<int>(result);
 }
 
+extern "C" __attribute__((visibility("default"))) int statx(int directory, const char* path,
+                                                            int flags, unsigned int mask,
+                                                            struct statx* status) {
+  const auto result = syscall(SYS_statx, directory, path, flags, mask, status);
+  HostileTest::RunOnce(HostileTest::afterLook, path);
+  return static_cast<int>(result);
+}
+
 namespace HostileTest {
 namespace {
 
@@ -48,6 +59,7 @@ class LabelRace : public HostileTree {
   void TearDown() override {
     before.clear();
     after.clear();
+    afterLook.clear();
     HostileTree::TearDown();
   }
 
@@ -73,14 +85,50 @@ TEST_F(LabelRace, FollowsALinkThatReplacedAFileAfterItWasListed) {
 
 TEST_F(LabelRace, GivesNoFirstLabelThroughALink) {
   MakeFile(*this / "victim");
-  const std::string unlabelled = Outside() + "/target";
-  close(open(unlabelled.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0644));
-  before[*this / "victim"] = [&] { ReplaceByLink(*this / "victim", unlabelled); };
+  const std::string target = Unlabelled() + "/target";
+  close(open(target.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0644));
+  before[*this / "victim"] = [&] { ReplaceByLink(*this / "victim", target); };
 
   EXPECT_EQ(LabelTree(), "Unable to set file label (toolLabel) for file " + *this / "victim" +
                              ": No data available");
 
-  EXPECT_EQ(LabelOf(unlabelled), "");
+  EXPECT_EQ(LabelOf(target), "");
+}
+
+// What inherits a label has one.
+TEST_F(LabelRace, FollowsALinkToAFileThatInherits) {
+  MakeFile(*this / "victim");
+  const std::string heir = Outside() + "/target";
+  close(open(heir.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0644));
+  before[*this / "victim"] = [&] { ReplaceByLink(*this / "victim", heir); };
+
+  EXPECT_EQ(LabelTree(), "");
+
+  EXPECT_EQ(LabelOf(heir), kLabel);
+  EXPECT_EQ(LabelOf(Outside()), kFirstLabel);
+}
+
+// A file without a label is looked at once more, and what is written then is written right there.
+TEST_F(LabelRace, FollowsNoLinkThatReplacesAFileOnceItWasFoundToInherit) {
+  const std::string victim = *this / "victim";
+  close(open(victim.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0644));
+  MakeFile(Outside() + "/target");
+  afterLook["victim"] = [&] { ReplaceByLink(victim, Outside() + "/target"); };
+
+  LabelTree();
+
+  EXPECT_TRUE(afterLook.empty());
+  EXPECT_EQ(LabelOf(Outside() + "/target"), kFirstLabel);
+}
+
+TEST_F(LabelRace, GivesAFileThatAppearedTheLabel) {
+  MakeFile(*this / "file");
+  const std::string late = *this / "late";
+  after[Tree()] = [&] { close(open(late.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0644)); };
+
+  EXPECT_EQ(LabelTree(), "");
+
+  EXPECT_EQ(LabelOf(late), kLabel);
 }
 
 TEST_F(LabelRace, LabelsTheTreeBehindALinkThatReplacedADirectory) {
@@ -196,8 +244,6 @@ TEST_F(LabelRace, SurvivesARacerAndKeepsToItsLinks) {
       vanished("files/directory/inner"),
       vanished("files/directory/target"),
       vanished("files/passing"),
-      // It came back, without a first label.
-      "Unable to set file label (toolLabel) for file " + passing + ": No data available",
   };
   const Racer racer([&] {
     Exchange(*this / "files/file", links + "/file");

@@ -47,13 +47,13 @@ void AddPolicy(Syntax& syntax, Arguments& arguments) {
 
 constexpr LabelKind kLabelKinds[] = {
     {"get", "Print the labels of files",
-     "Prints 'PATH: LABEL' for each file. In a tree, links and sockets are left out: they carry "
-     "no\n"
-     "label.\n"
+     "Prints 'PATH: LABEL' for each file, and '(inherited)' where that is the label of a "
+     "directory\n"
+     "above. In a tree, links and sockets are left out: they have no label.\n"
      "\n"
      "Examples:\n"
      "  secpolicy label get /usr/sbin/sshd\n"
-     "  secpolicy label get -R /etc | grep -v ': unlabeled$'",
+     "  secpolicy label get -R /etc | grep -v ': unlabeled'",
      [](Syntax& syntax, Arguments& arguments) {
        AddWholeTrees(syntax, arguments);
        AddPaths(syntax, arguments, "The files", true);

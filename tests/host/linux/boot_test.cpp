@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "host/linux/security_attribute.h"
 #include "host/linux/settings.h"
 #include "orinconfigstore/config_store.h"
 #include "scratch_root.h"
@@ -45,13 +46,12 @@ class Boot : public ::testing::Test {
   ScratchRoot scratch;
 };
 
-// The label that the file at `path` carries, or why it has none.
+// The label that the file at `path` carries itself, or why it has none.
 std::string Label(const std::string& path) {
-  unsigned int id = 0;
-  if (Zorvan::Kernel::GetXattr(path.c_str(), "zorvan.security", &id, sizeof id) != sizeof id) {
-    return std::strerror(errno);
-  }
-  return TeskAccessInterfaceImpl().GetLabel(id, TESKACCESS_LABEL_OBJECT);
+  const auto label = LinuxHost::ReadLabel(path.c_str());
+  if (!label) return std::strerror(errno);
+  if (label->isInherited) return std::strerror(ENODATA);
+  return TeskAccessInterfaceImpl().GetLabel(label->id, TESKACCESS_LABEL_OBJECT);
 }
 
 // The tardisk that the file at `path` came from, as the inode's record names it.
@@ -191,7 +191,7 @@ TEST_F(Boot, MayBeDoneAgain) {
                        .HardLink("usr/same", "usr/program"));
   for (int boot = 1; boot <= 2; ++boot) {
     EXPECT_EQ(
-        BootAnd([] { return Content("/usr/same") + Label("/usr/link") + Origin("/usr/link"); }),
+        BootAnd([] { return Content("/usr/same") + Label("/usr/same") + Origin("/usr/link"); }),
         "codeunlabeleddisk.tgz");
   }
 }

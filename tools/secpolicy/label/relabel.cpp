@@ -27,10 +27,11 @@ class Relabelling {
     ++count.files;
     // Reading is much cheaper than writing, and most files have their label already.
     const auto before = LinuxHost::ReadLabel(file.name);
-    if (before == line.id) return;
+    if (before && before->id == line.id) return;
     if (!before) return run.Error(file.path + ": " + WhyNoLabel(errno));
     if (dryRun) {
-      run.Print(StrCat(file.path, ": ", run.NameOf(*before), " -> ", line.label.label, " (",
+      run.Print(StrCat(file.path, ": ", run.NameOf(before->id),
+                       before->isInherited ? " (inherited)" : "", " -> ", line.label.label, " (",
                        line.Place(), ")"));
     } else if (LinuxHost::ReplaceLabel(file.name, line.id) != 0) {
       return run.Error(StrCat(file.path, ": cannot be given the label ", line.label.label, ": ",

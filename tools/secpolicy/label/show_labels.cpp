@@ -10,12 +10,15 @@ namespace SecPolicyCli {
 namespace {
 
 void ShowLabel(LabelRun& run, const WalkedFile& file) {
+  const auto label = LinuxHost::ReadLabel(file.name);
+  if (!label) return run.Error(file.path + ": " + WhyNoLabel(errno));
+  const std::string inherited = label->isInherited ? " (inherited)" : "";
   try {
-    run.Print(file.path + ": " + SecPolicy::GetFileLabel(file.name, run.access));
+    const std::string name =
+        run.access.GetLabel(label->id, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
+    run.Print(file.path + ": " + name + inherited);
   } catch (const Braxo::Lib::BraxoException&) {
-    // The path that the user knows, and not the name that the walk uses.
-    const auto id = LinuxHost::ReadLabel(file.name);
-    run.Error(file.path + ": " + (id ? "has " + run.NameOf(*id) : WhyNoLabel(errno)));
+    run.Error(file.path + ": has " + run.NameOf(label->id) + inherited);
   }
 }
 

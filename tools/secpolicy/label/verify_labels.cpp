@@ -18,13 +18,14 @@ std::string VerifyLabels(LabelRun& run, const std::string& dir,
   LabelPlan(run, dir).ForEachFile(
       paths, "verifying", [&](const WalkedFile& file, const LabelLine& line) {
         ++files;
-        const auto id = LinuxHost::ReadLabel(file.name);
-        if (id == line.id) return;
-        if (!id && errno != ENODATA) return run.Error(file.path + ": " + WhyNoLabel(errno));
+        const auto label = LinuxHost::ReadLabel(file.name);
+        if (label && label->id == line.id) return;
+        if (!label && errno != ENODATA) return run.Error(file.path + ": " + WhyNoLabel(errno));
         ++different;
-        if (!id) ++withoutLabel;
-        run.Print(StrCat(file.path, ": has ", id ? run.NameOf(*id) : "no label",
-                         ", the policy says ", line.label.label, " (", line.Place(), ")"));
+        if (!label) ++withoutLabel;
+        run.Print(StrCat(file.path, ": has ", label ? run.NameOf(label->id) : "no label",
+                         label && label->isInherited ? " (inherited)" : "", ", the policy says ",
+                         line.label.label, " (", line.Place(), ")"));
       });
   if (different > 0) {
     throw Braxo::Lib::BraxoException(StrCat(

@@ -51,7 +51,7 @@ void WriteFile(const AskedFile& file, std::ostream& output) {
     WriteLine(output, "label: none");
     return;
   }
-  WriteLine(output, "label: " + file.label);
+  WriteLine(output, "label: " + file.label + (file.labelIsInherited ? " (inherited)" : ""));
   if (file.labelOrigin) WriteLine(output, Cite(*file.labelOrigin));
 }
 
@@ -59,6 +59,7 @@ Json FileToJson(const AskedFile& file) {
   Json label;
   if (!file.label.empty()) label = file.label;
   Json json = {{"exists", file.exists}, {"paths", file.paths}, {"label", label}};
+  if (file.labelIsInherited) json["labelInherited"] = true;
   if (file.labelOrigin) {
     json["labelFile"] = file.labelOrigin->file;
     json["labelLine"] = file.labelOrigin->line;

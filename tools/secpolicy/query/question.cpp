@@ -6,6 +6,7 @@
 #include <map>
 
 #include "host/linux/parameter_range.h"
+#include "host/linux/security_attribute.h"
 #include "installed/real_path.h"
 #include "text/suggestion.h"
 
@@ -110,13 +111,24 @@ std::string WithoutTrailingSlashes(std::string path) {
   return path;
 }
 
+// The line for the nearest directory that gave the file the label that it inherits.
+std::optional<LinuxHost::LabelOrigin> FindOriginAbove(const AskedFile& file) {
+  std::string path = file.paths.back();
+  while (path.size() > 1) {
+    path.resize(std::max<std::size_t>(path.rfind('/'), 1));
+    auto origin = LinuxHost::FindLabelOrigin(path);
+    if (origin && origin->label == file.label) return origin;
+  }
+  return std::nullopt;
+}
+
 // The line for one of the paths that gave the label that the file has now.
 std::optional<LinuxHost::LabelOrigin> FindOriginOf(const AskedFile& file) {
   for (const std::string& path : file.paths) {
     auto origin = LinuxHost::FindLabelOrigin(path);
     if (origin && origin->label == file.label) return origin;
   }
-  return std::nullopt;
+  return file.labelIsInherited ? FindOriginAbove(file) : std::nullopt;
 }
 
 AskedFile ExamineFile(const std::string& asked, TeskAccessInterfaceImpl& access) {
@@ -131,6 +143,8 @@ AskedFile ExamineFile(const std::string& asked, TeskAccessInterfaceImpl& access)
   } catch (const BraxoException&) {
     return file;
   }
+  const auto label = LinuxHost::ReadLabel(resolved.c_str());
+  file.labelIsInherited = label && label->isInherited;
   file.labelIsBuiltIn =
       access.IsPredefinedLabel(file.label, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
   file.labelOrigin = FindOriginOf(file);

@@ -47,7 +47,8 @@ std::span<const QuestionForm> QuestionForms();
 struct AskedFile {
   std::vector<std::string> paths;  // as asked and, where that is another path, as it resolves
   bool exists = false;
-  std::string label;  // empty when it carries none
+  std::string label;  // empty when it has none
+  bool labelIsInherited = false;
   bool labelIsBuiltIn = false;
   std::optional<LinuxHost::LabelOrigin> labelOrigin;  // empty when no policy file gave it
 };
