@@ -6,11 +6,11 @@ set(SECPOLICY_HEADERS "${CMAKE_INSTALL_INCLUDEDIR}/libsecpolicy")
 set(SECPOLICY_CMAKE "${CMAKE_INSTALL_LIBDIR}/cmake/secpolicy")
 set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, below the prefix")
 
-# Libraries and headers. A caller's include paths begin at the public header, and at the contract
-# headers that it includes.
-target_include_directories(secpolicy INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
+# Libraries and headers. A caller's include paths begin at the public header, at the contract headers
+# that it includes, and at those of the Linux host.
+target_include_directories(host_contract INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
 set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN" BUILD_WITH_INSTALL_RPATH ON)
-install(TARGETS secpolicy secpolicyhost host_contract EXPORT secpolicyTargets
+install(TARGETS secpolicy secpolicyhost secpolicyhost_headers host_contract EXPORT secpolicyTargets
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}")
 # Never linked to, so without the name for linkers.
 install(TARGETS secpolicyhost_archive
@@ -18,7 +18,7 @@ install(TARGETS secpolicyhost_archive
 install(FILES secpolicy/secpolicy.h secpolicy/export.h
   DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
 install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")
-install(FILES host/linux/mode_param.h DESTINATION "${SECPOLICY_HEADERS}/host/linux")
+install(DIRECTORY host/linux/include/ DESTINATION "${SECPOLICY_HEADERS}")
 
 # For find_package and pkg-config.
 install(EXPORT secpolicyTargets NAMESPACE secpolicy:: DESTINATION "${SECPOLICY_CMAKE}")

@@ -1,5 +1,5 @@
-// A service that confines a job: it makes a domain for it, says what the job may touch, looks at
-// what is installed, and removes the domain when the job is over.
+// A service that confines a job: it makes a domain for it, says what the job may do, looks at what
+// is installed, and removes the domain when the job is over.
 //
 //   c++ -std=c++20 runtime.cpp $(pkg-config --cflags --libs secpolicy) -o runtime
 
@@ -9,12 +9,10 @@
 #include <vector>
 
 #include "secpolicy/secpolicy.h"
+#include "secpolicyhost/mode_param.h"
+#include "secpolicyhost/values.h"
 
 namespace {
-
-constexpr unsigned int kRead = 0x1;
-constexpr unsigned int kWrite = 0x2;
-constexpr unsigned int kExecute = 0x10;
 
 // The policies may change between the two calls; then the library asks for another try.
 std::vector<SecPolicy::TeskAccess_FileRule> ReadFilePolicies(unsigned int domain) {
@@ -39,14 +37,23 @@ int main() {
 
     const unsigned int job =
         SecPolicy::CreateDomain("job7", TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE);
-    SecPolicy::TeskAccess_FileRule allowed[] = {{"/srv/jobs/7", kRead | kWrite},
-                                                {"/usr/bin/convert", kRead | kExecute}};
+    SecPolicy::TeskAccess_FileRule allowed[] = {
+        {"/srv/jobs/7", LinuxHost::kPermitRead | LinuxHost::kPermitWrite},
+        {"/usr/bin/convert", LinuxHost::kPermitRead | LinuxHost::kPermitExecute}};
     unsigned int result = 0;
     SecPolicy::AddFilePolicyBatch(0, job, allowed, 2, &result);
     for (const SecPolicy::TeskAccess_FileRule& rule : ReadFilePolicies(job)) {
       std::cout << SecPolicy::GetDomainNameForID(job) << ": " << rule.path << " 0x" << std::hex
-                << rule.permission << '\n';
+                << rule.permission << std::dec << '\n';
     }
+
+    // It may bind port 80 and no other, which takes the capability and the check.
+    const TeskCtl::Security::TeskAccess_ModeParam webPort{80, 80};
+    SecPolicy::SetCapRule(job, LinuxHost::kCapNetBindService, 1);
+    SecPolicy::SetParamCheckRule(job, LinuxHost::kCheckBindPort, &webPort, 1);
+
+    TeskCtl::Security::TeskAccessInterfaceImpl access;
+    SecPolicy::DisplayDomainPolicy(access, job);
     SecPolicy::DestroyDomain(job);
   } catch (const Braxo::Lib::BraxoException& failure) {
     std::cerr << failure.what() << '\n';

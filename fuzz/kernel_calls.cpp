@@ -23,7 +23,7 @@
 #include <vector>
 
 #include "host_state.h"
-#include "mode_param.h"
+#include "secpolicyhost/mode_param.h"
 #include "support/caller_memory.h"
 #include "support/outcome.h"
 #include "support/reference_reader.h"

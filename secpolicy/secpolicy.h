@@ -292,6 +292,9 @@ SECPOLICY_EXPORT void RetrieveFilePolicies(unsigned int domainId, TeskAccess_Fil
 SECPOLICY_EXPORT void ReplaceFilePolicyVMs(const std::string& oldPath, const std::string& newPath);
 
 // ---- Runtime interface: capabilities and parameter checks -------------------------------------
+//
+// The numbers are the host's, and so are their names and TeskAccess_ModeParam: of the Linux host in
+// "secpolicyhost/values.h" and "secpolicyhost/mode_param.h".
 
 // Grants (`grant` not 0) or revokes the capability, 0 to 18, for the domain `domainId`.
 SECPOLICY_EXPORT void SetCapRule(unsigned int domainId, TeskAccess_Capability capability,

@@ -19,7 +19,8 @@ struct PermissionLetter {
   char letter;
   unsigned int bit;
 };
-constexpr std::array<PermissionLetter, 3> kLetters = {{{'r', 0x1}, {'w', 0x2}, {'x', 0x10}}};
+constexpr std::array<PermissionLetter, 3> kLetters = {
+    {{'r', kPermitRead}, {'w', kPermitWrite}, {'x', kPermitExecute}}};
 
 void RequirePath(const std::string& path) {
   if (path.empty()) throw HostError(EINVAL, "a file policy needs a path");

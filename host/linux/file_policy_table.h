@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "rule_table.h"
+#include "secpolicyhost/values.h"
 #include "store.h"
 
 namespace LinuxHost {
@@ -14,8 +15,8 @@ class HostState;
 // The longest path of a file policy in bytes.
 constexpr std::size_t kMaxPolicyPath = 1983;
 
-// Every permission bit: read, write, execute.
-constexpr unsigned int kAllPermissions = 0x1 | 0x2 | 0x10;
+// Every permission bit.
+constexpr unsigned int kAllPermissions = kPermitRead | kPermitWrite | kPermitExecute;
 
 // What a domain, or one world in it, may do with a path.
 struct FilePolicy {

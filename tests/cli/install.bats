@@ -10,12 +10,15 @@ setup_file() {
   export PKG_CONFIG_PATH=$(dirname "$(find "$PREFIX" -name secpolicy.pc)")
 }
 
-# runs_as_service PROGRAM: the program is the runtime example, and works.
+# runs_as_service PROGRAM: the program is the runtime example, and works. It needs both libraries: it
+# calls the one, and makes the connection that it hands to it from the other.
 runs_as_service() {
   SECPOLICY_HOST_STATE=$BATS_TEST_TMPDIR/state/host.db LD_LIBRARY_PATH=$(dirname "$PKG_CONFIG_PATH") \
     run --separate-stderr "$1"
   exits 0
   shows "job7: /usr/bin/convert 0x11"
+  shows "-c cap_net_bind_service grant"
+  shows "-p bind_port 80 grant"
 }
 
 @test "a program builds with pkg-config against what is installed" {

@@ -75,7 +75,21 @@ as_nobody() {
   exits 0
   [[ $output == "This service runs in hostDom
 job7: /srv/jobs/7 0x3
-job7: /usr/bin/convert 0x11" ]]
+job7: /usr/bin/convert 0x11
+
+
+-----------------------------------------------------------
+Domain Name: job7 Domain ID :2 Enforcement Level: enforcing
+State: 8 RefCount: 0 WorldRefCount: 0 defaultDom: 0
+-----------------------------------------------------------
+-c cap_net_bind_service grant
+
+
+-p bind_port 80 grant
+
+
+-r /srv/jobs/7 rw
+-r /usr/bin/convert rx" ]]
 }
 
 @test "where nothing is installed, the verbs that look say what to do and make nothing" {

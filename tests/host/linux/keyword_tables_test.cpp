@@ -6,6 +6,7 @@
 
 #include "host/linux/host_state.h"
 #include "message_of.h"
+#include "secpolicyhost/values.h"
 #include "state_directory.h"
 
 namespace LinuxHostTest {
@@ -65,6 +66,47 @@ TEST_F(KeywordTables, NumberTheParameterChecks) {
                            Pair("set_uid", 8), Pair("set_gid", 9)));
   EXPECT_EQ(LinuxHost::ParameterCheckWord(9), "set_gid");
   EXPECT_EQ(MessageOf([] { LinuxHost::ParameterCheckWord(10); }), "unknown parameter check 10");
+}
+
+TEST_F(KeywordTables, NumberCapabilitiesAsTheInstalledHeaderDoes) {
+  const std::map<std::string, long> expected = {
+      {"cap_chown", LinuxHost::kCapChown},
+      {"cap_dac_override", LinuxHost::kCapDacOverride},
+      {"cap_dac_read_search", LinuxHost::kCapDacReadSearch},
+      {"cap_fowner", LinuxHost::kCapFowner},
+      {"cap_fsetid", LinuxHost::kCapFsetid},
+      {"cap_kill", LinuxHost::kCapKill},
+      {"cap_setgid", LinuxHost::kCapSetgid},
+      {"cap_setuid", LinuxHost::kCapSetuid},
+      {"cap_setpcap", LinuxHost::kCapSetpcap},
+      {"cap_net_bind_service", LinuxHost::kCapNetBindService},
+      {"cap_net_admin", LinuxHost::kCapNetAdmin},
+      {"cap_net_raw", LinuxHost::kCapNetRaw},
+      {"cap_ipc_lock", LinuxHost::kCapIpcLock},
+      {"cap_sys_module", LinuxHost::kCapSysModule},
+      {"cap_sys_rawio", LinuxHost::kCapSysRawio},
+      {"cap_sys_chroot", LinuxHost::kCapSysChroot},
+      {"cap_sys_ptrace", LinuxHost::kCapSysPtrace},
+      {"cap_sys_admin", LinuxHost::kCapSysAdmin},
+      {"cap_sys_boot", LinuxHost::kCapSysBoot},
+  };
+  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
+}
+
+TEST_F(KeywordTables, NumberParameterChecksAsTheInstalledHeaderDoes) {
+  const std::map<std::string, long> expected = {
+      {"socket_family", LinuxHost::kCheckSocketFamily},
+      {"socket_type", LinuxHost::kCheckSocketType},
+      {"bind_port", LinuxHost::kCheckBindPort},
+      {"connect_port", LinuxHost::kCheckConnectPort},
+      {"ioctl_request", LinuxHost::kCheckIoctlRequest},
+      {"prctl_option", LinuxHost::kCheckPrctlOption},
+      {"clone_flags", LinuxHost::kCheckCloneFlags},
+      {"kill_signal", LinuxHost::kCheckKillSignal},
+      {"set_uid", LinuxHost::kCheckSetUid},
+      {"set_gid", LinuxHost::kCheckSetGid},
+  };
+  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK), expected);
 }
 
 TEST_F(KeywordTables, NumberTheKinds) {
