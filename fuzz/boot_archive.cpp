@@ -39,6 +39,7 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr int kSkipped = 77;
+const LinuxHost::TardiskRules kRules{.policyRoot = "/etc/zorvan/secpolicy", .policyTardisks = {}};
 constexpr rlim_t kLargestFile = 4 << 20;
 
 // ---- The archive.
@@ -142,10 +143,15 @@ class World {
 
   // Returns why the archive was refused, empty when it was not.
   std::string Unpack(std::vector<LinuxHost::InodeOrigin>& origins) const {
+    LinuxHost::AssembledRoot assembled;
+
     const bool entered = chroot(path.c_str()) == 0 && chdir("/inside/root") == 0;
     Require(entered, "the root can be entered");
-    const std::string failure = FailureOf(
-        [&] { LinuxHost::UnpackTardisk("/image.tgz", LinuxHost::LabelAttribute(), origins); });
+    const std::string failure = FailureOf([&] {
+      assembled.labelAttribute = LinuxHost::LabelAttribute();
+      LinuxHost::UnpackTardisks({"/image.tgz"}, kRules, assembled);
+    });
+    origins = assembled.origins;
     struct stat here {
     }, root{};
     const bool stayed = stat(".", &here) == 0 && stat("/inside/root", &root) == 0 &&

@@ -1,7 +1,8 @@
 // All that libsecpolicyhost-archive.so shows. Found by its name, which C++ would decorate.
+#include "archive_entry_point.h"
+
 #include "tardisk_archive.h"
 
-extern "C" __attribute__((visibility("default"))) void SecPolicyHostUnpackArchive(
-    const std::string& image, const LinuxHost::Arrival& arrived) {
-  LinuxHost::UnpackArchive(image, arrived);
-}
+extern "C" __attribute__((visibility("default")))
+const LinuxHost::ArchiveFunctions SecPolicyHostArchive = {LinuxHost::CheckArchives,
+                                                          LinuxHost::UnpackArchive};

@@ -6,19 +6,17 @@
 #include <cerrno>
 #include <string>
 
+#include "archive_entry_point.h"
 #include "braxo/misc/strcat.h"
 #include "host_error.h"
-#include "tardisk_archive.h"
 
 using Braxo::Misc::StrCat;
 
 namespace LinuxHost {
 namespace {
 
-using Unpack = decltype(&UnpackArchive);
-
 constexpr char kLibrary[] = "libsecpolicyhost-archive.so.1";
-constexpr char kEntryPoint[] = "SecPolicyHostUnpackArchive";
+constexpr char kEntryPoint[] = "SecPolicyHostArchive";
 
 // libarchive converts names with iconv, whose configuration says which libraries convert what. It
 // is read once, at first use: here, and not below a root that belongs to somebody else.
@@ -35,18 +33,18 @@ void* Open() {
   return library != nullptr ? library : dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
 }
 
-Unpack Load() {
+const ArchiveFunctions& Load() {
   void* const library = Open();
   void* const entryPoint = library == nullptr ? nullptr : dlsym(library, kEntryPoint);
-  if (entryPoint != nullptr) return reinterpret_cast<Unpack>(entryPoint);
+  if (entryPoint != nullptr) return *static_cast<const ArchiveFunctions*>(entryPoint);
   throw HostError(ELIBACC, StrCat("Unable to load what unpacks tardisks: ", dlerror(),
                                   ". It belongs beside libsecpolicyhost.so.1: "
                                   "install that again"));
 }
 
-Unpack Loaded() {
-  static const Unpack unpack = Load();
-  return unpack;
+const ArchiveFunctions& Loaded() {
+  static const ArchiveFunctions& functions = Load();
+  return functions;
 }
 
 }  // namespace
@@ -56,6 +54,13 @@ void LoadArchiveLibrary() {
   ReadConversions();
 }
 
-void UnpackArchive(const std::string& image, const Arrival& arrived) { Loaded()(image, arrived); }
+void CheckArchives(const std::vector<std::string>& images, const TardiskRules& rules,
+                   ArchiveInspector& inspector) {
+  Loaded().check(images, rules, inspector);
+}
+
+void UnpackArchive(const std::string& image, const TardiskRules& rules, const Arrival& arrived) {
+  Loaded().unpack(image, rules, arrived);
+}
 
 }  // namespace LinuxHost

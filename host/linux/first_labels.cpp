@@ -8,6 +8,7 @@
 #include <cerrno>
 #include <cstddef>
 #include <cstring>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -56,7 +57,9 @@ class Failures {
 // planted on the way nor a tree of any depth leads it astray.
 class Walk {
  public:
-  explicit Walk(const std::string& name) : attribute(name) {}
+  // `labelling` labels the file of a name in the working directory: 0, or -1 with errno set.
+  Walk(const std::string& name, const std::function<int(const char*)>& labelling)
+      : attribute(name), label(labelling) {}
 
   void Run() {
     struct stat status;
@@ -85,7 +88,7 @@ class Walk {
   };
 
   void Label(const char* name, const struct stat& status) {
-    if (!CanCarryLabel(status.st_mode, attribute) || GiveFirstLabel(name, attribute) == 0) return;
+    if (!CanCarryLabel(status.st_mode, attribute) || label(name) == 0) return;
     failures.Add(StrCat(path, "/", name), errno);
   }
 
@@ -141,6 +144,7 @@ class Walk {
   }
 
   const std::string& attribute;
+  const std::function<int(const char*)>& label;
   dev_t rootDevice = 0;
   std::string path;  // of where the walk is, without the slash of the root
   std::vector<Level> levels;
@@ -149,6 +153,17 @@ class Walk {
 
 }  // namespace
 
-void GiveFirstLabels(const std::string& attribute) { Walk(attribute).Run(); }
+void GiveFirstLabels(const std::string& attribute) {
+  Walk(attribute, [&](const char* name) { return GiveFirstLabel(name, attribute); }).Run();
+}
+
+std::size_t CountFirstLabels(const std::string& attribute) {
+  std::size_t count = 0;
+  Walk(attribute, [&](const char* /*name*/) {
+    ++count;
+    return 0;
+  }).Run();
+  return count;
+}
 
 }  // namespace LinuxHost

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <string>
 
 namespace LinuxHost {
@@ -10,5 +11,8 @@ namespace LinuxHost {
 // systems mounted beneath it. Changes the working directory while it runs, and leaves it changed
 // when it throws. Throws HostError when files could not be labelled, after all others were.
 void GiveFirstLabels(const std::string& attribute);
+
+// How many files that would be.
+std::size_t CountFirstLabels(const std::string& attribute);
 
 }  // namespace LinuxHost

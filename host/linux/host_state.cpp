@@ -1,5 +1,8 @@
 #include "host_state.h"
 
+#include <sys/stat.h>
+
+#include <cerrno>
 #include <filesystem>
 
 #include "domain_table.h"
@@ -82,6 +85,8 @@ CREATE TABLE inode_origin (
   tardisk TEXT NOT NULL,
   path TEXT NOT NULL,
   birth INTEGER NOT NULL,
+  size INTEGER NOT NULL,
+  modified INTEGER NOT NULL,
   PRIMARY KEY (device, inode)
 ) WITHOUT ROWID;
 CREATE TABLE rule_origin (
@@ -118,7 +123,7 @@ constexpr StoreLayout kLayout = {
     .purpose = "host state",
     .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
     .applicationId = 0x5a6f7276,
-    .version = 2,
+    .version = 3,
     .schema = kSchema,
     .survivesPowerLoss = false,
 };
@@ -133,6 +138,14 @@ HostState& HostState::Current() {
     current = std::make_shared<HostState>(path);
   }
   return *current;
+}
+
+HostState* HostState::Find() {
+  struct stat status;
+  // Anything but a missing file is for the store to judge.
+  const bool isMissing =
+      lstat(StatePath().c_str(), &status) != 0 && (errno == ENOENT || errno == ENOTDIR);
+  return isMissing ? nullptr : &Current();
 }
 
 HostState::HostState(const std::string& path)
@@ -195,22 +208,26 @@ void HostState::Reset() {
 void HostState::RecordOrigins(std::span<const InodeOrigin> origins) {
   Transaction transaction(store);
   for (const auto& origin : origins) {
-    store.Run("INSERT OR REPLACE INTO inode_origin VALUES (?1, ?2, ?3, ?4, ?5)", origin.device,
-              origin.inode, origin.tardisk, origin.path, origin.birth);
+    store.Run("INSERT OR REPLACE INTO inode_origin VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7)",
+              origin.device, origin.inode, origin.tardisk, origin.path, origin.birth, origin.size,
+              origin.modified);
   }
   transaction.Commit();
 }
 
 std::optional<InodeOrigin> HostState::FindOrigin(dev_t device, ino_t inode) {
-  Rows rows =
-      store.Select("SELECT tardisk, path, birth FROM inode_origin WHERE device = ?1 AND inode = ?2",
-                   device, inode);
+  Rows rows = store.Select(
+      "SELECT tardisk, path, birth, size, modified FROM inode_origin WHERE device = ?1 AND inode = "
+      "?2",
+      device, inode);
   if (!rows.Next()) return std::nullopt;
   return InodeOrigin{.device = device,
                      .inode = inode,
                      .tardisk = rows.Text(0),
                      .path = rows.Text(1),
-                     .birth = rows.Integer(2)};
+                     .birth = rows.Integer(2),
+                     .size = static_cast<std::uint64_t>(rows.Integer(3)),
+                     .modified = rows.Integer(4)};
 }
 
 const std::string& HostState::LabelAttribute() {

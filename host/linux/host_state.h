@@ -26,8 +26,11 @@ class HostState : public std::enable_shared_from_this<HostState> {
  public:
   // The calling thread's connection, opened, and the state created with its built-in contents, at
   // first use, of the state at StatePath(). A new connection replaces one whose file is gone, or
-  // that a fork left behind. The reference holds until the next call of Current().
+  // that a fork left behind. The reference holds until the next call of Current() or Find().
   static HostState& Current();
+
+  // The same, but null where there is no state.
+  static HostState* Find();
 
   explicit HostState(const std::string& path);
   HostState(const HostState&) = delete;

@@ -7,21 +7,20 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <climits>
 #include <cstring>
 #include <filesystem>
-#include <memory>
 #include <new>
-#include <set>
 #include <string_view>
-#include <utility>
 #include <vector>
 
+#include "archive_admission.h"
+#include "archive_handle.h"
+#include "archive_path.h"
 #include "braxo/misc/strcat.h"
 #include "descriptor.h"
 #include "host_error.h"
 #include "inode_origin.h"
-#include "running_system.h"
+#include "tar_reader.h"
 
 namespace LinuxHost {
 namespace {
@@ -33,30 +32,8 @@ constexpr int kUnpackFlags = ARCHIVE_EXTRACT_PERM | ARCHIVE_EXTRACT_TIME |
                              ARCHIVE_EXTRACT_SECURE_SYMLINKS | ARCHIVE_EXTRACT_SECURE_NODOTDOT |
                              ARCHIVE_EXTRACT_SECURE_NOABSOLUTEPATHS;
 
-struct FreeReader {
-  void operator()(archive* reader) const { archive_read_free(reader); }
-};
-struct FreeWriter {
-  void operator()(archive* writer) const { archive_write_free(writer); }
-};
-using Reader = std::unique_ptr<archive, FreeReader>;
-using Writer = std::unique_ptr<archive, FreeWriter>;
-
-// Only what a tar archive needs: every other format is attack surface, and some read local files
-// by name.
-Reader NewReader() {
-  Reader reader(archive_read_new());
-  if (!reader) throw std::bad_alloc();
-  archive_read_support_format_tar(reader.get());
-  archive_read_support_filter_gzip(reader.get());
-  archive_read_support_filter_bzip2(reader.get());
-  archive_read_support_filter_xz(reader.get());
-  archive_read_support_filter_zstd(reader.get());
-  return reader;
-}
-
-Writer NewWriter() {
-  Writer writer(archive_write_disk_new());
+ArchiveWriter NewWriter() {
+  ArchiveWriter writer(archive_write_disk_new());
   if (!writer) throw std::bad_alloc();
   // Only the superuser can give files away.
   archive_write_disk_set_options(writer.get(),
@@ -64,160 +41,177 @@ Writer NewWriter() {
   return writer;
 }
 
-std::string_view TextOf(const char* text) { return text == nullptr ? "" : text; }
+std::string NameOf(const std::string& image) { return std::filesystem::path(image).filename(); }
 
-// Why the last step failed. The library leaves the system's own text out, and tells a malformed
-// archive by an error number of the system, EILSEQ, that would only confuse.
-std::string ReasonOf(archive* handle) {
-  const std::string_view text = TextOf(archive_error_string(handle));
-  const int error = archive_errno(handle);
-  if (error <= 0 || error == EILSEQ) return std::string(text);
-  return StrCat(text, ": ", std::strerror(error));
-}
+std::string PathOf(archive_entry* entry) { return PlainPath(archive_entry_pathname(entry)); }
 
-// The components of `path` that lead somewhere: neither empty ones nor ".".
-std::vector<std::string_view> Components(std::string_view path) {
-  std::vector<std::string_view> components;
-  while (!path.empty()) {
-    const std::string_view component = path.substr(0, path.find('/'));
-    path.remove_prefix(std::min(component.size() + 1, path.size()));
-    if (!component.empty() && component != ".") components.push_back(component);
+// Takes a step with the tardisk in `image`; its failure gets the tardisk's name.
+template <class Step>
+void WithName(const std::string& image, Step step) {
+  try {
+    step();
+  } catch (const HostError& error) {
+    throw HostError(error.Code(),
+                    StrCat("Unable to unpack tardisk ", NameOf(image), ": ", error.what()));
   }
-  return components;
 }
 
-// The path of an entry as it is found in the root: behind a link, "/" and "/." would lead on to
-// what the link points to.
-std::string PlainPath(std::string_view path) {
-  std::string plain;
-  for (const std::string_view component : Components(path)) {
-    if (!plain.empty()) plain += '/';
-    plain += component;
-  }
-  return plain;
-}
-
-// One archive on its way into the working directory.
-class Unpacking {
+// Compares the file at `path` with the content that an archive has for it, piece by piece.
+class ContentComparison {
  public:
-  Unpacking(const std::string& image, const Arrival& receiver)
-      : tardisk(std::filesystem::path(image).filename()),
-        arrived(receiver),
-        file(open(image.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC)),
-        reader(NewReader()),
-        writer(NewWriter()) {
-    if (!file.IsOpen()) Fail(errno, std::strerror(errno));
-    if (archive_read_open_fd(reader.get(), file.Number(), kBlockSize) != ARCHIVE_OK) {
-      FailReading();
+  explicit ContentComparison(const std::string& path)
+      : file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK)) {}
+
+  bool HasZerosUpTo(std::uint64_t end) {
+    static constexpr char kZeros[4096] = {};
+    bool same = true;
+    while (same && position < end) {
+      same = HasNext({kZeros, static_cast<std::size_t>(
+                                  std::min<std::uint64_t>(sizeof kZeros, end - position))});
     }
+    return same;
   }
+
+  bool HasNext(std::string_view bytes) {
+    buffer.resize(bytes.size());
+    const ssize_t count =
+        pread(file.Number(), buffer.data(), buffer.size(), static_cast<off_t>(position));
+    position += bytes.size();
+    return count == static_cast<ssize_t>(bytes.size()) &&
+           std::memcmp(buffer.data(), bytes.data(), bytes.size()) == 0;
+  }
+
+ private:
+  const Descriptor file;
+  std::uint64_t position = 0;
+  std::vector<char> buffer;
+};
+
+// One archive, read to its end.
+class Checking {
+ public:
+  Checking(const std::string& image, ArchiveAdmission& judge, ArchiveInspector& observer)
+      : reader(image), admission(judge), inspector(observer) {}
 
   void Run() {
-    while (archive_entry* entry = NextEntry()) Unpack(entry);
-    // Attributes of directories are set last, or they would change while the files are written.
-    if (archive_write_close(writer.get()) != ARCHIVE_OK) {
-      Fail(archive_errno(writer.get()), ReasonOf(writer.get()));
+    while (archive_entry* entry = reader.Next()) {
+      if (admission.Admits(entry)) Inspect(entry);
+      ContentPiece rest;
+      while (reader.ReadContent(&rest)) continue;
     }
   }
 
  private:
-  static constexpr std::size_t kBlockSize = 65536;
-
-  [[noreturn]] void Fail(int error, std::string_view reason) const {
-    throw HostError(error > 0 ? error : EINVAL,
-                    StrCat("Unable to unpack tardisk ", tardisk, ": ", reason));
+  void Inspect(archive_entry* entry) {
+    ArchiveFinding finding{
+        .path = PathOf(entry), .type = TypeOf(entry), .present = 0, .differs = false};
+    struct statx present;
+    if (Examine(finding.path.c_str(), &present)) {
+      finding.present = present.stx_mode & S_IFMT;
+      finding.differs = !S_ISDIR(finding.present) &&
+                        inspector.WantsComparison(finding.path, present) &&
+                        Differs(entry, finding, present);
+    }
+    inspector.Take(finding);
   }
 
-  [[noreturn]] void FailReading() const {
-    Fail(archive_errno(reader.get()), ReasonOf(reader.get()));
+  // A hard link is to a file that the archive brought.
+  static mode_t TypeOf(archive_entry* entry) {
+    return archive_entry_hardlink(entry) != nullptr ? S_IFREG : archive_entry_filetype(entry);
   }
 
-  [[noreturn]] void Refuse(std::string_view path, std::string_view reason) const {
-    Fail(EINVAL, StrCat(path, ": ", reason));
+  bool Differs(archive_entry* entry, const ArchiveFinding& finding, const struct statx& present) {
+    if (const char* target = archive_entry_hardlink(entry)) return !IsSameFile(target, present);
+    if (finding.type != finding.present) return true;
+    if (S_ISLNK(finding.type)) return HasOtherTarget(entry, finding.path);
+    return S_ISREG(finding.type) && HasOtherContent(entry, finding.path, present);
   }
 
-  // Null after the last entry. A warning is about a name that is not text, which a name need not
-  // be.
-  archive_entry* NextEntry() const {
-    archive_entry* entry = nullptr;
-    const int result = archive_read_next_header(reader.get(), &entry);
-    if (result == ARCHIVE_EOF) return nullptr;
-    if (result != ARCHIVE_OK && result != ARCHIVE_WARN) FailReading();
-    return entry;
+  // Then it is compared at the other name.
+  static bool IsSameFile(const char* path, const struct statx& present) {
+    struct statx other;
+    return Examine(path, &other) && other.stx_ino == present.stx_ino &&
+           DeviceOf(other) == DeviceOf(present);
   }
 
+  static bool HasOtherTarget(archive_entry* entry, const std::string& path) {
+    std::error_code error;
+    const std::string target = std::filesystem::read_symlink(path, error);
+    return error || target != archive_entry_symlink(entry);
+  }
+
+  bool HasOtherContent(archive_entry* entry, const std::string& path, const struct statx& present) {
+    const auto size = static_cast<std::uint64_t>(archive_entry_size(entry));
+    if (size != present.stx_size) return true;
+    ContentComparison comparison(path);
+    ContentPiece piece;
+    while (reader.ReadContent(&piece)) {
+      if (!comparison.HasZerosUpTo(piece.offset) || !comparison.HasNext(piece.bytes)) return true;
+    }
+    return !comparison.HasZerosUpTo(size);
+  }
+
+  TarReader reader;
+  ArchiveAdmission& admission;
+  ArchiveInspector& inspector;
+};
+
+// One archive on its way into the working directory.
+class Unpacking {
+ public:
+  Unpacking(const std::string& image, const TardiskRules& rules, const Arrival& receiver)
+      : arrived(receiver), admission(rules), reader(image), writer(NewWriter()) {
+    admission.Begin(NameOf(image));
+  }
+
+  void Run() {
+    while (archive_entry* entry = reader.Next()) {
+      // It may have been changed since it was checked.
+      if (admission.Admits(entry)) Unpack(entry);
+    }
+    // Attributes of directories are set last, or they would change while the files are written.
+    if (archive_write_close(writer.get()) == ARCHIVE_OK) return;
+    const int error = archive_errno(writer.get());
+    throw HostError(error > 0 ? error : EINVAL, ReasonOf(writer.get()));
+  }
+
+ private:
   void Unpack(archive_entry* entry) {
-    const std::string path(TextOf(archive_entry_pathname(entry)));
-    if (IsAlreadyThere(path, entry)) return;
-    RefuseUnwanted(path, entry);
-    if (archive_read_extract2(reader.get(), entry, writer.get()) != ARCHIVE_OK) {
-      Fail(archive_errno(reader.get()), StrCat(path, ": ", ReasonOf(reader.get())));
-    }
-    Settle(PlainPath(path));
-  }
-
-  // The root itself, and a running system's directory, which another file system may cover by now.
-  static bool IsAlreadyThere(const std::string& path, archive_entry* entry) {
-    if (archive_entry_filetype(entry) != AE_IFDIR || path.starts_with('/')) return false;
-    const std::vector<std::string_view> components = Components(path);
-    if (components.empty()) return !path.empty();
-    struct stat status;
-    return components.size() == 1 && IsRunningSystem(components[0]) &&
-           lstat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode);
-  }
-
-  void RefuseUnwanted(const std::string& path, archive_entry* entry) const {
-    if (path.empty()) Refuse("an entry", "It has no name");
-    if (path.size() >= PATH_MAX) Refuse(path, "Its name is too long");
-    RefuseForeignPlace(path, entry);
-    if (const char* target = archive_entry_hardlink(entry)) return RefuseForeignLink(path, target);
-    switch (archive_entry_filetype(entry)) {
-      case AE_IFREG:
-      case AE_IFDIR:
-      case AE_IFLNK:
-      case AE_IFIFO:
-        return;
-      default:
-        Refuse(path, "Devices and sockets are made by the running system");
+    const std::string name = archive_entry_pathname(entry);
+    try {
+      reader.Extract(entry, writer.get());
+      Settle(PlainPath(name));
+    } catch (const HostError& error) {
+      throw HostError(error.Code(), StrCat(name, ": ", error.what()));
     }
   }
 
-  // Which images make up the root is decided before the first of them is unpacked.
-  void RefuseForeignPlace(const std::string& path, archive_entry* entry) const {
-    const std::vector<std::string_view> components = Components(path);
-    if (components.empty()) Refuse(path, "It is the root");
-    if (components.size() == 1 && archive_entry_filetype(entry) == AE_IFDIR) return;
-    if (IsRunningSystem(components[0])) Refuse(path, "It belongs to the running system");
-    if (components[0] == "tardisks") Refuse(path, "It belongs to the tardisk images");
-  }
-
-  // Otherwise a tardisk could write to a file of somebody else, and pass for where it came from.
-  void RefuseForeignLink(const std::string& path, const char* target) const {
+  void Settle(const std::string& path) const {
     struct statx status;
-    if (Examine(target, &status) && brought.contains({DeviceOf(status), status.stx_ino})) return;
-    Refuse(path, StrCat("It is a hard link to ", target, ", which this tardisk did not bring"));
+    const int error = Examine(path.c_str(), &status) ? arrived(path, status) : errno;
+    if (error != 0) throw HostError(error, std::strerror(error));
   }
 
-  void Settle(const std::string& path) {
-    struct statx status;
-    if (!Examine(path.c_str(), &status)) Fail(errno, StrCat(path, ": ", std::strerror(errno)));
-    const int error = arrived(path, status);
-    if (error != 0) Fail(error, StrCat(path, ": ", std::strerror(error)));
-    brought.emplace(DeviceOf(status), status.stx_ino);
-  }
-
-  const std::string tardisk;
   const Arrival& arrived;
-  const Descriptor file;
-  const Reader reader;
-  const Writer writer;
-  std::set<std::pair<dev_t, ino_t>> brought;
+  ArchiveAdmission admission;
+  TarReader reader;
+  const ArchiveWriter writer;
 };
 
 }  // namespace
 
-void UnpackArchive(const std::string& image, const Arrival& arrived) {
-  Unpacking(image, arrived).Run();
+void CheckArchives(const std::vector<std::string>& images, const TardiskRules& rules,
+                   ArchiveInspector& inspector) {
+  ArchiveAdmission admission(rules);
+  for (const std::string& image : images) {
+    admission.Begin(NameOf(image));
+    inspector.Begin(NameOf(image));
+    WithName(image, [&] { Checking(image, admission, inspector).Run(); });
+  }
+}
+
+void UnpackArchive(const std::string& image, const TardiskRules& rules, const Arrival& arrived) {
+  WithName(image, [&] { Unpacking(image, rules, arrived).Run(); });
 }
 
 }  // namespace LinuxHost

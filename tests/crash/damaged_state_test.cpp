@@ -63,9 +63,9 @@ const std::string kChmod = ". Take that right from them (chmod go-w), or choose 
 
 const std::vector<Fault> kFaults = {
     {"ItIsOfANewerSchema",
-     [](const auto& state) { StateFile(state).Execute("PRAGMA user_version = 3"); },
+     [](const auto& state) { StateFile(state).Execute("PRAGMA user_version = 4"); },
      std::string(kUseless) +
-         "has schema 3, this program works with schema 2: it was made by another version of it" +
+         "has schema 4, this program works with schema 3: it was made by another version of it" +
          kMakeANewOne},
     {"ItWasCutOff",
      [](const auto& state) {

@@ -24,7 +24,8 @@ void LoadEarly() {
 }
 
 void BootAndLoad(LoadTiming& timing) {
-  LinuxHost::StartPolicy(LinuxHost::AssembleRoot());
+  LinuxHost::StartPolicy(
+      LinuxHost::AssembleRoot({.policyRoot = SecPolicy::kPolicyRoot, .policyTardisks = {}}));
   timing.EndPhase("first labels");
   timing.BeginPart("early ");
   LoadEarly();
