@@ -8,6 +8,14 @@ _secpolicy_saved() {
   done
 }
 
+# The names of the tardisks below the root $1.
+_secpolicy_tardisks() {
+  local file
+  for file in "$1"/tardisks/*; do
+    [[ -f $file ]] && basename "$file"
+  done
+}
+
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
   local verbs='boot check load load-early restore status display why who-can graph diff save history rollback label settings'
@@ -15,7 +23,7 @@ _secpolicy() {
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy ]]; then
+    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy || $word == --policy-from ]]; then
       index=$((index + 1))
       [[ $word == --root ]] && root=${COMP_WORDS[index]}
     elif [[ $word == -* ]]; then
@@ -35,7 +43,7 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
-  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load) && $previous == --format ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load || $verb == boot) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
   elif [[ $verb == graph && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'dot svg' -- "$current")
@@ -49,7 +57,11 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
-  elif [[ ($verb == boot || $verb == load-early) && $current == -* ]]; then
+  elif [[ $verb == boot && $previous == --policy-from ]]; then
+    mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_tardisks "$root")" -- "$current")
+  elif [[ $verb == boot && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--plan --policy-from --timing --format --root --verbose --help -v -h' -- "$current")
+  elif [[ $verb == load-early && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--timing --root --verbose --help -v -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--timing --plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")

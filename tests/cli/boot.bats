@@ -113,3 +113,184 @@ all" ]]
   says "/etc/zorvan/secpolicy/early/domains/hostDom: 1 error"
   says "/etc/zorvan/secpolicy/domains/hostDom: 1 error"
 }
+
+# ---- What a boot does to files
+
+# add_tardisk NAME DIR: packs DIR as the tardisk NAME.
+add_tardisk() {
+  tar --directory "$2" --create --owner=0 --group=0 --mode=go-w --gzip --file "$root/tardisks/$1" .
+}
+
+@test "boot refuses a tardisk that was cut off, and leaves what was there" {
+  boot
+  local before
+  before=$("$SECPOLICY" --root "$root" display 2>/dev/null)
+  rm "$root/usr/sbin/sshd"
+  gzip -dc "$root/tardisks/monitor.tgz" | head -c -10240 >"$root/tardisks/monitor.tar"
+  rm "$root/tardisks/monitor.tgz"
+  secpolicy boot
+  exits 1
+  [[ ${stderr##*$'\n'} == "secpolicy: boot: Unable to unpack tardisk monitor.tar: "* ]]
+  [[ ! -e $root/usr/sbin/sshd ]]
+  [[ $("$SECPOLICY" --root "$root" display 2>/dev/null | grep -v 'tardisks/') == "$(grep -v 'tardisks/' <<<"$before")" ]]
+}
+
+@test "only a tardisk that is named brings the policy" {
+  mkdir -p "$BATS_TEST_TMPDIR/addon/etc/zorvan/secpolicy/domains"
+  echo "-c cap_sys_module grant" >"$BATS_TEST_TMPDIR/addon/etc/zorvan/secpolicy/domains/addonDom"
+  add_tardisk addon.tgz "$BATS_TEST_TMPDIR/addon"
+  secpolicy boot
+  exits 1
+  ends_with "secpolicy: boot: Unable to unpack tardisk addon.tgz: ./etc/zorvan/secpolicy/domains/: It belongs to the policy, which a tardisk brings only when it is named by --policy-from"
+  secpolicy boot --policy-from base.tgz
+  exits 1
+  secpolicy boot --policy-from base.tgz --policy-from addon.tgz
+  exits 0
+  is_done boot
+  [[ -n $(domain_id addonDom) ]]
+}
+
+@test "boot --policy-from needs a tardisk of that name" {
+  secpolicy boot --policy-from addon.tgz
+  exits 1
+  says "secpolicy: boot: There is no tardisk addon.tgz in /tardisks"
+  [[ ! -e $root/usr/sbin/sshd ]]
+}
+
+@test "boot names the edited files that it has replaced" {
+  boot
+  echo "edited" >>"$root/etc/services.conf"
+  sed -i 's/./x/' "$root/opt/monitor/etc/agent.conf" # a new file under the old name
+  touch "$root/usr/bin/supervise"                    # with what the tardisk has in it
+  secpolicy boot
+  exits 0
+  says "edited files that were replaced (2):"
+  says "  /etc/services.conf"
+  says "  /opt/monitor/etc/agent.conf"
+  ends_done boot
+  secpolicy boot
+  exits 0
+  is_done boot
+}
+
+@test "boot compares with the tardisk where no record is left" {
+  boot
+  echo "edited" >>"$root/etc/services.conf"
+  rm -r "$root/run/secpolicy"
+  secpolicy boot
+  exits 0
+  [[ $stderr == "edited files that were replaced (1):
+  /etc/services.conf
+"* ]]
+}
+
+@test "a new version of a tardisk replaces what nobody has edited without a word" {
+  boot
+  mkdir "$BATS_TEST_TMPDIR/base"
+  tar --directory "$BATS_TEST_TMPDIR/base" --extract --file "$root/tardisks/base.tgz"
+  echo "new" >>"$BATS_TEST_TMPDIR/base/etc/services.conf"
+  add_tardisk base.tgz "$BATS_TEST_TMPDIR/base"
+  secpolicy boot
+  exits 0
+  is_done boot
+  [[ $(tail -n 1 "$root/etc/services.conf") == new ]]
+}
+
+@test "boot names ten edited files, and all with -v" {
+  boot
+  mkdir -p "$BATS_TEST_TMPDIR/many/srv"
+  local index
+  for index in {10..21}; do echo "$index" >"$BATS_TEST_TMPDIR/many/srv/$index"; done
+  add_tardisk many.tgz "$BATS_TEST_TMPDIR/many"
+  boot
+  for index in {10..21}; do echo "edited" >>"$root/srv/$index"; done
+  secpolicy boot --plan
+  exits 0
+  shows "edited files to replace (12):"
+  shows "  ... and 2 more; -v shows all"
+  secpolicy -v boot
+  exits 0
+  says "  /srv/21"
+  for index in {10..21}; do echo "edited" >>"$root/srv/$index"; done
+  secpolicy boot
+  exits 0
+  says "edited files that were replaced (12):"
+  says "  /srv/19"
+  says "  ... and 2 more; -v shows all"
+}
+
+# What is in the root, but for what a reader of a database leaves beside it.
+describe_root() {
+  (cd "$root" && find . -path ./run/secpolicy -prune -o -printf '%p %y %m %i %T@ %C@\n' | LC_ALL=C sort)
+}
+
+@test "boot --plan shows what a boot would do, and changes nothing" {
+  local before
+  before=$(describe_root)
+  secpolicy boot --plan
+  exits 0
+  [[ $(describe_root) == "$before" && ! -e $root/run/secpolicy ]]
+  shows "  /etc/services.conf (base.tgz)"
+  shows "files to unpack again as they are: 0"
+  ends_with "secpolicy: boot: this was a plan: nothing was changed"
+  [[ $output != *"to replace"* ]]
+  boot
+  echo "edited" >>"$root/etc/services.conf"
+  before=$(describe_root)
+  secpolicy boot --plan
+  exits 0
+  [[ $(describe_root) == "$before" ]]
+  [[ $output == "edited files to replace (1):
+  /etc/services.conf (base.tgz)
+files to unpack again as they are: "[0-9]*"
+files to get their first label: "[0-9]* ]]
+}
+
+@test "boot --plan counts the files that get a label" {
+  secpolicy boot --plan --format json
+  exits 0
+  fits_schema boot-plan
+  local planned
+  planned=$(jq .firstLabels <<<"$output")
+  boot
+  local labelled
+  labelled=$(find "$root" -path "$root/run" -prune -o -print0 |
+    xargs -0 getfattr --absolute-names --no-dereference --match '^(user\.zorvan\.security|security\.zorvan)$' 2>/dev/null |
+    grep -c '^# file:')
+  [[ $planned -eq $labelled ]]
+}
+
+@test "boot --plan --format json tells edited files from others" {
+  boot
+  mkdir "$BATS_TEST_TMPDIR/base"
+  tar --directory "$BATS_TEST_TMPDIR/base" --extract --file "$root/tardisks/base.tgz"
+  echo "new" >>"$BATS_TEST_TMPDIR/base/etc/services.conf"
+  echo "new" >>"$BATS_TEST_TMPDIR/base/etc/ssh/host_key"
+  ln -s services.conf "$BATS_TEST_TMPDIR/base/etc/link"
+  add_tardisk base.tgz "$BATS_TEST_TMPDIR/base"
+  echo "edited" >>"$root/etc/ssh/host_key"
+  secpolicy boot --plan --format json
+  exits 0
+  fits_schema boot-plan
+  jq -e '.tardisks == ["base.tgz", "monitor.tgz"]
+    and .add == [{path: "/etc/link", tardisk: "base.tgz", type: "link"}]
+    and .replace == [
+      {path: "/etc/services.conf", tardisk: "base.tgz", type: "file", edited: false},
+      {path: "/etc/ssh/host_key", tardisk: "base.tgz", type: "file", edited: true}]' <<<"$output"
+}
+
+@test "boot --plan names what a boot would refuse" {
+  echo "this is no archive" >"$root/tardisks/aaa.tgz"
+  secpolicy boot --plan
+  exits 1
+  [[ -z $output && $stderr == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: "* ]]
+}
+
+@test "completion offers what boot takes" {
+  complete_line secpolicy boot --pl
+  [[ ${COMPREPLY[*]} == --plan ]]
+  complete_line secpolicy --root "$root" boot --policy-from b
+  [[ ${COMPREPLY[*]} == base.tgz ]]
+  complete_line secpolicy boot --plan --format j
+  [[ ${COMPREPLY[*]} == json ]]
+}

@@ -1,5 +1,11 @@
 #include "host/linux/boot.h"
 
+#include <iostream>
+#include <limits>
+
+#include "boot/boot_plan.h"
+#include "braxo/lib/exception.h"
+#include "command_line.h"
 #include "host/linux/archive_library.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
@@ -9,6 +15,8 @@
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
+#include "summary.h"
+#include "text/file_list.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -23,9 +31,29 @@ void LoadEarly() {
                            SecPolicy::kEarlyPolicyRoot);
 }
 
-void BootAndLoad(LoadTiming& timing) {
-  LinuxHost::StartPolicy(
-      LinuxHost::AssembleRoot({.policyRoot = SecPolicy::kPolicyRoot, .policyTardisks = {}}));
+struct Options {
+  bool timing = false;
+  bool plan = false;
+  std::string format = "text";
+  std::vector<std::string> policyFrom;
+  bool showAll = false;
+};
+
+LinuxHost::TardiskRules RulesOf(const Options& options) {
+  return {.policyRoot = SecPolicy::kPolicyRoot,
+          .policyTardisks = {options.policyFrom.begin(), options.policyFrom.end()}};
+}
+
+// More fill a screen without telling more.
+std::size_t MostShown(const Options& options) {
+  constexpr std::size_t kMostShown = 10;
+  return options.showAll ? std::numeric_limits<std::size_t>::max() : kMostShown;
+}
+
+void BootAndLoad(const Options& options, LoadTiming& timing) {
+  const LinuxHost::AssembledRoot root = LinuxHost::AssembleRoot(RulesOf(options));
+  WriteFileList("edited files that were replaced", root.editedFiles, MostShown(options), std::cerr);
+  LinuxHost::StartPolicy(root);
   timing.EndPhase("first labels");
   timing.BeginPart("early ");
   LoadEarly();
@@ -34,39 +62,76 @@ void BootAndLoad(LoadTiming& timing) {
   SecPolicy::LoadPolicy(SecPolicy::kPolicyRoot);
 }
 
-ExitCode Boot(bool timing) {
+ExitCode BootNow(const Options& options) {
+  return CallLibrary(
+      "boot", SecPolicy::kPolicyRoot,
+      [&] {
+        LoadTiming phases(options.timing);
+        BootAndLoad(options, phases);
+      },
+      AdviseOnPrivilege, DescribeInstalled);
+}
+
+ExitCode Plan(const Options& options) {
+  try {
+    const LinuxHost::BootPlan plan = LinuxHost::PlanBoot(RulesOf(options));
+    if (options.format == "json") {
+      WriteBootPlanJson(plan, std::cout);
+    } else {
+      WriteBootPlanText(plan, MostShown(options), std::cout);
+    }
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    return Refuse("boot", failure.what());
+  }
+  Summarize("boot", "this was a plan: nothing was changed");
+  return kWell;
+}
+
+ExitCode Boot(const Options& options) {
   if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) {
     return Refuse("boot", std::string("there is no directory ") + SecPolicy::kTardiskImagesDir +
                               " below this root, so nothing was changed. Put the tardisks there, "
                               "or name the root that they are in (--root DIR).");
   }
-  return CallLibrary(
-      "boot", SecPolicy::kPolicyRoot,
-      [&] {
-        LoadTiming phases(timing);
-        BootAndLoad(phases);
-      },
-      AdviseOnPrivilege, DescribeInstalled);
+  return options.plan ? Plan(options) : BootNow(options);
 }
 
 Action Define(Syntax& syntax) {
-  const auto timing = std::make_shared<bool>(false);
-  AddTiming(syntax, *timing);
-  return [timing] { return Boot(*timing); };
+  const auto options = std::make_shared<Options>();
+  const Option plan = syntax.AddFlag("--plan", options->plan,
+                                     "Only show what would become of files; -v shows them all");
+  syntax.AddFormat(options->format, "the plan", {"text", "json"}).Need(plan);
+  syntax
+      .AddList("--policy-from", options->policyFrom,
+               "Let the tardisk NAME bring the policy of the host; may be repeated")
+      .NameValue("NAME");
+  AddTiming(syntax, options->timing).Exclude(plan);
+  const Option verbose = syntax.Verbose();
+  return [=] {
+    options->showAll = verbose.IsGiven();
+    return Boot(*options);
+  };
 }
 
 }  // namespace
 
 const Verb kBoot = {
     "boot", "Unpack the tardisks, label every file, and install the policy",
-    "Starts from an empty state: unpacks every archive of /tardisks/ into the root, in byte order\n"
-    "of name, gives every file the label 'unlabeled', and then does what load-early and load do.\n"
+    "Checks every archive of /tardisks/ to its last byte, unpacks them into the root, in byte "
+    "order\n"
+    "of name, gives every file the label 'unlabeled', and then, from an empty state, does what\n"
+    "load-early and load do. An archive that is damaged or brings what it may not ends the boot\n"
+    "before anything was changed. No archive may bring the policy in /etc/zorvan/secpolicy but "
+    "for\n"
+    "its tardisks/; --policy-from names one that may, and whose makers are then trusted with all.\n"
+    "Files that somebody has edited since they were unpacked are replaced and named.\n"
     "A root without /etc/zorvan/secpolicy/early is booted without an early policy.\n"
     "It writes into the root that it is given, so try it on a root of your own first.\n"
     "\n"
     "Examples:\n"
     "  mkdir -p r/tardisks && cp base.tgz r/tardisks/\n"
     "  secpolicy --root ./r boot\n"
+    "  secpolicy --root ./r boot --plan     which files would it add, replace and label?\n"
     "  secpolicy --root ./r boot --timing   how long does each phase take?",
     Define, LinuxHost::LoadArchiveLibrary};
 
