@@ -3,6 +3,8 @@
 #include <cerrno>
 #include <cstdint>
 #include <cstring>
+#include <stack>
+#include <utility>
 
 #include "braxo/misc/strcat.h"
 #include "secpolicy/parse/directory.h"
@@ -33,6 +35,20 @@ bool IsLabelled(unsigned char entryType) {
   }
 }
 
+// A directory of a tree of which some entries are labelled.
+struct LabelledDirectory {
+  std::string path;
+  Directory entries;
+};
+
+LabelledDirectory LabelAndOpen(const std::string& dir, const std::string& label,
+                               TeskAccessInterfaceImpl& access) {
+  SetFileLabel(dir, label, access);
+  Directory entries(dir);
+  if (!entries.IsOpen()) RaiseError("Unable to open directory " + dir);
+  return {dir, std::move(entries)};
+}
+
 }  // namespace
 
 void SetFileLabel(const std::string& path, const std::string& label,
@@ -51,15 +67,20 @@ void SetFileLabel(const std::string& path, const std::string& label,
 
 void SetDirLabelRecursive(const std::string& dir, const std::string& label,
                           TeskAccessInterfaceImpl& access) {
-  SetFileLabel(dir, label, access);
-
-  Directory directory(dir);
-  if (!directory.IsOpen()) RaiseError("Unable to open directory " + dir);
-  while (const dirent* entry = directory.Next()) {
+  // Not by calling itself: how deep a tree is is not ours to say, and a full stack ends a process.
+  std::stack<LabelledDirectory> open;
+  open.push(LabelAndOpen(dir, label, access));
+  while (!open.empty()) {
+    LabelledDirectory& current = open.top();
+    const dirent* const entry = current.entries.Next();
+    if (entry == nullptr) {
+      open.pop();
+      continue;
+    }
     if (!IsLabelled(entry->d_type)) continue;
-    const std::string child = dir + "/" + entry->d_name;
+    const std::string child = current.path + "/" + entry->d_name;
     SetFileLabel(child, label, access);
-    if (entry->d_type == DT_DIR) SetDirLabelRecursive(child, label, access);
+    if (entry->d_type == DT_DIR) open.push(LabelAndOpen(child, label, access));
   }
 }
 

@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <pthread.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
@@ -9,6 +10,7 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <functional>
 #include <string>
 
 #include "labels/file_system_faults.h"
@@ -292,6 +294,28 @@ TEST_F(SetDirLabelRecursive, ReachesEveryDepth) {
   EXPECT_THAT(labelled,
               UnorderedElementsAre("/dir", "/dir/a", "/dir/a/b", "/dir/a/b/c", "/dir/a/b/c/deep",
                                    "/dir/a/b/file", "/dir/x", "/dir/x/y", "/dir/top"));
+}
+
+// On a stack that one step for each level would not fit.
+TEST_F(SetDirLabelRecursive, NeedsNoStackForDepth) {
+  constexpr std::size_t kDepth = 900;
+  std::string path = "dir/";
+  for (std::size_t level = 0; level < kDepth; ++level) path += "d/";
+  tree.Write(path, "");
+
+  pthread_attr_t attributes;
+  pthread_attr_init(&attributes);
+  ASSERT_EQ(pthread_attr_setstacksize(&attributes, 128UL * 1024), 0);
+  std::function<void()> walk = [this] { SetTree(tree / "dir"); };
+  const auto run = [](void* function) -> void* {
+    (*static_cast<std::function<void()>*>(function))();
+    return nullptr;
+  };
+  pthread_t walker{};
+  ASSERT_EQ(pthread_create(&walker, &attributes, run, &walk), 0);
+  pthread_join(walker, nullptr);
+  pthread_attr_destroy(&attributes);
+  EXPECT_EQ(host.attributes.size(), kDepth + 1);
 }
 
 TEST_F(SetDirLabelRecursive, KeepsTheDoubledSlashOfAPathThatEndsInOne) {
