@@ -79,11 +79,11 @@ load helper
 }
 
 @test "a path of any letters is escaped, and one without permissions is not reached" {
-  printf -- '-r /odd"\\\033 r\n-r /never\n' >>"$policy/domains/appDom"
+  printf -- '-r /odd"\\\033ü r\n-r /never\n' >>"$policy/domains/appDom"
   boot
   secpolicy graph --domain appDom
   exits 0
-  shows '  "path /odd\"\\^[" [label="/odd\"\\^[", shape="folder", style="solid"]'
+  shows '  "path /odd\"\\^[ü" [label="/odd\"\\^[ü", shape="folder", style="solid"]'
   [[ $output != *never* ]]
   secpolicy graph --domain appDom --format svg
   exits 0

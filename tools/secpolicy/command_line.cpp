@@ -5,6 +5,7 @@
 #include <CLI/Formatter.hpp>
 
 #include "text/suggestion.h"
+#include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -41,7 +42,7 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   } else if (!app->get_subcommands().empty() && error.get_name() == "RequiredError") {
     problem += KindsOf(*app->get_subcommands().front());
   }
-  return "secpolicy: " + problem + "\n'" + command + " --help' explains the usage.\n";
+  return "secpolicy: " + VisibleLines(problem) + "\n'" + command + " --help' explains the usage.\n";
 }
 
 // "A, B or C".

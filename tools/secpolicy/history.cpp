@@ -10,6 +10,7 @@
 #include "summary.h"
 #include "text/count.h"
 #include "text/utc_time.h"
+#include "text/visible.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -38,7 +39,8 @@ ExitCode ShowHistory() {
   bool allUsable = true;
   for (const SavedState& state : states) {
     std::cout << std::left << std::setw(static_cast<int>(width)) << state.name << "  "
-              << UtcTime(state.time) << "  " << DescribeSaved(state.name, allUsable) << '\n';
+              << UtcTime(state.time) << "  " << Visible(DescribeSaved(state.name, allUsable))
+              << '\n';
   }
   Summarize("history", states.empty() ? "nothing is saved" : CountOf(states.size(), "saved state"));
   return allUsable ? kWell : kFailed;

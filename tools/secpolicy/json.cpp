@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <string_view>
 
+#include "text/visible.h"
+
 namespace SecPolicyCli {
 namespace {
 
@@ -35,6 +37,18 @@ Character FirstCharacter(std::string_view text) {
   return {size, true};
 }
 
+void WriteNumber(std::uint32_t character, std::string& output) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  output += "\\u";
+  for (int shift = 12; shift >= 0; shift -= 4) output += kDigits[character >> shift & 0xf];
+}
+
+// Every document is safe to show, and says the same.
+void WriteCharacter(std::string_view character, std::string& output) {
+  if (const auto unsafe = UnsafeNumber(character)) return WriteNumber(*unsafe, output);
+  output += character;
+}
+
 // The letter that stands for `byte` behind a backslash; 0 when there is none.
 char ShortEscape(char byte) {
   constexpr std::string_view kBytes = "\"\\\b\f\n\r\t";
@@ -44,16 +58,11 @@ char ShortEscape(char byte) {
 }
 
 void WriteByte(char byte, std::string& output) {
-  constexpr char kDigits[] = "0123456789abcdef";
   if (const char letter = ShortEscape(byte)) {
     output += '\\';
     output += letter;
-  } else if (const auto number = static_cast<unsigned char>(byte); number < 0x20) {
-    output += "\\u00";
-    output += kDigits[number >> 4];
-    output += kDigits[number & 0xf];
   } else {
-    output += byte;
+    WriteCharacter(std::string_view(&byte, 1), output);
   }
 }
 
@@ -66,7 +75,7 @@ void WriteText(std::string_view text, std::string& output) {
     } else if (first.size == 1) {
       WriteByte(text.front(), output);
     } else {
-      output += text.substr(0, first.size);
+      WriteCharacter(text.substr(0, first.size), output);
     }
     text.remove_prefix(first.size);
   }

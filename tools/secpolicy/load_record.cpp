@@ -8,6 +8,7 @@
 #include "host/linux/load_record.h"
 #include "installed/origin_reader.h"
 #include "secpolicy/policy_root.h"
+#include "text/visible.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -71,7 +72,7 @@ void RecordLoad(const std::string& verb, const std::string& policyDir, const std
   } catch (const std::exception& failure) {
     if (ending != "done") return;
     std::cerr << "secpolicy: " << verb << ": this load cannot be recorded for the verbs that "
-              << "explain it: " << failure.what() << std::endl;
+              << "explain it: " << Visible(failure.what()) << std::endl;
   }
 }
 
@@ -80,7 +81,7 @@ void RecordRollback(const std::string& name) {
     RecordEnding(kRollback.name, name, "done", {});
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << kRollback.name << ": this rollback cannot be recorded for "
-              << "'status': " << failure.what() << std::endl;
+              << "'status': " << Visible(failure.what()) << std::endl;
   }
 }
 

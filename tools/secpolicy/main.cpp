@@ -1,3 +1,5 @@
+#include <unistd.h>
+
 #include <exception>
 #include <iostream>
 #include <string>
@@ -5,6 +7,8 @@
 #include "command_line.h"
 #include "host/linux/system_log.h"
 #include "root.h"
+#include "text/terminal_guard.h"
+#include "text/visible.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -65,8 +69,8 @@ int Run(int argc, char** argv) {
     return FlushOutput(commandLine.Act());
   } catch (const std::exception& failure) {
     const std::string advice = isInRoot ? AdviseOnPrivilege() : "";
-    std::cerr << "secpolicy: " << failure.what() << (advice.empty() ? "" : ". ") << advice
-              << std::endl;
+    std::cerr << "secpolicy: " << VisibleLines(failure.what()) << (advice.empty() ? "" : ". ")
+              << advice << std::endl;
     return kFailed;
   }
 }
@@ -74,4 +78,8 @@ int Run(int argc, char** argv) {
 }  // namespace
 }  // namespace SecPolicyCli
 
-int main(int argc, char** argv) { return SecPolicyCli::Run(argc, argv); }
+int main(int argc, char** argv) {
+  const SecPolicyCli::TerminalGuard output(std::cout, STDOUT_FILENO);
+  const SecPolicyCli::TerminalGuard errors(std::cerr, STDERR_FILENO);
+  return SecPolicyCli::Run(argc, argv);
+}

@@ -2,11 +2,13 @@
 
 #include <iostream>
 
+#include "text/visible.h"
+
 namespace SecPolicyCli {
 
 void Summarize(const std::string& verb, const std::string& text) {
   std::cout.flush();
-  std::cerr << "secpolicy: " << verb << ": " << text << std::endl;
+  std::cerr << "secpolicy: " << verb << ": " << Visible(text) << std::endl;
 }
 
 }  // namespace SecPolicyCli

@@ -16,13 +16,14 @@ constexpr char kHead[] =
 // Line feeds stay line breaks; what else could mean something inside the quotes is escaped.
 std::string Quote(const std::string& text) {
   std::string quoted = "\"";
-  for (const char letter : text) {
-    if (letter == '\n') {
+  for (std::string_view rest = text; !rest.empty();) {
+    const std::string_view character = TakeCharacter(rest);
+    if (character == "\n") {
       quoted += "\\n";
       continue;
     }
-    if (letter == '"' || letter == '\\') quoted += '\\';
-    AppendVisible(quoted, std::string_view(&letter, 1));
+    if (character == "\"" || character == "\\") quoted += '\\';
+    AppendVisible(quoted, character);
   }
   return quoted + "\"";
 }

@@ -6,6 +6,7 @@
 #include "library_call.h"
 #include "question.h"
 #include "scratch/used_state.h"
+#include "text/visible.h"
 
 namespace SecPolicyCli {
 
@@ -21,7 +22,7 @@ ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer) {
   try {
     return answer();
   } catch (const QuestionError& error) {
-    std::cerr << "secpolicy: " << verb << ": " << error.what() << "\n'secpolicy " << verb
+    std::cerr << "secpolicy: " << verb << ": " << Visible(error.what()) << "\n'secpolicy " << verb
               << " --help' explains the usage." << std::endl;
     return kUsage;
   }

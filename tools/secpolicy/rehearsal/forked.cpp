@@ -10,6 +10,8 @@
 #include <iostream>
 #include <system_error>
 
+#include "text/visible.h"
+
 namespace SecPolicyCli {
 namespace {
 
@@ -18,7 +20,7 @@ namespace {
   try {
     code = body();
   } catch (const std::exception& failure) {
-    std::cerr << "secpolicy: " << failure.what() << std::endl;
+    std::cerr << "secpolicy: " << VisibleLines(failure.what()) << std::endl;
   }
   // Closes the connections to the state. What the parent has on its stack is not cleaned up.
   std::exit(code);

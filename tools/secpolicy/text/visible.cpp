@@ -55,10 +55,13 @@ Decoded Decode(std::string_view text) {
 
 bool IsPlain(char byte) { return byte >= ' ' && byte < 0x7f; }
 
+bool IsControl(std::uint32_t point) { return point < 0x20 || point == 0x7f; }
+
 bool IsUnsafe(std::uint32_t point) {
-  return std::any_of(std::begin(kUnsafe), std::end(kUnsafe), [&](const Range& range) {
-    return point >= range.first && point <= range.last;
-  });
+  return IsControl(point) ||
+         std::any_of(std::begin(kUnsafe), std::end(kUnsafe), [&](const Range& range) {
+           return point >= range.first && point <= range.last;
+         });
 }
 
 std::string InBrackets(const char* format, unsigned int number) {
@@ -69,12 +72,13 @@ std::string InBrackets(const char* format, unsigned int number) {
 
 // How an unsafe character is shown; empty for one that is safe.
 std::string Replacement(std::string_view character) {
-  const Decoded decoded = Decode(character);
-  if (decoded.size == 0) return InBrackets("<%02X>", static_cast<unsigned char>(character.front()));
-  if (decoded.point < 0x20 || decoded.point == 0x7f) {
-    return {'^', static_cast<char>(decoded.point ^ 0x40)};
+  if (Decode(character).size == 0) {
+    return InBrackets("<%02X>", static_cast<unsigned char>(character.front()));
   }
-  return IsUnsafe(decoded.point) ? InBrackets("<U+%04X>", decoded.point) : "";
+  const std::optional<std::uint32_t> unsafe = UnsafeNumber(character);
+  if (!unsafe) return "";
+  if (IsControl(*unsafe)) return {'^', static_cast<char>(*unsafe ^ 0x40)};
+  return InBrackets("<U+%04X>", *unsafe);
 }
 
 }  // namespace
@@ -102,6 +106,23 @@ std::string Visible(std::string_view text) {
   std::string visible;
   while (!text.empty()) AppendVisible(visible, TakeCharacter(text));
   return visible;
+}
+
+std::string VisibleLines(std::string_view text) {
+  std::string visible;
+  while (true) {
+    const std::size_t end = text.find('\n');
+    visible += Visible(text.substr(0, end));
+    if (end == std::string_view::npos) return visible;
+    visible += '\n';
+    text.remove_prefix(end + 1);
+  }
+}
+
+std::optional<std::uint32_t> UnsafeNumber(std::string_view character) {
+  const Decoded decoded = Decode(character);
+  if (decoded.size == 0 || !IsUnsafe(decoded.point)) return std::nullopt;
+  return decoded.point;
 }
 
 }  // namespace SecPolicyCli

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -19,7 +21,14 @@ std::size_t AppendVisible(std::string& text, std::string_view character);
 // The number of characters in `text`; a byte that belongs to none counts as one.
 std::size_t CountCharacters(std::string_view text);
 
-// The whole text as it can be shown.
+// The whole text as it can be shown, on one line.
 std::string Visible(std::string_view text);
+
+// The same for a text of several lines, whose ends stay.
+std::string VisibleLines(std::string_view text);
+
+// The number of a character that commands a terminal or turns the direction of the text; nothing
+// for any other.
+std::optional<std::uint32_t> UnsafeNumber(std::string_view character);
 
 }  // namespace SecPolicyCli
