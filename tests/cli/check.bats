@@ -212,12 +212,125 @@ fileLabels/zz:3 [unknown-word]" ]]
   add domains/appDom "-r /no/such r"
   warns "$shown/domains/appDom:$number:4: warning: there is nothing at /no/such under this root [missing-path]"
   add fileLabels/base "/no/such/* hostConfig"
-  warns "$shown/fileLabels/base:$number:1: warning: there is nothing at /no/such under this root [missing-path]"
+  secpolicy check --fresh
+  exits 0
+  shows "$shown/fileLabels/base:$number:1: warning: there is nothing at /no/such under this root [missing-path]"
+}
+
+# cannot_label LINE PATH: a load fails to label PATH for this line, and check says so in its words.
+cannot_label() {
+  add fileLabels/base "$1"
+  secpolicy load
+  exits 1
+  local message=${stderr#*"fileLabels/base:$number : "}
+  finds "$shown/fileLabels/base:$number:1: error: ${message%%$'\n'*} [cannot-label]"
+  [[ $output == *"for file $2: "* || $output == *"directory $2 "* ]]
+}
+
+@test "cannot-label, of a path that is not there" {
+  cannot_label "/no/such hostConfig" /no/such
+  shows "    hint: there is nothing at /no/such under this root"
+}
+
+@test "cannot-label, of a name that is too long" {
+  local name
+  name=$(printf 'x%.0s' {1..256})
+  cannot_label "/$name hostConfig" "/$name"
+}
+
+@test "cannot-label, of a tree that is too deep" {
+  python3 -c '
+import os, sys
+os.chdir(sys.argv[1])
+for _ in range(2100):
+    os.mkdir("d")
+    os.chdir("d")' "$root/etc"
+  "$SECPOLICY" --root "$root" boot 2>/dev/null || true
+  add fileLabels/base "/etc/* hostConfig"
+  secpolicy load
+  exits 1
+  secpolicy check
+  exits 1
+  [[ $output == *": error: Unable to "*" [cannot-label]"* ]]
+}
+
+@test "cannot-label, of a tree that is none" {
+  cannot_label "/etc/services.conf/* hostConfig" /etc/services.conf
+  shows "    hint: /* stands behind something that is no directory"
+}
+
+@test "relative-path, of rules and of labels" {
+  add domains/appDom "-r etc r"
+  warns "$shown/domains/appDom:$number:4: warning: this path is looked up from where a load is started [relative-path]"
+  add fileLabels/base "etc/services.conf hostConfig"
+  secpolicy check
+  shows "$shown/fileLabels/base:$number:1: warning: this path is looked up from where a load is started [relative-path]"
+}
+
+@test "byte-order-mark" {
+  sed -i '1s/^/\xef\xbb\xbf/' "$policy/domains/appDom"
+  finds "$shown/domains/appDom:1:1: warning: a byte order mark is part of the first word [byte-order-mark]"
+  shows "$shown/domains/appDom:1:1: error: invalid policy rule type (<U+FEFF>) [rule-type]"
+}
+
+@test "editor-copy, of every kind" {
+  local name
+  for name in appDom~ .appDom.swp '#appDom#' appDom.dpkg-old appDom.rpmsave appDom.bak; do
+    cp "$policy/domains/appDom" "$policy/domains/$name"
+    warns "$shown/domains/$name: warning: this looks like a copy that was left behind: a load reads it as policy [editor-copy]"
+    rm "$policy/domains/$name"
+  done
+  cp "$policy/domains/appDom" "$policy/domains/swp"
+  secpolicy check
+  [[ $output != *editor-copy* ]]
+}
+
+@test "untyped-entries" {
+  [[ ${SANITIZER:-} != *address* ]] || skip "the sanitizer wants to be loaded first"
+  # A file system without the types of entries is rare: this is what a listing on it looks like.
+  "${CC:-cc}" -shared -fPIC -o "$BATS_TEST_TMPDIR/untyped.so" -x c - -ldl <<'END'
+#define _GNU_SOURCE
+#include <dirent.h>
+#include <dlfcn.h>
+static void *next(const char *name) { return dlsym(RTLD_NEXT, name); }
+struct dirent *readdir(DIR *directory) {
+  struct dirent *entry = ((struct dirent * (*)(DIR *)) next("readdir"))(directory);
+  if (entry) entry->d_type = DT_UNKNOWN;
+  return entry;
+}
+struct dirent64 *readdir64(DIR *directory) {
+  struct dirent64 *entry = ((struct dirent64 * (*)(DIR *)) next("readdir64"))(directory);
+  if (entry) entry->d_type = DT_UNKNOWN;
+  return entry;
+}
+END
+  run --separate-stderr env LD_PRELOAD="$BATS_TEST_TMPDIR/untyped.so" "$SECPOLICY" --root "$root" check
+  shows "$shown/objects: warning: this file system does not tell which of its entries are files: to a load the directory looks empty [untyped-entries]"
+  shows "$shown/domains: warning: this file system does not tell which of its entries are files: to a load the directory looks empty [untyped-entries]"
 }
 
 @test "no-tardisk" {
   echo "-E monitorImage monitorDom" >"$policy/tardisks/late"
-  warns "$shown/tardisks/late: warning: No backing tardisk for policy file $shown/tardisks/late [no-tardisk]"
+  finds "$shown/tardisks/late: error: No backing tardisk for policy file $shown/tardisks/late [no-tardisk]"
+  secpolicy load
+  exits 1
+}
+
+@test "tardisk-entry, among the policies and among the tardisks" {
+  mkdir "$policy/tardisks/inner" "$root/tardisks/inner"
+  finds "$shown/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
+  shows "/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
+  secpolicy load
+  exits 1
+}
+
+@test "where tardisk policies come from counts in the policy root only" {
+  cp -r "$policy" "$root/copy"
+  echo "-E monitorImage monitorDom" >"$root/copy/tardisks/late"
+  mkdir "$root/copy/tardisks/inner"
+  secpolicy check /copy
+  exits 0
+  shows "/copy/tardisks/inner: warning: this is a directory: a load skips it [skipped-entry]"
 }
 
 @test "nul-byte" {
@@ -231,7 +344,7 @@ fileLabels/zz:3 [unknown-word]" ]]
   echo "-E monitorImage monitorDom" | tee "$BATS_TEST_TMPDIR/disk/etc/zorvan/secpolicy/tardisks/"{one,two} >/dev/null
   tar -C "$BATS_TEST_TMPDIR/disk" -czf "$root/tardisks/twice.tgz" etc
   "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err" || true
-  warns "$shown/tardisks/two: warning: More than one exception specification for tardisk /tardisks/twice.tgz [second-policy]"
+  finds "$shown/tardisks/two: error: More than one exception specification for tardisk /tardisks/twice.tgz [second-policy]"
 }
 
 @test "skipped-entry, but for the directory of partner domains" {
@@ -246,7 +359,9 @@ fileLabels/zz:3 [unknown-word]" ]]
   add domains/appDom "-r /etc/* r"
   warns "$shown/domains/appDom:$number:4: warning: a -r rule has no patterns: this one is about a file whose name has a star [star-in-path]"
   add fileLabels/base "/* hostConfig" "/etc/services.conf/* hostConfig" "/etc/s*.conf hostConfig"
-  warns "$shown/fileLabels/base:$((number - 2)):1: warning: there is no directory before the /* [star-in-path]"
+  secpolicy check --fresh
+  exits 0
+  shows "$shown/fileLabels/base:$((number - 2)):1: warning: there is no directory before the /* [star-in-path]"
   shows "$shown/fileLabels/base:$((number - 1)):1: warning: /* stands behind something that is no directory [star-in-path]"
   shows "$shown/fileLabels/base:$number:1: warning: there are no patterns: this is a file whose name has a star [star-in-path]"
 }

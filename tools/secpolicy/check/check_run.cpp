@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <cerrno>
 #include <fstream>
+#include <iterator>
+#include <string_view>
 
 #include "secpolicy/parse/directory.h"
 
@@ -33,19 +35,19 @@ void AddFileProblem(CheckRun& run, const Code& code, const std::string& file,
   run.diagnostics.Add(std::move(diagnostic));
 }
 
-void CheckEntries(CheckRun& run, const std::string& dir, const std::string& expected) {
-  SecPolicy::Directory directory(dir);
-  if (!directory.IsOpen()) return;
-  std::map<std::string, const char*> skipped;
-  while (const dirent* entry = directory.Next()) {
-    if (entry->d_type != DT_REG && entry->d_name != expected) {
-      skipped.emplace(entry->d_name, KindOf(entry->d_type));
-    }
-  }
-  for (const auto& [name, kind] : skipped) {
-    AddFileProblem(run, Codes::kSkippedEntry, dir + "/" + name,
-                   std::string("this is ") + kind + ": a load skips it");
-  }
+// A load reads every regular file, so also what an editor or a package left behind.
+void CheckName(CheckRun& run, const SourceFile& file, const std::string& name) {
+  constexpr std::string_view kEnds[] = {"~",    ".swp", ".swo",     ".bak",    ".orig",
+                                        ".rej", ".tmp", ".rpmsave", ".rpmnew", ".rpmorig"};
+  const bool isCopy = std::any_of(std::begin(kEnds), std::end(kEnds),
+                                  [&](std::string_view end) { return name.ends_with(end); }) ||
+                      (name.size() > 1 && name.starts_with('#') && name.ends_with('#')) ||
+                      name.find(".dpkg-") != std::string::npos ||
+                      name.find(".ucf-") != std::string::npos;
+  if (!isCopy) return;
+  run.diagnostics.Add(file.About(
+      Codes::kEditorCopy, "this looks like a copy that was left behind: a load reads it as policy",
+      "move it out of the directory"));
 }
 
 void WriteLines(const std::string& path, const SourceFile& file,
@@ -64,8 +66,32 @@ std::string WithoutPlace(const std::string& message, const std::string& path) {
 
 }  // namespace
 
+void CheckEntries(CheckRun& run, const std::string& dir, const std::string& expected,
+                  const Code& skipped) {
+  SecPolicy::Directory directory(dir);
+  if (!directory.IsOpen()) return;
+  std::map<std::string, const char*> kinds;
+  bool isTyped = true;
+  while (const dirent* entry = directory.Next()) {
+    if (entry->d_type == DT_UNKNOWN) isTyped = false;
+    if (entry->d_type == DT_REG || entry->d_type == DT_UNKNOWN || entry->d_name == expected) {
+      continue;
+    }
+    kinds.emplace(entry->d_name, KindOf(entry->d_type));
+  }
+  if (!isTyped) {
+    AddFileProblem(run, Codes::kUntypedEntries, dir,
+                   "this file system does not tell which of its entries are files: to a load the "
+                   "directory looks empty");
+  }
+  for (const auto& [name, kind] : kinds) {
+    AddFileProblem(run, skipped, dir + "/" + name,
+                   std::string("this is ") + kind + ": a load skips it");
+  }
+}
+
 std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
-                                       const std::string& expected) {
+                                       const std::string& expected, const Code& skipped) {
   std::map<std::string, std::string> names;
   try {
     SecPolicy::GetFileList(dir, names);
@@ -78,19 +104,29 @@ std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
     run.diagnostics.BeginFile(path);
     try {
       const SourceFile& file = run.files.emplace_back(path);
+      CheckName(run, file, name);
       file.CheckBytes(run.diagnostics);
       opened.push_back({&file, name});
     } catch (const BraxoException& failure) {
       AddFileProblem(run, Codes::kUnreadable, path, failure.what());
     }
   }
-  CheckEntries(run, dir, expected);
+  CheckEntries(run, dir, expected, skipped);
   return opened;
 }
 
 bool IsMissing(const std::string& path) {
   struct stat attributes {};
-  return stat(path.c_str(), &attributes) != 0 && (errno == ENOENT || errno == ENOTDIR);
+  return stat(path.c_str(), &attributes) != 0 &&
+         (errno == ENOENT || errno == ENOTDIR || errno == ENAMETOOLONG || errno == ELOOP);
+}
+
+void CheckIsAbsolute(CheckRun& run, const SourceFile& file, unsigned int line, std::size_t word) {
+  const std::string& path = file.Lines().at(line).at(word);
+  if (path.starts_with('/')) return;
+  run.diagnostics.Add(file.AtWord(Codes::kRelativePath, line, word,
+                                  "this path is looked up from where a load is started",
+                                  "a path begins with a slash"));
 }
 
 std::vector<unsigned int> ParseEveryLine(

@@ -51,12 +51,21 @@ struct CheckRun {
 };
 
 // Opens every policy file of `dir`, in the order in which a load takes them, and checks its bytes.
-// What cannot be read, and what a load skips, becomes a problem; the directory `expected` does not.
+// What cannot be read becomes a problem; what a load skips, one of the kind `skipped`, but not the
+// directory `expected`.
 std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
-                                       const std::string& expected = {});
+                                       const std::string& expected = {},
+                                       const Code& skipped = Codes::kSkippedEntry);
+
+// Tells of everything in `dir`, but of the directory `expected`, that is no regular file.
+void CheckEntries(CheckRun& run, const std::string& dir, const std::string& expected,
+                  const Code& skipped);
 
 // True when there is surely nothing at `path`.
 bool IsMissing(const std::string& path);
+
+// Tells when the word `word` of a line is a path that means another file in every directory.
+void CheckIsAbsolute(CheckRun& run, const SourceFile& file, unsigned int line, std::size_t word);
 
 // Hands all lines of `file` to `parse`, which reads the policy file that it is given and throws at
 // a bad line, after it has made `count` grow by one for each line above. Where it throws, it is

@@ -15,13 +15,18 @@ const Code kArgumentCount{"argument-count", kError, "A line has too many or too 
 const Code kBadName{"bad-name", kError, "The host refuses the name of an object or a domain"};
 const Code kBadPermissions{"bad-permissions", kError,
                            "The letters of a -r rule fail when the rule is installed"};
+const Code kCannotLabel{"cannot-label", kError, "A load cannot give a file its label"};
 const Code kGrantWord{"grant-word", kError, "The last word is neither grant nor revoke"};
 const Code kMissingDomain{"missing-domain", kError,
                           "A domain that every host needs is missing: a load stops"};
+const Code kNoTardisk{"no-tardisk", kError, "A tardisk policy came from no tardisk"};
 const Code kParameterConflict{"parameter-conflict", kError,
                               "The host refuses a -p rule, alone or beside another one"};
 const Code kRuleType{"rule-type", kError, "The first word is no kind of rule"};
+const Code kSecondPolicy{"second-policy", kError, "A tardisk has more than one policy file"};
 const Code kSecondRule{"second-rule", kError, "A tardisk policy has more than one rule"};
+const Code kTardiskEntry{"tardisk-entry", kError,
+                         "An entry among tardisks or their policies is no regular file"};
 const Code kTreeMarker{"tree-marker", kError, "\"/*\" does not end the path"};
 const Code kUnknownDomain{"unknown-domain", kError, "A rule names a domain that is not defined"};
 const Code kUnknownWord{"unknown-word", kError,
@@ -29,58 +34,47 @@ const Code kUnknownWord{"unknown-word", kError,
                         "or system calls"};
 const Code kUnreadable{"unreadable", kError, "A policy file or directory cannot be read"};
 
+const Code kByteOrderMark{"byte-order-mark", kWarning,
+                          "A byte order mark is part of the first word"};
 const Code kCarriageReturn{"carriage-return", kWarning, "A carriage return is part of a word"};
 const Code kContradictingRule{"contradicting-rule", kWarning,
                               "A later rule replaces an earlier one"};
 const Code kDuplicateObject{"duplicate-object", kWarning, "An object is declared twice"};
 const Code kDuplicateRule{"duplicate-rule", kWarning, "A rule is written twice"};
+const Code kEditorCopy{"editor-copy", kWarning,
+                       "A file looks like a left-over copy of another one"};
 const Code kInstalledOnly{"installed-only", kWarning,
                           "A domain that every host needs is installed, but no file defines it"};
 const Code kLongLine{"long-line", kWarning, "A line over 1023 characters ends its file"};
 const Code kMissingPath{"missing-path", kWarning, "A path does not exist under this root"};
-const Code kNoTardisk{"no-tardisk", kWarning, "A tardisk policy came from no tardisk"};
 const Code kNulByte{"nul-byte", kWarning, "A NUL byte ends its line"};
-const Code kSecondPolicy{"second-policy", kWarning, "A tardisk has more than one policy file"};
+const Code kRelativePath{"relative-path", kWarning, "A path does not begin with a slash"};
 const Code kSkippedEntry{"skipped-entry", kWarning,
                          "A directory entry is no regular file and is skipped"};
 const Code kStarInPath{"star-in-path", kWarning, "A star in a path does not mean what it seems to"};
 const Code kTab{"tab", kWarning, "A tab is part of a word"};
 const Code kTwoLabels{"two-labels", kWarning, "Two lines give one file different labels"};
 const Code kUnreachableDomain{"unreachable-domain", kWarning, "Nothing enters a domain"};
+const Code kUntypedEntries{"untyped-entries", kWarning,
+                           "A file system does not tell what its entries are: a load skips them"};
 const Code kUnusedObject{"unused-object", kWarning, "Nobody uses an object"};
 
 }  // namespace Codes
 
 namespace {
 
-constexpr std::array<const Code*, 28> kAll = {
-    &Codes::kArgumentCount,
-    &Codes::kBadName,
-    &Codes::kBadPermissions,
-    &Codes::kGrantWord,
-    &Codes::kMissingDomain,
-    &Codes::kParameterConflict,
-    &Codes::kRuleType,
-    &Codes::kSecondRule,
-    &Codes::kTreeMarker,
-    &Codes::kUnknownDomain,
-    &Codes::kUnknownWord,
-    &Codes::kUnreadable,
-    &Codes::kCarriageReturn,
-    &Codes::kContradictingRule,
-    &Codes::kDuplicateObject,
-    &Codes::kDuplicateRule,
-    &Codes::kInstalledOnly,
-    &Codes::kLongLine,
-    &Codes::kMissingPath,
-    &Codes::kNoTardisk,
-    &Codes::kNulByte,
-    &Codes::kSecondPolicy,
-    &Codes::kSkippedEntry,
-    &Codes::kStarInPath,
-    &Codes::kTab,
-    &Codes::kTwoLabels,
-    &Codes::kUnreachableDomain,
+constexpr std::array<const Code*, 34> kAll = {
+    &Codes::kArgumentCount,     &Codes::kBadName,           &Codes::kBadPermissions,
+    &Codes::kCannotLabel,       &Codes::kGrantWord,         &Codes::kMissingDomain,
+    &Codes::kNoTardisk,         &Codes::kParameterConflict, &Codes::kRuleType,
+    &Codes::kSecondPolicy,      &Codes::kSecondRule,        &Codes::kTardiskEntry,
+    &Codes::kTreeMarker,        &Codes::kUnknownDomain,     &Codes::kUnknownWord,
+    &Codes::kUnreadable,        &Codes::kByteOrderMark,     &Codes::kCarriageReturn,
+    &Codes::kContradictingRule, &Codes::kDuplicateObject,   &Codes::kDuplicateRule,
+    &Codes::kEditorCopy,        &Codes::kInstalledOnly,     &Codes::kLongLine,
+    &Codes::kMissingPath,       &Codes::kNulByte,           &Codes::kRelativePath,
+    &Codes::kSkippedEntry,      &Codes::kStarInPath,        &Codes::kTab,
+    &Codes::kTwoLabels,         &Codes::kUnreachableDomain, &Codes::kUntypedEntries,
     &Codes::kUnusedObject,
 };
 

@@ -108,6 +108,7 @@ class DomainCheck {
 
   void CheckPathRule(unsigned int line, const Words& words) {
     const std::string& path = words[1];
+    CheckIsAbsolute(run, file, line, 1);
     if (path.find('*') != std::string::npos) {
       run.diagnostics.Add(
           file.AtWord(Codes::kStarInPath, line, 1,

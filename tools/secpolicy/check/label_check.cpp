@@ -4,12 +4,15 @@
 #include <tuple>
 
 #include "check_run.h"
+#include "host/linux/label_rehearsal.h"
+#include "root.h"
 #include "rule_form.h"
 #include "secpolicy/labels/file_label_policy.h"
 
 namespace SecPolicyCli {
 namespace {
 
+using Braxo::Lib::BraxoException;
 using SecPolicy::FileLabelPolicy;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
@@ -48,29 +51,63 @@ void ReadLabels(CheckRun& run, const SourceFile& file, std::vector<LabelLine>& l
 }
 
 // A line is read when its label is any label; it can be applied only when it is an object's.
-void CheckLabel(CheckRun& run, const LabelLine& line) {
+bool CheckLabel(CheckRun& run, const LabelLine& line) {
   const auto& [path, label, recursive, policyFile, lineNumber] = line.label;
   run.usedLabels.insert(label);
-  if (run.access.LookupLabel(label, TESKACCESS_LABEL_OBJECT) != kNoSuchLabel) return;
+  if (run.access.LookupLabel(label, TESKACCESS_LABEL_OBJECT) != kNoSuchLabel) return true;
   run.diagnostics.Add(line.file->AtWord(Codes::kUnknownWord, line.line, 1,
                                         "Invalid label (" + label + ") for file " + path,
                                         HintForLabel(run, label)));
+  return false;
 }
 
-void CheckPath(CheckRun& run, const LabelLine& line) {
-  const auto add = [&](const Code& code, const std::string& message) {
-    run.diagnostics.Add(line.file->AtWord(code, line.line, 0, message));
-  };
-  const std::string& path = line.label.path;
+// What is odd about the path of a line.
+struct PathProblem {
+  const Code* code = nullptr;  // null: nothing
+  std::string message;
+};
+
+PathProblem FindPathProblem(const FileLabelPolicy::FileLabel& label) {
+  const std::string& path = label.path;
   std::error_code ignored;
-  if (line.label.recursive && path.empty()) {
-    add(Codes::kStarInPath, "there is no directory before the /*");
-  } else if (path.find('*') != std::string::npos) {
-    add(Codes::kStarInPath, "there are no patterns: this is a file whose name has a star");
-  } else if (IsMissing(path)) {
-    add(Codes::kMissingPath, "there is nothing at " + path + " under this root");
-  } else if (line.label.recursive && !std::filesystem::is_directory(path, ignored)) {
-    add(Codes::kStarInPath, "/* stands behind something that is no directory");
+  if (label.recursive && path.empty()) {
+    return {&Codes::kStarInPath, "there is no directory before the /*"};
+  }
+  if (path.find('*') != std::string::npos) {
+    return {&Codes::kStarInPath, "there are no patterns: this is a file whose name has a star"};
+  }
+  if (IsMissing(path)) {
+    return {&Codes::kMissingPath, "there is nothing at " + path + " under this root"};
+  }
+  if (label.recursive && !std::filesystem::is_directory(path, ignored)) {
+    return {&Codes::kStarInPath, "/* stands behind something that is no directory"};
+  }
+  return {};
+}
+
+// Why a load cannot give the label; empty when it can.
+std::string Rehearse(CheckRun& run, const FileLabelPolicy::FileLabel& label) {
+  try {
+    if (label.recursive) {
+      SecPolicy::SetDirLabelRecursive(label.path, label.label, run.access);
+    } else {
+      SecPolicy::SetFileLabel(label.path, label.label, run.access);
+    }
+    return "";
+  } catch (const BraxoException& failure) {
+    return failure.what();
+  }
+}
+
+void CheckPath(CheckRun& run, const LabelLine& line, bool isRehearsed) {
+  CheckIsAbsolute(run, *line.file, line.line, 0);
+  const PathProblem problem = FindPathProblem(line.label);
+  const std::string failure = isRehearsed ? Rehearse(run, line.label) : "";
+  if (!failure.empty()) {
+    run.diagnostics.Add(
+        line.file->AtWord(Codes::kCannotLabel, line.line, 0, failure, problem.message));
+  } else if (problem.code != nullptr) {
+    run.diagnostics.Add(line.file->AtWord(*problem.code, line.line, 0, problem.message));
   }
 }
 
@@ -140,14 +177,21 @@ class LabelMap {
   std::map<Inode, const LabelLine*> inodes;
 };
 
+// What a boot will unpack and label is not there yet, and who may not load may not see everything.
+bool CanRehearse(const CheckRun& run) {
+  return run.scratch.IsCopy() && AdviseOnPrivilege().empty();
+}
+
 }  // namespace
 
 void CheckFileLabels(CheckRun& run, const std::string& dir) {
   std::vector<LabelLine> labels;
   for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadLabels(run, *named.file, labels);
+  const bool isRehearsed = CanRehearse(run);
+  if (isRehearsed) LinuxHost::StartLabelRehearsal(run.scratch.DirectoryPath());
   for (const LabelLine& line : labels) {
-    CheckLabel(run, line);
-    CheckPath(run, line);
+    const bool isLabel = CheckLabel(run, line);
+    CheckPath(run, line, isRehearsed && isLabel);
   }
   LabelMap(run, labels).Check();
 }

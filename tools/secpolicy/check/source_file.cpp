@@ -80,6 +80,12 @@ Diagnostic SourceFile::AtWords(const Code& code, unsigned int number, std::size_
 }
 
 void SourceFile::CheckBytes(DiagnosticList& diagnostics) const {
+  constexpr std::string_view kByteOrderMark = "\xef\xbb\xbf";
+  if (texts.front().starts_with(kByteOrderMark)) {
+    diagnostics.Add(AtBytes(Codes::kByteOrderMark, 1, 0, kByteOrderMark.size(),
+                            "a byte order mark is part of the first word",
+                            "save the file as UTF-8 without it"));
+  }
   unsigned int number = 0;
   for (const std::string_view text : texts) {
     ++number;

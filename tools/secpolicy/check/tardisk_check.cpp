@@ -2,6 +2,7 @@
 
 #include "check_run.h"
 #include "rule_form.h"
+#include "secpolicy/policy_root.h"
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
 
 namespace SecPolicyCli {
@@ -71,15 +72,26 @@ void CheckOrigin(CheckRun& run, const SourceFile& file, const std::string& tardi
   }
 }
 
+// As the library names it, without the slash at its end.
+std::string ImagesDir() {
+  std::string dir = SecPolicy::kTardiskImagesDir;
+  dir.pop_back();
+  return dir;
+}
+
 }  // namespace
 
 void CheckTardisks(CheckRun& run, const std::string& dir) {
+  // A load reads no other directory. A new state does not know yet what a boot will unpack.
+  const bool isLoaded = run.scratch.IsCopy() &&
+                        dir == std::string(SecPolicy::kPolicyRoot) + "/" + SecPolicy::kTardisksDir;
+  const Code& skipped = isLoaded ? Codes::kTardiskEntry : Codes::kSkippedEntry;
+  if (isLoaded) CheckEntries(run, ImagesDir(), "", skipped);
   std::set<std::string> tardisks;
-  for (const NamedFile& named : OpenPolicyFiles(run, dir)) {
+  for (const NamedFile& named : OpenPolicyFiles(run, dir, "", skipped)) {
     const SourceFile& file = *named.file;
-    // A new state does not know yet what a boot will unpack.
     std::string tardisk;
-    if (run.scratch.IsCopy()) {
+    if (isLoaded) {
       try {
         tardisk = SecPolicy::TardiskPolicy(file.Path()).GetBackingTardiskPath();
       } catch (const BraxoException& failure) {

@@ -21,6 +21,9 @@ class ScratchState {
   // Why an installed state was not copied; empty when it was, and when there is none.
   const std::string& CopyFailure() const { return copyFailure; }
 
+  // The directory that the state is in.
+  const std::string& DirectoryPath() const { return directory.Path(); }
+
   // A file beside the state, for what has to be read from a file.
   std::string ScratchFile() const { return directory.File("policy"); }
 
