@@ -104,6 +104,15 @@ fileLabels/zz:3 [unknown-word]" ]]
   [[ $output == *"$shown/domains/$name: error: "*" [bad-name]"* ]]
 }
 
+@test "bad-name, where there is no room for more domains" {
+  (cd "$policy/domains" && seq -f 'x%04.0f' 3000 | xargs touch)
+  secpolicy check
+  exits 1
+  [[ $(grep -c 'bad-name' <<<"$output") -eq 1 ]]
+  [[ $output == *"domains are in use [bad-name]
+    hint: neither is there room for 24"*" files after this one"* ]]
+}
+
 @test "bad-name, of an object" {
   local name
   name=$(printf 'x%.0s' {1..256})

@@ -1,14 +1,17 @@
 #include <algorithm>
+#include <cerrno>
 #include <cstddef>
 #include <iterator>
 #include <queue>
 #include <unordered_map>
 
 #include "check_run.h"
+#include "host/linux/host_error.h"
 #include "rule_form.h"
 #include "secpolicy/domain/capability_param_rules.h"
 #include "secpolicy/domain/domain_policy.h"
 #include "secpolicy/domain/file_path_access_rules.h"
+#include "text/count.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -192,19 +195,29 @@ struct NamedDomain {
   unsigned int id;
 };
 
+// Of a host that has no room for one more domain.
+std::string DescribeRest(std::size_t files) {
+  return files == 0 ? ""
+                    : "neither is there room for " + CountOf(files, "file") + " after this one";
+}
+
 // Creates the domain in the scratch state, as a load does before it reads any file.
 std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>& files,
                                      const std::string& prefix) {
   std::vector<NamedDomain> domains;
-  for (const NamedFile& named : files) {
+  for (std::size_t index = 0; index < files.size(); ++index) {
+    const NamedFile& named = files[index];
     const std::string name = prefix + named.name;
     unsigned int id = 0;
     try {
       if (!run.access.FindDomain(name, &id)) {
         id = run.access.CreateDomain(name, TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE);
       }
-    } catch (const BraxoException& refusal) {
-      run.diagnostics.Add(named.file->About(Codes::kBadName, refusal.what()));
+    } catch (const LinuxHost::HostError& refusal) {
+      const bool isFull = refusal.Code() == ENOSPC;
+      run.diagnostics.Add(named.file->About(Codes::kBadName, refusal.what(),
+                                            isFull ? DescribeRest(files.size() - index - 1) : ""));
+      if (isFull) break;
       continue;
     }
     run.domains[name] = named.file;
