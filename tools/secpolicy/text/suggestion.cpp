@@ -34,7 +34,7 @@ std::size_t EditDistance(const std::string& one, const std::string& other, std::
   std::vector<std::size_t> beforeLast(other.size() + 1, bound);
   std::vector<std::size_t> last(other.size() + 1, bound);
   std::vector<std::size_t> current(other.size() + 1, bound);
-  std::iota(last.begin(), last.begin() + std::min(bound, other.size() + 1), 0U);
+  std::iota(last.begin(), last.end(), 0U);
   for (std::size_t i = 1; i <= one.size(); ++i) {
     const std::size_t begin = i > bound ? i - bound : 1;
     const std::size_t end = std::min(i + bound, other.size() + 1);

@@ -66,7 +66,7 @@ bool IsUnsafe(std::uint32_t point) {
 
 std::string InBrackets(const char* format, unsigned int number) {
   std::array<char, 16> text{};
-  std::snprintf(text.data(), text.size(), format, number);
+  static_cast<void>(std::snprintf(text.data(), text.size(), format, number));
   return text.data();
 }
 
