@@ -50,9 +50,9 @@ _secpolicy() {
   elif [[ $verb == graph && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--domain --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
-    mapfile -t COMPREPLY < <(compgen -W 'carriage-return contradicting-rule duplicate-object duplicate-rule
-      installed-only long-line missing-path no-tardisk nul-byte second-policy skipped-entry star-in-path
-      tab two-labels unreachable-domain unused-object' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W 'byte-order-mark carriage-return contradicting-rule duplicate-object
+      duplicate-rule editor-copy installed-only long-line missing-path nul-byte relative-path skipped-entry
+      star-in-path tab two-labels unreachable-domain untyped-entries unused-object' -- "$current")
   elif [[ $verb == check && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
   elif [[ $verb == save && $current == -* ]]; then

@@ -562,3 +562,11 @@ secpolicy: check: no problems" ]]
   diff <(jq -r '.runs[0].tool.driver.rules[].id' <<<"$output" | sort) \
     <(sed -n 's/^### `\(.*\)`$/\1/p' "$SOURCE/docs/diagnostics.md" | sort)
 }
+
+@test "both shells complete the warnings, and no errors" {
+  local warnings
+  warnings=$(sed -n '/^## Warnings/,$s/^### `\(.*\)`$/\1/p' "$SOURCE/docs/diagnostics.md")
+  complete_line secpolicy check --disable ""
+  diff <(echo "$warnings") <(printf '%s\n' "${COMPREPLY[@]}")
+  diff <(echo "$warnings") <(sed -n 's/.*warning:(\(.*\)).*/\1/p' "$SOURCE/completions/_secpolicy" | tr ' ' '\n')
+}
