@@ -11,7 +11,7 @@
 #include "host_error.h"
 #include "host_state.h"
 #include "inherited_label.h"
-#include "label_rehearsal.h"
+#include "noted_labels.h"
 #include "label_table.h"
 #include "zorvan/kernel.h"
 
@@ -96,8 +96,8 @@ namespace Zorvan::Kernel {
 int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
   const char* realName = LinuxHost::RealName(name);
   if (realName == nullptr) return -1;
-  if (LinuxHost::IsRehearsing()) {
-    return LinuxHost::RehearseSetting(path, realName, value, size, flags);
+  if (auto* notes = LinuxHost::NotedLabels::Current()) {
+    return notes->Set(path, realName, value, size, flags);
   }
   const int result = setxattr(path, realName, value, size, flags);
   if (result == 0 || errno != ENODATA) return result;
@@ -107,7 +107,9 @@ int SetXattr(const char* path, const char* name, const void* value, std::size_t 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
   const char* realName = LinuxHost::RealName(name);
   if (realName == nullptr) return -1;
-  if (LinuxHost::IsRehearsing()) return LinuxHost::ReadRehearsed(path, realName, value, size);
+  if (auto* notes = LinuxHost::NotedLabels::Current()) {
+    return notes->Get(path, realName, value, size);
+  }
   const ssize_t result = getxattr(path, realName, value, size);
   if (result >= 0 || errno != ENODATA) return result;
   return LinuxHost::ReadInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);

@@ -8,7 +8,7 @@
 #include <string_view>
 
 #include "error_watch.h"
-#include "host/linux/label_rehearsal.h"
+#include "host/linux/noted_labels.h"
 #include "load_record.h"
 #include "load_summary.h"
 #include "summary.h"

@@ -1,10 +1,11 @@
 #include <sys/stat.h>
 
 #include <filesystem>
+#include <optional>
 #include <tuple>
 
 #include "check_run.h"
-#include "host/linux/label_rehearsal.h"
+#include "host/linux/noted_labels.h"
 #include "root.h"
 #include "rule_form.h"
 #include "secpolicy/labels/file_label_policy.h"
@@ -187,11 +188,13 @@ bool CanRehearse(const CheckRun& run) {
 void CheckFileLabels(CheckRun& run, const std::string& dir) {
   std::vector<LabelLine> labels;
   for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadLabels(run, *named.file, labels);
-  const bool isRehearsed = CanRehearse(run);
-  if (isRehearsed) LinuxHost::StartLabelRehearsal(run.scratch.DirectoryPath());
+  std::optional<LinuxHost::NotedLabels> notes;
+  if (CanRehearse(run)) {
+    notes.emplace(LinuxHost::LabelNotes::kRehearsal, run.scratch.DirectoryPath());
+  }
   for (const LabelLine& line : labels) {
     const bool isLabel = CheckLabel(run, line);
-    CheckPath(run, line, isRehearsed && isLabel);
+    CheckPath(run, line, notes && isLabel);
   }
   LabelMap(run, labels).Check();
 }

@@ -35,9 +35,9 @@ void Redirect(int descriptor, const std::string& path) {
   close(file);
 }
 
-void WriteLabels(const std::string& path) {
+void WriteLabels(const LinuxHost::NotedLabels& labels, const std::string& path) {
   std::ofstream file(path, std::ios::binary);
-  for (const auto& change : LinuxHost::RehearsedLabels()) {
+  for (const auto& change : labels.Changes()) {
     file << change.before << ' ' << change.after << ' ' << change.path << '\0';
   }
   file.flush();
@@ -77,11 +77,11 @@ LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
     Redirect(STDOUT_FILENO, scratch.File("output"));
     Redirect(STDERR_FILENO, messageFile);
     LinuxHost::DropLog();
-    LinuxHost::StartLabelRehearsal(scratch.Path());
+    const LinuxHost::NotedLabels notes(LinuxHost::LabelNotes::kRehearsal, scratch.Path());
     const CopiedSettings settings(scratch.File("config.db"));
     const LinuxHost::UsedState state(StateAfter());
     const ExitCode code = LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
-    WriteLabels(labelFile);
+    WriteLabels(notes, labelFile);
     return code;
   });
   messages = ReadAll(messageFile);

@@ -4,7 +4,7 @@
 #include <utility>
 #include <vector>
 
-#include "host/linux/label_rehearsal.h"
+#include "host/linux/noted_labels.h"
 #include "scratch/scratch_directory.h"
 #include "verb.h"
 
