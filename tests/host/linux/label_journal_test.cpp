@@ -1,0 +1,256 @@
+#include "host/linux/label_journal.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <initializer_list>
+#include <stdexcept>
+
+#include "host/linux/host_error.h"
+#include "host/linux/host_state.h"
+#include "host/linux/security_attribute.h"
+#include "scratch_root.h"
+#include "zorvan/kernel.h"
+
+namespace LinuxHostTest {
+namespace {
+
+using LinuxHost::LabelJournal;
+using LinuxHost::LabelNotes;
+using LinuxHost::LabelsPutBack;
+using LinuxHost::NotedLabels;
+
+// Each is asked for before the next one.
+std::string Words(std::initializer_list<std::string> words) {
+  std::string text;
+  for (const std::string& word : words) text += (text.empty() ? "" : " ") + word;
+  return text;
+}
+
+void Give(const std::string& path, std::uint32_t id) {
+  const int flags = NotedLabels::Current() != nullptr ? XATTR_REPLACE : 0;
+  if (Zorvan::Kernel::SetXattr(path.c_str(), "zorvan.security", &id, sizeof id, flags) != 0) {
+    throw std::runtime_error(path);
+  }
+}
+
+// What the files carry themselves.
+std::string Carried(std::initializer_list<const char*> paths) {
+  std::string text;
+  for (const char* path : paths) {
+    std::uint32_t id = 0;
+    const ssize_t size = lgetxattr(path, LinuxHost::LabelAttribute().c_str(), &id, sizeof id);
+    text += (text.empty() ? "" : " ") + (size < 0 ? strerrorname_np(errno) : std::to_string(id));
+  }
+  return text;
+}
+
+std::string StatePath() { return LinuxHost::HostState::Current().Database().Path(); }
+std::string JournalPath() { return LinuxHost::HostState::Current().Directory() + "/labels.undo"; }
+std::string Journals() { return access(JournalPath().c_str(), F_OK) == 0 ? "there" : "gone"; }
+
+std::string Told(const LabelsPutBack& back) {
+  std::string text = std::to_string(back.count);
+  for (const auto& failure : back.failures) {
+    text += " " + failure.path + ":" + strerrorname_np(failure.error);
+  }
+  return text;
+}
+
+std::string LeftOver() {
+  const auto back = LabelJournal::PutBackLeftOver(StatePath());
+  return back ? Told(*back) : "none";
+}
+
+// Runs `body`, which kills its process, in one of its own.
+void RunInKilled(const std::function<void()>& body) {
+  const pid_t child = fork();
+  if (child == 0) body();
+  waitpid(child, nullptr, 0);
+}
+
+// The files "one" and "two" in "tree" carry 7 and nothing, "tree" carries 6.
+class Journal : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    for (const char* path : {"tree/one", "tree/two", "tree/sub/three"}) scratch.Write(path, "text");
+    Run([] {
+      Give("tree", 6);
+      Give("tree/one", 7);
+      return "";
+    });
+  }
+
+  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
+
+  // Notes labels for all files, and keeps what they have.
+  static void NoteAndKeep(const NotedLabels& notes, LabelJournal& journal) {
+    Give("tree/one", 8);
+    Give("tree/two", 8);
+    Give("tree/sub/three", 8);
+    Give("tree", 8);
+    Give("tree/one", 9);
+    journal.Keep(notes);
+  }
+
+  ScratchRoot scratch;
+};
+
+TEST_F(Journal, PutsBackWhatFilesCarried) {
+  EXPECT_EQ(Run([] {
+              const NotedLabels notes(LabelNotes::kForLater);
+              LabelJournal journal(StatePath());
+              NoteAndKeep(notes, journal);
+              notes.Apply();
+              const std::string given =
+                  Carried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
+              const std::string back = Told(journal.PutBack());
+              return given + ", " + back + ", " +
+                     Carried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
+            }),
+            "8 9 8 ENODATA 8, 4, 6 7 ENODATA ENODATA ENODATA");
+}
+
+TEST_F(Journal, ChangesNothingThatIsAsItWas) {
+  EXPECT_EQ(Run([] {
+              const NotedLabels notes(LabelNotes::kForLater);
+              LabelJournal journal(StatePath());
+              NoteAndKeep(notes, journal);
+              return Told(journal.PutBack()) + ", " + Carried({"tree", "tree/one", "tree/two"});
+            }),
+            "0, 6 7 ENODATA");
+}
+
+TEST_F(Journal, GoesWithItsObject) {
+  EXPECT_EQ(Run([] {
+              std::string during;
+              {
+                const NotedLabels notes(LabelNotes::kForLater);
+                LabelJournal journal(StatePath());
+                NoteAndKeep(notes, journal);
+                notes.Apply();
+                during = Journals();
+              }
+              return Words({during, Journals(), LeftOver(), Carried({"tree/one"})});
+            }),
+            "there gone none 9");
+}
+
+TEST_F(Journal, IsPutBackByTheNextProcessWhenItsOwnDied) {
+  EXPECT_EQ(Run([] {
+              RunInKilled([] {
+                const NotedLabels notes(LabelNotes::kForLater);
+                LabelJournal journal(StatePath());
+                NoteAndKeep(notes, journal);
+                notes.Apply();
+                raise(SIGKILL);
+              });
+              return Words({Carried({"tree/one"}), Journals(), LeftOver(), Journals(),
+                            Carried({"tree", "tree/one", "tree/two"})});
+            }),
+            "9 there 4 gone 6 7 ENODATA");
+}
+
+TEST_F(Journal, IsPutBackBeforeTheNextOneBegins) {
+  EXPECT_EQ(Run([] {
+              RunInKilled([] {
+                const NotedLabels notes(LabelNotes::kForLater);
+                LabelJournal journal(StatePath());
+                NoteAndKeep(notes, journal);
+                notes.Apply();
+                raise(SIGKILL);
+              });
+              LabelJournal next(StatePath());
+              return Words({Carried({"tree", "tree/one", "tree/two"}), Told(next.PutBack())});
+            }),
+            "6 7 ENODATA 0");
+}
+
+TEST_F(Journal, IsLeftAloneWhileItsProcessLives) {
+  EXPECT_EQ(Run([] {
+              const NotedLabels notes(LabelNotes::kForLater);
+              LabelJournal journal(StatePath());
+              NoteAndKeep(notes, journal);
+              notes.Apply();
+              std::string second;
+              try {
+                LabelJournal another(StatePath());
+              } catch (const LinuxHost::HostError& error) {
+                second = strerrorname_np(error.Code());
+              }
+              return Words({LeftOver(), second, Journals(), Carried({"tree/one"})});
+            }),
+            "none EAGAIN there 9");
+}
+
+TEST_F(Journal, CountsAsFarAsItsWriterCame) {
+  EXPECT_EQ(Run([] {
+              const NotedLabels notes(LabelNotes::kForLater);
+              std::string whole;
+              {
+                LabelJournal journal(StatePath());
+                NoteAndKeep(notes, journal);
+                whole = Content(JournalPath());
+              }
+              notes.Apply();
+              std::size_t put = 0;
+              for (std::size_t size = 0; size <= whole.size(); ++size) {
+                const int file = open(JournalPath().c_str(), O_CREAT | O_WRONLY | O_TRUNC, 0600);
+                const bool isWritten =
+                    write(file, whole.data(), size) == static_cast<ssize_t>(size);
+                close(file);
+                const auto back = LabelJournal::PutBackLeftOver(StatePath());
+                if (!isWritten || !back || !back->failures.empty()) return std::string("failed");
+                put += back->count;
+              }
+              return Words({std::to_string(put), Carried({"tree", "tree/one", "tree/two"})});
+            }),
+            "4 6 7 ENODATA");
+}
+
+TEST_F(Journal, FollowsNothingThatWasReplaced) {
+  scratch.Write("other/one", "text");
+  EXPECT_EQ(
+      Run([]() -> std::string {
+        Give("other/one", 3);
+        const NotedLabels notes(LabelNotes::kForLater);
+        LabelJournal journal(StatePath());
+        NoteAndKeep(notes, journal);
+        notes.Apply();
+        unlink("tree/one");
+        rename("tree/sub", "aside");
+        if (symlink("../other/one", "tree/one") != 0 || symlink("../other", "tree/sub") != 0) {
+          return "no way";
+        }
+        const LabelsPutBack back = journal.PutBack();
+        return Words({std::to_string(back.count), std::to_string(back.failures.size()),
+                      Carried({"tree", "tree/two", "other/one", "aside/three"})});
+      }),
+      "2 3 6 ENODATA 3 8");
+}
+
+TEST_F(Journal, IsRefusedWhereOthersMayHaveWrittenIt) {
+  EXPECT_NE(Run([]() -> std::string {
+              StatePath();
+              close(open(JournalPath().c_str(), O_CREAT | O_WRONLY, 0600));
+              chmod(JournalPath().c_str(), 0666);
+              return LeftOver();
+            }).find("other users may write"),
+            std::string::npos);
+  EXPECT_NE(Run([]() -> std::string {
+              unlink(JournalPath().c_str());
+              if (symlink("/dev/null", JournalPath().c_str()) != 0) return "no way";
+              return LeftOver();
+            }).find("is not a regular file"),
+            std::string::npos);
+}
+
+}  // namespace
+}  // namespace LinuxHostTest
