@@ -191,13 +191,14 @@ class World {
     return {names, size < 0 ? 0 : static_cast<std::size_t>(size)};
   }
 
-  // Everything but the root, the image and the host's own state.
+  // Everything but the root, the image and the host's own state and log.
   std::string Describe() const {
     std::map<std::string, std::string> entries;
     for (auto entry = fs::recursive_directory_iterator(path); entry != fs::end(entry); ++entry) {
       const std::string name = fs::relative(entry->path(), path);
-      if (name == "inside/root" || name == "state") entry.disable_recursion_pending();
-      if (name == "inside/root" || name == "state" || name == "image.tgz") continue;
+      const bool isOwn = name == "inside/root" || name == "state" || name == "run";
+      if (isOwn) entry.disable_recursion_pending();
+      if (isOwn || name == "image.tgz") continue;
       struct stat status {};
       lstat(entry->path().c_str(), &status);
       std::ostringstream text;
