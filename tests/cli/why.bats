@@ -249,3 +249,11 @@ END
   fits_schema why
   jq -e '.allowed and (.granted | not) and .rules == [] and .missing == ["-s mount grant"]' <<<"$output"
 }
+
+@test "a tab is part of a word" {
+  printf 'tab\tbed\n' >"$policy/objects/odd"
+  printf -- '-u tab\tbed stream grant\n' >>"$policy/domains/appDom"
+  boot
+  secpolicy why appDom create-socket $'tab\tbed' stream
+  exits 0
+}

@@ -1,6 +1,8 @@
 #include "rule_words.h"
 
-#include <sstream>
+#include <queue>
+
+#include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -22,8 +24,9 @@ RuleWords SplitRule(const std::string& text) {
     rule.words = {text.substr(path, last - path), text.substr(last + 1)};
     return rule;
   }
-  std::istringstream rest(text.substr(first + 1));
-  for (std::string word; rest >> word;) rule.words.push_back(word);
+  // As the library splits lines: a tab is part of a word.
+  std::queue<std::string> rest = SecPolicy::StringToQueue(text.substr(first + 1));
+  for (; !rest.empty(); rest.pop()) rule.words.push_back(rest.front());
   if (rule.words.empty()) return rule;
   rule.grant = rule.words.back() == "grant";
   rule.words.pop_back();
