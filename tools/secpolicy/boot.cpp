@@ -16,7 +16,7 @@
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "summary.h"
-#include "text/file_list.h"
+#include "text/section.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -52,7 +52,7 @@ std::size_t MostShown(const Options& options) {
 
 void BootAndLoad(const Options& options, LoadTiming& timing) {
   const LinuxHost::AssembledRoot root = LinuxHost::AssembleRoot(RulesOf(options));
-  WriteFileList("edited files that were replaced", root.editedFiles, MostShown(options), std::cerr);
+  WriteSection("edited files that were replaced", root.editedFiles, MostShown(options), std::cerr);
   LinuxHost::StartPolicy(root);
   timing.EndPhase("first labels");
   timing.BeginPart("early ");

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "json.h"
-#include "text/file_list.h"
+#include "text/section.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -54,9 +54,9 @@ void WriteBootPlanText(const BootPlan& plan, std::size_t maximum, std::ostream& 
   const auto replaced = Pick(
       plan, [](const auto& file) { return EffectOf(file) == Effect::kReplace && !file.isEdited; });
   const auto edited = Pick(plan, [](const auto& file) { return file.isEdited; });
-  WriteFileList("files to add", added, maximum, output);
-  WriteFileList("files to replace", replaced, maximum, output);
-  WriteFileList("edited files to replace", edited, maximum, output);
+  WriteSection("files to add", added, maximum, output);
+  WriteSection("files to replace", replaced, maximum, output);
+  WriteSection("edited files to replace", edited, maximum, output);
   output << "files to unpack again as they are: " << CountKept(plan) << '\n'
          << "files to get their first label: " << plan.labelCount << '\n';
 }

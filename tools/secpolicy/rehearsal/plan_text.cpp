@@ -1,28 +1,13 @@
-#include <algorithm>
-
 #include "load_plan.h"
-#include "text/visible.h"
+#include "text/section.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Lines = std::vector<std::string>;
 
-// The things of one heading. `maximum` of them are shown.
-void WriteSection(const std::string& heading, const Lines& lines, std::size_t maximum,
-                  std::ostream& output) {
-  if (lines.empty()) return;
-  output << heading << " (" << lines.size() << "):\n";
-  const std::size_t shown = std::min(lines.size(), maximum);
-  for (std::size_t index = 0; index < shown; ++index)
-    output << "  " << Visible(lines[index]) << '\n';
-  if (shown < lines.size()) {
-    output << "  ... and " << lines.size() - shown << " more; -v shows all\n";
-  }
-}
-
 void WriteSection(const std::string& heading, const Lines& lines, std::ostream& output) {
-  WriteSection(heading, lines, lines.size(), output);
+  SecPolicyCli::WriteSection(heading, lines, lines.size(), output);
 }
 
 std::string Arrow(const std::string& before, const std::string& after) {

@@ -1,4 +1,4 @@
-#include "file_list.h"
+#include "section.h"
 
 #include <algorithm>
 #include <ostream>
@@ -7,8 +7,8 @@
 
 namespace SecPolicyCli {
 
-void WriteFileList(const std::string& heading, const std::vector<std::string>& lines,
-                   std::size_t maximum, std::ostream& output) {
+void WriteSection(const std::string& heading, const std::vector<std::string>& lines,
+                  std::size_t maximum, std::ostream& output) {
   if (lines.empty()) return;
   output << heading << " (" << lines.size() << "):\n";
   const std::size_t shown = std::min(lines.size(), maximum);
