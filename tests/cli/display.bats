@@ -38,7 +38,7 @@ load helper
   boot
   secpolicy display 400
   exits 0
-  ! grep -q '^Domain Name: ' <<<"$output"
+  [[ $output != *"Domain Name: "* ]]
   shows "Policy set in the kernel"
 }
 
