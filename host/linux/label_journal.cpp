@@ -7,7 +7,6 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include <array>
 #include <cerrno>
 #include <cstring>
 #include <fstream>
@@ -44,15 +43,6 @@ std::string JournalBeside(const std::string& statePath) {
   throw HostError(code, StrCat(what, path, ": ", std::strerror(code)));
 }
 
-// What the entry of the working directory carries itself; empty, with errno set, when it carries
-// nothing.
-std::optional<std::string> ReadCarried(const char* name, const std::string& attribute) {
-  std::array<char, XATTR_SIZE_MAX> value;
-  const ssize_t size = lgetxattr(name, attribute.c_str(), value.data(), value.size());
-  if (size < 0) return std::nullopt;
-  return std::string(value.data(), static_cast<std::size_t>(size));
-}
-
 bool IsLink(const char* name) {
   struct stat status {};
   return lstat(name, &status) == 0 && S_ISLNK(status.st_mode);
@@ -83,7 +73,7 @@ class JournalReader {
     return input >> place.device >> place.inode && input.get() == ' ' && ReadText(place.path);
   }
 
-  bool ReadCarried(KeptLabel& kept) {
+  bool ReadKept(KeptLabel& kept) {
     std::size_t size = 0;
     if (!(input >> size) || size > XATTR_SIZE_MAX || input.get() != ' ') return false;
     kept.value.emplace(size, '\0');
@@ -147,7 +137,7 @@ bool PutLineBack(JournalReader& reader, Undoing& undoing) {
       undoing.Enter(std::move(place));
       return true;
     case kCarries:
-      if (!reader.ReadCarried(kept)) return false;
+      if (!reader.ReadKept(kept)) return false;
       undoing.PutBack(kept);
       return true;
     case kCarriesNothing:

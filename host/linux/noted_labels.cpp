@@ -1,7 +1,6 @@
 #include "noted_labels.h"
 
 #include <fcntl.h>
-#include <linux/limits.h>
 #include <linux/magic.h>
 #include <sys/stat.h>
 #include <sys/statfs.h>
@@ -9,7 +8,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
@@ -80,16 +78,15 @@ int CheckTracelessly(const std::string& path, const char* name, std::uint32_t id
 
 // The try is with the old value, if the file has one, so that it changes nothing anywhere.
 int CheckAnywhere(const std::string& path, const char* name, std::uint32_t id, LabelNotes purpose) {
-  std::array<char, XATTR_SIZE_MAX> old;
-  ssize_t size = lgetxattr(path.c_str(), name, old.data(), old.size());
-  if (size < 0) {
+  auto value = ReadCarried(path.c_str(), name);
+  if (!value) {
     const bool mayBeThere = errno == EACCES;
     if (!mayBeThere && (errno != ENODATA || RequireInherited(path, name) != 0)) return -1;
-    std::memcpy(old.data(), &id, sizeof id);
-    size = sizeof id;
+    value.emplace(sizeof id, '\0');
+    std::memcpy(value->data(), &id, sizeof id);
   }
   if (purpose == LabelNotes::kRehearsal) return CheckQuietly(path);
-  const int error = TryInVain(path, name, old.data(), static_cast<std::size_t>(size));
+  const int error = TryInVain(path, name, value->data(), value->size());
   return error == 0 || error == EEXIST || error == ENODATA || error == EINVAL ? 0 : Fail(error);
 }
 

@@ -1,6 +1,7 @@
 #include "security_attribute.h"
 
 #include <fcntl.h>
+#include <linux/limits.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 
@@ -11,8 +12,8 @@
 #include "host_error.h"
 #include "host_state.h"
 #include "inherited_label.h"
-#include "noted_labels.h"
 #include "label_table.h"
+#include "noted_labels.h"
 #include "zorvan/kernel.h"
 
 namespace LinuxHost {
@@ -70,6 +71,18 @@ bool CanCarryLabel(mode_t mode, const std::string& attribute) {
 int GiveFirstLabel(const char* path, const std::string& attribute) {
   const std::uint32_t id = kUnlabeledId;
   return lsetxattr(path, attribute.c_str(), &id, sizeof id, 0);
+}
+
+std::optional<std::string> ReadCarried(const char* path, const std::string& attribute) {
+  std::string value(sizeof(std::uint32_t), '\0');
+  ssize_t size = lgetxattr(path, attribute.c_str(), value.data(), value.size());
+  if (size < 0 && errno == ERANGE) {
+    value.resize(XATTR_SIZE_MAX);
+    size = lgetxattr(path, attribute.c_str(), value.data(), value.size());
+  }
+  if (size < 0) return std::nullopt;
+  value.resize(static_cast<std::size_t>(size));
+  return value;
 }
 
 std::optional<FileLabel> ReadLabel(const char* path) {

@@ -27,6 +27,11 @@ bool CanCarryLabel(mode_t mode, const std::string& attribute);
 // file are followed, the last one is not.
 int GiveFirstLabel(const char* path, const std::string& attribute);
 
+// What the file at `path` itself carries in the real attribute `attribute`, whatever that is;
+// nothing, with errno set, when it carries none (ENODATA) or it cannot be read. Links on the way to
+// the file are followed, the last one is not.
+std::optional<std::string> ReadCarried(const char* path, const std::string& attribute);
+
 struct FileLabel {
   std::uint32_t id = 0;
   bool isInherited = false;  // from a directory above; the file itself carries none
