@@ -1,5 +1,6 @@
 #include "forked.h"
 
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -26,12 +27,22 @@ namespace {
   std::exit(code);
 }
 
+// Nobody would clear up after a child whose parent was killed. The parent may be gone already.
+void DieWith(pid_t parent) {
+  prctl(PR_SET_PDEATHSIG, SIGKILL);
+  if (getppid() != parent) _exit(kFailed);
+}
+
 pid_t Fork(const std::function<ExitCode()>& body) {
   std::cout.flush();
   std::cerr.flush();
+  const pid_t parent = getpid();
   const pid_t child = fork();
   if (child < 0) throw std::system_error(errno, std::generic_category(), "cannot fork");
-  if (child == 0) RunChild(body);
+  if (child == 0) {
+    DieWith(parent);
+    RunChild(body);
+  }
   return child;
 }
 
