@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/sysmacros.h>
 #include <sys/un.h>
 #include <syslog.h>
 #include <unistd.h>
@@ -15,6 +16,7 @@
 #include "braxo/misc/strcat.h"
 #include "descriptor.h"
 #include "host_error.h"
+#include "private_file.h"
 #include "teskctl/system.h"
 
 namespace LinuxHost {
@@ -82,33 +84,30 @@ std::string Printable(const std::string& message) {
   return text;
 }
 
-// A text that is too long for one record goes into several, each with the tag.
-void WriteRecords(const Descriptor& device, std::string_view text, const std::string& tag) {
-  const int priority = LOG_USER | (tag == kInformationTag ? LOG_INFO : LOG_ERR);
-  do {
-    const std::string_view piece = text.substr(0, kMaxRecordText);
-    text.remove_prefix(piece.size());
-    WriteWhole(device, kKernelLogDevice,
-               Braxo::Misc::StrCat("<", priority, ">", tag, " ", piece, "\n"));
-  } while (!text.empty());
+// What else lies there, a pipe or a link perhaps, would keep the writer waiting or be written over.
+bool HasKernelLogDevice() {
+  struct stat status {};
+  return lstat(kKernelLogDevice, &status) == 0 && S_ISCHR(status.st_mode) &&
+         status.st_rdev == makedev(1, 11);
 }
 
 void AppendLine(std::string_view text, const std::string& tag) {
   mkdir("/run", 0755);
-  mkdir("/run/secpolicy", 0700);
+  PreparePrivateFile(kKernelLogFile, "kernel log");
   const Descriptor file(
-      open(kKernelLogFile, O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+      open(kKernelLogFile, O_WRONLY | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   if (!file.IsOpen()) FailToWrite(kKernelLogFile);
   // One write: lines of several processes stay whole.
   WriteWhole(file, kKernelLogFile, Braxo::Misc::StrCat(tag, " ", text, "\n"));
 }
 
 void WriteToKernelLog(const std::string& message, const std::string& tag) {
-  const std::string text = Printable(message);
-  const Descriptor device(open(kKernelLogDevice, O_WRONLY | O_CLOEXEC));
-  if (device.IsOpen()) return WriteRecords(device, text, tag);
-  if (errno != ENOENT) FailToWrite(kKernelLogDevice);
-  AppendLine(text, tag);
+  if (!HasKernelLogDevice()) return AppendLine(Printable(message), tag);
+  const Descriptor device(open(kKernelLogDevice, O_WRONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  if (!device.IsOpen()) FailToWrite(kKernelLogDevice);
+  for (const std::string& record : KernelLogRecords(message, tag)) {
+    WriteWhole(device, kKernelLogDevice, record);
+  }
 }
 
 void WriteToSyslog(const std::string& message, const std::string& tag) {
@@ -128,6 +127,19 @@ void WatchLog(const std::function<void(const std::string& message)>& watcher) {
 }
 
 void DropLog() { dropped = true; }
+
+std::vector<std::string> KernelLogRecords(const std::string& message, const std::string& tag) {
+  const int priority = LOG_USER | (tag == kInformationTag ? LOG_INFO : LOG_ERR);
+  const std::string text = Printable(message);
+  std::vector<std::string> records;
+  std::size_t begin = 0;
+  do {
+    records.push_back(Braxo::Misc::StrCat("<", priority, ">", tag, " ",
+                                          text.substr(begin, kMaxRecordText), "\n"));
+    begin += kMaxRecordText;
+  } while (begin < text.size());
+  return records;
+}
 
 void LogInformation(const std::string& message) {
   if (TeskCtl::System::SyslogIsRunning()) return WriteToSyslog(message, kInformationTag);

@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 // Where this host's log lines go, and what the command may ask of it.
 namespace LinuxHost {
@@ -19,6 +20,10 @@ void WatchLog(const std::function<void(const std::string& message)>& watcher);
 // From now on drops every line, those that are shown included: what a process only rehearses has
 // not happened.
 void DropLog();
+
+// What the kernel's device gets for a line: a text that is too long for one record goes into
+// several, each with its priority and the tag.
+std::vector<std::string> KernelLogRecords(const std::string& message, const std::string& tag);
 
 // Logs one information line of the host's own, by the same road as those of the library.
 void LogInformation(const std::string& message);
