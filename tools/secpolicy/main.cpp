@@ -7,6 +7,7 @@
 #include "command_line.h"
 #include "host/linux/system_log.h"
 #include "root.h"
+#include "standard_descriptors.h"
 #include "text/terminal_guard.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -79,6 +80,7 @@ int Run(int argc, char** argv) {
 }  // namespace SecPolicyCli
 
 int main(int argc, char** argv) {
+  SecPolicyCli::TakeClosedDescriptors();
   const SecPolicyCli::TerminalGuard output(std::cout, STDOUT_FILENO);
   const SecPolicyCli::TerminalGuard errors(std::cerr, STDERR_FILENO);
   return SecPolicyCli::Run(argc, argv);
