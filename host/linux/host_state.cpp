@@ -123,7 +123,7 @@ constexpr StoreLayout kLayout = {
     .purpose = "host state",
     .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
     .applicationId = 0x5a6f7276,
-    .version = 3,
+    .version = kStateVersion,
     .schema = kSchema,
     .survivesPowerLoss = false,
 };

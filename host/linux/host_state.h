@@ -2,6 +2,7 @@
 
 #include <sys/types.h>
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <span>
@@ -11,6 +12,9 @@
 #include "store.h"
 
 namespace LinuxHost {
+
+// Of the schema of the state, and so of the saved ones.
+inline constexpr std::int32_t kStateVersion = 3;
 
 class DomainTable;
 class FilePolicyTable;

@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "braxo/misc/strcat.h"
+#include "descriptor.h"
 #include "host_error.h"
 
 using Braxo::Misc::StrCat;
@@ -33,6 +34,12 @@ struct Use {
   const char* alternative;
 };
 
+// For a look at what is there, which nothing can keep waiting, and which drops no lock when it
+// ends.
+constexpr int kLookAt = O_PATH | O_NOFOLLOW | O_CLOEXEC;
+
+const char* NameOf(const std::string& path) { return path.c_str() + path.rfind('/') + 1; }
+
 constexpr char kElsewhere[] = ", or choose another place";
 constexpr char kAnew[] = ", and make it anew";
 
@@ -47,15 +54,17 @@ void RequirePrivate(const struct stat& status, const std::string& path, const Us
   }
 }
 
-// Looks at a link itself, never at what it leads to.
-struct stat Examine(const std::string& path) {
+// Looks at a link itself, never at what it leads to, and waits for nothing.
+struct stat Examine(const Descriptor& file, const std::string& path) {
   struct stat status {};
-  if (lstat(path.c_str(), &status) != 0) ThrowSystemError(StrCat("Unable to examine ", path));
+  if (!file.IsOpen() || fstat(file.Number(), &status) != 0) {
+    ThrowSystemError(StrCat("Unable to examine ", path));
+  }
   return status;
 }
 
-void RequireDirectory(const std::string& directory, const Use& use) {
-  const struct stat status = Examine(directory);
+void RequireDirectory(const Descriptor& opened, const std::string& directory, const Use& use) {
+  const struct stat status = Examine(opened, directory);
   if (!S_ISDIR(status.st_mode)) {
     throw HostError(ENOTDIR,
                     StrCat("Refusing the ", use.purpose, ": ", directory, " is not a directory"));
@@ -63,39 +72,38 @@ void RequireDirectory(const std::string& directory, const Use& use) {
   RequirePrivate(status, directory, use);
 }
 
-void RequireFile(const std::string& path, const Use& use) {
-  const struct stat status = Examine(path);
+struct stat RequireFile(const Descriptor& directory, const std::string& path, const Use& use) {
+  const Descriptor opened(openat(directory.Number(), NameOf(path), kLookAt));
+  const struct stat status = Examine(opened, path);
   if (!S_ISREG(status.st_mode)) {
     throw HostError(EINVAL, StrCat("Refusing the ", use.purpose, ": ", path,
                                    " is not a regular file. Remove it", use.alternative));
   }
   RequirePrivate(status, path, use);
+  return status;
 }
 
-void PrepareDirectory(const std::string& directory, const Use& use) {
+void MakeDirectory(const std::string& directory, const Use& use) {
   if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
     if (errno == ENOENT) ThrowParentMissing(directory, use.purpose);
     ThrowSystemError(
         StrCat("Unable to create the directory ", directory, " for the ", use.purpose));
   }
-  RequireDirectory(directory, use);
 }
 
 // Only ever opens a file that it has just created: closing another descriptor of a database in use
 // would drop this process's locks on it.
-void CreateFile(const std::string& path, const std::string& purpose) {
-  const int descriptor =
-      open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, S_IRUSR | S_IWUSR);
-  if (descriptor >= 0) {
-    close(descriptor);
-    return;
-  }
-  if (errno != EEXIST) ThrowSystemError(StrCat("Unable to create the ", purpose, " ", path));
+void CreateFile(const Descriptor& directory, const std::string& path, const std::string& purpose) {
+  constexpr int kFlags = O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  const Descriptor made(openat(directory.Number(), NameOf(path), kFlags, S_IRUSR | S_IWUSR));
+  if (made.IsOpen() || errno == EEXIST) return;
+  ThrowSystemError(StrCat("Unable to create the ", purpose, " ", path));
 }
 
-bool IsMissing(const std::string& path) {
+bool IsMissing(const Descriptor& directory, const std::string& path) {
   struct stat status {};
-  return lstat(path.c_str(), &status) != 0 && errno == ENOENT;
+  return fstatat(directory.Number(), NameOf(path), &status, AT_SYMLINK_NOFOLLOW) != 0 &&
+         errno == ENOENT;
 }
 
 std::string DirectoryOf(const std::string& path, const std::string& purpose) {
@@ -109,17 +117,22 @@ std::string DirectoryOf(const std::string& path, const std::string& purpose) {
 
 }  // namespace
 
-void PreparePrivateFile(const std::string& path, const std::string& purpose) {
+struct stat PreparePrivateFile(const std::string& path, const std::string& purpose) {
   const Use use{.purpose = purpose, .alternative = kElsewhere};
-  PrepareDirectory(DirectoryOf(path, purpose), use);
-  if (IsMissing(path)) CreateFile(path, purpose);
-  RequireFile(path, use);
+  const std::string directory = DirectoryOf(path, purpose);
+  MakeDirectory(directory, use);
+  const Descriptor opened(open(directory.c_str(), kLookAt));
+  RequireDirectory(opened, directory, use);
+  if (IsMissing(opened, path)) CreateFile(opened, path, purpose);
+  return RequireFile(opened, path, use);
 }
 
-void RequirePrivateFile(const std::string& path, const std::string& purpose) {
+struct stat RequirePrivateFile(const std::string& path, const std::string& purpose) {
   const Use use{.purpose = purpose, .alternative = kAnew};
-  RequireDirectory(DirectoryOf(path, purpose), use);
-  RequireFile(path, use);
+  const std::string directory = DirectoryOf(path, purpose);
+  const Descriptor opened(open(directory.c_str(), kLookAt));
+  RequireDirectory(opened, directory, use);
+  return RequireFile(opened, path, use);
 }
 
 }  // namespace LinuxHost

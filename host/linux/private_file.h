@@ -1,16 +1,19 @@
 #pragma once
 
+#include <sys/stat.h>
+
 #include <string>
 
 namespace LinuxHost {
 
 // Makes sure that `path` is a regular file in a directory of its own, both of which only this user
 // and the superuser may change; creates the file (mode 0600) and the last directory (0700) when
-// they are missing. `purpose` says in messages what the file is. Throws HostError, changing
-// nothing, when something else is there.
-void PreparePrivateFile(const std::string& path, const std::string& purpose);
+// they are missing. Follows no link and opens nothing but what it creates, so that nothing can keep
+// it waiting. `purpose` says in messages what the file is. Returns what the file is. Throws
+// HostError, changing nothing, when something else is there.
+struct stat PreparePrivateFile(const std::string& path, const std::string& purpose);
 
 // The same for a file that is only read: makes nothing, and throws also when there is no such file.
-void RequirePrivateFile(const std::string& path, const std::string& purpose);
+struct stat RequirePrivateFile(const std::string& path, const std::string& purpose);
 
 }  // namespace LinuxHost

@@ -17,6 +17,7 @@
 #include "host_state.h"
 #include "private_file.h"
 #include "store_copy.h"
+#include "store_seal.h"
 #include "world_table.h"
 
 using Braxo::Misc::StrCat;
@@ -79,13 +80,18 @@ void MakeDirectory(const std::filesystem::path& directory) {
   }
 }
 
+bool LacksDescriptors(const HostError& failure) {
+  return failure.Code() == EMFILE || failure.Code() == ENFILE;
+}
+
 // The copy as the database "saved" beside the state.
 class AttachedCopy {
  public:
   AttachedCopy(Store& target, const std::string& copy) : store(target) {
     try {
       store.Run("ATTACH DATABASE ?1 AS saved", copy);
-    } catch (const HostError&) {
+    } catch (const HostError& failure) {
+      if (LacksDescriptors(failure)) throw;
       throw HostError(EIO, kDamaged);
     }
   }
@@ -105,7 +111,7 @@ class AttachedCopy {
       Rows rows = store.Select("PRAGMA saved.quick_check(1)");
       if (rows.Next() && rows.Text(0) == "ok") return;
     } catch (const HostError& failure) {
-      if (failure.Code() == EPROTO) throw;
+      if (failure.Code() == EPROTO || LacksDescriptors(failure)) throw;
     }
     throw HostError(EIO, kDamaged);
   }
@@ -207,12 +213,12 @@ void SaveState(const std::string& from, const std::string& to, bool replace) {
   MakeDirectory(std::filesystem::path(to).parent_path());
   FileInTheMaking file(to);
   PreparePrivateFile(file.Path(), kPurpose);
-  const std::string failure = CopyDatabase(from, file.Path());
-  if (!failure.empty()) throw HostError(EIO, StrCat("Unable to copy ", from, ": ", failure));
+  CopyDatabase(from, CopyOf::kState, file.Path());
+  Seal(file.Path());
+  const std::string damage = FindBrokenSeal(file.Path());
+  if (!damage.empty()) throw HostError(EIO, StrCat("Unable to copy ", from, ": ", damage));
   file.TakeName(replace);
 }
-
-void RequireTrustedState(const std::string& path) { RequirePrivateFile(path, kPurpose); }
 
 void RestorePolicy(const std::string& copy, LabelNumbers numbers) {
   HostState& state = HostState::Current();

@@ -7,12 +7,9 @@ namespace LinuxHost {
 
 // Copies the state at `from`, which is only read and may be in use, to the file `to` (mode 0600) in
 // a directory of its own (0700), which is made if it is missing. The file is there whole, and to
-// stay, or not at all. Throws when there is such a file already, unless `replace` is set.
+// stay, or not at all, and holds a digest of its contents. Throws when there is such a file
+// already, unless `replace` is set.
 void SaveState(const std::string& from, const std::string& to, bool replace);
-
-// Throws unless the saved state `path` is a regular file that only this user and the superuser may
-// change, in such a directory: whoever else may write it decides what comes back.
-void RequireTrustedState(const std::string& path);
 
 // The numbers that labels get which the copy has and the state has no longer.
 enum class LabelNumbers {

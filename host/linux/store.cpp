@@ -26,13 +26,6 @@ constexpr unsigned int kLongWaitMicroseconds = 1000;
 constexpr int kShortWaits = 100;
 constexpr int kWaits = 30'000;
 
-// The first waits are short, since most calls hold the database for one row only; a batch may hold
-// it far longer. Gives up after half a minute.
-int WaitForOthers(void* /*unused*/, int waits) {
-  usleep(waits < kShortWaits ? kShortWaitMicroseconds : kLongWaitMicroseconds);
-  return waits < kWaits ? 1 : 0;
-}
-
 int ErrorNumber(int result) {
   switch (result & 0xff) {
     case SQLITE_BUSY:
@@ -91,6 +84,13 @@ class DirectoryLock {
 };
 
 }  // namespace
+
+// The first waits are short, since most calls hold the database for one row only; a batch may hold
+// it far longer. Gives up after half a minute.
+int WaitForOthers(void* /*unused*/, int waits) {
+  usleep(waits < kShortWaits ? kShortWaitMicroseconds : kLongWaitMicroseconds);
+  return waits < kWaits ? 1 : 0;
+}
 
 Rows::~Rows() { sqlite3_reset(statement); }
 
@@ -295,6 +295,11 @@ std::int64_t Store::ReadInteger(const char* query) {
 
 void Store::Fail(int result) const {
   const char* reason = database != nullptr ? sqlite3_errmsg(database) : sqlite3_errstr(result);
+  const int systemError = database != nullptr ? sqlite3_system_errno(database) : 0;
+  if (systemError == EMFILE || systemError == ENFILE) {
+    throw HostError(systemError, StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
+                                        std::strerror(systemError)));
+  }
   if (IsDamaged(result)) Refuse(EIO, StrCat("is damaged or no such thing (", reason, ")"));
   throw HostError(ErrorNumber(result), StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
                                               reason, RemedyFor(result)));

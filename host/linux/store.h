@@ -16,6 +16,10 @@ struct sqlite3_stmt;
 // The one place that knows the database engine. Every failure is a HostError.
 namespace LinuxHost {
 
+// Sleeps, as a writer does that waits for others and has waited `waits` times already. Returns 0
+// when it is time to give up, after about half a minute. The engine calls it, too.
+int WaitForOthers(void* unused, int waits);
+
 // What a database file must be to be used, and what it is made of when it is created.
 struct StoreLayout {
   const char* purpose;         // what it is, in messages: "host state"

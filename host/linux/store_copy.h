@@ -4,8 +4,18 @@
 
 namespace LinuxHost {
 
-// Copies the database at `from`, which is only read and may be in use, to a new file `to`. Returns
-// why it could not; empty when it could. The copy survives no power loss.
-std::string CopyDatabase(const std::string& from, const std::string& to);
+// What a database is that is copied.
+enum class CopyOf {
+  kState,       // may be in use
+  kSettings,    // may be in use
+  kSavedState,  // never changes once it has its name
+  kOwnCopy      // known to nobody else
+};
+
+// Copies the database at `from`, which is only read, to the file `to` (mode 0600), as it was at one
+// moment: waits for writers as other writers do. Throws HostError, and leaves no file, when
+// anybody else may write `from` or it is no regular file, and when it is damaged. The copy survives
+// no power loss. Of a saved state it is verified as a whole.
+void CopyDatabase(const std::string& from, CopyOf what, const std::string& to);
 
 }  // namespace LinuxHost

@@ -530,12 +530,49 @@ END
   [[ $output == *"Failed to fetch domain id for: sshDom [unknown-domain]"* ]]
 }
 
-@test "a state that cannot be read is said, and the policy is checked as after a boot" {
-  echo garbage >"$root/run/secpolicy/host.db"
+@test "a state that this user may not read is said, and the policy is checked as after a boot" {
+  [[ $EUID -eq 0 ]] || skip "only root can become somebody else"
+  setpriv --reuid=65534 --clear-groups test -x "$SECPOLICY" -a -r "$SOURCE" ||
+    skip "others may not read this place"
+  chmod 700 "$root/run/secpolicy"
+  export SECPOLICY_HOST_STATE=$root/run/secpolicy/host.db
+  run --separate-stderr setpriv --reuid=65534 --clear-groups "$SECPOLICY" check "$SOURCE/examples/host/etc/zorvan/secpolicy"
+  [[ $stderr == *"; checked as after a boot, since this user may not read the installed state" ]]
+  run --separate-stderr setpriv --reuid=65534 --clear-groups "$SECPOLICY" check --format json "$SOURCE/examples/host/etc/zorvan/secpolicy"
+  fits_schema check
+  [[ $(jq -r .against <<<"$output") == boot ]]
+}
+
+@test "where nothing is installed, the policy is checked as after a boot" {
+  rm -r "$root/run/secpolicy"
   secpolicy check
-  exits 0
-  [[ $stderr == "secpolicy: check: the installed state cannot be read ("*"): checked as after a boot
-secpolicy: check: no problems" ]]
+  ends_with "secpolicy: check: no problems; checked as after a boot, since nothing is installed"
+  secpolicy check --fresh
+  ends_with "secpolicy: check: no problems"
+  [[ ! -e $root/run/secpolicy ]]
+}
+
+@test "a state that others may have written, or that is damaged, is not checked against" {
+  secpolicy check --format json
+  fits_schema check
+  [[ $(jq -r .against <<<"$output") == installed ]]
+  local state=$root/run/secpolicy/host.db
+  chmod 666 "$state"
+  secpolicy check
+  exits 1
+  [[ $stderr == "secpolicy: Refusing the host state: other users may write /run/secpolicy/host.db. Take that right from them (chmod go-w), and make it anew" ]]
+  rm "$state"
+  mkfifo -m 600 "$state"
+  run --separate-stderr timeout 10 "$SECPOLICY" --root "$root" check
+  exits 1
+  [[ $stderr == "secpolicy: Refusing the host state: /run/secpolicy/host.db is not a regular file. Remove it, and make it anew" ]]
+  rm "$state"
+  echo garbage >"$state"
+  chmod 600 "$state"
+  secpolicy check
+  exits 1
+  [[ $stderr == "secpolicy: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
+  [[ $(cat "$state") == garbage ]]
 }
 
 @test "a directory that is not there" {

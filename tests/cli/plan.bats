@@ -207,7 +207,7 @@ secpolicy: load: nothing would change" ]]
   echo garbage >"$root/run/secpolicy/host.db"
   plan
   exits 1
-  [[ $stderr == "secpolicy: the installed state /run/secpolicy/host.db cannot be read: "* ]]
+  [[ $stderr == "secpolicy: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
   [[ $(cat "$root/run/secpolicy/host.db") == garbage ]]
   secpolicy load --plan /no/such
   exits 1

@@ -175,14 +175,14 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   touch -d '2025-01-01 UTC' "$saved/bad.db"
   secpolicy rollback bad
   exits 1
-  [[ $stderr == "secpolicy: rollback: the saved state 'bad' cannot be put back, so nothing was changed: file is not a database" ]]
+  [[ $stderr == "secpolicy: rollback: the saved state 'bad' cannot be put back, so nothing was changed: Unable to copy the saved state /var/lib/secpolicy/saved/bad.db: file is not a database" ]]
   secpolicy rollback old
   exits 1
   [[ $stderr =~ ^"secpolicy: rollback: the saved state 'old' cannot be put back, so nothing was changed: it has schema 1, this program works with schema "[0-9]+": it was saved by another version"$ ]]
   installed | diff "$BATS_TEST_TMPDIR/before" -
   secpolicy history
   exits 1
-  [[ $output == "bad  2025-01-01 00:00:00 UTC  the state /var/lib/secpolicy/saved/bad.db cannot be read: file is not a database
+  [[ $output == "bad  2025-01-01 00:00:00 UTC  Unable to copy the saved state /var/lib/secpolicy/saved/bad.db: file is not a database
 old  "*" UTC  Unable to use the host state /var/lib/secpolicy/saved/old.db: it has schema 1, "* ]]
 }
 
@@ -220,6 +220,45 @@ refuses() {
   secpolicy save good
   chown 65534 "$saved/good.db"
   refuses "Refusing the saved state: /var/lib/secpolicy/saved/good.db belongs to another user. Remove it, and make it anew"
+}
+
+@test "what is empty is no saved state" {
+  secpolicy save good
+  for size in 1 0; do
+    truncate -s "$size" "$saved/good.db"
+    refuses "Unable to copy the saved state /var/lib/secpolicy/saved/good.db: it is no saved state"
+  done
+}
+
+@test "a saved state in which a rule was turned round is refused" {
+  secpolicy save good
+  sqlite3 "$saved/good.db" "UPDATE rule SET granted = 1 - granted WHERE id = 1"
+  refuses "Unable to copy the saved state /var/lib/secpolicy/saved/good.db: it is damaged"
+}
+
+# The state is in use by none, and is read while another one is put in its place.
+@test "what is saved while the state changes is the one or the other" {
+  secpolicy save one
+  echo "-s ptrace grant" >>"$policy/domains/appDom"
+  secpolicy load
+  secpolicy save two
+  local number
+  (while [[ ! -e $BATS_TEST_TMPDIR/end ]]; do
+    for name in one two; do "$SECPOLICY" --root "$root" rollback "$name" 2>/dev/null || exit 1; done
+  done) &
+  local flipper=$!
+  for number in {1..20}; do
+    secpolicy save --force third
+    exits 0
+    secpolicy diff third one
+    [[ $status -eq 0 ]] || secpolicy diff third two
+    exits 0
+    secpolicy check
+    exits 0
+    [[ $stderr != *"after a boot"* ]]
+  done
+  touch "$BATS_TEST_TMPDIR/end"
+  wait "$flipper"
 }
 
 @test "a rollback that would leave a process without its domain is refused" {
@@ -275,7 +314,7 @@ refuses() {
   run --separate-stderr setpriv --reuid=65534 --clear-groups env SECPOLICY_HOST_STATE="$root/run/secpolicy/host.db" \
     "$SECPOLICY" diff installed "$SOURCE/examples/host/etc/zorvan/secpolicy"
   exits 2
-  [[ $stderr == "secpolicy: diff: the state $root/run/secpolicy/host.db cannot be read: unable to open database file" ]]
+  [[ $stderr == "secpolicy: diff: Unable to examine $root/run/secpolicy: Permission denied" ]]
 }
 
 @test "the completion of bash knows the saved states" {

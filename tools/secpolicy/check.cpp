@@ -55,19 +55,18 @@ ExitCode Check(const std::string& dir, const Options& options) {
                                "that it is in (--root DIR).");
   }
   CheckRun run(options.fresh, options.unwanted);
-  if (!run.scratch.CopyFailure().empty()) {
-    Summarize("check", "the installed state cannot be read (" + run.scratch.CopyFailure() +
-                           "): checked as after a boot");
-  }
   CheckPolicy(run, dir);
   run.diagnostics.Sort();
+  run.diagnostics.against = run.scratch.IsCopy() ? "installed" : "boot";
   kFormats.at(options.format)(run.diagnostics, std::cout);
 
   const std::size_t errors = run.diagnostics.Count(Severity::kError);
   const std::size_t warnings = run.diagnostics.Count(Severity::kWarning);
-  Summarize("check", errors + warnings == 0
-                         ? "no problems"
-                         : CountOf(errors, "error") + ", " + CountOf(warnings, "warning"));
+  const std::string why = run.scratch.WhyNoCopy();
+  Summarize("check", (errors + warnings == 0
+                          ? "no problems"
+                          : CountOf(errors, "error") + ", " + CountOf(warnings, "warning")) +
+                         (why.empty() ? "" : "; checked as after a boot, since " + why));
   return errors > 0 || (options.warningsAreErrors && warnings > 0) ? kFailed : kWell;
 }
 

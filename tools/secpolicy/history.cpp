@@ -25,7 +25,7 @@ std::string Describe(const InstalledPolicy& policy) {
 // What is saved, or why it cannot be used; `isUsable` becomes false then.
 std::string DescribeSaved(const std::string& name, bool& isUsable) {
   try {
-    return Describe(ReadStateAt(TrustedStatePath(name)));
+    return Describe(ReadStateAt(SavedStatePath(name), LinuxHost::CopyOf::kSavedState));
   } catch (const std::exception& failure) {
     isUsable = false;
     return failure.what();

@@ -1,6 +1,7 @@
 #include <stdexcept>
 
 #include "host/linux/saved_policy.h"
+#include "host/linux/store_copy.h"
 #include "library_call.h"
 #include "load_record.h"
 #include "root.h"
@@ -17,8 +18,7 @@ void PutBack(const std::string& name) {
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("saved.db");
   try {
-    const std::string failure = CopyState(TrustedStatePath(name), copy);
-    if (!failure.empty()) throw std::runtime_error(failure);
+    LinuxHost::CopyDatabase(SavedStatePath(name), LinuxHost::CopyOf::kSavedState, copy);
     LinuxHost::RestorePolicy(copy, LinuxHost::LabelNumbers::kNew);
   } catch (const std::exception& reason) {
     throw std::runtime_error("the saved state '" + name +

@@ -1,6 +1,7 @@
 #include "host/linux/saved_policy.h"
 
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -24,9 +25,9 @@ namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::CopyDatabase;
+using LinuxHost::CopyOf;
 using LinuxHost::HostState;
 using LinuxHost::LabelNumbers;
-using LinuxHost::RequireTrustedState;
 using LinuxHost::RestorePolicy;
 using LinuxHost::RuleKind;
 using LinuxHost::SaveState;
@@ -80,13 +81,29 @@ class SavedPolicy : public ::testing::Test {
   std::string Copy(const std::string& name = "copy.db") {
     const std::string path = directory.Path() + "/" + name;
     std::filesystem::remove(path);
-    EXPECT_EQ(CopyDatabase(directory.Database(), path), "");
+    CopyDatabase(directory.Database(), CopyOf::kState, path);
     return path;
+  }
+
+  // Copies a saved state for its next use.
+  std::string CopySaved(const std::string& path) {
+    const std::string copy = directory.Path() + "/used.db";
+    std::filesystem::remove(copy);
+    CopyDatabase(path, CopyOf::kSavedState, copy);
+    return copy;
   }
 
   StateDirectory directory;
   HostState& state = HostState::Current();
 };
+
+// Changes a database behind the host's back.
+void Execute(const std::string& path, const char* sql) {
+  sqlite3* database = nullptr;
+  ASSERT_EQ(sqlite3_open(path.c_str(), &database), SQLITE_OK);
+  ASSERT_EQ(sqlite3_exec(database, sql, nullptr, nullptr, nullptr), SQLITE_OK) << sql;
+  sqlite3_close(database);
+}
 
 TEST_F(SavedPolicy, PutsDomainsRulesAndPartsBack) {
   const unsigned int one = Create("oneDom");
@@ -382,9 +399,9 @@ TEST_F(SavedPolicy, ReplacesAFileOnlyWhenTold) {
   Create("lateDom");
   EXPECT_EQ(MessageOf([&] { SaveState(directory.Database(), path, false); }),
             "Unable to make " + path + ": File exists");
-  EXPECT_EQ(HostState(path).Domains().Find("lateDom"), nullptr);
+  EXPECT_EQ(HostState(CopySaved(path)).Domains().Find("lateDom"), nullptr);
   SaveState(directory.Database(), path, true);
-  EXPECT_NE(HostState(path).Domains().Find("lateDom"), nullptr);
+  EXPECT_NE(HostState(CopySaved(path)).Domains().Find("lateDom"), nullptr);
 }
 
 TEST_F(SavedPolicy, RefusesAPlaceThatOthersMayWrite) {
@@ -401,33 +418,33 @@ TEST_F(SavedPolicy, IsTrustedOnlyWhereNobodyElseMayWrite) {
   const std::string place = directory.Path() + "/saved";
   const std::string path = place + "/one.db";
   SaveState(directory.Database(), path, false);
-  EXPECT_NO_THROW(RequireTrustedState(path));
+  EXPECT_NO_THROW(CopySaved(path));
 
   std::filesystem::permissions(path, std::filesystem::perms(0620));
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(path); }),
             "Refusing the saved state: other users may write " + path +
                 ". Take that right from them (chmod go-w), and make it anew");
   std::filesystem::permissions(path, std::filesystem::perms(0600));
   std::filesystem::permissions(place, std::filesystem::perms::all);
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(path); }),
             "Refusing the saved state: other users may write " + place +
                 ". Take that right from them (chmod go-w), and make it anew");
   std::filesystem::permissions(place, std::filesystem::perms::owner_all);
 
   std::filesystem::create_symlink("one.db", place + "/link.db");
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(place + "/link.db"); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(place + "/link.db"); }),
             "Refusing the saved state: " + place +
                 "/link.db is not a regular file. Remove it, and make it anew");
   std::filesystem::create_directory_symlink("saved", directory.Path() + "/linked");
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(directory.Path() + "/linked/one.db"); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(directory.Path() + "/linked/one.db"); }),
             "Refusing the saved state: " + directory.Path() + "/linked is not a directory");
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(place + "/none.db"); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(place + "/none.db"); }),
             "Unable to examine " + place + "/none.db: No such file or directory");
   EXPECT_FALSE(std::filesystem::exists(place + "/none.db"));
 
   if (geteuid() != 0) return;  // only root can give files away
   ASSERT_EQ(chown(path.c_str(), 65534, 65534), 0);
-  EXPECT_EQ(MessageOf([&] { RequireTrustedState(path); }),
+  EXPECT_EQ(MessageOf([&] { CopySaved(path); }),
             "Refusing the saved state: " + path +
                 " belongs to another user. Remove it, and make it anew");
 }
@@ -438,8 +455,41 @@ TEST_F(SavedPolicy, IsNotSavedFromWhatIsNoState) {
                   "with, and it goes on and on and on");
   const std::string from = directory.Path() + "/text";
   EXPECT_EQ(MessageOf([&] { SaveState(from, directory.Path() + "/saved/one.db", false); }),
-            "Unable to copy " + from + ": file is not a database");
+            "Unable to copy the host state " + from + ": file is not a database");
   EXPECT_TRUE(std::filesystem::is_empty(directory.Path() + "/saved"));
+}
+
+// The engine itself takes such files for empty databases.
+TEST_F(SavedPolicy, IsNoSavedStateWhenItIsEmpty) {
+  const std::string path = directory.Path() + "/saved/one.db";
+  SaveState(directory.Database(), path, false);
+  for (const std::size_t size : {1U, 0U}) {
+    std::filesystem::resize_file(path, size);
+    EXPECT_EQ(MessageOf([&] { CopySaved(path); }),
+              "Unable to copy the saved state " + path + ": it is no saved state");
+  }
+}
+
+TEST_F(SavedPolicy, IsRefusedWhenAValueIsNoLongerWhatWasSaved) {
+  const unsigned int domain = Create("oneDom");
+  Grant(domain, "read", false);
+  const std::string path = directory.Path() + "/saved/one.db";
+  const char* const changes[] = {"UPDATE rule SET granted = 1",
+                                 "UPDATE rule SET id = id + 1",
+                                 "DELETE FROM state",
+                                 "UPDATE sqlite_sequence SET seq = seq + 1",
+                                 "DROP TABLE label_origin",
+                                 "CREATE TABLE more (id INTEGER)",
+                                 "DELETE FROM seal",
+                                 "DROP TABLE seal"};
+  for (const char* const change : changes) {
+    SaveState(directory.Database(), path, true);
+    EXPECT_NO_THROW(CopySaved(path));
+    Execute(path, change);
+    EXPECT_EQ(MessageOf([&] { CopySaved(path); }),
+              "Unable to copy the saved state " + path + ": it is damaged")
+        << change;
+  }
 }
 
 }  // namespace

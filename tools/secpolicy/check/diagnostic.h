@@ -98,6 +98,9 @@ class DiagnosticList {
   const std::vector<Diagnostic>& All() const { return diagnostics; }
   std::size_t Count(Severity severity) const;
 
+  // What the policy was checked against, in reports: what is "installed", or as after a "boot".
+  std::string against = "boot";
+
  private:
   std::set<std::string> unwanted;
   std::map<std::string, std::size_t> fileOrder;

@@ -25,6 +25,7 @@ void WriteJson(const DiagnosticList& diagnostics, std::ostream& output) {
   Json problems = Json::Array();
   for (const Diagnostic& diagnostic : diagnostics.All()) problems.Append(ToJson(diagnostic));
   const Json report = {{"schema", "secpolicy.check/1"},
+                       {"against", diagnostics.against},
                        {"errors", diagnostics.Count(Severity::kError)},
                        {"warnings", diagnostics.Count(Severity::kWarning)},
                        {"problems", problems}};

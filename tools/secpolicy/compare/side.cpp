@@ -28,8 +28,8 @@ Side ReadDirectory(const std::string& dir) {
   return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
 }
 
-Side ReadStateOf(const std::string& name, const std::string& path) {
-  return {.name = name, .policy = ReadStateAt(path), .labels = std::nullopt};
+Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::CopyOf what) {
+  return {.name = name, .policy = ReadStateAt(path, what), .labels = std::nullopt};
 }
 
 Side ReadInstalled() {
@@ -38,7 +38,7 @@ Side ReadInstalled() {
         "nothing is installed below this root. Name the root that was booted (--root DIR), or run "
         "'secpolicy boot' first.");
   }
-  return ReadStateOf(kInstalled, LinuxHost::StatePath());
+  return ReadStateOf(kInstalled, LinuxHost::StatePath(), LinuxHost::CopyOf::kState);
 }
 
 Side ReadSaved(const std::string& name) {
@@ -47,7 +47,7 @@ Side ReadSaved(const std::string& name) {
                              "', and no such directory. 'secpolicy history' lists what is saved; "
                              "'installed' is what is installed now.");
   }
-  return ReadStateOf(name, TrustedStatePath(name));
+  return ReadStateOf(name, SavedStatePath(name), LinuxHost::CopyOf::kSavedState);
 }
 
 // Where there is a directory, a saved state that this user may not look for is not meant.

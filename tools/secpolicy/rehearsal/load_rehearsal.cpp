@@ -11,6 +11,7 @@
 #include <system_error>
 
 #include "forked.h"
+#include "host/linux/store_copy.h"
 #include "host/linux/system_log.h"
 #include "policy_dir.h"
 #include "root.h"
@@ -20,11 +21,10 @@
 namespace SecPolicyCli {
 namespace {
 
-void RequireCopied(const std::string& failure) {
-  if (failure.empty()) return;
+[[noreturn]] void ThrowForbidden() {
   const std::string advice = AdviseOnPrivilege();
-  throw std::runtime_error("the installed state " + LinuxHost::StatePath() +
-                           " cannot be read: " + failure + (advice.empty() ? "" : ". " + advice));
+  throw std::runtime_error("this user may not read the installed state " + LinuxHost::StatePath() +
+                           (advice.empty() ? "" : ". " + advice));
 }
 
 void Redirect(int descriptor, const std::string& path) {
@@ -63,13 +63,15 @@ std::string ReadAll(const std::string& path) {
 
 }  // namespace
 
-void CopyInstalledState(const std::string& to) { RequireCopied(CopyUsedState(to)); }
+void CopyInstalledState(const std::string& to) {
+  if (CopyUsedState(to) == StateCopy::kForbidden) ThrowForbidden();
+}
 
 LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
   CopyInstalledState(StateBefore());
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
-    RequireCopied(CopyState(StateBefore(), StateAfter()));
+    LinuxHost::CopyDatabase(StateBefore(), LinuxHost::CopyOf::kOwnCopy, StateAfter());
   }
   const std::string messageFile = scratch.File("messages");
   const std::string labelFile = scratch.File("labels");

@@ -10,7 +10,6 @@
 #include <system_error>
 #include <tuple>
 
-#include "host/linux/saved_policy.h"
 #include "root.h"
 
 namespace SecPolicyCli {
@@ -38,7 +37,7 @@ bool IsMissing(const std::error_code& failure) {
 // What lies at `path`; nothing when nothing does.
 std::optional<struct stat> Examine(const std::string& path) {
   struct stat status {};
-  if (stat(path.c_str(), &status) == 0) return status;
+  if (lstat(path.c_str(), &status) == 0) return status;
   const std::error_code failure(errno, std::generic_category());
   if (!IsMissing(failure)) ThrowUnreadable(path, failure);
   return std::nullopt;
@@ -73,12 +72,6 @@ std::string SavedStatePath(const std::string& name) {
   return std::string(kSavedStatesDir) + "/" + name + kEnding;
 }
 
-std::string TrustedStatePath(const std::string& name) {
-  std::string path = SavedStatePath(name);
-  LinuxHost::RequireTrustedState(path);
-  return path;
-}
-
 bool IsSaved(const std::string& name) { return Examine(SavedStatePath(name)).has_value(); }
 
 std::vector<SavedState> ListSavedStates() {
@@ -87,7 +80,8 @@ std::vector<SavedState> ListSavedStates() {
     const std::string name = file.stem();
     if (file.extension() != kEnding || !WhyNoSavedName(name).empty()) continue;
     const std::optional<struct stat> status = Examine(file);
-    if (!status || !S_ISREG(status->st_mode)) continue;
+    // A link is named, so that who uses it tells that it is refused.
+    if (!status || !(S_ISREG(status->st_mode) || S_ISLNK(status->st_mode))) continue;
     states.push_back({.name = name, .time = status->st_mtim.tv_sec});
   }
   std::ranges::sort(states, {},

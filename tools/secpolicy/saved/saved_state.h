@@ -20,10 +20,6 @@ std::string WhyNoSavedName(const std::string& name);
 // The file of the saved state `name`, which may not be there.
 std::string SavedStatePath(const std::string& name);
 
-// The same for a saved state that is to be used. Throws Braxo::Lib::BraxoException when others may
-// have changed it.
-std::string TrustedStatePath(const std::string& name);
-
 // Throws std::runtime_error, with what to do about it, when this user may not look.
 bool IsSaved(const std::string& name);
 

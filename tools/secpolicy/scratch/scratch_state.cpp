@@ -1,17 +1,24 @@
 #include "scratch_state.h"
 
-#include <filesystem>
-
 namespace SecPolicyCli {
 namespace {
 
 constexpr char kState[] = "host.db";
 
+std::optional<StateCopy> CopyUnless(bool fresh, const std::string& to) {
+  if (fresh) return std::nullopt;
+  return CopyUsedState(to);
+}
+
 }  // namespace
 
 ScratchState::ScratchState(bool fresh)
-    : copyFailure(fresh ? "" : CopyUsedState(directory.File(kState))),
-      copied(std::filesystem::exists(directory.File(kState))),
-      used(directory.File(kState)) {}
+    : copy(CopyUnless(fresh, directory.File(kState))), used(directory.File(kState)) {}
+
+std::string ScratchState::WhyNoCopy() const {
+  if (copy == StateCopy::kMissing) return "nothing is installed";
+  if (copy == StateCopy::kForbidden) return "this user may not read the installed state";
+  return "";
+}
 
 }  // namespace SecPolicyCli

@@ -11,15 +11,16 @@ namespace SecPolicyCli {
 // object lives. The installed state is never written.
 class ScratchState {
  public:
-  // Copies the installed state; with `fresh`, and where there is none, starts from the state after
-  // a boot. Throws std::system_error when there is no place for it.
+  // Copies the installed state; with `fresh`, and where there is none or this user may not read it,
+  // starts from the state after a boot. Throws std::system_error when there is no place for it, and
+  // what the host throws for a state that cannot be trusted or is damaged.
   explicit ScratchState(bool fresh);
 
   // False when the state is a new one.
-  bool IsCopy() const { return copied; }
+  bool IsCopy() const { return copy == StateCopy::kMade; }
 
-  // Why an installed state was not copied; empty when it was, and when there is none.
-  const std::string& CopyFailure() const { return copyFailure; }
+  // Why the state is a new one although a copy was wanted; empty when it is not.
+  std::string WhyNoCopy() const;
 
   // The directory that the state is in.
   const std::string& DirectoryPath() const { return directory.Path(); }
@@ -29,8 +30,7 @@ class ScratchState {
 
  private:
   ScratchDirectory directory;
-  std::string copyFailure;
-  bool copied;
+  std::optional<StateCopy> copy;
   LinuxHost::UsedState used;
 };
 

@@ -17,13 +17,10 @@ std::string About(const std::string& path, const std::string& copy, std::string 
 
 }  // namespace
 
-InstalledPolicy ReadStateAt(const std::string& path) {
+InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("host.db");
-  const std::string failure = CopyState(path, copy);
-  if (!failure.empty()) {
-    throw std::runtime_error("the state " + path + " cannot be read: " + failure);
-  }
+  LinuxHost::CopyDatabase(path, what, copy);
   const LinuxHost::UsedState state(copy);
   try {
     SecPolicy::TeskAccessInterfaceImpl access;

@@ -2,12 +2,14 @@
 
 #include <string>
 
+#include "host/linux/store_copy.h"
 #include "installed/installed_policy.h"
 
 namespace SecPolicyCli {
 
 // Reads the state at `path` from a copy, since even reading leaves traces beside a state. Throws
-// std::runtime_error when it cannot be copied, and what the host throws.
-InstalledPolicy ReadStateAt(const std::string& path);
+// what the host throws when it cannot be copied, and std::runtime_error when the copy cannot be
+// used.
+InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
 
 }  // namespace SecPolicyCli

@@ -11,13 +11,13 @@ namespace SecPolicyCli {
 // look for counts as there.
 bool IsStateMissing();
 
-// Copies the state at `from`, which is only read, to the new file `to`, such that the host works
-// with the copy. Returns why it could not, and leaves no file then; empty when it could.
-std::string CopyState(const std::string& from, const std::string& to);
+// What became of a copy of the state: only what is missing, or not this user's to read, is left
+// out.
+enum class StateCopy { kMade, kMissing, kForbidden };
 
-// The same for the state that this process works with. Where there is none, nothing is copied, and
-// that is no failure.
-std::string CopyUsedState(const std::string& to);
+// Copies the state that this process works with to the new file `to`. Throws what the host throws
+// for one that cannot be trusted or is damaged; leaves no file unless the copy was made.
+StateCopy CopyUsedState(const std::string& to);
 
 // As long as it lives, this process works with a copy of the wanted settings, which becomes the new
 // file `to`: even reading leaves traces beside the real ones. Settings that cannot be copied stay
