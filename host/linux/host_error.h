@@ -20,4 +20,11 @@ class HostError : public Braxo::Lib::BraxoException {
   int errorNumber;
 };
 
+// A database file whose content is not what it should be: damaged, of another version, or of
+// another program.
+class UnusableContent : public HostError {
+ public:
+  using HostError::HostError;
+};
+
 }  // namespace LinuxHost

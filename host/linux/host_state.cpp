@@ -171,7 +171,7 @@ void HostState::Refresh() {
   Store::CommitMark now{};
   const bool told = store.ReadCommitMark(&now);
   Rows rows = store.Select("SELECT domain_version, label_version, label_attribute FROM state");
-  rows.Next();
+  if (!rows.Next()) store.TellDamage("the table state is empty");
   domains->Notice(rows.Integer(0));
   labels->Notice(rows.Integer(1));
   labelAttribute = rows.Text(2);

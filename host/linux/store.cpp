@@ -9,7 +9,9 @@
 #include <algorithm>
 #include <atomic>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
+#include <string_view>
 #include <vector>
 
 #include "braxo/misc/strcat.h"
@@ -84,6 +86,15 @@ class DirectoryLock {
 };
 
 }  // namespace
+
+void MoveAside(const std::string& path) {
+  const DirectoryLock lock(path.substr(0, path.rfind('/') + 1));
+  if (rename(path.c_str(), (path + ".damaged").c_str()) != 0) {
+    throw HostError(errno, StrCat("Unable to move ", path, ": ", std::strerror(errno)));
+  }
+  unlink((path + "-wal").c_str());
+  unlink((path + "-shm").c_str());
+}
 
 // The first waits are short, since most calls hold the database for one row only; a batch may hold
 // it far longer. Gives up after half a minute.
@@ -176,9 +187,32 @@ bool Store::IsReady() {
       applicationId == 0 && version == 0 && ReadInteger("SELECT count(*) FROM sqlite_schema") == 0;
   if (isEmpty) return false;
   if (applicationId != layout.applicationId) Refuse(EPROTO, "is the database of something else");
-  if (version == layout.version) return true;
+  if (version == layout.version) {
+    RequireStructure();
+    return true;
+  }
   Refuse(EPROTO, StrCat("has schema ", version, ", this program works with schema ", layout.version,
                         ": it was made by another version of it"));
+}
+
+// The engine keeps the text of each statement that made something.
+void Store::RequireStructure() {
+  constexpr std::string_view kCreate = "CREATE ";
+  const std::string_view schema = layout.schema;
+  std::int64_t wanted = 0;
+  for (auto at = schema.find(kCreate); at != schema.npos; at = schema.find(kCreate, at + 1)) {
+    ++wanted;
+  }
+  Rows rows = Select("SELECT count(*) FROM sqlite_schema WHERE instr(?1, sql) > 0", schema);
+  if (!rows.Next() || rows.Integer(0) != wanted) {
+    TellDamage("its tables are not those of this program");
+  }
+}
+
+void Store::RequireIntegrity() {
+  Rows rows = Select("PRAGMA integrity_check(1)");
+  const std::string found = rows.Next() ? rows.Text(0) : "";
+  if (found != "ok") TellDamage(found.c_str());
 }
 
 void Store::Create() {
@@ -205,7 +239,10 @@ void Store::SwitchToWriteAheadLog() {
       std::strcmp(reinterpret_cast<const char*>(sqlite3_column_text(statement, 0)), "wal") == 0;
   sqlite3_finalize(statement);
   if (result != SQLITE_ROW) Fail(result);
-  if (!switched) Refuse(ENOTSUP, "lies on a file system without shared memory");
+  if (switched) return;
+  throw HostError(ENOTSUP,
+                  StrCat("Unable to use the ", layout.purpose, " ", file,
+                         ": it lies on a file system without shared memory. ", layout.remedy));
 }
 
 // The log's index is a file that every user of the database maps. It begins with two copies of a
@@ -300,14 +337,18 @@ void Store::Fail(int result) const {
     throw HostError(systemError, StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
                                         std::strerror(systemError)));
   }
-  if (IsDamaged(result)) Refuse(EIO, StrCat("is damaged or no such thing (", reason, ")"));
+  if (IsDamaged(result)) TellDamage(reason);
   throw HostError(ErrorNumber(result), StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
                                               reason, RemedyFor(result)));
 }
 
+void Store::TellDamage(const char* reason) const {
+  Refuse(EIO, StrCat("is damaged or no such thing (", reason, ")"));
+}
+
 void Store::Refuse(int code, const std::string& reason) const {
-  throw HostError(code, StrCat("Unable to use the ", layout.purpose, " ", file, ": it ", reason,
-                               ". ", layout.remedy));
+  throw UnusableContent(code, StrCat("Unable to use the ", layout.purpose, " ", file, ": it ",
+                                     reason, ". ", layout.remedy));
 }
 
 Snapshot::Snapshot(Store& source) : end(source.Prepared("COMMIT")) { source.Run("BEGIN"); }

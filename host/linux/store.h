@@ -20,6 +20,10 @@ namespace LinuxHost {
 // when it is time to give up, after about half a minute. The engine calls it, too.
 int WaitForOthers(void* unused, int waits);
 
+// Moves the database at `path`, which nobody can use any more, out of the way to `path`.damaged,
+// which it replaces, and removes what lies beside it: that must not get into the next one.
+void MoveAside(const std::string& path);
+
 // What a database file must be to be used, and what it is made of when it is created.
 struct StoreLayout {
   const char* purpose;         // what it is, in messages: "host state"
@@ -80,6 +84,12 @@ class Store {
 
   const std::string& Path() const { return file; }
 
+  // Refuses the database, as one that is damaged is refused. For what only its user can see.
+  [[noreturn]] void TellDamage(const char* reason) const;
+
+  // Looks at every page, and refuses the database when it is damaged.
+  void RequireIntegrity();
+
   // True when the process was not forked since, and the path still names the open file.
   bool IsCurrent() const;
 
@@ -137,6 +147,7 @@ class Store {
   void PrepareFile();
   void Open();
   bool IsReady();
+  void RequireStructure();
   void Create();
   void SwitchToWriteAheadLog();
   void FindCommitHeader();

@@ -7,6 +7,7 @@
 #include "braxo/lib/exception.h"
 #include "command_line.h"
 #include "host/linux/archive_library.h"
+#include "host/linux/mend_state.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "load_summary.h"
@@ -51,6 +52,8 @@ std::size_t MostShown(const Options& options) {
 }
 
 void BootAndLoad(const Options& options, LoadTiming& timing) {
+  const std::string mended = LinuxHost::MendState();
+  if (!mended.empty()) Summarize("boot", mended);
   const LinuxHost::AssembledRoot root = LinuxHost::AssembleRoot(RulesOf(options));
   WriteSection("edited files that were replaced", root.editedFiles, MostShown(options), std::cerr);
   LinuxHost::StartPolicy(root);

@@ -1,0 +1,55 @@
+# A state that is damaged: every verb ends and says so, and a boot mends it.
+
+load helper
+
+setup() {
+  root=$BATS_TEST_TMPDIR/root
+  state=$root/run/secpolicy/host.db
+  "$SOURCE/scripts/pack-example" "$root"
+  boot
+  "$SECPOLICY" --root "$root" save good
+}
+
+# damage SQL: changes the state behind the back of the host.
+damage() { sqlite3 "$state" "$1"; }
+
+@test "a state without the row that counts its versions is told by every verb, in time" {
+  damage "DELETE FROM state"
+  local verb
+  for verb in status display load "load --plan" load-early "label relabel" "rollback good" \
+    "why sshDom read /etc/ssh" "load --all-or-nothing" graph check; do
+    # shellcheck disable=SC2086
+    run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" $verb
+    exits 1
+    [[ $stderr == *"is damaged or no such thing (the table state is empty)"* ]] || exits 0
+  done
+}
+
+@test "a state with other tables is told" {
+  damage "DROP TABLE world"
+  secpolicy status
+  exits 1
+  [[ $stderr == *"is damaged or no such thing (its tables are not those of this program)"* ]]
+}
+
+@test "a boot moves a state aside that cannot be used" {
+  local mended="secpolicy: boot: the host state could not be used, so a new one is made; what was there is now /run/secpolicy/host.db.damaged"
+  local change
+  for change in "DELETE FROM state" "DROP TABLE rule" "PRAGMA user_version = 1" "PRAGMA application_id = 1"; do
+    damage "$change"
+    secpolicy boot
+    exits 0
+    says "$mended"
+    ends_done boot
+    secpolicy status
+    exits 0
+  done
+  echo garbage >"$state"
+  secpolicy boot
+  exits 0
+  says "$mended"
+  [[ $(cat "$state.damaged") == garbage ]]
+  secpolicy boot
+  exits 0
+  [[ $stderr != *"could not be used"* ]]
+}
