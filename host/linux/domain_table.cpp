@@ -96,6 +96,11 @@ void DomainTable::Notice(std::int64_t currentVersion) {
   loaded = false;
 }
 
+void DomainTable::Forget() {
+  version = 0;
+  loaded = false;
+}
+
 void DomainTable::Load() {
   if (loaded) return;
   slots.clear();
@@ -116,6 +121,7 @@ void DomainTable::Load() {
 }
 
 const Domain* DomainTable::Find(std::string_view name) {
+  if (hidden.contains(name)) return nullptr;
   Load();
   const auto found = identifiers.find(name);
   return found == identifiers.end() ? nullptr : Find(found->second);
@@ -149,6 +155,7 @@ unsigned int DomainTable::LowestFreeSlot() const {
 unsigned int DomainTable::Create(const std::string& name, TeskAccessKsi_DefaultDom defaultRules,
                                  bool createdAtRunTime) {
   Change change(*this);
+  hidden.erase(name);
   if (const Domain* existing = Find(name)) {
     // Of two loaders that missed the same domain, the second one gets the first one's.
     if (!createdAtRunTime && existing->defaultRules == defaultRules) return existing->id;
@@ -199,6 +206,8 @@ void DomainTable::Erase(unsigned int id) {
   store.Run("DELETE FROM domain WHERE id = ?1", domain.id);
   store.Run("DELETE FROM parameter_rule WHERE domain_id = ?1", domain.id);
   store.Run("DELETE FROM file_policy WHERE domain_id = ?1", domain.id);
+  store.Run("DELETE FROM covered_parameter_rule WHERE domain_id = ?1", domain.id);
+  store.Run("DELETE FROM covered_file_policy WHERE domain_id = ?1", domain.id);
   store.Run("DELETE FROM guest_service WHERE domain_id = ?1", domain.id);
   store.Run("DELETE FROM world WHERE domain_id = ?1", domain.id);
   state.Rules().RemoveDomain(domain);

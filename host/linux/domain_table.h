@@ -4,8 +4,10 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "teskctl/security.h"
@@ -108,6 +110,11 @@ class DomainTable {
   // The version of the table that the state is at now.
   std::int64_t Version() const { return version; }
   void Notice(std::int64_t currentVersion);
+  void Forget();
+
+  // From now on no domain is found by one of these names, until a domain of the name is wanted
+  // anew. Replaces the names that were hidden before.
+  void Hide(std::set<std::string, std::less<>> names) { hidden = std::move(names); }
 
  private:
   class Change;
@@ -125,6 +132,7 @@ class DomainTable {
   bool loaded = false;
   std::vector<std::unique_ptr<Domain>> slots;
   TextMap<unsigned int> identifiers;
+  std::set<std::string, std::less<>> hidden;
 };
 
 }  // namespace LinuxHost

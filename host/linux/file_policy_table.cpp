@@ -100,10 +100,10 @@ void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
 
 bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
   return state.Database().Run(
-             "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line) "
-             "SELECT ?1, ?2, ?3, ?4, ?5 FROM state WHERE domain_version = ?6",
+             "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6 FROM state WHERE domain_version = ?7",
              policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
-             state.Domains().Version()) != 0;
+             state.CurrentLoad(), state.Domains().Version()) != 0;
 }
 
 void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
@@ -113,6 +113,9 @@ void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string
       "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
       path);
   if (removed == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+  state.Database().Run(
+      "DELETE FROM covered_file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId,
+      world, path);
   transaction.Commit();
 }
 

@@ -17,6 +17,9 @@ namespace LinuxHost {
 namespace {
 
 // Rules and policies are read in the order of their `id`, which is that of their installation.
+// Their `load` is the load that installed them, or 0. What one load installs in place of what
+// another, or a service, has installed is kept beside it (covered_...), to come back when its file
+// drops it.
 constexpr char kSchema[] = R"sql(
 CREATE TABLE state (
   one INTEGER PRIMARY KEY CHECK (one = 1),
@@ -50,6 +53,7 @@ CREATE TABLE rule (
   word3 TEXT NOT NULL,
   granted INTEGER NOT NULL,
   line INTEGER NOT NULL,
+  load INTEGER NOT NULL,
   UNIQUE (domain_id, kind, word1, word2, word3)
 );
 CREATE INDEX transition_target ON rule (word2) WHERE kind = 'domain transition';
@@ -63,6 +67,7 @@ CREATE TABLE parameter_rule (
   last_word TEXT NOT NULL,
   granted INTEGER NOT NULL,
   line INTEGER NOT NULL,
+  load INTEGER NOT NULL,
   UNIQUE (domain_id, parameter_check, first_value, last_value)
 );
 CREATE TABLE file_policy (
@@ -72,7 +77,51 @@ CREATE TABLE file_policy (
   path TEXT NOT NULL,
   permission INTEGER NOT NULL,
   line INTEGER NOT NULL,
+  load INTEGER NOT NULL,
   UNIQUE (domain_id, world, path)
+);
+CREATE TABLE policy_load (
+  number INTEGER PRIMARY KEY,
+  kind INTEGER NOT NULL,
+  directory TEXT NOT NULL
+);
+CREATE TABLE policy_domain (
+  kind INTEGER NOT NULL,
+  name TEXT NOT NULL,
+  load INTEGER NOT NULL,
+  PRIMARY KEY (kind, name)
+) WITHOUT ROWID;
+CREATE TABLE covered_rule (
+  id INTEGER NOT NULL,
+  domain_id INTEGER NOT NULL,
+  kind TEXT NOT NULL,
+  word1 TEXT NOT NULL,
+  word2 TEXT NOT NULL,
+  word3 TEXT NOT NULL,
+  granted INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  load INTEGER NOT NULL
+);
+CREATE TABLE covered_parameter_rule (
+  id INTEGER NOT NULL,
+  domain_id INTEGER NOT NULL,
+  parameter_check TEXT NOT NULL,
+  first_value INTEGER NOT NULL,
+  last_value INTEGER NOT NULL,
+  first_word TEXT NOT NULL,
+  last_word TEXT NOT NULL,
+  granted INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  load INTEGER NOT NULL
+);
+CREATE TABLE covered_file_policy (
+  id INTEGER NOT NULL,
+  domain_id INTEGER NOT NULL,
+  world INTEGER NOT NULL,
+  path TEXT NOT NULL,
+  permission INTEGER NOT NULL,
+  line INTEGER NOT NULL,
+  load INTEGER NOT NULL
 );
 CREATE TABLE world (
   id INTEGER PRIMARY KEY,
@@ -111,7 +160,9 @@ CREATE TABLE load_record (
   directory TEXT NOT NULL,
   time INTEGER NOT NULL,
   ending TEXT NOT NULL,
-  error_count INTEGER NOT NULL
+  error_count INTEGER NOT NULL,
+  removed_rules INTEGER NOT NULL,
+  removed_domains INTEGER NOT NULL
 );
 CREATE TABLE load_error (id INTEGER PRIMARY KEY, message TEXT NOT NULL);
 INSERT INTO state VALUES (1, 1, 1, '');
@@ -179,6 +230,12 @@ void HostState::Refresh() {
   seen = now;
 }
 
+void HostState::Forget() {
+  domains->Forget();
+  labels->Forget();
+  marked = false;
+}
+
 void HostState::Reset() {
   Transaction transaction(store);
   store.Run("DELETE FROM domain");
@@ -189,6 +246,11 @@ void HostState::Reset() {
   store.Run("DELETE FROM rule");
   store.Run("DELETE FROM parameter_rule");
   store.Run("DELETE FROM file_policy");
+  store.Run("DELETE FROM policy_load");
+  store.Run("DELETE FROM policy_domain");
+  store.Run("DELETE FROM covered_rule");
+  store.Run("DELETE FROM covered_parameter_rule");
+  store.Run("DELETE FROM covered_file_policy");
   store.Run("DELETE FROM world");
   store.Run("DELETE FROM inode_origin");
   store.Run("DELETE FROM rule_origin");

@@ -74,6 +74,13 @@ class HostState : public std::enable_shared_from_this<HostState> {
   // database only when something was committed since the last call.
   void Refresh();
 
+  // Makes the tables forget all that they know: it may have been undone.
+  void Forget();
+
+  // The number of the load that is installing its policy, 0 while none is.
+  std::int64_t CurrentLoad() const { return currentLoad; }
+  void SetCurrentLoad(std::int64_t number) { currentLoad = number; }
+
  private:
   Store store;
   std::unique_ptr<DomainTable> domains;
@@ -85,6 +92,7 @@ class HostState : public std::enable_shared_from_this<HostState> {
   bool marked = false;
   Store::CommitMark seen{};
   std::string labelAttribute;
+  std::int64_t currentLoad = 0;
 };
 
 }  // namespace LinuxHost

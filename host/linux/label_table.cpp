@@ -35,6 +35,11 @@ void LabelTable::Notice(std::int64_t currentVersion) {
   loaded = false;
 }
 
+void LabelTable::Forget() {
+  version = 0;
+  loaded = false;
+}
+
 void LabelTable::Load() {
   if (loaded) return;
   identifiers.clear();
@@ -75,6 +80,7 @@ std::map<std::string, long> LabelTable::All() {
 void LabelTable::Add(const std::vector<std::string>& added) {
   for (const auto& name : added) RequireLabelName(name);
   Transaction transaction(state.Database());
+  state.Refresh();
   int changes = 0;
   for (const auto& name : added) {
     changes += state.Database().Run(
@@ -86,6 +92,7 @@ void LabelTable::Add(const std::vector<std::string>& added) {
 
 void LabelTable::Remove(const std::vector<std::string>& removed) {
   Transaction transaction(state.Database());
+  state.Refresh();
   int changes = 0;
   for (const auto& name : removed) {
     if (IsPredefined(name)) continue;
@@ -99,6 +106,8 @@ void LabelTable::Commit(Transaction& transaction, int changes) {
   if (changes == 0) return;
   state.Database().Run("UPDATE state SET label_version = label_version + 1");
   transaction.Commit();
+  // Within a load nothing tells of it before its end.
+  Notice(version + 1);
 }
 
 }  // namespace LinuxHost

@@ -49,6 +49,7 @@ class LabelTable {
   // The version of the table that the state is at now.
   std::int64_t Version() const { return version; }
   void Notice(std::int64_t currentVersion);
+  void Forget();
 
  private:
   void Load();

@@ -16,6 +16,8 @@ struct LoadRecord {
   std::string ending;     // "done", "failed" or "stopped"
   std::uint64_t errorCount = 0;
   std::vector<std::string> errors;  // the first kKeptErrors of them
+  std::uint64_t removedRules = 0;   // that no file had any more, as their domains
+  std::uint64_t removedDomains = 0;
 };
 
 constexpr std::size_t kKeptErrors = 100;

@@ -74,10 +74,11 @@ std::optional<HostError> ParameterRuleTable::Refusal(const ParameterRule& rule) 
 bool ParameterRuleTable::InstallIfUnchanged(const ParameterRule& rule) {
   return state.Database().Run(
              "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
-             "last_value, first_word, last_word, granted, line) "
-             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8 FROM state WHERE domain_version = ?9",
+             "last_value, first_word, last_word, granted, line, load) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9 FROM state WHERE domain_version = ?10",
              rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
-             rule.lastWord, rule.granted, rule.line, state.Domains().Version()) != 0;
+             rule.lastWord, rule.granted, rule.line, state.CurrentLoad(),
+             state.Domains().Version()) != 0;
 }
 
 void ParameterRuleTable::Install(const ParameterRule& rule) {
@@ -87,6 +88,7 @@ void ParameterRuleTable::Install(const ParameterRule& rule) {
 
 void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
                                 const ParameterRange& range) {
+  Transaction transaction(state.Database());
   state.Refresh();
   state.Domains().Get(domainId);
   const int removed = state.Database().Run(
@@ -94,6 +96,11 @@ void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
       "first_value = ?3 AND last_value = ?4",
       domainId, check, range.first, range.last);
   if (removed == 0) throw HostError(ENOENT, StrCat("no rule for parameter check '", check, "'"));
+  state.Database().Run(
+      "DELETE FROM covered_parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "
+      "first_value = ?3 AND last_value = ?4",
+      domainId, check, range.first, range.last);
+  transaction.Commit();
 }
 
 Rows ParameterRuleTable::Read(unsigned int domainId) {

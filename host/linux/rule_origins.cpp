@@ -26,6 +26,73 @@ void KeepLater(Store& store, const std::string& path, bool isTree, LatestLabel& 
 
 }  // namespace
 
+namespace {
+
+// The rules of words have one table.
+struct WordKind {
+  std::string_view keyword;
+  std::string_view kind;
+};
+
+constexpr WordKind kWordKinds[] = {
+    {"-a", "object access"}, {"-c", "capability"},  {"-d", "domain transition"},
+    {"-f", "file creation"}, {"-s", "system call"}, {"-u", "unix socket creation"},
+};
+
+std::vector<RuleSource> ReadSources(Rows rows) {
+  std::vector<RuleSource> sources;
+  while (rows.Next()) {
+    RuleSource source{.kind = std::nullopt,
+                      .directory = rows.Text(1),
+                      .line = static_cast<unsigned int>(rows.Integer(2)),
+                      .isCurrent = rows.Integer(3) != 0};
+    if (rows.Integer(0) != 0) source.kind = static_cast<LoadKind>(rows.Integer(0));
+    sources.push_back(std::move(source));
+  }
+  return sources;
+}
+
+}  // namespace
+
+std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword) {
+  Store& store = HostState::Current().Database();
+  if (keyword == "-p") {
+    return ReadSources(store.Select(
+        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM parameter_rule AS r "
+        "LEFT JOIN policy_load AS p ON p.number = r.load WHERE r.domain_id = ?1 ORDER BY r.id",
+        id));
+  }
+  if (keyword == "-r") {
+    return ReadSources(store.Select(
+        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM file_policy AS r "
+        "LEFT JOIN policy_load AS p ON p.number = r.load "
+        "WHERE r.domain_id = ?1 AND r.world = 0 ORDER BY r.id",
+        id));
+  }
+  for (const WordKind& row : kWordKinds) {
+    if (row.keyword != keyword) continue;
+    return ReadSources(
+        store.Select("SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+                     "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM rule AS r "
+                     "LEFT JOIN policy_load AS p ON p.number = r.load "
+                     "WHERE r.domain_id = ?1 AND r.kind = +?2 ORDER BY r.id",
+                     id, row.kind));
+  }
+  return {};
+}
+
+std::vector<std::string> FindDomainsWithoutFile() {
+  std::vector<std::string> names;
+  Rows rows = HostState::Current().Database().Select(
+      "SELECT p.name FROM policy_domain AS p JOIN domain AS d ON d.name = p.name "
+      "WHERE NOT d.created_at_run_time AND d.id <> 0 GROUP BY p.name HAVING max(p.load = "
+      "(SELECT max(number) FROM policy_load WHERE kind = p.kind)) = 0 ORDER BY p.name");
+  while (rows.Next()) names.push_back(rows.Text(0));
+  return names;
+}
+
 void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels) {
   Store& store = HostState::Current().Database();
   Transaction transaction(store);

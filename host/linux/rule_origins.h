@@ -3,13 +3,25 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
+
+#include "policy_load.h"
 
 // Where the policy was written: the kernel is told rules and labels, not the files that they come
 // from, so who loads files records it beside them. An origin says nothing about what is installed
 // now. Everything throws Braxo::Lib::BraxoException when the state cannot be used.
 namespace LinuxHost {
 
+// The load that installed a rule, and the line of the file of its domain.
+struct RuleSource {
+  std::optional<LoadKind> kind;  // none: no load, but a service
+  std::string directory;         // of the policy
+  unsigned int line = 0;         // 0: no line says so, it is the policy's default
+  bool isCurrent = true;         // false: the latest load of the kind has not found it again
+};
+
+// A rule that is not written in a file of its domain.
 struct RuleOrigin {
   std::string domain;
   std::string rule;  // as it is displayed: "-a sshKey read grant"
@@ -29,8 +41,15 @@ struct LabelOrigin {
 // takes the place of an earlier one.
 void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels);
 
-// The origins of the rules of a domain, in no particular order.
+// The recorded origins of rules of a domain, in no particular order.
 std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain);
+
+// The sources of all rules of the domain `id` with the keyword ("-a"), in the order in which the
+// rules are read.
+std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword);
+
+// The domains that the latest load of their kind has not found in any file, by name.
+std::vector<std::string> FindDomainsWithoutFile();
 
 // The line that labels the file at the absolute path `path`: of those for the path and for the
 // trees around it, the one that was recorded last.

@@ -66,11 +66,12 @@ std::optional<HostError> RuleTable::Refusal(const Rule& rule) {
 bool RuleTable::InstallIfUnchanged(const Rule& rule) {
   return state.Database().Run(
              "INSERT OR REPLACE INTO rule "
-             "(domain_id, kind, word1, word2, word3, granted, line) "
-             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7 FROM state "
-             "WHERE domain_version = ?8 AND label_version = ?9",
+             "(domain_id, kind, word1, word2, word3, granted, line, load) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8 FROM state "
+             "WHERE domain_version = ?9 AND label_version = ?10",
              rule.domain.id, ShapeOf(rule.kind).name, rule.words[0], rule.words[1], rule.words[2],
-             rule.granted, rule.line, state.Domains().Version(), state.Labels().Version()) != 0;
+             rule.granted, rule.line, state.CurrentLoad(), state.Domains().Version(),
+             state.Labels().Version()) != 0;
 }
 
 void RuleTable::Install(const Rule& rule) {
@@ -89,6 +90,7 @@ Rows RuleTable::Read(unsigned int domainId, RuleKind kind) {
 
 void RuleTable::RemoveDomain(const Domain& domain) {
   state.Database().Run("DELETE FROM rule WHERE domain_id = ?1", domain.id);
+  state.Database().Run("DELETE FROM covered_rule WHERE domain_id = ?1", domain.id);
   state.Database().Run("DELETE FROM rule WHERE kind = 'domain transition' AND word2 = ?1",
                        domain.name);
   RemoveUnnamed();
@@ -100,6 +102,12 @@ void RuleTable::RemoveUnnamed() {
       "word1 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
       "kind = 'file creation' AND "
       "word2 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain))");
+  state.Database().Run(
+      "DELETE FROM covered_rule WHERE kind NOT IN ('system call', 'capability') AND ("
+      "word1 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
+      "kind = 'file creation' AND "
+      "word2 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
+      "kind = 'domain transition' AND word2 NOT IN (SELECT name FROM domain))");
 }
 
 }  // namespace LinuxHost

@@ -167,8 +167,8 @@ constexpr Sql kMoveWorlds[] = {
     R"(UPDATE main.file_policy SET domain_id = -1 - (SELECT s.id FROM main.domain AS d
        JOIN saved.domain AS s ON s.name = d.name WHERE d.id = file_policy.domain_id))",
     R"(UPDATE main.file_policy SET domain_id = -1 - domain_id)",
-    R"(INSERT INTO main.file_policy (domain_id, world, path, permission, line)
-       SELECT domain_id, world, path, permission, line FROM saved.file_policy WHERE world = 0
+    R"(INSERT INTO main.file_policy (domain_id, world, path, permission, line, load)
+       SELECT domain_id, world, path, permission, line, load FROM saved.file_policy WHERE world = 0
        ORDER BY id)",
 };
 
@@ -184,6 +184,16 @@ constexpr Sql kReplaceTables[] = {
     "INSERT INTO main.rule SELECT * FROM saved.rule",
     "DELETE FROM main.parameter_rule",
     "INSERT INTO main.parameter_rule SELECT * FROM saved.parameter_rule",
+    "DELETE FROM main.policy_load",
+    "INSERT INTO main.policy_load SELECT * FROM saved.policy_load",
+    "DELETE FROM main.policy_domain",
+    "INSERT INTO main.policy_domain SELECT * FROM saved.policy_domain",
+    "DELETE FROM main.covered_rule",
+    "INSERT INTO main.covered_rule SELECT * FROM saved.covered_rule",
+    "DELETE FROM main.covered_parameter_rule",
+    "INSERT INTO main.covered_parameter_rule SELECT * FROM saved.covered_parameter_rule",
+    "DELETE FROM main.covered_file_policy",
+    "INSERT INTO main.covered_file_policy SELECT * FROM saved.covered_file_policy",
     "DELETE FROM main.rule_origin",
     "INSERT INTO main.rule_origin SELECT * FROM saved.rule_origin",
 };

@@ -280,12 +280,23 @@ sqlite3_stmt* Store::Prepared(Sql sql) {
     throw HostError(EBADF, StrCat("The ", layout.purpose,
                                   " was opened before this process was forked: open it again"));
   }
+  RequireWholeTransaction();
   auto& statement = statements[sql.Text()];
   if (statement != nullptr) return statement;
   const int result =
       sqlite3_prepare_v3(database, sql.Text(), -1, SQLITE_PREPARE_PERSISTENT, &statement, nullptr);
   if (result != SQLITE_OK) Fail(result);
   return statement;
+}
+
+// After some failures, a full disk for one, the engine undoes a transaction by itself. What
+// followed would then be installed without what came before.
+void Store::RequireWholeTransaction() const {
+  if (openTransactions == 0 || sqlite3_get_autocommit(database) == 0) return;
+  throw HostError(EIO,
+                  StrCat("Unable to use the ", layout.purpose, " ", file,
+                         ": a failure has undone what was to be installed as a whole. Mend its "
+                         "cause, and run it again"));
 }
 
 void Store::BindInteger(sqlite3_stmt* statement, int index, std::int64_t value) {
@@ -351,21 +362,43 @@ void Store::Refuse(int code, const std::string& reason) const {
                                      reason, ". ", layout.remedy));
 }
 
-Snapshot::Snapshot(Store& source) : end(source.Prepared("COMMIT")) { source.Run("BEGIN"); }
+Snapshot::Snapshot(Store& source) {
+  if (sqlite3_get_autocommit(source.database) == 0) return;
+  end = source.Prepared("COMMIT");
+  source.Run("BEGIN");
+}
 
 Snapshot::~Snapshot() {
+  if (end == nullptr) return;
   sqlite3_step(end);
   sqlite3_reset(end);
 }
 
-Transaction::Transaction(Store& target) : store(target) { store.Run("BEGIN IMMEDIATE"); }
-
-Transaction::~Transaction() {
-  if (sqlite3_get_autocommit(store.database) == 0) {
-    sqlite3_exec(store.database, "ROLLBACK", nullptr, nullptr, nullptr);
+Transaction::Transaction(Store& target) : store(target), isStep(target.openTransactions != 0) {
+  if (isStep) {
+    store.Run("SAVEPOINT step");
+  } else {
+    store.Run("BEGIN IMMEDIATE");
   }
+  ++store.openTransactions;
 }
 
-void Transaction::Commit() { store.Run("COMMIT"); }
+Transaction::~Transaction() {
+  if (!isOpen) return;
+  --store.openTransactions;
+  if (sqlite3_get_autocommit(store.database) != 0) return;
+  sqlite3_exec(store.database, isStep ? "ROLLBACK TO step; RELEASE step" : "ROLLBACK", nullptr,
+               nullptr, nullptr);
+}
+
+void Transaction::Commit() {
+  if (isStep) {
+    store.Run("RELEASE step");
+  } else {
+    store.Run("COMMIT");
+  }
+  isOpen = false;
+  --store.openTransactions;
+}
 
 }  // namespace LinuxHost

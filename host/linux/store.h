@@ -90,6 +90,9 @@ class Store {
   // Looks at every page, and refuses the database when it is damaged.
   void RequireIntegrity();
 
+  // True while a transaction of this connection is open.
+  bool IsInTransaction() const { return openTransactions != 0; }
+
   // True when the process was not forked since, and the path still names the open file.
   bool IsCurrent() const;
 
@@ -141,6 +144,7 @@ class Store {
   int Execute(sqlite3_stmt* statement);
   void RunScript(const std::string& script);
   std::int64_t ReadInteger(const char* query);
+  void RequireWholeTransaction() const;
   [[noreturn]] void Fail(int result) const;
   [[noreturn]] void Refuse(int code, const std::string& reason) const;
 
@@ -160,12 +164,14 @@ class Store {
   dev_t device = 0;
   ino_t inode = 0;
   sqlite3* database = nullptr;
+  int openTransactions = 0;  // each within the one before it
   const volatile std::uint32_t* commitHeader = nullptr;
   std::unordered_map<const char*, sqlite3_stmt*> statements;
 };
 
-// While it lives, all that is read was there at one moment. Keeps others from nothing. Not within a
-// transaction, and what remembers a commit mark must not read within it: the mark may be newer.
+// While it lives, all that is read was there at one moment. Keeps others from nothing. Within
+// another one, or a transaction, it is a part of that. What remembers a commit mark must not read
+// within it: the mark may be newer.
 class Snapshot {
  public:
   explicit Snapshot(Store& source);
@@ -174,10 +180,11 @@ class Snapshot {
   ~Snapshot();
 
  private:
-  sqlite3_stmt* end;  // prepared before it begins, so that it can always end
+  sqlite3_stmt* end = nullptr;  // prepared before it begins, so that it can always end
 };
 
-// A write transaction: waits for the other writers, and is undone unless committed.
+// A write transaction: waits for the other writers, and is undone unless committed. Within another
+// one it is a step of that: undone alone, but committed only together with it.
 class Transaction {
  public:
   explicit Transaction(Store& target);
@@ -189,6 +196,8 @@ class Transaction {
 
  private:
   Store& store;
+  const bool isStep;
+  bool isOpen = true;
 };
 
 }  // namespace LinuxHost
