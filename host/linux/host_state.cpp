@@ -264,6 +264,7 @@ void HostState::Reset() {
       "UPDATE state SET domain_version = domain_version + 1, label_version = label_version + 1, "
       "label_attribute = ''");
   transaction.Commit();
+  Forget();
   Refresh();
 }
 
@@ -299,6 +300,7 @@ const std::string& HostState::LabelAttribute() {
 
 const std::string& HostState::ChooseLabelAttribute(const std::string& name) {
   store.Run("UPDATE state SET label_attribute = ?1 WHERE label_attribute = ''", name);
+  Forget();
   return LabelAttribute();
 }
 

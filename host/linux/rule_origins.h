@@ -44,6 +44,16 @@ void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigi
 // The recorded origins of rules of a domain, in no particular order.
 std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain);
 
+// A line about a path in the file of a domain. The kernel is told paths without their lines.
+struct PathLine {
+  std::string path;
+  unsigned int line = 0;
+};
+
+// Records the lines of the path rules that the latest load of the kind has installed for the domain;
+// `lines` are those of its file, in order. A rule for what a path resolves to is of the same line.
+void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines);
+
 // The sources of all rules of the domain `id` with the keyword ("-a"), in the order in which the
 // rules are read.
 std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword);

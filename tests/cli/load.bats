@@ -64,7 +64,7 @@ load helper
   secpolicy load
   exits 3
   says "Error: Failed to fetch domainID for IOFilter domain"
-  ends_with "secpolicy: load: stopped: there is no domain ioFilterDom, so the load ended before tardisks and file labels. Put a policy file named ioFilterDom into /etc/zorvan/secpolicy/domains and run it again."
+  ends_with "secpolicy: load: stopped: there is no domain ioFilterDom, so nothing was installed, and what was there before is unchanged. Put a policy file named ioFilterDom into /etc/zorvan/secpolicy/domains and run it again."
 }
 
 @test "load of a directory that is not there changes nothing and says what to do" {
@@ -125,7 +125,7 @@ load helper
 /etc/zorvan/secpolicy/early/domains: 1 error
 'secpolicy check /etc/zorvan/secpolicy' shows the lines, and what may be meant
 installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
-secpolicy: load-early: failed (1 error above)"$ ]]
+secpolicy: load-early: failed (1 error above); nothing was removed: "[0-9]+" rules that no file has"$ ]]
 }
 
 @test "two loads at once both end well" {
@@ -287,4 +287,80 @@ END
   exits 0
   says "secpolicy: load: what is installed cannot be counted: std::bad_alloc"
   ends_with "secpolicy: load: done"
+}
+
+@test "a load removes what no file has any more, and says so" {
+  boot
+  sed -i '/-s listen/d; /-s accept4/d' "$policy/domains/sshDom"
+  secpolicy load
+  exits 0
+  [[ $stderr =~ ^"secpolicy: load: done ("[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects), 2 rules removed that no file has"$ ]]
+  secpolicy why sshDom call listen
+  exits 1
+  secpolicy load
+  is_done load
+}
+
+@test "--keep keeps what no file has any more" {
+  boot
+  sed -i '/-s listen/d' "$policy/domains/sshDom"
+  secpolicy load --keep
+  exits 0
+  [[ $stderr == *", 1 rule kept that no file has" ]]
+  secpolicy why sshDom call listen
+  exits 0
+  secpolicy load
+  [[ $stderr == *", 1 rule removed that no file has" ]]
+}
+
+@test "after an error in the files nothing is removed" {
+  boot
+  sed -i '/-s listen/d' "$policy/domains/sshDom"
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  secpolicy load
+  exits 1
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (4 errors above); nothing was removed: 1 rule that no file has"
+  secpolicy why sshDom call listen
+  exits 0
+}
+
+@test "a full load leaves the early policy, and an early load the full one" {
+  boot
+  sed -i '/init_module/d' "$policy/early/domains/bootDom"
+  secpolicy load
+  is_done load
+  secpolicy why bootDom call init_module
+  exits 0
+  sed -i '/-s listen/d' "$policy/domains/sshDom"
+  secpolicy load-early
+  [[ $stderr == *", 1 rule removed that no file has" ]]
+  secpolicy why bootDom call init_module
+  exits 1
+  secpolicy why sshDom call listen
+  exits 0
+}
+
+@test "what a service has made outlives a load" {
+  boot
+  SECPOLICY_HOST_STATE=$root/run/secpolicy/host.db "$RUNTIME_EXAMPLE" >/dev/null || true
+  sqlite3 "$root/run/secpolicy/host.db" "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line, load)
+    SELECT id, 'capability', 'cap_kill', '', '', 1, 0, 0 FROM domain WHERE name = 'sshDom'"
+  secpolicy load
+  is_done load
+  secpolicy why sshDom use cap_kill
+  exits 0
+}
+
+@test "a load that is killed has installed nothing" {
+  boot
+  "$SECPOLICY" --root "$root" display >"$BATS_TEST_TMPDIR/before" 2>&1
+  sed -i 's/grant/revoke/' "$policy/domains/"*Dom
+  local delay
+  for delay in 0.002 0.004 0.006 0.008 0.01 0.012; do
+    timeout --signal=KILL "$delay" "$SECPOLICY" --root "$root" load >/dev/null 2>&1 || true
+    secpolicy display
+    # Before, or as a whole.
+    [[ $output == *" revoke"* && $output != *" grant"* ]] && continue
+    diff "$BATS_TEST_TMPDIR/before" <("$SECPOLICY" --root "$root" display 2>&1)
+  done
 }

@@ -10,10 +10,8 @@
 #include "host/linux/mend_state.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
-#include "load_summary.h"
-#include "load_timing.h"
+#include "load/load_run.h"
 #include "policy_dir.h"
-#include "root.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "summary.h"
@@ -24,10 +22,8 @@ namespace SecPolicyCli {
 namespace {
 
 // A root whose services all start after the full load needs no early policy.
-void LoadEarly() {
-  if (File_IsDirectory(SecPolicy::kEarlyPolicyRoot)) {
-    return SecPolicy::LoadPolicyEarly(SecPolicy::kEarlyPolicyRoot);
-  }
+void LoadEarly(const std::string& directory) {
+  if (File_IsDirectory(directory.c_str())) return SecPolicy::LoadPolicyEarly(directory);
   SecPolicy::SecpolicyInfo(std::string("No early policy: there is no directory ") +
                            SecPolicy::kEarlyPolicyRoot);
 }
@@ -51,28 +47,29 @@ std::size_t MostShown(const Options& options) {
   return options.showAll ? std::numeric_limits<std::size_t>::max() : kMostShown;
 }
 
-void BootAndLoad(const Options& options, LoadTiming& timing) {
+// A boot is the way out of every damage.
+void Mend() {
   const std::string mended = LinuxHost::MendState();
   if (!mended.empty()) Summarize("boot", mended);
-  const LinuxHost::AssembledRoot root = LinuxHost::AssembleRoot(RulesOf(options));
-  WriteSection("edited files that were replaced", root.editedFiles, MostShown(options), std::cerr);
-  LinuxHost::StartPolicy(root);
-  timing.EndPhase("first labels");
-  timing.BeginPart("early ");
-  LoadEarly();
-  EndEarlyLoad();
-  timing.BeginPart("");
-  SecPolicy::LoadPolicy(SecPolicy::kPolicyRoot);
 }
 
 ExitCode BootNow(const Options& options) {
-  return CallLibrary(
-      "boot", SecPolicy::kPolicyRoot,
-      [&] {
-        LoadTiming phases(options.timing);
-        BootAndLoad(options, phases);
-      },
-      AdviseOnPrivilege, DescribeInstalled);
+  LinuxHost::AssembledRoot root;
+  return RunLoad(
+      {.verb = "boot",
+       .policyDir = SecPolicy::kPolicyRoot,
+       .steps = {{LinuxHost::LoadKind::kEarly, SecPolicy::kEarlyPolicyRoot, LoadEarly},
+                 {LinuxHost::LoadKind::kFull, SecPolicy::kPolicyRoot, SecPolicy::LoadPolicy}},
+       .timing = options.timing,
+       .mend = Mend,
+       .prepare =
+           [&](LoadTiming& phases) {
+             root = LinuxHost::AssembleRoot(RulesOf(options));
+             WriteSection("edited files that were replaced", root.editedFiles, MostShown(options),
+                          std::cerr);
+             phases.EndPhase("first labels");
+           },
+       .begin = [&] { LinuxHost::StartPolicy(root); }});
 }
 
 ExitCode Plan(const Options& options) {

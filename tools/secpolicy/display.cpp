@@ -60,7 +60,7 @@ Action Define(Syntax& syntax) {
   return [domain, format] {
     const auto show = *format == "json" ? WriteJson : SecPolicy::DisplayPolicy;
     return CallLibrary(
-        "display", "", [&] { show(*domain); }, Advise);
+        "display", [&] { show(*domain); }, Advise);
   };
 }
 

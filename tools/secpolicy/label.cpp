@@ -122,7 +122,7 @@ ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   }
   std::string ending;
   return CallLibrary(
-      verb, "",
+      verb,
       [&] {
         LabelRun run;
         ending = kind.run(run, arguments);

@@ -1,7 +1,7 @@
 #include "command_line.h"
+#include "load/load_run.h"
 #include "policy_dir.h"
 #include "rehearsal/planned_load.h"
-#include "rehearsal/whole_load.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "verb.h"
@@ -12,14 +12,27 @@ namespace {
 struct Options {
   bool plan = false;
   bool allOrNothing = false;
+  bool keep = false;
   bool timing = false;
   PlanOptions planOptions;
 };
 
+LoadRequest FullLoad(const std::string& dir, const Options& options) {
+  return {.verb = "load",
+          .policyDir = dir,
+          .steps = {{LinuxHost::LoadKind::kFull, dir, SecPolicy::LoadPolicy}},
+          .keep = options.keep,
+          .allOrNothing = options.allOrNothing,
+          .timing = options.timing,
+          .mend = {},
+          .prepare = {},
+          .begin = {}};
+}
+
 ExitCode Load(const std::string& dir, const Options& options) {
-  if (options.plan) return PlanLoad(dir, options.planOptions);
-  if (options.allOrNothing) return LoadAllOrNothing(dir);
-  return LoadFrom("load", dir, SecPolicy::LoadPolicy, options.timing);
+  if (const auto refusal = RefuseMissingDir("load", dir)) return *refusal;
+  const LoadRequest load = FullLoad(dir, options);
+  return options.plan ? PlanLoad(load, options.planOptions) : RunLoad(load);
 }
 
 Action Define(Syntax& syntax) {
@@ -28,13 +41,12 @@ Action Define(Syntax& syntax) {
   const Option plan = syntax.AddFlag("--plan", options->plan,
                                      "Only show what the load would change; -v shows every file");
   syntax.AddFormat(options->planOptions.format, "the plan", {"text", "json"}).Need(plan);
-  const Option allOrNothing =
-      syntax
-          .AddFlag("--all-or-nothing", options->allOrNothing,
-                   "Load only when a rehearsal ends well, and put everything back when the load "
-                   "does not")
-          .Exclude(plan);
-  AddTiming(syntax, options->timing).Exclude(plan).Exclude(allOrNothing);
+  syntax
+      .AddFlag("--all-or-nothing", options->allOrNothing,
+               "Install and label nothing when there is any error")
+      .Exclude(plan);
+  AddKeep(syntax, options->keep);
+  AddTiming(syntax, options->timing).Exclude(plan);
   const Option verbose = syntax.Verbose();
   return [=] {
     options->planOptions.showAll = verbose.IsGiven();
@@ -48,12 +60,14 @@ const Verb kLoad = {
     "load", "Install the full policy",
     "Installs objects, domains, partner domains, tardisk policy and file labels, in this order.\n"
     "A part that fails is reported and the next one is loaded. Tardisk policy and partner domains\n"
-    "are always those of /etc/zorvan/secpolicy. What is installed and in no file any more stays.\n"
-    "With --plan the load is rehearsed on a copy of what is installed: it shows what it would\n"
-    "change and which problems it would have, and changes nothing. Exit status as of the load.\n"
-    "With --all-or-nothing the load is rehearsed in the same way, and done only when that ends\n"
-    "well; when it then fails or is interrupted, rules, objects and file labels are put back as\n"
-    "they were just before it. What others change while it runs is lost then.\n"
+    "are always those of /etc/zorvan/secpolicy. Others see what was installed before, or all of\n"
+    "it; files get their labels right after that. What earlier loads have installed and no file\n"
+    "has any more is removed when the load ends well, unless --keep is given; what services have\n"
+    "made and what load-early has installed stays.\n"
+    "With --plan the load is done on a copy of what is installed: it shows what it would change\n"
+    "and which problems it would have, and changes nothing. Exit status as of the load.\n"
+    "With --all-or-nothing any error leaves rules, objects and file labels as they were, and so\n"
+    "does a load that is killed.\n"
     "\n"
     "Examples:\n"
     "  secpolicy load                       install the host's policy again after an edit\n"

@@ -2,9 +2,6 @@
 
 #include "kitlibs/file.h"
 #include "library_call.h"
-#include "load_summary.h"
-#include "load_timing.h"
-#include "root.h"
 
 namespace SecPolicyCli {
 
@@ -12,6 +9,11 @@ std::shared_ptr<const std::string> AddPolicyDir(Syntax& syntax, const std::strin
   const auto dir = std::make_shared<std::string>(preset);
   syntax.AddOption("DIR", *dir, "The policy directory, as seen from the root").ShowDefault();
   return dir;
+}
+
+Option AddKeep(Syntax& syntax, bool& keep) {
+  return syntax.AddFlag("--keep", keep,
+                        "Keep what earlier loads installed and no file has any more");
 }
 
 Option AddTiming(Syntax& syntax, bool& timing) {
@@ -24,18 +26,6 @@ std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::str
   return Refuse(verb, "there is no directory " + dir +
                           " below this root, so nothing was changed. Name the directory of the "
                           "policy, or the root that it is in (--root DIR).");
-}
-
-ExitCode LoadFrom(const std::string& verb, const std::string& dir,
-                  void (*load)(const std::string& dir), bool timing) {
-  if (const auto refusal = RefuseMissingDir(verb, dir)) return *refusal;
-  return CallLibrary(
-      verb, dir,
-      [&] {
-        LoadTiming phases(timing);
-        load(dir);
-      },
-      AdviseOnPrivilege, DescribeInstalled);
 }
 
 }  // namespace SecPolicyCli

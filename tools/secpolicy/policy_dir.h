@@ -12,15 +12,13 @@ namespace SecPolicyCli {
 // given.
 std::shared_ptr<const std::string> AddPolicyDir(Syntax& syntax, const std::string& preset);
 
+// Adds the flag --keep of a load to `syntax`.
+Option AddKeep(Syntax& syntax, bool& keep);
+
 // Adds the flag --timing to `syntax`.
 Option AddTiming(Syntax& syntax, bool& timing);
 
 // Refuses a policy directory that is not there; nothing for one that is.
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);
-
-// Loads the policy directory `dir` with `load` for the verb `verb`. A directory that is not there
-// is refused before anything is changed. `timing` shows the time by phase.
-ExitCode LoadFrom(const std::string& verb, const std::string& dir,
-                  void (*load)(const std::string& dir), bool timing = false);
 
 }  // namespace SecPolicyCli

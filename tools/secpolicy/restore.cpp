@@ -9,7 +9,7 @@ namespace {
 Action Define(Syntax&) {
   return [] {
     return CallLibrary(
-        "restore", "", [] { SecPolicy::RestoreDomainEnforcement(); }, AdviseOnPrivilege);
+        "restore", [] { SecPolicy::RestoreDomainEnforcement(); }, AdviseOnPrivilege);
   };
 }
 

@@ -3,7 +3,7 @@
 #include "host/linux/saved_policy.h"
 #include "host/linux/store_copy.h"
 #include "library_call.h"
-#include "load_record.h"
+#include "load/load_record.h"
 #include "root.h"
 #include "saved/saved_name.h"
 #include "saved/saved_state.h"
@@ -34,7 +34,7 @@ ExitCode RollBack(const std::string& name) {
                                   "'. 'secpolicy history' lists what is saved.");
   }
   return CallLibrary(
-      "rollback", "", [&] { PutBack(name); }, AdviseOnPrivilege,
+      "rollback", [&] { PutBack(name); }, AdviseOnPrivilege,
       [] {
         return "done; files keep the labels that they have, and 'secpolicy label verify' compares "
                "them with the policy";

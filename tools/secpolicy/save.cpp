@@ -19,8 +19,7 @@ ExitCode Save(const std::string& name, bool force) {
                               "' already. Give --force to replace it, or choose another name.");
   }
   return CallLibrary(
-      "save", "",
-      [&] { LinuxHost::SaveState(LinuxHost::StatePath(), SavedStatePath(name), force); },
+      "save", [&] { LinuxHost::SaveState(LinuxHost::StatePath(), SavedStatePath(name), force); },
       AdviseOnPrivilege);
 }
 

@@ -1,10 +1,13 @@
 #include "installed_policy.h"
 
+#include <algorithm>
 #include <list>
 #include <optional>
 #include <utility>
 
+#include "domain_file.h"
 #include "host/linux/rule_origins.h"
+#include "host/linux/stable_view.h"
 #include "kitlibs/file.h"
 #include "printed_rules.h"
 #include "secpolicy/domain/domain_policy.h"
@@ -13,6 +16,7 @@
 namespace SecPolicyCli {
 namespace {
 
+using LinuxHost::RuleSource;
 using SecPolicy::TeskAccessInterfaceImpl;
 
 using Origins = std::map<std::string, Origin>;
@@ -26,18 +30,32 @@ Origins ReadOrigins(const std::string& domain) {
   return origins;
 }
 
+// A rule that a load installed is written in the file of its domain, unless it is told otherwise.
+Origin OriginOf(const std::string& domain, const RuleSource& source) {
+  if (!source.kind || source.line == 0) return {};
+  const bool isEarly = source.kind == LinuxHost::LoadKind::kEarly;
+  return {.file = isEarly ? source.directory + "/" + SecPolicy::kDomainsDir + "/" + domain
+                          : DomainFile(domain, source.directory),
+          .line = source.line};
+}
+
 std::vector<InstalledRule> ReadRules(const std::string& name, unsigned int id,
                                      TeskAccessInterfaceImpl& access) {
-  const Origins origins = ReadOrigins(name);
+  const Origins recorded = ReadOrigins(name);
   SecPolicy::DomainPolicy policy(name, id);
   std::vector<InstalledRule> rules;
   // Set by set, because reading a whole domain reports a set that cannot be read and goes on.
   for (const auto& [keyword, ruleSet] : policy.ruleSets) {
     ruleSet->ReadSystemRules(id, access);
+    const std::vector<RuleSource> sources = LinuxHost::FindRuleSources(id, keyword);
+    auto source = sources.begin();
     for (std::string& text : PrintedRules(*ruleSet)) {
-      const auto origin = origins.find(text);
+      const auto origin = recorded.find(text);
       rules.push_back(
-          {.text = std::move(text), .origin = origin == origins.end() ? Origin{} : origin->second});
+          {.text = std::move(text),
+           .origin = origin == recorded.end() ? OriginOf(name, *source) : origin->second,
+           .hasNoLine = !source->isCurrent});
+      ++source;
     }
   }
   return rules;
@@ -76,12 +94,18 @@ std::vector<InstalledDomain> ReadDomains(TeskAccessInterfaceImpl& access) {
   for (unsigned int id = 0; id < slots; ++id) {
     if (auto domain = ReadDomain(id, access)) domains.push_back(std::move(*domain));
   }
+  const std::vector<std::string> withoutFile = LinuxHost::FindDomainsWithoutFile();
+  for (InstalledDomain& domain : domains) {
+    domain.hasNoFile = std::binary_search(withoutFile.begin(), withoutFile.end(), domain.name);
+  }
   return domains;
 }
 
 }  // namespace
 
 InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
+  // A load may end meanwhile.
+  const LinuxHost::StableView view;
   InstalledPolicy policy;
   policy.domains = ReadDomains(access);
   for (const auto& [name, id] :

@@ -19,6 +19,7 @@ struct Origin {
 struct InstalledRule {
   std::string text;
   Origin origin;
+  bool hasNoLine = false;  // a load installed it, and the latest one has not found it in any file
 };
 
 struct InstalledDomain {
@@ -29,6 +30,7 @@ struct InstalledDomain {
   unsigned int references = 0;
   unsigned int worldReferences = 0;
   SecPolicy::TeskAccessKsi_DefaultDom defaultRules{};
+  bool hasNoFile = false;            // the same of the domain
   std::vector<InstalledRule> rules;  // in the order in which `display` shows them
 };
 

@@ -5,10 +5,7 @@
 #include <span>
 
 #include "printed_rules.h"
-#include "real_path.h"
 #include "secpolicy/domain/dom_trans_rules.h"
-#include "secpolicy/domain/domain_policy.h"
-#include "secpolicy/domain/file_path_access_rules.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
 
@@ -16,13 +13,10 @@ namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
-using LinuxHost::RuleOrigin;
-using TeskCtl::Security::TeskAccess_FilePathAccessRule;
 
 constexpr char kExceptionRule[] = "-E";
 constexpr char kPathRule[] = "-r";
 constexpr char kTransitionRule[] = "-d";
-constexpr std::string_view kPermissionLetters = "rwx";
 
 using Lines = std::map<unsigned int, std::queue<std::string>>;
 
@@ -48,67 +42,16 @@ Lines LinesOf(const std::string& path) {
   return lines;
 }
 
-// The numbers of the lines of each kind, in order: the first rule of a kind is that of the first
-// line, and so on.
-std::map<std::string, std::vector<unsigned int>> NumbersByKeyword(const Lines& lines) {
-  std::map<std::string, std::vector<unsigned int>> numbers;
-  for (const auto& [number, words] : lines) numbers[words.front()].push_back(number);
-  return numbers;
-}
-
-std::string InKernelOrder(const std::string& permissions) {
-  std::string ordered;
-  for (const char letter : kPermissionLetters) {
-    if (permissions.find(letter) != std::string::npos) ordered += letter;
-  }
-  return ordered;
-}
-
-// A path rule is displayed as the kernel keeps it: with the letters in its order, and once more for
-// the path that it resolves to.
-void AddPathOrigins(const SecPolicy::FilePathAccessRules& written, const std::string& file,
-                    std::vector<RuleOrigin>& origins) {
-  SecPolicy::FilePathAccessRules kept;
-  kept.keyword = written.keyword;
-  for (TeskAccess_FilePathAccessRule rule : written.rules) {
-    rule.permissions = InKernelOrder(rule.permissions);
-    const std::string resolved = RealPathOf(rule.path);
-    const bool elsewhere = !resolved.empty() && resolved != rule.path;
-    kept.rules.push_back(rule);
-    if (!elsewhere) continue;
-    rule.path = resolved;
-    kept.rules.push_back(rule);
-  }
-  auto rule = kept.rules.begin();
-  for (const std::string& text : PrintedRules(kept)) {
-    origins.push_back({.domain = rule->domainName, .rule = text, .file = file, .line = rule->line});
-    ++rule;
-  }
-}
-
 }  // namespace
 
-void OriginReader::ReadDomains(const std::string& dir, const std::string& prefix) {
-  for (const auto& [path, name] : FilesOf(dir)) ReadDomain(path, prefix + name);
-}
-
-void OriginReader::ReadDomain(const std::string& path, const std::string& name) {
-  unsigned int id = 0;
-  if (!access.FindDomain(name, &id)) return;
-  Lines lines = LinesOf(path);
-  const auto numbers = NumbersByKeyword(lines);
-  SecPolicy::DomainPolicy policy(name, id);
-  Quietly([&] { policy.ProcessParsedPolicyFile(access, lines); });
-
-  for (const auto& [keyword, ruleSet] : policy.ruleSets) {
-    if (!numbers.contains(keyword)) continue;
-    if (keyword == kPathRule) {
-      AddPathOrigins(dynamic_cast<const SecPolicy::FilePathAccessRules&>(*ruleSet), path, rules);
-      continue;
-    }
-    auto number = numbers.at(keyword).begin();
-    for (std::string& text : PrintedRules(*ruleSet)) {
-      rules.push_back({.domain = name, .rule = std::move(text), .file = path, .line = *number++});
+void OriginReader::ReadPaths(const std::string& dir, const std::string& prefix,
+                             LinuxHost::LoadKind kind) {
+  for (const auto& [path, name] : FilesOf(dir)) {
+    Paths& domain = paths.emplace_back(Paths{.kind = kind, .domain = prefix + name, .lines = {}});
+    for (auto& [number, words] : LinesOf(path)) {
+      if (words.front() != kPathRule) continue;
+      words.pop();
+      if (!words.empty()) domain.lines.push_back({.path = words.front(), .line = number});
     }
   }
 }

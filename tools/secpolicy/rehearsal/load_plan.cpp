@@ -14,53 +14,19 @@ namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
 
-constexpr unsigned int kCreatedAtRunTime = 0x8;
-
-// Keeps what is written to standard error from being seen.
-class QuietErrors {
- public:
-  QuietErrors() : shown(std::cerr.rdbuf(ignored.rdbuf())) {}
-  QuietErrors(const QuietErrors&) = delete;
-  QuietErrors& operator=(const QuietErrors&) = delete;
-  ~QuietErrors() { std::cerr.rdbuf(shown); }
-
- private:
-  std::ostringstream ignored;
-  std::streambuf* shown;
-};
-
 InstalledPolicy ReadState(const std::string& path) {
   const LinuxHost::UsedState state(path);
   TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }
 
-// The part of a state that policy files are to bring.
-InstalledPolicy ReadFilePart(const std::string& path) {
-  const LinuxHost::UsedState state(path);
-  TeskAccessInterfaceImpl access;
-  InstalledPolicy policy = ReadInstalledPolicy(access);
-  DropTardiskTransitions(policy, access);
-  std::erase_if(policy.domains, [](const InstalledDomain& domain) {
-    return domain.defaultRules != TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE ||
-           (domain.state & kCreatedAtRunTime) != 0;
-  });
-  return policy;
-}
-
-// What is wrong with the files, the rehearsal has told.
-InstalledPolicy ReadFiles(const std::string& policyDir) {
-  const QuietErrors quiet;
-  return ReadPolicyDirectory(policyDir, SecPolicy::kPartnerDomainsDir).policy;
-}
-
-void FindStaying(const InstalledPolicy& files, const InstalledPolicy& installed, LoadPlan& plan) {
-  for (const DomainDifference& domain : Compare(files, installed).domains) {
-    if (domain.IsNew()) {
-      plan.stayingDomains.push_back(domain.name);
-      continue;
+// What no file has any more, and the load has left.
+void FindStaying(const InstalledPolicy& after, LoadPlan& plan) {
+  for (const InstalledDomain& domain : after.domains) {
+    if (domain.hasNoFile) plan.stayingDomains.push_back(domain.name);
+    for (const InstalledRule& rule : domain.rules) {
+      if (rule.hasNoLine) plan.stayingRules.push_back({domain.name, rule.text});
     }
-    for (const std::string& rule : domain.added) plan.stayingRules.push_back({domain.name, rule});
   }
 }
 
@@ -80,7 +46,7 @@ std::string NameOf(unsigned int id, const LabelNames& names) {
 
 }  // namespace
 
-LoadPlan MakeLoadPlan(const std::string& policyDir, const LoadRehearsal& rehearsal) {
+LoadPlan MakeLoadPlan(const LoadRehearsal& rehearsal) {
   const InstalledPolicy before = ReadState(rehearsal.StateBefore());
   const InstalledPolicy after = ReadState(rehearsal.StateAfter());
   LoadPlan plan;
@@ -92,7 +58,7 @@ LoadPlan MakeLoadPlan(const std::string& policyDir, const LoadRehearsal& rehears
     plan.labels.push_back(
         {change.path, NameOf(change.before, oldNames), NameOf(change.after, newNames)});
   }
-  FindStaying(ReadFiles(policyDir), ReadFilePart(rehearsal.StateAfter()), plan);
+  FindStaying(after, plan);
   return plan;
 }
 

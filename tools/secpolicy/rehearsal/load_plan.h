@@ -27,15 +27,15 @@ struct LoadPlan {
   PolicyDifference difference;
   std::vector<FileLabelChange> labels;
 
-  // What is installed and in no file any more: a load leaves it.
+  // What no file has any more, and the load leaves: it is to keep it, or has errors, or worlds run.
   std::vector<std::string> stayingDomains;
   std::vector<DomainRule> stayingRules;
 
   bool ChangesNothing() const { return difference.IsEmpty() && labels.empty(); }
 };
 
-// The plan of the load of `policyDir` that was rehearsed. Throws what the host throws.
-LoadPlan MakeLoadPlan(const std::string& policyDir, const LoadRehearsal& rehearsal);
+// The plan of the load that was rehearsed. Throws what the host throws.
+LoadPlan MakeLoadPlan(const LoadRehearsal& rehearsal);
 
 // Writes the plan for people: one thing a line under a heading for each kind of change. At most
 // `maxLabels` files are shown.

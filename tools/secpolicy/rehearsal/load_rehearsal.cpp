@@ -67,7 +67,7 @@ void CopyInstalledState(const std::string& to) {
   if (CopyUsedState(to) == StateCopy::kForbidden) ThrowForbidden();
 }
 
-LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
+LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
   CopyInstalledState(StateBefore());
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
@@ -82,7 +82,7 @@ LoadRehearsal::LoadRehearsal(const std::string& policyDir) {
     const LinuxHost::NotedLabels notes(LinuxHost::LabelNotes::kRehearsal, scratch.Path());
     const CopiedSettings settings(scratch.File("config.db"));
     const LinuxHost::UsedState state(StateAfter());
-    const ExitCode code = LoadFrom("load", policyDir, SecPolicy::LoadPolicy);
+    const ExitCode code = RunLoad(load);
     WriteLabels(notes, labelFile);
     return code;
   });

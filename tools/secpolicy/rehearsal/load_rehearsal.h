@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "host/linux/noted_labels.h"
+#include "load/load_run.h"
 #include "scratch/scratch_directory.h"
 #include "verb.h"
 
@@ -18,9 +19,9 @@ void CopyInstalledState(const std::string& to);
 // a file is changed, and nothing is logged.
 class LoadRehearsal {
  public:
-  // Rehearses the load of `policyDir`. Nothing of the host may be in use in this process. Throws
+  // Rehearses the load. Nothing of the host may be in use in this process. Throws
   // std::runtime_error when it cannot be done.
-  explicit LoadRehearsal(const std::string& policyDir);
+  explicit LoadRehearsal(const LoadRequest& load);
 
   // How the load would end.
   ExitCode Ending() const { return ending; }
@@ -30,9 +31,6 @@ class LoadRehearsal {
 
   // The files that it would label, by path. Not all of them would have another label in the end.
   const std::vector<LinuxHost::LabelChange>& Labels() const { return labels; }
-
-  // The same, for who needs them longer than the rehearsal; it has none afterwards.
-  std::vector<LinuxHost::LabelChange> TakeLabels() { return std::move(labels); }
 
   // The copy of the state that was installed, and the state that the load would leave. There is no
   // file for the first one where nothing is installed yet.

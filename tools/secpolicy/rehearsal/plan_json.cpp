@@ -35,6 +35,14 @@ Json NewDomains(const PolicyDifference& difference) {
   return list;
 }
 
+Json GoneDomains(const PolicyDifference& difference) {
+  Json list = Json::Array();
+  for (const DomainDifference& domain : difference.domains) {
+    if (domain.IsGone()) list.Append(domain.name);
+  }
+  return list;
+}
+
 Json StayingRules(const LoadPlan& plan) {
   Json list = Json::Array();
   for (const auto& [domain, rule] : plan.stayingRules) {
@@ -78,7 +86,10 @@ void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
       {"ending", WordFor(rehearsal.Ending())},
       {"errors", Errors(rehearsal.Messages())},
       {"changesNothing", plan.ChangesNothing()},
-      {"domains", {{"create", NewDomains(difference)}, {"stay", plan.stayingDomains}}},
+      {"domains",
+       {{"create", NewDomains(difference)},
+        {"remove", GoneDomains(difference)},
+        {"stay", plan.stayingDomains}}},
       {"objects", {{"add", difference.objectsAdded}, {"remove", difference.objectsRemoved}}},
       {"rules",
        {{"add", RulesOf(difference, &DomainDifference::added)},

@@ -18,11 +18,13 @@ std::string Arrow(const std::string& before, const std::string& after) {
 
 void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& output) {
   Lines newDomains;
+  Lines goneDomains;
   Lines added;
   Lines changed;
   Lines removed;
   for (const DomainDifference& domain : plan.difference.domains) {
     if (domain.IsNew()) newDomains.push_back(domain.name);
+    if (domain.IsGone()) goneDomains.push_back(domain.name);
     const std::string prefix = domain.name + ": ";
     for (const std::string& rule : domain.added) added.push_back(prefix + rule);
     for (const std::string& rule : domain.removed) removed.push_back(prefix + rule);
@@ -38,11 +40,12 @@ void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& ou
   }
 
   WriteSection("domains to create", newDomains, output);
+  WriteSection("domains to remove", goneDomains, output);
   WriteSection("objects to add", plan.difference.objectsAdded, output);
   WriteSection("objects to remove", plan.difference.objectsRemoved, output);
   WriteSection("rules to add", added, output);
   WriteSection("rules to change", changed, output);
-  WriteSection("rules to remove with their object", removed, output);
+  WriteSection("rules to remove", removed, output);
   WriteSection("files to label anew", labels, maxLabels, output);
   WriteSection("domains that stay installed although no file defines them", plan.stayingDomains,
                output);

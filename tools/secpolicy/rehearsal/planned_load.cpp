@@ -16,14 +16,13 @@ constexpr std::size_t kShownLabels = 20;
 
 }  // namespace
 
-ExitCode PlanLoad(const std::string& policyDir, const PlanOptions& options) {
-  if (const auto refusal = RefuseMissingDir("load", policyDir)) return *refusal;
-  const LoadRehearsal rehearsal(policyDir);
+ExitCode PlanLoad(const LoadRequest& load, const PlanOptions& options) {
+  const LoadRehearsal rehearsal(load);
   if (rehearsal.Ending() != kWell) std::cerr << rehearsal.Messages() << std::flush;
   LinuxHost::DropLog();
-  const LoadPlan plan = MakeLoadPlan(policyDir, rehearsal);
+  const LoadPlan plan = MakeLoadPlan(rehearsal);
   if (options.format == "json") {
-    WritePlanJson(plan, policyDir, rehearsal, std::cout);
+    WritePlanJson(plan, load.policyDir, rehearsal, std::cout);
   } else {
     const auto all = std::numeric_limits<std::size_t>::max();
     WritePlanText(plan, options.showAll ? all : kShownLabels, std::cout);

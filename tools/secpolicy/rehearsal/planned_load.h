@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "load/load_run.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -11,8 +12,8 @@ struct PlanOptions {
   bool showAll = false;  // every file whose label would change, however many
 };
 
-// Prints to standard output what a load of `policyDir` would change, and changes nothing. The
+// Prints to standard output what the load would change, and changes nothing. The
 // problems that the load would report are reported too. Returns how the load would end.
-ExitCode PlanLoad(const std::string& policyDir, const PlanOptions& options);
+ExitCode PlanLoad(const LoadRequest& load, const PlanOptions& options);
 
 }  // namespace SecPolicyCli

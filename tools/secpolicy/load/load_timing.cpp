@@ -1,4 +1,4 @@
-#include "load_timing.h"
+#include "load/load_timing.h"
 
 #include <algorithm>
 #include <array>

@@ -1,6 +1,7 @@
-#include "load_summary.h"
+#include "load/load_summary.h"
 
 #include <array>
+#include <exception>
 #include <iostream>
 #include <map>
 #include <string_view>
@@ -8,6 +9,7 @@
 #include "domain_file.h"
 #include "host/linux/policy_count.h"
 #include "secpolicy/policy_root.h"
+#include "summary.h"
 #include "text/count.h"
 #include "text/visible.h"
 
@@ -52,6 +54,14 @@ std::string FileOf(std::string_view message, const std::string& policyDir) {
   return std::string(place.substr(0, place.rfind(':')));
 }
 
+// "1 domain and 2 rules"
+std::string Count(const LinuxHost::LoadRemainder& remainder) {
+  std::string text;
+  if (!remainder.domains.empty()) text = CountOf(remainder.domains.size(), "domain");
+  if (remainder.rules == 0) return text;
+  return text + (text.empty() ? "" : " and ") + CountOf(remainder.rules, "rule");
+}
+
 }  // namespace
 
 void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t earlyErrors,
@@ -79,6 +89,23 @@ std::string CountInstalled() {
          CountOf(count.objects, "object");
 }
 
-std::string DescribeInstalled() { return "done (" + CountInstalled() + ")"; }
+std::string DescribeDone(const std::string& verb) {
+  try {
+    return "done (" + CountInstalled() + ")";
+  } catch (const std::exception& failure) {
+    Summarize(verb, std::string("what is installed cannot be counted: ") + failure.what());
+    return "done";
+  }
+}
+
+std::string DescribeRemainder(const LinuxHost::LoadEnding& ending, bool keep) {
+  if (!ending.removed.IsEmpty()) return ", " + Count(ending.removed) + " removed that no file has";
+  // Domains in which worlds run are told before.
+  if (keep && !ending.staying.IsEmpty()) {
+    return ", " + Count(ending.staying) + " kept that no file has";
+  }
+  if (ending.staying.rules == 0) return "";
+  return "; nothing was removed: " + Count(ending.staying) + " that no file has";
+}
 
 }  // namespace SecPolicyCli

@@ -1,0 +1,47 @@
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "host/linux/policy_load.h"
+#include "load/load_timing.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// The files of one kind, and the library call that installs them.
+struct LoadStep {
+  LinuxHost::LoadKind kind;
+  std::string directory;
+  void (*load)(const std::string& directory);
+};
+
+struct LoadRequest {
+  std::string verb;
+  std::string policyDir;  // what messages and records name
+  std::vector<LoadStep> steps;
+  bool keep = false;          // what no file has any more
+  bool allOrNothing = false;  // installs nothing after an error
+  bool timing = false;        // prints the time of each phase
+
+  // What makes a state usable that is not, if anything can.
+  std::function<void()> mend;
+
+  // What acts on files before anything is installed, and what is the first to be installed, if any.
+  std::function<void(LoadTiming& timing)> prepare;
+  std::function<void()> begin;
+};
+
+// Takes the steps as one load: others see what was installed before, or all of it. Ends with one
+// summary line on standard error; after a load that did not end well, it is preceded by the files
+// that failed and by what is installed. An error that the library reports counts as a failure even
+// when its call returns normally.
+//
+// What no file has any more is removed when the load ends well, unless it is to be kept.
+//
+// When the library ends the process because a well-known domain is missing, nothing is installed,
+// the summary says so, and the process exits with kStopped.
+ExitCode RunLoad(const LoadRequest& request);
+
+}  // namespace SecPolicyCli
