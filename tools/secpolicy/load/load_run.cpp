@@ -1,20 +1,25 @@
 #include "load/load_run.h"
 
+#include <signal.h>
 #include <unistd.h>
 
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <filesystem>
 #include <iostream>
 #include <map>
 #include <optional>
 #include <string_view>
 
 #include "error_watch.h"
+#include "host/linux/label_journal.h"
 #include "host/linux/noted_labels.h"
+#include "host/linux/used_paths.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
 #include "root.h"
+#include "scratch/used_state.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "summary.h"
@@ -67,6 +72,25 @@ std::vector<std::string> DefinedDomains(const LoadStep& step) {
   return names;
 }
 
+// What asks the process to end waits until the labels are given and the load is committed, or both
+// are undone; so does that nobody reads the messages.
+class BlockedSignals {
+ public:
+  BlockedSignals() {
+    sigset_t signals;
+    sigemptyset(&signals);
+    for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE})
+      sigaddset(&signals, signal);
+    sigprocmask(SIG_BLOCK, &signals, &before);
+  }
+  BlockedSignals(const BlockedSignals&) = delete;
+  BlockedSignals& operator=(const BlockedSignals&) = delete;
+  ~BlockedSignals() { sigprocmask(SIG_SETMASK, &before, nullptr); }
+
+ private:
+  sigset_t before;
+};
+
 class LoadRun;
 
 // A terminate handler cannot be handed anything.
@@ -115,24 +139,80 @@ class LoadRun {
 
   void Install() {
     LoadTiming timing(request.timing);
+    if (!LinuxHost::IsRehearsing()) PutBackLeftOver();
     if (request.prepare) request.prepare(timing);
+    stateIsNew = IsStateMissing();
     transaction.emplace();
+    hasBegun = true;
     if (request.begin) request.begin();
     // A number on a file is to be one that the state knows.
     std::optional<NotedLabels> labels;
     if (!LinuxHost::IsRehearsing()) labels.emplace(LinuxHost::LabelNotes::kForLater);
     for (const LoadStep& step : request.steps) Take(step, timing);
-    if (request.allOrNothing && !WentWell()) return transaction.reset();
-    RecordLoad(Ending(), ending);
-    transaction->Commit();
-    isInstalled = true;
-    if (labels) ReportUnlabelled(labels->Apply());
+    if (request.allOrNothing && labels) {
+      InstallAllOrNothing(*labels);
+    } else {
+      Commit();
+      if (labels) ReportUnlabelled(labels->Apply());
+    }
     timing.EndPhase("file labels");
   }
 
+  // A load that was killed while it gave labels, all of them or none, has left them half done.
+  static void PutBackLeftOver() {
+    if (IsStateMissing()) return;
+    const auto back = LinuxHost::LabelJournal::PutBackLeftOver(LinuxHost::StatePath());
+    if (!back) return;
+    Summarize("load", "a load before this one was killed, so " +
+                          CountOf(back->count, "file label") + " were put back first");
+    ReportFailures("Unable to put the label back of ", back->failures);
+  }
+
+  void Commit() {
+    RecordLoad(Ending(), ending);
+    transaction->Commit();
+    isInstalled = true;
+  }
+
+  // The labels come before the commit: they can be taken back, and the commit cannot.
+  void InstallAllOrNothing(const NotedLabels& labels) {
+    if (!WentWell()) return transaction.reset();
+    const BlockedSignals blocked;
+    LinuxHost::LabelJournal journal(LinuxHost::StatePath());
+    try {
+      journal.Keep(labels);
+      ReportUnlabelled(labels.Apply());
+      if (WentWell()) return Commit();
+    } catch (const std::exception&) {
+      ReportPutBack(journal.PutBack());
+      throw;
+    }
+    transaction.reset();
+    ReportPutBack(journal.PutBack());
+  }
+
+  // All or nothing leaves no trace of itself. Where there was no state, there is to be none; its
+  // journal goes with it.
+  void RecordUndone(const RecordedLoad& record) const {
+    if (!request.allOrNothing) return RecordEnding(record);
+    if (!stateIsNew) return;
+    for (const char* part : {"", "-wal", "-shm"}) {
+      std::filesystem::remove(LinuxHost::StatePath() + part);
+    }
+  }
+
   static void ReportUnlabelled(const std::vector<LinuxHost::LabelFailure>& failures) {
+    ReportFailures("Unable to label ", failures);
+  }
+
+  static void ReportPutBack(const LinuxHost::LabelsPutBack& back) {
+    ReportFailures("Unable to put the label back of ", back.failures);
+  }
+
+  static void ReportFailures(const std::string& what,
+                             const std::vector<LinuxHost::LabelFailure>& failures) {
     for (const auto& [path, error] : failures) {
-      SecPolicy::SecpolicyError("Unable to label " + path + ": " + std::strerror(error));
+      SecPolicy::SecpolicyError(what + path + ": " + std::strerror(error));
     }
   }
 
@@ -184,7 +264,7 @@ class LoadRun {
   }
 
   ExitCode ReportFailure() {
-    if (!isInstalled) Attempt([&] { RecordEnding(Ending()); });
+    if (!isInstalled) Attempt([&] { RecordUndone(Ending()); });
     Attempt([&] { WriteErrorsByFile(errors.Messages(), earlyErrors, request.policyDir); });
     std::string summary = failure.empty() ? "failed" : failure;
     if (errors.Count() > 0) summary += " (" + CountOf(errors.Count(), "error") + " above)";
@@ -194,7 +274,7 @@ class LoadRun {
       }
       summary += DescribeRemainder(ending, request.keep);
     } else {
-      summary += "; nothing was installed, and what was there before is unchanged";
+      if (hasBegun) summary += "; nothing was installed";
     }
     const std::string next = AdviseOnPrivilege();
     Summarize(request.verb, next.empty() ? summary : summary + ". " + next);
@@ -208,14 +288,13 @@ class LoadRun {
     record.ending = "stopped";
     Attempt([&] {
       transaction->Undo();
-      RecordEnding(record);
+      RecordUndone(record);
     });
     Attempt([&] { WriteErrorsByFile(errors.Messages(), earlyErrors, request.policyDir); });
     const std::string name(missing);
     Summarize(request.verb, "stopped: there is no domain " + name +
-                                ", so nothing was installed, and what was there before is "
-                                "unchanged. Put a policy file named " +
-                                name + " into " + request.policyDir + "/domains and run it again.");
+                                ", so nothing was installed. Put a policy file named " + name +
+                                " into " + request.policyDir + "/domains and run it again.");
     _exit(kStopped);
   }
 
@@ -226,6 +305,8 @@ class LoadRun {
   std::size_t earlyErrors = 0;
   std::string failure;
   LoadEnding ending;
+  bool stateIsNew = false;
+  bool hasBegun = false;
   bool isInstalled = false;
 };
 
