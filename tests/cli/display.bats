@@ -62,9 +62,19 @@ load helper
   ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' first."
 }
 
+# late_tardisk: an image that came after the boot, with a label that no object has.
+late_tardisk() {
+  echo new >"$root/tardisks/late.tgz"
+  python3 - "$root/tardisks" <<'END'
+import os, sys
+name = next(name for name in os.listxattr(sys.argv[1]) if "zorvan" in name)
+os.setxattr(sys.argv[1] + "/late.tgz", name, b"\xfe\xff\xff\x7f")
+END
+}
+
 @test "a tardisk whose label cannot be read fails the display" {
   boot
-  echo new >"$root/tardisks/late.tgz"
+  late_tardisk
   secpolicy display
   exits 1
   [[ $stderr == *"Error: Error in reading tardisk label: (/tardisks/late.tgz): "* ]]
@@ -118,7 +128,7 @@ load helper
 
 @test "--format json of a tardisk whose label cannot be read" {
   boot
-  echo new >"$root/tardisks/late.tgz"
+  late_tardisk
   secpolicy display --format json
   exits 0
   fits_schema display

@@ -49,7 +49,7 @@ class SmallDisk : public ::testing::Test {
   std::vector<std::string> contents;
 };
 
-TEST_F(SmallDisk, EndsALoadWithAClearErrorAndAPrefixOfItsCalls) {
+TEST_F(SmallDisk, EndsALoadWithAClearErrorAndNothingOfIt) {
   int failures = 0;
   for (int kilobytes = 4; kilobytes < 1500; kilobytes += kilobytes < 160 ? 12 : 300) {
     SCOPED_TRACE(std::to_string(kilobytes) + " kB");

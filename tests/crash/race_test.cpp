@@ -37,21 +37,6 @@ std::vector<std::string> OfKind(const std::vector<std::string>& rules, const std
   return found;
 }
 
-// Every kind of rule is read in one call, and installed in the order of the file.
-void ExpectBeginningsOf(const std::string& whole, const std::string& display) {
-  const auto expected = DomainsOf(whole);
-  for (const auto& [domain, rules] : DomainsOf(display)) {
-    ASSERT_EQ(expected.count(domain), 1U) << domain;
-    for (const char* kind : {"-a", "-c", "-d", "-f", "-p", "-r", "-s", "-u"}) {
-      const auto all = OfKind(expected.at(domain), kind);
-      const auto seen = OfKind(rules, kind);
-      ASSERT_LE(seen.size(), all.size());
-      ASSERT_TRUE(std::equal(seen.begin(), seen.end(), all.begin())) << display;
-    }
-    ASSERT_EQ(OfKind(rules, "-r").size() % 2, 0U) << display;
-  }
-}
-
 class LoadersAtOnce : public ::testing::TestWithParam<int> {};
 
 TEST_P(LoadersAtOnce, EndRightAndLeaveTheStateOfOne) {
@@ -77,7 +62,7 @@ TEST_P(LoadersAtOnce, EndRightAndLeaveTheStateOfOne) {
 
 INSTANTIATE_TEST_SUITE_P(Loaders, LoadersAtOnce, ::testing::Values(2, 4, 8));
 
-TEST(Reader, NeverSeesHalfACall) {
+TEST(Reader, NeverSeesHalfALoad) {
   const HostRoot root;
   ASSERT_EQ(RunCommand(root.Path(), {"load"}).exitStatus, 0);
   const std::string whole = RunCommand(root.Path(), {"display"}).output;
@@ -86,7 +71,7 @@ TEST(Reader, NeverSeesHalfACall) {
   ASSERT_EQ(domains, static_cast<std::size_t>(kServices) + 5);
   ASSERT_EQ(OfKind(DomainsOf(whole).at("Domain Name: service0"), "-r").size(), 2U * kLinks);
 
-  int partial = 0;
+  int early = 0;
   for (int round = 0; round < (LongTests() ? 100 : 15); ++round) {
     root.Forget();
     Command loader(root.Path(), {"load"});
@@ -96,13 +81,14 @@ TEST(Reader, NeverSeesHalfACall) {
       const Outcome reader = RunCommand(root.Path(), {"display"});
       ASSERT_EQ(reader.exitStatus, 0) << reader.errors;
       display = reader.output;
-      ExpectBeginningsOf(whole, display);
-      if (HasFatalFailure()) return;
-      if (!DomainsOf(display).empty() && display != whole) ++partial;
+      if (display == whole) continue;
+      ++early;
+      // The built-in one.
+      ASSERT_LE(DomainsOf(display).size(), 1U) << display;
     }
     EXPECT_EQ(loader.Wait().exitStatus, 0);
   }
-  EXPECT_GT(partial, 0);
+  EXPECT_GT(early, 0);
 }
 
 }  // namespace

@@ -17,7 +17,8 @@ constexpr std::array kQueries = {
     "SELECT 'rule', domain_id, kind, word1, word2, word3, granted, line FROM rule ORDER BY id",
     "SELECT 'parameter', domain_id, parameter_check, first_value, last_value, first_word, "
     "last_word, granted, line FROM parameter_rule ORDER BY id",
-    "SELECT 'file', domain_id, world, path, permission, line FROM file_policy ORDER BY id",
+    // The library does not tell the line of a path: the command records it afterwards.
+    "SELECT 'file', domain_id, world, path, permission FROM file_policy ORDER BY id",
     "SELECT 'origin', tardisk, path FROM inode_origin ORDER BY path",
 };
 

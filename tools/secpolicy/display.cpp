@@ -3,6 +3,7 @@
 #include <list>
 
 #include "command_line.h"
+#include "host/linux/stable_view.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
@@ -60,7 +61,13 @@ Action Define(Syntax& syntax) {
   return [domain, format] {
     const auto show = *format == "json" ? WriteJson : SecPolicy::DisplayPolicy;
     return CallLibrary(
-        "display", [&] { show(*domain); }, Advise);
+        "display",
+        [&] {
+          // A load may end meanwhile.
+          const LinuxHost::StableView view;
+          show(*domain);
+        },
+        Advise);
   };
 }
 

@@ -139,6 +139,7 @@ class LoadRun {
 
   void Install() {
     LoadTiming timing(request.timing);
+    if (request.mend) request.mend();
     if (!LinuxHost::IsRehearsing()) PutBackLeftOver();
     if (request.prepare) request.prepare(timing);
     stateIsNew = IsStateMissing();
