@@ -204,11 +204,26 @@ fileLabels/zz:3 [unknown-word]" ]]
   warns "$shown/domains/appDom:$number:1: warning: this rule is in line $((number - 1)) already [duplicate-rule]"
 }
 
+# early NAME: the domain is installed by the early policy, and no file defines it any more.
+early() {
+  mkdir -p "$policy/early/domains"
+  touch "$policy/early/domains/$1"
+  "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err"
+  rm "$policy/early/domains/$1" "$policy/domains/$1"
+}
+
 @test "installed-only" {
-  rm "$policy/domains/globalVMDom"
+  early globalVMDom
   secpolicy check
   exits 0
   shows "$shown/domains: warning: no file defines the domain 'globalVMDom', which every host needs; it is installed since an earlier load, and the next boot will lack it [installed-only]"
+}
+
+@test "a domain that only an earlier load has defined counts no more, as in a load" {
+  rm "$policy/domains/globalVMDom"
+  secpolicy load
+  exits 3
+  finds "$shown/domains: error: there is no domain 'globalVMDom', which every host needs: a load stops without it, before tardisks and file labels [missing-domain]"
 }
 
 @test "long-line" {
@@ -521,7 +536,7 @@ END
 
 @test "what is installed counts, but not with --fresh" {
   add domains/appDom "-d hostProgram sshDom exec grant"
-  rm "$policy/domains/sshDom"
+  early sshDom
   sed -i '/sshDom/d' "$policy/domains/hostDom" "$policy/domains/daemonFrameworkDom"
   secpolicy check --disable unused-object
   exits 0

@@ -7,6 +7,7 @@
 #include "check/check_run.h"
 #include "check/report_format.h"
 #include "command_line.h"
+#include "host/linux/policy_load.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "policy_dir.h"
@@ -32,6 +33,23 @@ struct Options {
   std::vector<std::string> unwanted;
 };
 
+void AddNames(const std::string& dir, const std::string& prefix, std::vector<std::string>& names) {
+  if (!File_IsDirectory(dir.c_str())) return;
+  std::map<std::string, std::string> files;
+  SecPolicy::GetFileList(dir, files);
+  for (const auto& [path, name] : files) names.push_back(prefix + name);
+}
+
+// As for a load, domains that earlier loads have defined and no file defines any more are not
+// there.
+void HideOldDomains(LinuxHost::PolicyTransaction& load, const std::string& root) {
+  const std::string domains = root + "/" + SecPolicy::kDomainsDir;
+  std::vector<std::string> names;
+  AddNames(domains, "", names);
+  AddNames(domains + "/" + kPartnerDir, SecPolicy::kPartnerPrefix, names);
+  load.BeginLoad({.kind = LinuxHost::LoadKind::kFull, .directory = root, .domains = names});
+}
+
 // In the order in which a boot comes to the files. The directories of early boot, partners and
 // tardisks may be missing.
 void CheckPolicy(CheckRun& run, const std::string& root) {
@@ -55,6 +73,8 @@ ExitCode Check(const std::string& dir, const Options& options) {
                                "that it is in (--root DIR).");
   }
   CheckRun run(options.fresh, options.unwanted);
+  LinuxHost::PolicyTransaction load;
+  HideOldDomains(load, dir);
   CheckPolicy(run, dir);
   run.diagnostics.Sort();
   run.diagnostics.against = run.scratch.IsCopy() ? "installed" : "boot";
