@@ -3,7 +3,8 @@
 against each other and against the files and labels themselves:
 
   check      tells an error exactly when the load ends badly
-  load       changes what load --plan said, labels of files included, and nothing when it is repeated
+  load       changes what load --plan said, labels of files included, and nothing when it is repeated;
+             when it ends well, what is installed is what the files say
   display    written as policy files and booted elsewhere, is displayed again
   why        answers as a model of docs/queries.md that knows nothing of the command
   diff       finds no difference between what is installed and what was just saved
@@ -101,7 +102,7 @@ class Tree:
         if chance.random() < 0.1:
             self.domains.append(chance.choice(ODD_DOMAINS if not is_good else ODD_DOMAINS[1:]))
         needed = list(NEEDED)
-        if not is_good and chance.random() < 0.05:
+        if not is_good and chance.random() < 0.1:
             needed.remove(chance.choice(needed))
         self.all_domains = self.domains + needed
         self.add_objects()
@@ -116,7 +117,7 @@ class Tree:
         for name in ["l1", "l2"][: chance.randint(0, 2)] or ["none"]:
             self.add("fileLabels/" + name, [self.label_line() for _ in range(chance.choice([0, 1, 4]))])
         # What tardisks brought is written over in its place; what they did not bring comes from none.
-        if chance.random() < 0.2:
+        if chance.random() < 0.1:
             self.add("tardisks/part", [f"-E {self.label()} {chance.choice(needed)}"])
         if chance.random() < self.badness:
             self.add("tardisks/" + chance.choice(["late", "inner/"]), ["-E unlabeled appDom"])
@@ -196,6 +197,7 @@ class Host:
     def __init__(self, command, root):
         self.command = command
         self.root = root
+        self.early = {}  # the early policy that was booted, which stays
 
     def path(self, path):
         return os.path.join(self.root, path)
@@ -439,6 +441,59 @@ def check_planned_labels(host, plan, before, after, shown):
                       f"found {[changed.get(i) for i in wrong]}")
 
 
+def key_of(keyword, words):
+    """What a rule is about; and of a range, however it is written."""
+    if keyword == "-r":
+        return keyword, words[0]
+    if keyword == "-p":
+        ends = [int(word, 0) for word in words[1:]]
+        return keyword, words[0], ends[0], ends[-1]
+    return (keyword, *words)
+
+
+def written_rules(host, text):
+    """What the lines of a domain's file say in the end: of several about one thing the last."""
+    rules = {}
+    for line in text.decode().split("\n"):
+        words = line.split("#")[0].split(" ")
+        words = [word for word in words if word]
+        if not words:
+            continue
+        if words[0] == "-r":
+            letters = "".join(sorted(words[2])) if len(words) > 2 else ""
+            real = resolve(host, words[1])
+            for path in [words[1]] + ([real] if real else []):
+                rules[key_of("-r", [path])] = letters
+        else:
+            rules[key_of(words[0], words[1:-1])] = words[-1] == "grant"
+    return rules
+
+
+def shown_rules(domain):
+    return {key_of(rule["keyword"], rule["words"]):
+            rule["grant"] if "grant" in rule else "".join(sorted(rule["words"][1]))
+            for rule in domain["rules"]}
+
+
+def check_is_what_files_say(host, tree, shown):
+    """After a load that ended well nothing is installed but what files and tardisks bring."""
+    files = {path: text for path, text in tree.files.items() if path.startswith("domains/")}
+    wanted = {path.split("/")[-1] if path.count("/") == 1 else "plugin-" + path.split("/")[-1]: text
+              for path, text in files.items()}
+    for domain in shown["domains"]:
+        name = domain["name"]
+        early = written_rules(host, host.early.get(name, b""))
+        says = written_rules(host, wanted.get(name, b""))
+        has = shown_rules(domain)
+        is_brought = lambda key: key[0] == "-d" and key[-1] == "tardisk_exec"
+        wrong = {key for key in has if key not in says and key not in early and not is_brought(key)}
+        wrong |= {key for key in says if has.get(key) != says[key] and key not in early and not is_brought(key)}
+        expect(not wrong, f"installed in {name!r} but not written, or written but not installed: {wrong}")
+    gone = set(wanted) - domains_of(shown)
+    more = domains_of(shown) - set(wanted) - set(host.early) - {"hostDom"}
+    expect(not gone and not more, f"domains that are missing: {gone}, and too many: {more}")
+
+
 def check_saved(host, shown):
     status, _, errors = host.run("save", "now")
     expect(status == 0, f"save ends with {status}: {errors}")
@@ -526,6 +581,8 @@ def take_step(host, chance, tree, scratch):
     check_planned_labels(host, plan, labels_before, host.labels(), after)
     _, again = host.ask("load", "--plan")
     expect(again["changesNothing"], f"a load repeated: {json.dumps(again)[:2000]}")
+    if load_status == 0:
+        check_is_what_files_say(host, tree, after)
     check_why(host, chance, after)
     if chance.random() < 0.3:
         check_saved(host, after)
@@ -550,6 +607,7 @@ def run_chain(command, seed, count, keep):
         host.make()
         first = Tree(chance, True)
         host.write(first)
+        host.early = {path.split("/")[-1]: text for path, text in first.files.items() if path.startswith("early/")}
         if chance.random() < 0.7:
             host.pack("part.tar", {POLICY + "/tardisks/part": tardisk_policy(chance, first)})
         if chance.random() < 0.3:
