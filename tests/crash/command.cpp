@@ -42,6 +42,8 @@ Command::Command(const std::filesystem::path& root, const std::vector<std::strin
   if (id != 0) return;
   dup2(output, STDOUT_FILENO);
   dup2(errors, STDERR_FILENO);
+  // What does not end is ended, as a crash is. Nothing here takes a second on an idle machine.
+  alarm(300);
   unsetenv("SECPOLICY_HOST_STATE");
   unsetenv("SECPOLICY_HOST_CONFIG");
   // Leaks are looked for in /proc, which is not below the root.
