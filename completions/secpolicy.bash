@@ -62,9 +62,9 @@ _secpolicy() {
   elif [[ $verb == boot && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--plan --policy-from --timing --format --root --verbose --help -v -h' -- "$current")
   elif [[ $verb == load-early && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--timing --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--keep --timing --root --verbose --help -v -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--timing --plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--keep --timing --plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
   elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $kind == relabel && $current == -* ]]; then

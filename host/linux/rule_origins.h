@@ -50,8 +50,9 @@ struct PathLine {
   unsigned int line = 0;
 };
 
-// Records the lines of the path rules that the latest load of the kind has installed for the domain;
-// `lines` are those of its file, in order. A rule for what a path resolves to is of the same line.
+// Records the lines of the path rules that the latest load of the kind has installed for the
+// domain; `lines` are those of its file, in order. A rule for what a path resolves to is of the
+// same line.
 void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines);
 
 // The sources of all rules of the domain `id` with the keyword ("-a"), in the order in which the

@@ -158,3 +158,24 @@ rules_of() {
   exits 1
   [[ $output != *$'\033'* && $output == *"'^[[2J'"* ]]
 }
+
+@test "status tells what no file has any more, and what a load has removed of it" {
+  boot
+  sed -i '/-s listen/d' "$policy/domains/sshDom"
+  echo "-s read grant" >"$policy/domains/newDom"
+  secpolicy load --keep
+  rm "$policy/domains/newDom"
+  secpolicy load --keep
+  secpolicy status
+  exits 0
+  shows "in no file   2 rules"
+  shows "in no file   domain newDom"
+  secpolicy status --format json
+  fits_schema status
+  jq -e '.inNoFile == {domains: ["newDom"], rules: 2}' <<<"$output"
+  secpolicy load
+  secpolicy status
+  [[ $output != *"in no file"* ]]
+  secpolicy status --format json
+  jq -e '.latestLoad.removed == {domains: 1, rules: 2}' <<<"$output"
+}

@@ -47,6 +47,9 @@ struct Status {
   std::map<std::string, std::vector<std::string>> domainsByLevel;
   std::map<std::string, std::size_t> rulesByKeyword;
   std::size_t ruleCount = 0;
+  std::vector<std::string>
+      domainsWithoutFile;  // what loads have installed and no file has any more
+  std::size_t rulesWithoutLine = 0;
 
   // Beside the one that is built in, there are domains only when something was loaded.
   bool IsLoaded() const { return policy.domains.size() > 1; }
@@ -61,7 +64,9 @@ Status ReadStatus() {
   for (const InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);
     status.ruleCount += domain.rules.size();
+    if (domain.hasNoFile) status.domainsWithoutFile.push_back(domain.name);
     for (const InstalledRule& rule : domain.rules) {
+      if (rule.hasNoLine) ++status.rulesWithoutLine;
       ++status.rulesByKeyword[SplitRule(rule.text).keyword];
     }
   }
@@ -120,6 +125,12 @@ void WriteText(const Status& status) {
     WriteLine(std::string("  ") + kind.keyword,
               std::string(width - number.size(), ' ') + number + " " + kind.name);
   }
+  if (status.rulesWithoutLine > 0) {
+    WriteLine("in no file", CountOf(status.rulesWithoutLine, "rule"));
+  }
+  for (const std::string& domain : status.domainsWithoutFile) {
+    WriteLine("in no file", "domain " + domain);
+  }
   WriteLine("tardisks", std::to_string(status.policy.tardisks.size()));
   for (const InstalledTardisk& tardisk : status.policy.tardisks) {
     WriteLine("", tardisk.path + " " + (tardisk.label.empty() ? "(no label)" : tardisk.label));
@@ -127,8 +138,13 @@ void WriteText(const Status& status) {
 }
 
 Json ToJson(const LinuxHost::LoadRecord& load) {
-  return {{"verb", load.verb},     {"directory", load.directory},   {"time", IsoTime(load.time)},
-          {"ending", load.ending}, {"errorCount", load.errorCount}, {"errors", load.errors}};
+  return {{"verb", load.verb},
+          {"directory", load.directory},
+          {"time", IsoTime(load.time)},
+          {"ending", load.ending},
+          {"errorCount", load.errorCount},
+          {"errors", load.errors},
+          {"removed", {{"domains", load.removedDomains}, {"rules", load.removedRules}}}};
 }
 
 void WriteJson(const Status& status) {
@@ -140,15 +156,17 @@ void WriteJson(const Status& status) {
   for (const auto& [keyword, count] : status.rulesByKeyword) rules[keyword] = count;
   Json load;
   if (status.load) load = ToJson(*status.load);
-  const Json screen = {{"schema", "secpolicy.status/1"},
-                       {"loaded", status.IsLoaded()},
-                       {"latestLoad", load},
-                       {"domains", status.policy.domains.size()},
-                       {"domainsByLevel", levels},
-                       {"objects", status.policy.objects.size()},
-                       {"rules", status.ruleCount},
-                       {"rulesByKeyword", rules},
-                       {"tardisks", ToJson(status.policy.tardisks)}};
+  const Json screen = {
+      {"schema", "secpolicy.status/1"},
+      {"loaded", status.IsLoaded()},
+      {"latestLoad", load},
+      {"domains", status.policy.domains.size()},
+      {"domainsByLevel", levels},
+      {"objects", status.policy.objects.size()},
+      {"rules", status.ruleCount},
+      {"rulesByKeyword", rules},
+      {"inNoFile", {{"domains", status.domainsWithoutFile}, {"rules", status.rulesWithoutLine}}},
+      {"tardisks", ToJson(status.policy.tardisks)}};
   std::cout << screen.Text();
 }
 

@@ -10,9 +10,9 @@
 
 namespace SecPolicyCli {
 
-// Finds out where the rules about paths and of tardisks, and file labels, are written, by reading policy files as a
-// load does. A line that a load refuses ends its file here too; nothing is reported. `access` is
-// only borrowed.
+// Finds out where the rules about paths, the rules of tardisks and the file labels are written, by
+// reading policy files as a load does. A line that a load refuses ends its file here too; nothing
+// is reported. `access` is only borrowed.
 class OriginReader {
  public:
   explicit OriginReader(SecPolicy::TeskAccessInterfaceImpl& connection) : access(connection) {}
