@@ -451,10 +451,16 @@ def key_of(keyword, words):
     return (keyword, *words)
 
 
+LONGEST_LINE = 1023  # bytes that a load reads of one
+
+
 def written_rules(host, text):
-    """What the lines of a domain's file say in the end: of several about one thing the last."""
+    """What the lines of a domain's file say in the end: of several about one thing the last. An overlong
+    line is cut, and ends the file."""
     rules = {}
-    for line in text.decode().split("\n"):
+    lines = text.split(b"\n")
+    overlong = next((number for number, line in enumerate(lines) if len(line) > LONGEST_LINE), len(lines))
+    for line in [line[:LONGEST_LINE].decode(errors="replace") for line in lines[:overlong + 1]]:
         words = line.split("#")[0].split(" ")
         words = [word for word in words if word]
         if not words:
