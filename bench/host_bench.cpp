@@ -1,5 +1,6 @@
 // The library on the Linux host beside bare loops that do only what cannot be left out: the system
-// calls of labelling, one prepared insert for each rule, one write for each line.
+// calls of labelling, one prepared insert for each rule in one transaction, one write for each
+// line.
 //
 // SECPOLICY_BENCH_DIRS names the directories, separated by colons, in which trees are labelled; the
 // host state lies in the first.
@@ -21,6 +22,7 @@
 #include <string>
 #include <vector>
 
+#include "host/linux/policy_load.h"
 #include "secpolicy/domain/domain_policy.h"
 #include "secpolicy/secpolicy.h"
 
@@ -225,6 +227,15 @@ class DomainFiles {
   std::vector<std::string> capabilities;
 };
 
+// As the command does it: as one step.
+void LoadAsAWhole(const DomainFiles& files, TeskAccessInterfaceImpl& access) {
+  LinuxHost::PolicyTransaction transaction;
+  transaction.BeginLoad({.directory = files.Path(), .domains = {}});
+  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  transaction.EndLoad(false);
+  transaction.Commit();
+}
+
 void LoadDomains(benchmark::State& state) {
   const DomainFiles files(state.range(0), state.range(1));
   for (auto _ : state) {
@@ -232,7 +243,7 @@ void LoadDomains(benchmark::State& state) {
     const FreshState host;
     TeskAccessInterfaceImpl access;
     state.ResumeTiming();
-    SecPolicy::LoadPolicyDomains(files.Path(), access);
+    LoadAsAWhole(files, access);
   }
 }
 BENCHMARK(LoadDomains)
@@ -252,6 +263,10 @@ class Database {
   Database(const Database&) = delete;
   Database& operator=(const Database&) = delete;
   ~Database() { sqlite3_close(database); }
+
+  void Run(const char* statement) const {
+    if (sqlite3_exec(database, statement, nullptr, nullptr, nullptr) != SQLITE_OK) std::abort();
+  }
 
   sqlite3* database = nullptr;
 };
@@ -277,7 +292,6 @@ class InstalledRows {
     for (sqlite3_value* value : values) sqlite3_value_free(value);
   }
 
-  // Each with a commit of its own.
   void InsertInto(const Database& target) const {
     sqlite3_stmt* insert = nullptr;
     if (sqlite3_prepare_v2(target.database, statement, -1, &insert, nullptr) != SQLITE_OK) {
@@ -301,35 +315,38 @@ class InstalledRows {
 };
 
 // The rows of the same rules, in the same order, by bare prepared inserts into the host's own
-// schema.
+// schema, in one transaction.
 void InsertRulesBare(benchmark::State& state) {
   const DomainFiles files(state.range(0), state.range(1));
   const FreshState loaded;
   TeskAccessInterfaceImpl access;
-  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  LoadAsAWhole(files, access);
   const Database source(loaded.Path());
   const InstalledRows words(
-      source, "SELECT domain_id, kind, word1, word2, word3, granted, line FROM rule ORDER BY id",
-      "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line) "
-      "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7)");
+      source,
+      "SELECT domain_id, kind, word1, word2, word3, granted, line, load FROM rule ORDER BY id",
+      "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line, load) "
+      "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)");
   const InstalledRows parameters(
       source,
       "SELECT domain_id, parameter_check, first_value, last_value, first_word, last_word, granted, "
-      "line FROM parameter_rule ORDER BY id",
+      "line, load FROM parameter_rule ORDER BY id",
       "INSERT INTO parameter_rule (domain_id, parameter_check, first_value, last_value, "
-      "first_word, last_word, granted, line) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)");
+      "first_word, last_word, granted, line, load) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)");
   const InstalledRows paths(
-      source, "SELECT domain_id, world, path, permission, line FROM file_policy ORDER BY id",
-      "INSERT INTO file_policy (domain_id, world, path, permission, line) "
-      "VALUES (?1, ?2, ?3, ?4, ?5)");
+      source, "SELECT domain_id, world, path, permission, line, load FROM file_policy ORDER BY id",
+      "INSERT INTO file_policy (domain_id, world, path, permission, line, load) "
+      "VALUES (?1, ?2, ?3, ?4, ?5, ?6)");
   for (auto _ : state) {
     state.PauseTiming();
     const FreshState host;
     const Database target(host.Path());
     state.ResumeTiming();
+    target.Run("BEGIN");
     words.InsertInto(target);
     parameters.InsertInto(target);
     paths.InsertInto(target);
+    target.Run("COMMIT");
   }
 }
 BENCHMARK(InsertRulesBare)->Args({kDomains, kRules})->UseRealTime()->Unit(benchmark::kMillisecond);
@@ -383,7 +400,7 @@ void DisplayDomains(benchmark::State& state) {
   const DomainFiles files(state.range(0), state.range(1));
   const FreshState host;
   TeskAccessInterfaceImpl access;
-  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  LoadAsAWhole(files, access);
   const OutputToFile output(scratch.path / "display");
   for (auto _ : state) {
     output.StartOver();
@@ -403,7 +420,7 @@ void WriteLinesBare(benchmark::State& state) {
   const DomainFiles files(kDomains, kRules);
   const FreshState host;
   TeskAccessInterfaceImpl access;
-  SecPolicy::LoadPolicyDomains(files.Path(), access);
+  LoadAsAWhole(files, access);
   const fs::path shown = scratch.path / "display";
   {
     const OutputToFile output(shown);

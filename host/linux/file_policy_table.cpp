@@ -99,6 +99,14 @@ void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
 }
 
 bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
+  if (state.CurrentLoad() != 0) {
+    state.Database().Run(
+        "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
+        "VALUES (?1, ?2, ?3, ?4, ?5, ?6)",
+        policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
+        state.CurrentLoad());
+    return true;
+  }
   return state.Database().Run(
              "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6 FROM state WHERE domain_version = ?7",

@@ -183,6 +183,9 @@ constexpr StoreLayout kLayout = {
 
 HostState& HostState::Current() {
   thread_local std::shared_ptr<HostState> current;
+  // A load keeps to the state that it began with.
+  if (current != nullptr && current->currentLoad != 0 && !current->store.WasForked())
+    return *current;
   const std::string path = StatePath();
   if (current == nullptr || current->store.Path() != path || !current->store.IsCurrent()) {
     current.reset();

@@ -72,6 +72,15 @@ std::optional<HostError> ParameterRuleTable::Refusal(const ParameterRule& rule) 
 }
 
 bool ParameterRuleTable::InstallIfUnchanged(const ParameterRule& rule) {
+  if (state.CurrentLoad() != 0) {
+    state.Database().Run(
+        "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
+        "last_value, first_word, last_word, granted, line, load) "
+        "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)",
+        rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
+        rule.lastWord, rule.granted, rule.line, state.CurrentLoad());
+    return true;
+  }
   return state.Database().Run(
              "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
              "last_value, first_word, last_word, granted, line, load) "

@@ -1,6 +1,7 @@
 #include "store.h"
 
 #include <fcntl.h>
+#include <pthread.h>
 #include <sqlite3.h>
 #include <sys/file.h>
 #include <sys/stat.h>
@@ -66,6 +67,15 @@ void Abandon(sqlite3* database) {
   abandoned->push_back(database);
 }
 
+// How often this process, or the one that it is a copy of, was forked into what it is. To ask the
+// system for the process would cost a call for each statement.
+unsigned int ForksUntilNow() {
+  static std::atomic<unsigned int> forks = 0;
+  [[maybe_unused]] static const int registered =
+      pthread_atfork(nullptr, nullptr, [] { forks.fetch_add(1, std::memory_order_relaxed); });
+  return forks.load(std::memory_order_relaxed);
+}
+
 // Held while a database is set up, so that one process does it and the others wait.
 class DirectoryLock {
  public:
@@ -122,7 +132,7 @@ std::string Rows::Text(int column) const {
 }
 
 Store::Store(const std::string& path, const StoreLayout& wanted)
-    : layout(wanted), file(path), owner(getpid()) {
+    : layout(wanted), file(path), forks(ForksUntilNow()) {
   PreparePrivateFile(file, layout.purpose);
   const auto slash = file.rfind('/');
   directory = slash == 0 ? "/" : file.substr(0, slash);
@@ -138,9 +148,11 @@ Store::Store(const std::string& path, const StoreLayout& wanted)
 
 Store::~Store() { Close(); }
 
+bool Store::WasForked() const { return forks != ForksUntilNow(); }
+
 void Store::Close() {
   if (database == nullptr) return;
-  if (getpid() != owner) {
+  if (WasForked()) {
     Abandon(database);
     return;
   }
@@ -153,7 +165,7 @@ void Store::Close() {
 
 bool Store::IsCurrent() const {
   struct stat status {};
-  return getpid() == owner && stat(file.c_str(), &status) == 0 && status.st_dev == device &&
+  return !WasForked() && stat(file.c_str(), &status) == 0 && status.st_dev == device &&
          status.st_ino == inode;
 }
 
@@ -174,6 +186,8 @@ void Store::Open() {
                                   "place"));
   }
   RunScript(layout.survivesPowerLoss ? "PRAGMA synchronous = FULL" : "PRAGMA synchronous = OFF");
+  // A load of a hundred thousand rules, in KiB: what does not fit is written twice.
+  RunScript("PRAGMA cache_size = -32768");
 }
 
 bool Store::IsReady() {
@@ -200,7 +214,8 @@ void Store::RequireStructure() {
   constexpr std::string_view kCreate = "CREATE ";
   const std::string_view schema = layout.schema;
   std::int64_t wanted = 0;
-  for (auto at = schema.find(kCreate); at != schema.npos; at = schema.find(kCreate, at + 1)) {
+  for (auto at = schema.find(kCreate); at != std::string_view::npos;
+       at = schema.find(kCreate, at + 1)) {
     ++wanted;
   }
   Rows rows = Select("SELECT count(*) FROM sqlite_schema WHERE instr(?1, sql) > 0", schema);
@@ -276,7 +291,7 @@ bool Store::IsAt(const CommitMark& mark) const {
 }
 
 sqlite3_stmt* Store::Prepared(Sql sql) {
-  if (getpid() != owner) {
+  if (WasForked()) {
     throw HostError(EBADF, StrCat("The ", layout.purpose,
                                   " was opened before this process was forked: open it again"));
   }

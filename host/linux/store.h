@@ -93,6 +93,9 @@ class Store {
   // True while a transaction of this connection is open.
   bool IsInTransaction() const { return openTransactions != 0; }
 
+  // True in a child of the process that opened it.
+  bool WasForked() const;
+
   // True when the process was not forked since, and the path still names the open file.
   bool IsCurrent() const;
 
@@ -160,7 +163,7 @@ class Store {
   const StoreLayout& layout;
   std::string file;
   std::string directory;
-  pid_t owner;
+  unsigned int forks;  // when it was opened
   dev_t device = 0;
   ino_t inode = 0;
   sqlite3* database = nullptr;

@@ -158,7 +158,7 @@ std::string ReasonOf(int result, int sourceError, int targetError) {
 // version tells so itself when it is used.
 std::string Unseal(const std::string& copy) {
   if (StoredVersion(copy) != kStateVersion) return FindDamage(copy);
-  const std::string damage = FindBrokenSeal(copy);
+  std::string damage = FindBrokenSeal(copy);
   if (damage.empty()) RemoveSeal(copy);
   return damage;
 }

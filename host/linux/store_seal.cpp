@@ -165,7 +165,7 @@ void Seal(const std::string& path) {
 std::string FindBrokenSeal(const std::string& path) {
   try {
     PrivateDatabase database(path);
-    const std::string damage = FindDamageIn(database);
+    std::string damage = FindDamageIn(database);
     if (!damage.empty()) return damage;
     return database.FirstText("SELECT digest FROM seal") == DigestOf(database) ? "" : kDamaged;
   } catch (const HostError& failure) {
