@@ -47,6 +47,15 @@ on_a_terminal() {
 /usr/sbin/sshd: sshProgram" ]]
 }
 
+@test "get -R prints many files in order of name, whatever order their directory has" {
+  boot
+  touch "$root/etc/ssh/"{z..a}
+  secpolicy label get -R /etc/ssh
+  exits 0
+  [[ $(wc -l <<<"$output") -eq 28 ]]
+  cut -d: -f1 <<<"$output" | LC_ALL=C sort --check
+}
+
 @test "get of what has no label, and of what is not there, fails and shows the rest" {
   boot
   unlabel / /etc

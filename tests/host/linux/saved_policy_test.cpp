@@ -459,6 +459,18 @@ TEST_F(SavedPolicy, IsNotSavedFromWhatIsNoState) {
   EXPECT_TRUE(std::filesystem::is_empty(directory.Path() + "/saved"));
 }
 
+// The engine is told how to open a file behind its name, so these letters mean something to it.
+TEST_F(SavedPolicy, IsCopiedWhateverLettersItsPathHas) {
+  Create("oneDom");
+  for (const char* const name : {"a%b.db", "a%23b.db", "a?b.db", "a?mode=ro", "a#b.db"}) {
+    const std::string copy = Copy(name);
+    const std::string again = directory.Path() + "/again.db";
+    std::filesystem::remove(again);
+    CopyDatabase(copy, CopyOf::kOwnCopy, again);
+    EXPECT_EQ(std::filesystem::file_size(again), std::filesystem::file_size(copy)) << name;
+  }
+}
+
 // The engine itself takes such files for empty databases.
 TEST_F(SavedPolicy, IsNoSavedStateWhenItIsEmpty) {
   const std::string path = directory.Path() + "/saved/one.db";
