@@ -7,8 +7,10 @@
 #include <cerrno>
 
 #include "child_process.h"
+#include "host/linux/file_policy_table.h"
 #include "host/linux/host_error.h"
 #include "host/linux/host_state.h"
+#include "host/linux/parameter_rule_table.h"
 #include "host/linux/rule_table.h"
 #include "host/linux/world_table.h"
 #include "message_of.h"
@@ -133,6 +135,25 @@ TEST_F(Domains, AreDestroyedWithTheirRules) {
   EXPECT_EQ(state.Domains().Find("a"), nullptr);
   EXPECT_EQ(Create("b"), id);
   EXPECT_FALSE(HasRules(id, RuleKind::Syscall));
+}
+
+// The next domain gets the slot, and must not get what the one before it was allowed.
+TEST_F(Domains, LeaveNothingToTheNextOneInTheirSlot) {
+  const unsigned int id = Create("a");
+  const LinuxHost::FilePolicy policy{.domain = {id, ""}, .path = "/etc", .permission = 1};
+  state.FilePolicies().Install({&policy, 1});
+  state.ParameterRules().Install({.domain = {id, ""},
+                                  .check = "bind_port",
+                                  .range = {80, 80},
+                                  .firstWord = "80",
+                                  .lastWord = "",
+                                  .granted = true});
+  state.Domains().AddGuestService(id, "time");
+  state.Domains().Destroy(id);
+  ASSERT_EQ(Create("b"), id);
+  EXPECT_EQ(state.FilePolicies().Count(id), 0U);
+  EXPECT_FALSE(state.ParameterRules().Read(id).Next());
+  EXPECT_THAT(state.Domains().GuestServices(id), ElementsAre());
 }
 
 TEST_F(Domains, TakeTheTransitionsIntoThemAlong) {
