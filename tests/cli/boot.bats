@@ -246,6 +246,20 @@ files to unpack again as they are: "[0-9]*"
 files to get their first label: "[0-9]* ]]
 }
 
+@test "boot --plan names the directories that an archive needs and does not hold" {
+  mkdir -p "$root/srv" "$BATS_TEST_TMPDIR/late/srv/new/deep"
+  touch "$BATS_TEST_TMPDIR/late/srv/new/deep/file"
+  rm "$root/tardisks/"*
+  tar --directory "$BATS_TEST_TMPDIR/late" --create --file "$root/tardisks/late.tar" srv/new/deep/file
+  secpolicy boot --plan
+  exits 0
+  [[ $output == "files to add (3):
+  /srv/new (late.tar)
+  /srv/new/deep (late.tar)
+  /srv/new/deep/file (late.tar)
+"* ]]
+}
+
 @test "boot --plan counts the files that get a label" {
   secpolicy boot --plan --format json
   exits 0
