@@ -31,7 +31,7 @@ inline ArchiveReader NewReader() {
 // archive by error numbers of the system that would only confuse.
 inline std::string ReasonOf(archive* handle) {
   const char* const text = archive_error_string(handle);
-  const std::string reason = text == nullptr ? "" : text;
+  std::string reason = text == nullptr ? "" : text;
   const int error = archive_errno(handle);
   if (error <= 0 || error == EILSEQ || error == EINVAL) return reason;
   return Braxo::Misc::StrCat(reason, ": ", std::strerror(error));
