@@ -98,9 +98,9 @@ LoadRun* running = nullptr;
 
 class LoadRun {
  public:
-  explicit LoadRun(const LoadRequest& wanted) : request(wanted) {
+  explicit LoadRun(const LoadRequest& wanted)
+      : request(wanted), otherwise(std::set_terminate(OnTerminate)) {
     running = this;
-    otherwise = std::set_terminate(OnTerminate);
   }
   LoadRun(const LoadRun&) = delete;
   LoadRun& operator=(const LoadRun&) = delete;
@@ -300,9 +300,9 @@ class LoadRun {
   }
 
   const LoadRequest& request;
+  const std::terminate_handler otherwise;
   ErrorWatch errors{std::cerr};
   std::optional<LinuxHost::PolicyTransaction> transaction;
-  std::terminate_handler otherwise = nullptr;
   std::size_t earlyErrors = 0;
   std::string failure;
   LoadEnding ending;
