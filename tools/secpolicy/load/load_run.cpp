@@ -114,8 +114,7 @@ class LoadRun {
       Install();
     } catch (const std::exception& raised) {
       transaction.reset();
-      failure = raised.what();
-      if (failure.empty()) failure = "failed";
+      Fail(raised);
     }
     std::cout.flush();
     return WentWell() ? ReportDone() : ReportFailure();
@@ -133,6 +132,11 @@ class LoadRun {
     }
     running->otherwise();
     std::abort();
+  }
+
+  void Fail(const std::exception& reason) {
+    failure = reason.what();
+    if (failure.empty()) failure = "failed";
   }
 
   bool WentWell() const { return failure.empty() && errors.Count() == 0; }
@@ -166,7 +170,7 @@ class LoadRun {
     if (!back) return;
     Summarize("load", "a load before this one was killed, so " +
                           CountOf(back->count, "file label") + " were put back first");
-    ReportFailures("Unable to put the label back of ", back->failures);
+    ReportPutBack(*back);
   }
 
   void Commit() {
@@ -226,8 +230,7 @@ class LoadRun {
     try {
       step.load(step.directory);
     } catch (const Braxo::Lib::BraxoException& problem) {
-      failure = problem.what();
-      if (failure.empty()) failure = "failed";
+      Fail(problem);
     }
     Add(transaction->EndLoad(WentWell() && !request.keep));
     if (isEarlyPart) earlyErrors = errors.Count();
@@ -274,8 +277,8 @@ class LoadRun {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });
       }
       summary += DescribeRemainder(ending, request.keep);
-    } else {
-      if (hasBegun) summary += "; nothing was installed";
+    } else if (hasBegun) {
+      summary += "; nothing was installed";
     }
     const std::string next = AdviseOnPrivilege();
     Summarize(request.verb, next.empty() ? summary : summary + ". " + next);

@@ -63,12 +63,8 @@ std::string ReadAll(const std::string& path) {
 
 }  // namespace
 
-void CopyInstalledState(const std::string& to) {
-  if (CopyUsedState(to) == StateCopy::kForbidden) ThrowForbidden();
-}
-
 LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
-  CopyInstalledState(StateBefore());
+  if (CopyUsedState(StateBefore()) == StateCopy::kForbidden) ThrowForbidden();
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
     LinuxHost::CopyDatabase(StateBefore(), LinuxHost::CopyOf::kOwnCopy, StateAfter());

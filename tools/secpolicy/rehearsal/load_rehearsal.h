@@ -11,10 +11,6 @@
 
 namespace SecPolicyCli {
 
-// Copies the installed state to the new file `to`, if there is one. Throws std::runtime_error with
-// advice when it cannot be read.
-void CopyInstalledState(const std::string& to);
-
 // A whole load of a policy directory on a copy of the host's state. Neither the installed state nor
 // a file is changed, and nothing is logged.
 class LoadRehearsal {
