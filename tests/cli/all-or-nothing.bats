@@ -137,6 +137,9 @@ load_broken() {
   says "Error: Unable to label /var/lib/vms/demo/settings: Input/output error"
   secpolicy display
   [[ $output == *newDom* ]]
+  secpolicy status
+  exits 1
+  [[ $output == *": failed, 1 error"* ]]
 }
 
 @test "of a load that is killed on the way the next one takes the labels back" {

@@ -158,7 +158,7 @@ class LoadRun {
       InstallAllOrNothing(*labels);
     } else {
       Commit();
-      if (labels) ReportUnlabelled(labels->Apply());
+      if (labels) GiveLabels(*labels);
     }
     timing.EndPhase("file labels");
   }
@@ -171,6 +171,14 @@ class LoadRun {
     Summarize("load", "a load before this one was killed, so " +
                           CountOf(back->count, "file label") + " were put back first");
     ReportPutBack(*back);
+  }
+
+  // A file without its label is an error of a load that was well until then.
+  void GiveLabels(const NotedLabels& labels) {
+    const std::vector<LinuxHost::LabelFailure> failures = labels.Apply();
+    if (failures.empty()) return;
+    ReportUnlabelled(failures);
+    RecordLoad(Ending(), ending);
   }
 
   void Commit() {
