@@ -32,16 +32,24 @@ setup() {
   [[ $(sqlite3 "$root/run/secpolicy/host.db" "PRAGMA integrity_check") == ok ]]
 }
 
-@test "too few descriptors are not told as damage" {
+# with_descriptors LIMIT VERB: the command, with none of those that the tests hold open.
+with_descriptors() {
+  # shellcheck disable=SC2016
+  run --separate-stderr bash -c '
+    for fd in {3..63}; do eval "exec $fd>&-"; done
+    ulimit -n "$1" && exec "$SECPOLICY" --root "$2" $3' - "$1" "$root" "$2"
+}
+
+@test "too few descriptors are told, and not as damage" {
   local limit verb told=0
-  for limit in {6..16}; do
-    for verb in "rollback good" history status load "load --plan" check "save --force other"; do
-      # shellcheck disable=SC2016
-      run --separate-stderr bash -c 'ulimit -n "$1" && exec "$SECPOLICY" --root "$2" $3' - "$limit" "$root" "$verb"
-      [[ $status -eq 0 ]] && continue
+  for verb in "rollback good" history status load "load --plan" check "save --force other"; do
+    for limit in {6..24}; do
+      with_descriptors "$limit" "$verb"
+      [[ $status -eq 0 ]] && break
       [[ -n $output$stderr && $output$stderr != *damage* ]] || exits 0
       [[ $output$stderr != *"Too many open files"* ]] || told=$((told + 1))
     done
+    exits 0
   done
-  [[ $told -gt 10 ]]
+  [[ $told -gt 0 ]]
 }
