@@ -22,7 +22,7 @@
 #include <string>
 #include <vector>
 
-#include "host_state.h"
+#include "host/linux/state/host_state.h"
 #include "secpolicyhost/mode_param.h"
 #include "support/caller_memory.h"
 #include "support/outcome.h"

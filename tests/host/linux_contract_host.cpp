@@ -1,5 +1,5 @@
 #include "contract_host.h"
-#include "host/linux/security_attribute.h"
+#include "host/linux/files/security_attribute.h"
 #include "linux/state_directory.h"
 
 namespace HostContractTest {

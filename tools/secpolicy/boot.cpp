@@ -1,4 +1,4 @@
-#include "host/linux/boot.h"
+#include "host/linux/files/boot.h"
 
 #include <iostream>
 #include <limits>
@@ -6,8 +6,8 @@
 #include "boot/boot_plan.h"
 #include "braxo/lib/exception.h"
 #include "command_line.h"
-#include "host/linux/archive_library.h"
-#include "host/linux/mend_state.h"
+#include "host/linux/files/archive_library.h"
+#include "host/linux/operation/mend_state.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "load/load_run.h"

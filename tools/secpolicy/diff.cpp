@@ -3,7 +3,7 @@
 
 #include "command_line.h"
 #include "compare/policy_diff.h"
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
 #include "summary.h"
 #include "verb.h"
 

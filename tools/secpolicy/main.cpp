@@ -5,7 +5,7 @@
 #include <string>
 
 #include "command_line.h"
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
 #include "root.h"
 #include "standard_descriptors.h"
 #include "text/terminal_guard.h"

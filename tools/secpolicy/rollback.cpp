@@ -1,7 +1,7 @@
 #include <stdexcept>
 
-#include "host/linux/saved_policy.h"
-#include "host/linux/store_copy.h"
+#include "host/linux/operation/saved_policy.h"
+#include "host/linux/state/store_copy.h"
 #include "library_call.h"
 #include "load/load_record.h"
 #include "root.h"

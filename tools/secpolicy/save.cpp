@@ -1,7 +1,7 @@
 #include <memory>
 
 #include "command_line.h"
-#include "host/linux/saved_policy.h"
+#include "host/linux/operation/saved_policy.h"
 #include "library_call.h"
 #include "root.h"
 #include "saved/saved_name.h"

@@ -1,4 +1,4 @@
-#include "host/linux/settings.h"
+#include "host/linux/services/settings.h"
 
 #include <iostream>
 #include <variant>

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "command_line.h"
-#include "host/linux/load_record.h"
+#include "host/linux/state/load_record.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "installed/rule_words.h"

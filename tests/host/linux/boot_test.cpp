@@ -1,4 +1,4 @@
-#include "host/linux/boot.h"
+#include "host/linux/files/boot.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -10,8 +10,8 @@
 #include <cerrno>
 #include <cstring>
 
-#include "host/linux/security_attribute.h"
-#include "host/linux/settings.h"
+#include "host/linux/files/security_attribute.h"
+#include "host/linux/services/settings.h"
 #include "orinconfigstore/config_store.h"
 #include "scratch_root.h"
 #include "tar_image.h"

@@ -1,12 +1,12 @@
-#include "host/linux/file_policy_table.h"
+#include "host/linux/state/file_policy_table.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <unistd.h>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
 #include "message_of.h"
 #include "state_directory.h"
 

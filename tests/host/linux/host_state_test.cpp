@@ -1,4 +1,4 @@
-#include "host/linux/host_state.h"
+#include "host/linux/state/host_state.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -10,13 +10,13 @@
 #include <vector>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/file_policy_table.h"
-#include "host/linux/inode_origin.h"
-#include "host/linux/label_table.h"
-#include "host/linux/parameter_rule_table.h"
-#include "host/linux/rule_table.h"
-#include "host/linux/world_table.h"
+#include "host/linux/common/inode_origin.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/label_table.h"
+#include "host/linux/state/parameter_rule_table.h"
+#include "host/linux/state/rule_table.h"
+#include "host/linux/state/world_table.h"
 #include "message_of.h"
 #include "state_directory.h"
 

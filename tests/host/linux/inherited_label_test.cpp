@@ -16,7 +16,7 @@
 #include <cstring>
 #include <initializer_list>
 
-#include "host/linux/security_attribute.h"
+#include "host/linux/files/security_attribute.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 

@@ -10,10 +10,10 @@
 #include <random>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/rule_table.h"
-#include "host/linux/world_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/rule_table.h"
+#include "host/linux/state/world_table.h"
 #include "secpolicyhost/mode_param.h"
 #include "state_directory.h"
 #include "teskctl/security.h"

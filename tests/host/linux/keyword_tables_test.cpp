@@ -1,10 +1,10 @@
-#include "host/linux/keyword_tables.h"
+#include "host/linux/state/keyword_tables.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/capability.h>
 
-#include "host/linux/host_state.h"
+#include "host/linux/state/host_state.h"
 #include "message_of.h"
 #include "secpolicyhost/values.h"
 #include "state_directory.h"

@@ -1,4 +1,4 @@
-#include "host/linux/label_journal.h"
+#include "host/linux/files/label_journal.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -13,9 +13,9 @@
 #include <initializer_list>
 #include <stdexcept>
 
-#include "host/linux/host_error.h"
-#include "host/linux/host_state.h"
-#include "host/linux/security_attribute.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/files/security_attribute.h"
+#include "host/linux/state/host_state.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 

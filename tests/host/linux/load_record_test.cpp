@@ -1,9 +1,9 @@
-#include "host/linux/load_record.h"
+#include "host/linux/state/load_record.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "host/linux/host_state.h"
+#include "host/linux/state/host_state.h"
 #include "state_directory.h"
 
 namespace LinuxHostTest {

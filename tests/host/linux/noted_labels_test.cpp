@@ -1,4 +1,4 @@
-#include "host/linux/noted_labels.h"
+#include "host/linux/files/noted_labels.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -14,7 +14,7 @@
 #include <cstring>
 #include <initializer_list>
 
-#include "host/linux/security_attribute.h"
+#include "host/linux/files/security_attribute.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 

@@ -3,10 +3,10 @@
 
 #include <vector>
 
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/parameter_range.h"
-#include "host/linux/parameter_rule_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/parameter_range.h"
+#include "host/linux/state/parameter_rule_table.h"
 #include "message_of.h"
 #include "state_directory.h"
 

@@ -1,10 +1,10 @@
-#include "host/linux/policy_count.h"
+#include "host/linux/state/policy_count.h"
 
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include "host/linux/file_policy_table.h"
-#include "host/linux/host_state.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/host_state.h"
 #include "state_directory.h"
 #include "teskctl/security.h"
 

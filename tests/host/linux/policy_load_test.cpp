@@ -1,6 +1,6 @@
 // A load is seen as a whole or not at all, and leaves exactly what its files, the files of the
 // other kind and services have installed.
-#include "host/linux/policy_load.h"
+#include "host/linux/state/policy_load.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -10,11 +10,11 @@
 #include <vector>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/file_policy_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
-#include "host/linux/world_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
+#include "host/linux/state/world_table.h"
 #include "message_of.h"
 #include "state_directory.h"
 #include "teskctl/security.h"

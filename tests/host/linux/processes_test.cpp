@@ -10,9 +10,9 @@
 #include <stdexcept>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
 #include "state_directory.h"
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"

@@ -1,9 +1,9 @@
-#include "host/linux/rule_origins.h"
+#include "host/linux/state/rule_origins.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "host/linux/host_state.h"
+#include "host/linux/state/host_state.h"
 #include "state_directory.h"
 
 namespace LinuxHostTest {

@@ -1,13 +1,13 @@
-#include "host/linux/rule_table.h"
+#include "host/linux/state/rule_table.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <vector>
 
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
 #include "message_of.h"
 #include "state_directory.h"
 

@@ -1,4 +1,4 @@
-#include "host/linux/saved_policy.h"
+#include "host/linux/operation/saved_policy.h"
 
 #include <gtest/gtest.h>
 #include <sqlite3.h>
@@ -10,14 +10,14 @@
 #include <optional>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/file_policy_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
-#include "host/linux/rule_origins.h"
-#include "host/linux/rule_table.h"
-#include "host/linux/store_copy.h"
-#include "host/linux/world_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
+#include "host/linux/state/rule_origins.h"
+#include "host/linux/state/rule_table.h"
+#include "host/linux/state/store_copy.h"
+#include "host/linux/state/world_table.h"
 #include "message_of.h"
 #include "state_directory.h"
 

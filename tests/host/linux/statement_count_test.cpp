@@ -7,10 +7,10 @@
 #include <list>
 #include <string>
 
-#include "file_policy_table.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
-#include "host/linux/label_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
 #include "state_directory.h"
 #include "teskctl/security.h"
 

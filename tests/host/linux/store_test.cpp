@@ -1,4 +1,4 @@
-#include "host/linux/store.h"
+#include "host/linux/state/store.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -12,7 +12,7 @@
 #include <optional>
 
 #include "child_process.h"
-#include "host/linux/host_error.h"
+#include "host/linux/common/host_error.h"
 #include "message_of.h"
 #include "state_directory.h"
 

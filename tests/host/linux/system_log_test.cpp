@@ -1,4 +1,4 @@
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
@@ -12,7 +12,7 @@
 
 #include <array>
 
-#include "host/linux/descriptor.h"
+#include "host/linux/common/descriptor.h"
 #include "scratch_root.h"
 #include "teskctl/system.h"
 

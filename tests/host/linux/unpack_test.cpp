@@ -7,8 +7,8 @@
 #include <cstdlib>
 #include <set>
 
-#include "host/linux/boot.h"
-#include "host/linux/security_attribute.h"
+#include "host/linux/files/boot.h"
+#include "host/linux/files/security_attribute.h"
 #include "scratch_root.h"
 #include "tar_image.h"
 

@@ -1,4 +1,4 @@
-#include "host/linux/user_memory.h"
+#include "host/linux/kernel/user_memory.h"
 
 #include <gtest/gtest.h>
 #include <sys/mman.h>
@@ -6,7 +6,7 @@
 #include <cerrno>
 #include <cstring>
 
-#include "host/linux/host_error.h"
+#include "host/linux/common/host_error.h"
 
 namespace LinuxHostTest {
 namespace {

@@ -1,11 +1,11 @@
-#include "host/linux/world_table.h"
+#include "host/linux/state/world_table.h"
 
 #include <gtest/gtest.h>
 #include <unistd.h>
 
 #include "child_process.h"
-#include "host/linux/domain_table.h"
-#include "host/linux/host_state.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
 #include "message_of.h"
 #include "state_directory.h"
 

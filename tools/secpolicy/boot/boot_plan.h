@@ -3,7 +3,7 @@
 #include <cstddef>
 #include <iosfwd>
 
-#include "host/linux/boot.h"
+#include "host/linux/files/boot.h"
 
 namespace SecPolicyCli {
 

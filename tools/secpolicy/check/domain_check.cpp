@@ -6,7 +6,7 @@
 #include <unordered_map>
 
 #include "check_run.h"
-#include "host/linux/host_error.h"
+#include "host/linux/common/host_error.h"
 #include "rule_form.h"
 #include "secpolicy/domain/capability_param_rules.h"
 #include "secpolicy/domain/domain_policy.h"

@@ -5,7 +5,7 @@
 #include <tuple>
 
 #include "check_run.h"
-#include "host/linux/noted_labels.h"
+#include "host/linux/files/noted_labels.h"
 #include "root.h"
 #include "rule_form.h"
 #include "secpolicy/labels/file_label_policy.h"

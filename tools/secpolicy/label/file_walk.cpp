@@ -12,7 +12,7 @@
 #include <utility>
 #include <vector>
 
-#include "host/linux/descriptor.h"
+#include "host/linux/common/descriptor.h"
 #include "secpolicy/parse/directory.h"
 
 namespace SecPolicyCli {

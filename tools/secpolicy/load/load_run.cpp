@@ -13,9 +13,9 @@
 #include <string_view>
 
 #include "error_watch.h"
-#include "host/linux/label_journal.h"
-#include "host/linux/noted_labels.h"
-#include "host/linux/used_paths.h"
+#include "host/linux/common/used_paths.h"
+#include "host/linux/files/label_journal.h"
+#include "host/linux/files/noted_labels.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
 #include "root.h"

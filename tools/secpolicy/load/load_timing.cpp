@@ -7,7 +7,7 @@
 #include <sstream>
 #include <string_view>
 
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
 
 namespace SecPolicyCli {
 namespace {

@@ -5,7 +5,7 @@
 #include <string_view>
 
 #include "domain_file.h"
-#include "host/linux/parameter_range.h"
+#include "host/linux/state/parameter_range.h"
 #include "installed/rule_words.h"
 #include "secpolicy/policy_root.h"
 

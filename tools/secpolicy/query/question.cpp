@@ -5,8 +5,8 @@
 #include <algorithm>
 #include <map>
 
-#include "host/linux/parameter_range.h"
-#include "host/linux/security_attribute.h"
+#include "host/linux/files/security_attribute.h"
+#include "host/linux/state/parameter_range.h"
 #include "installed/real_path.h"
 #include "text/suggestion.h"
 

@@ -11,8 +11,8 @@
 #include <system_error>
 
 #include "forked.h"
-#include "host/linux/store_copy.h"
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
+#include "host/linux/state/store_copy.h"
 #include "policy_dir.h"
 #include "root.h"
 #include "scratch/used_state.h"

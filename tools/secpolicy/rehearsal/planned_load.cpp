@@ -3,7 +3,7 @@
 #include <iostream>
 #include <limits>
 
-#include "host/linux/system_log.h"
+#include "host/linux/services/system_log.h"
 #include "load_plan.h"
 #include "policy_dir.h"
 #include "summary.h"

@@ -6,7 +6,7 @@
 #include <cerrno>
 
 #include "braxo/lib/exception.h"
-#include "host/linux/store_copy.h"
+#include "host/linux/state/store_copy.h"
 
 namespace SecPolicyCli {
 

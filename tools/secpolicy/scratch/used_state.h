@@ -3,7 +3,7 @@
 #include <optional>
 #include <string>
 
-#include "host/linux/used_paths.h"
+#include "host/linux/common/used_paths.h"
 
 namespace SecPolicyCli {
 

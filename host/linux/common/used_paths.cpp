@@ -1,0 +1,40 @@
+#include "host/linux/common/used_paths.h"
+
+#include <cstdlib>
+#include <utility>
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kState[] = "/run/secpolicy/host.db";
+constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
+constexpr char kSettings[] = "/var/lib/secpolicy/config.db";
+constexpr char kSettingsVariable[] = "SECPOLICY_HOST_CONFIG";
+
+// What takes the place of the host's own, if anything. Not the environment: a program with more
+// rights than its user may not trust what it reads there, not even what it wrote itself.
+std::optional<std::string> usedState;
+std::optional<std::string> usedSettings;
+
+std::string PathIn(const char* variable, const char* otherwise) {
+  const char* const path = secure_getenv(variable);
+  return path != nullptr && *path != '\0' ? path : otherwise;
+}
+
+}  // namespace
+
+std::string StatePath() { return usedState ? *usedState : PathIn(kStateVariable, kState); }
+
+std::string SettingsPath() {
+  return usedSettings ? *usedSettings : PathIn(kSettingsVariable, kSettings);
+}
+
+UsedState::UsedState(const std::string& path) : before(std::exchange(usedState, path)) {}
+
+UsedState::~UsedState() { usedState = before; }
+
+UsedSettings::UsedSettings(const std::string& path) : before(std::exchange(usedSettings, path)) {}
+
+UsedSettings::~UsedSettings() { usedSettings = before; }
+
+}  // namespace LinuxHost

@@ -1,0 +1,131 @@
+#include "host/linux/files/security_attribute.h"
+
+#include <fcntl.h>
+#include <linux/limits.h>
+#include <sys/stat.h>
+#include <sys/xattr.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/files/inherited_label.h"
+#include "host/linux/files/noted_labels.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
+#include "zorvan/kernel.h"
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kContractName[] = "zorvan.security";
+constexpr char kPrivilegedName[] = "security.zorvan";
+constexpr char kOrdinaryName[] = "user.zorvan.security";
+
+// Tries it out on a file without a name, which vanishes with its descriptor.
+bool MayWritePrivileged(const char* directory) {
+  const Descriptor file(open(directory, O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
+  const std::uint32_t value = 0;
+  return file.IsOpen() && fsetxattr(file.Number(), kPrivilegedName, &value, sizeof value, 0) == 0;
+}
+
+std::string RecordedOrChosen(HostState& state) {
+  if (!state.LabelAttribute().empty()) return state.LabelAttribute();
+  return state.ChooseLabelAttribute(UsableLabelAttribute(state.Directory()));
+}
+
+// The real name for `name`, or null with errno set as for a name that no file system knows.
+const char* RealName(const char* name) {
+  if (name == nullptr || std::strcmp(name, kContractName) != 0) {
+    errno = name == nullptr ? EFAULT : EOPNOTSUPP;
+    return nullptr;
+  }
+  try {
+    return LabelAttribute().c_str();
+  } catch (const HostError& error) {
+    errno = error.Code();
+    return nullptr;
+  }
+}
+
+}  // namespace
+
+const std::string& LabelAttribute() {
+  // Asked for each labelled file, so answered without a look at the state.
+  static const std::string name = RecordedOrChosen(HostState::Current());
+  return name;
+}
+
+// Labels are put on the root file system; any other tells at least what the process may do.
+std::string UsableLabelAttribute(const std::string& otherDirectory) {
+  const bool privileged = MayWritePrivileged("/") || MayWritePrivileged(otherDirectory.c_str());
+  return privileged ? kPrivilegedName : kOrdinaryName;
+}
+
+bool CanCarryLabel(mode_t mode, const std::string& attribute) {
+  if (S_ISLNK(mode)) return false;
+  return S_ISREG(mode) || S_ISDIR(mode) || attribute == kPrivilegedName;
+}
+
+int GiveFirstLabel(const char* path, const std::string& attribute) {
+  const std::uint32_t id = kUnlabeledId;
+  return lsetxattr(path, attribute.c_str(), &id, sizeof id, 0);
+}
+
+std::optional<std::string> ReadCarried(const char* path, const std::string& attribute) {
+  std::string value(sizeof(std::uint32_t), '\0');
+  ssize_t size = lgetxattr(path, attribute.c_str(), value.data(), value.size());
+  if (size < 0 && errno == ERANGE) {
+    value.resize(XATTR_SIZE_MAX);
+    size = lgetxattr(path, attribute.c_str(), value.data(), value.size());
+  }
+  if (size < 0) return std::nullopt;
+  value.resize(static_cast<std::size_t>(size));
+  return value;
+}
+
+std::optional<FileLabel> ReadLabel(const char* path) {
+  const char* name = LabelAttribute().c_str();
+  FileLabel label;
+  if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
+  if (errno != ENODATA) return std::nullopt;
+  label.isInherited = true;
+  if (ReadInherited(path, LastLink::kKept, name, &label.id, sizeof label.id) >= 0) return label;
+  return std::nullopt;
+}
+
+int ReplaceLabel(const char* path, std::uint32_t id) {
+  const char* name = LabelAttribute().c_str();
+  const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
+  if (result == 0 || errno != ENODATA) return result;
+  return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
+}
+
+}  // namespace LinuxHost
+
+namespace Zorvan::Kernel {
+
+int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
+  const char* realName = LinuxHost::RealName(name);
+  if (realName == nullptr) return -1;
+  if (auto* notes = LinuxHost::NotedLabels::Current()) {
+    return notes->Set(path, realName, value, size, flags);
+  }
+  const int result = setxattr(path, realName, value, size, flags);
+  if (result == 0 || errno != ENODATA) return result;
+  return LinuxHost::ReplaceInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
+}
+
+ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
+  const char* realName = LinuxHost::RealName(name);
+  if (realName == nullptr) return -1;
+  if (auto* notes = LinuxHost::NotedLabels::Current()) {
+    return notes->Get(path, realName, value, size);
+  }
+  const ssize_t result = getxattr(path, realName, value, size);
+  if (result >= 0 || errno != ENODATA) return result;
+  return LinuxHost::ReadInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
+}
+
+}  // namespace Zorvan::Kernel

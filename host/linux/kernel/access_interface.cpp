@@ -1,0 +1,386 @@
+#include <array>
+#include <cerrno>
+#include <string>
+#include <vector>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/errno_guard.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/file_policy_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/keyword_tables.h"
+#include "host/linux/state/label_table.h"
+#include "host/linux/state/parameter_rule_table.h"
+#include "host/linux/state/rule_table.h"
+#include "teskctl/security.h"
+
+using Braxo::Misc::StrCat;
+using LinuxHost::Domain;
+using LinuxHost::DomainRole;
+using LinuxHost::ErrnoGuard;
+using LinuxHost::FilePolicy;
+using LinuxHost::HostError;
+using LinuxHost::HostState;
+using LinuxHost::Rows;
+using LinuxHost::RuleKind;
+
+namespace TeskCtl::Security {
+namespace {
+
+// Which fields of a record are the words of its rule.
+template <class Record>
+struct RecordShape {
+  RuleKind kind;
+  std::array<std::string Record::*, LinuxHost::kMaxRuleWords> words;
+};
+
+constexpr RecordShape<TeskAccess_SyscallRule> kSyscall = {RuleKind::Syscall,
+                                                          {&TeskAccess_SyscallRule::syscall}};
+constexpr RecordShape<TeskAccess_CapabilityRule> kCapability = {
+    RuleKind::Capability, {&TeskAccess_CapabilityRule::capability}};
+constexpr RecordShape<TeskAccess_ObjectAccessRule> kObjectAccess = {
+    RuleKind::ObjectAccess,
+    {&TeskAccess_ObjectAccessRule::label, &TeskAccess_ObjectAccessRule::accessKind}};
+constexpr RecordShape<TeskAccess_DomTransRule> kDomTrans = {
+    RuleKind::DomainTransition,
+    {&TeskAccess_DomTransRule::label, &TeskAccess_DomTransRule::targetDomain,
+     &TeskAccess_DomTransRule::transitionKind}};
+constexpr RecordShape<TeskAccess_FileCreationRule> kFileCreation = {
+    RuleKind::FileCreation,
+    {&TeskAccess_FileCreationRule::label, &TeskAccess_FileCreationRule::secondLabel,
+     &TeskAccess_FileCreationRule::creationKind}};
+constexpr RecordShape<TeskAccess_UnixSockCreationRule> kUnixSockCreation = {
+    RuleKind::UnixSocketCreation,
+    {&TeskAccess_UnixSockCreationRule::label, &TeskAccess_UnixSockCreationRule::sockKind}};
+
+template <class Record>
+LinuxHost::Rule ToRule(const Record& record, const RecordShape<Record>& shape) {
+  LinuxHost::Rule rule{.domain = {record.domainId, record.domainName},
+                       .kind = shape.kind,
+                       .words = {},
+                       .granted = record.grant,
+                       .line = record.line};
+  for (std::size_t index = 0; index < shape.words.size(); ++index) {
+    if (shape.words[index] != nullptr) rule.words[index] = record.*shape.words[index];
+  }
+  return rule;
+}
+
+// A record behind those of `records`, with its header filled in from the row's column `lineColumn`.
+template <class Record>
+Record& AddRecord(std::list<Record>& records, const Domain& domain, const Rows& rows,
+                  int lineColumn) {
+  Record& record = records.emplace_back();
+  record.line = static_cast<unsigned int>(rows.Integer(lineColumn));
+  record.domainId = domain.id;
+  record.domainName = domain.name;
+  return record;
+}
+
+template <class Record>
+void ReadRules(HostState& state, unsigned int domainId, const RecordShape<Record>& shape,
+               std::list<Record>& records) {
+  const Domain& domain = state.Domains().Get(domainId);
+  Rows rows = state.Rules().Read(domainId, shape.kind);
+  while (rows.Next()) {
+    Record& record = AddRecord(records, domain, rows, 4);
+    for (std::size_t index = 0; index < shape.words.size(); ++index) {
+      if (shape.words[index] == nullptr) continue;
+      record.*shape.words[index] = rows.Text(static_cast<int>(index));
+    }
+    record.grant = rows.Integer(3) != 0;
+  }
+}
+
+// A label space; throws for a number that is none.
+bool IsDomainLabel(TeskAccessLabelType type) {
+  if (type == TESKACCESS_LABEL_DOMAIN) return true;
+  if (type == TESKACCESS_LABEL_OBJECT) return false;
+  throw HostError(EINVAL, StrCat("unknown label type ", static_cast<int>(type)));
+}
+
+}  // namespace
+
+class TeskAccessInterfaceImpl::Impl {
+ public:
+  // The state as it is now.
+  HostState& Fresh() {
+    state->Refresh();
+    return *state;
+  }
+
+  // The state as it was last looked at, for calls that look themselves.
+  HostState& Any() { return *state; }
+
+ private:
+  std::shared_ptr<HostState> state = HostState::Current().shared_from_this();
+};
+
+TeskAccessInterfaceImpl::TeskAccessInterfaceImpl() {
+  const ErrnoGuard guard;
+  impl = std::make_unique<Impl>();
+}
+
+TeskAccessInterfaceImpl::~TeskAccessInterfaceImpl() {
+  const ErrnoGuard guard;
+  impl.reset();
+}
+
+bool TeskAccessInterfaceImpl::FindDomain(const std::string& name, unsigned int* id) {
+  const Domain* domain = impl->Fresh().Domains().Find(name);
+  if (domain == nullptr) return false;
+  *id = domain->id;
+  return true;
+}
+
+unsigned int TeskAccessInterfaceImpl::CreateDomain(const std::string& name,
+                                                   TeskAccessKsi_DefaultDom dflt) {
+  return impl->Any().Domains().Create(name, dflt, false);
+}
+
+unsigned int TeskAccessInterfaceImpl::GetMaxDomains() { return LinuxHost::kDomainSlots; }
+
+bool TeskAccessInterfaceImpl::GetCompleteDomainInfo(unsigned int id, std::string& name,
+                                                    std::string& enforcementLevel,
+                                                    unsigned int& state, unsigned int& refCount,
+                                                    unsigned int& worldRefCount,
+                                                    TeskAccessKsi_DefaultDom& dflt) {
+  if (id >= LinuxHost::kDomainSlots) {
+    throw HostError(
+        EINVAL, StrCat("domain ", id, " is beyond the last slot ", LinuxHost::kDomainSlots - 1));
+  }
+  // Most slots are empty, which takes no query to see.
+  if (impl->Fresh().Domains().Find(id) == nullptr) return false;
+  const auto description = impl->Any().Domains().Describe(id);
+  if (!description) return false;
+  name = description->domain.name;
+  enforcementLevel = description->domain.level;
+  state = description->StateWord();
+  refCount = description->references.Sum();
+  worldRefCount = description->references.worlds;
+  dflt = description->domain.defaultRules;
+  return true;
+}
+
+// A level is all that a domain can be switched to here.
+bool TeskAccessInterfaceImpl::EnableDomain(const std::string& name, const std::string& level,
+                                           bool /*flag*/) {
+  impl->Any().Domains().SetLevel(name, level);
+  return true;
+}
+
+bool TeskAccessInterfaceImpl::SetGlobalVMDomain(unsigned int id) {
+  impl->Any().Domains().SetRole(DomainRole::GlobalVm, id);
+  return true;
+}
+
+bool TeskAccessInterfaceImpl::SetIoFilterDomain(unsigned int id) {
+  impl->Any().Domains().SetRole(DomainRole::IoFilter, id);
+  return true;
+}
+
+bool TeskAccessInterfaceImpl::SetDaemonFrameworkDomain(unsigned int id) {
+  impl->Any().Domains().SetRole(DomainRole::DaemonFramework, id);
+  return true;
+}
+
+bool TeskAccessInterfaceImpl::IsPrivilegedVm(const std::string& name) {
+  auto& domains = impl->Fresh().Domains();
+  const Domain* domain = domains.Find(name);
+  return domain != nullptr && domains.HasRole(DomainRole::GlobalVm, domain->id);
+}
+
+void TeskAccessInterfaceImpl::AddGcomService(unsigned int id, const std::string& service) {
+  impl->Any().Domains().AddGuestService(id, service);
+}
+
+bool TeskAccessInterfaceImpl::ValidateKeyword(TeskAccess_KeywordType type,
+                                              const std::string& word) {
+  if (const auto refusal = LinuxHost::KeywordRefusal(impl->Fresh(), type, word)) throw *refusal;
+  return true;
+}
+
+std::map<std::string, long> TeskAccessInterfaceImpl::GetKeywordsMap(TeskAccess_KeywordType type) {
+  return LinuxHost::Keywords(impl->Fresh(), type);
+}
+
+unsigned int TeskAccessInterfaceImpl::LookupLabel(const std::string& name,
+                                                  TeskAccessLabelType type) {
+  if (!IsDomainLabel(type)) return impl->Fresh().Labels().Lookup(name);
+  const Domain* domain = impl->Fresh().Domains().Find(name);
+  return domain == nullptr ? LinuxHost::kNoLabel : domain->id;
+}
+
+std::string TeskAccessInterfaceImpl::GetLabel(unsigned int id, TeskAccessLabelType type) {
+  return IsDomainLabel(type) ? impl->Fresh().Domains().Get(id).name
+                             : impl->Fresh().Labels().Name(id);
+}
+
+bool TeskAccessInterfaceImpl::IsPredefinedLabel(const std::string& name, TeskAccessLabelType type) {
+  if (!IsDomainLabel(type)) return LinuxHost::LabelTable::IsPredefined(name);
+  const Domain* domain = impl->Fresh().Domains().Find(name);
+  return domain != nullptr && domain->id == LinuxHost::kStartDomain;
+}
+
+// An identifier is never used again, so that the value of a label never becomes invalid.
+std::vector<std::string> TeskAccessInterfaceImpl::GetInvalidLabels(TeskAccessLabelType type) {
+  IsDomainLabel(type);
+  return {};
+}
+
+bool TeskAccessInterfaceImpl::AddLabels(std::vector<std::string> names, TeskAccessLabelType type) {
+  if (IsDomainLabel(type)) {
+    impl->Any().Domains().AddMissing(names);
+  } else {
+    impl->Any().Labels().Add(names);
+  }
+  return true;
+}
+
+bool TeskAccessInterfaceImpl::RemoveLabels(std::vector<std::string> names,
+                                           TeskAccessLabelType type) {
+  if (IsDomainLabel(type)) {
+    impl->Any().Domains().RemoveNamed(names);
+  } else {
+    impl->Any().Labels().Remove(names);
+  }
+  return true;
+}
+
+void TeskAccessInterfaceImpl::SetSyscallRule(TeskAccess_SyscallRule rule) {
+  impl->Any().Rules().Install(ToRule(rule, kSyscall));
+}
+
+void TeskAccessInterfaceImpl::SetCapabilityRule(TeskAccess_CapabilityRule rule) {
+  impl->Any().Rules().Install(ToRule(rule, kCapability));
+}
+
+void TeskAccessInterfaceImpl::SetCapabilityParamRule(TeskAccess_CapabilityParamRule rule) {
+  impl->Any().ParameterRules().Install(
+      {.domain = {rule.domainId, rule.domainName},
+       .check = rule.paramCheck,
+       .range = LinuxHost::ParseParameterRange(rule.firstParam, rule.secondParam),
+       .firstWord = rule.firstParam,
+       .lastWord = rule.secondParam,
+       .granted = rule.grant,
+       .line = rule.line});
+}
+
+void TeskAccessInterfaceImpl::SetObjectAccessRule(TeskAccess_ObjectAccessRule rule) {
+  impl->Any().Rules().Install(ToRule(rule, kObjectAccess));
+}
+
+void TeskAccessInterfaceImpl::SetDomTransRule(TeskAccess_DomTransRule rule) {
+  auto transition = ToRule(rule, kDomTrans);
+  transition.targetId = rule.targetDomainId;
+  impl->Any().Rules().Install(transition);
+}
+
+void TeskAccessInterfaceImpl::SetFileCreationRule(TeskAccess_FileCreationRule rule) {
+  impl->Any().Rules().Install(ToRule(rule, kFileCreation));
+}
+
+void TeskAccessInterfaceImpl::SetUnixSockCreationRule(TeskAccess_UnixSockCreationRule rule) {
+  impl->Any().Rules().Install(ToRule(rule, kUnixSockCreation));
+}
+
+void TeskAccessInterfaceImpl::SetFilePathAccessRules(
+    std::list<TeskAccess_FilePathAccessRule>& rules) {
+  std::vector<FilePolicy> policies;
+  for (const auto& rule : rules) {
+    policies.push_back({.domain = {rule.domainId, rule.domainName},
+                        .path = rule.path,
+                        .permission = LinuxHost::ParsePermissions(rule.permissions),
+                        .line = rule.line});
+  }
+  impl->Any().FilePolicies().Install(policies);
+}
+
+void TeskAccessInterfaceImpl::GetFilePathAccessRules(
+    unsigned int domainId, std::list<TeskAccess_FilePathAccessRule>& rules) {
+  HostState& state = impl->Fresh();
+  const Domain& domain = state.Domains().Get(domainId);
+  Rows rows = state.FilePolicies().Read(domainId);
+  while (rows.Next()) {
+    auto& rule = AddRecord(rules, domain, rows, 2);
+    rule.path = rows.Text(0);
+    rule.permissions = LinuxHost::FormatPermissions(static_cast<unsigned int>(rows.Integer(1)));
+  }
+}
+
+void TeskAccessInterfaceImpl::GetSyscallRules(unsigned int domainId,
+                                              std::list<TeskAccess_SyscallRule>& rules) {
+  ReadRules(impl->Fresh(), domainId, kSyscall, rules);
+}
+
+void TeskAccessInterfaceImpl::GetCapabilityRules(unsigned int domainId,
+                                                 std::list<TeskAccess_CapabilityRule>& rules) {
+  ReadRules(impl->Fresh(), domainId, kCapability, rules);
+}
+
+void TeskAccessInterfaceImpl::GetCapabilityParamRules(
+    unsigned int domainId, std::list<TeskAccess_CapabilityParamRule>& rules) {
+  HostState& state = impl->Fresh();
+  const Domain& domain = state.Domains().Get(domainId);
+  Rows rows = state.ParameterRules().Read(domainId);
+  while (rows.Next()) {
+    auto& rule = AddRecord(rules, domain, rows, 4);
+    rule.paramCheck = rows.Text(0);
+    rule.firstParam = rows.Text(1);
+    rule.secondParam = rows.Text(2);
+    rule.grant = rows.Integer(3) != 0;
+  }
+}
+
+void TeskAccessInterfaceImpl::GetObjectAccessRules(unsigned int domainId,
+                                                   std::list<TeskAccess_ObjectAccessRule>& rules) {
+  ReadRules(impl->Fresh(), domainId, kObjectAccess, rules);
+}
+
+void TeskAccessInterfaceImpl::GetDomTransRules(unsigned int domainId,
+                                               std::list<TeskAccess_DomTransRule>& rules) {
+  std::list<TeskAccess_DomTransRule> read;
+  ReadRules(impl->Fresh(), domainId, kDomTrans, read);
+  // A domain takes the transitions into it along: one that is gone by now was just destroyed.
+  auto& domains = impl->Fresh().Domains();
+  read.remove_if([&](auto& rule) {
+    const Domain* target = domains.Find(rule.targetDomain);
+    if (target != nullptr) rule.targetDomainId = target->id;
+    return target == nullptr;
+  });
+  rules.splice(rules.end(), read);
+}
+
+void TeskAccessInterfaceImpl::GetFileCreationRules(unsigned int domainId,
+                                                   std::list<TeskAccess_FileCreationRule>& rules) {
+  ReadRules(impl->Fresh(), domainId, kFileCreation, rules);
+}
+
+void TeskAccessInterfaceImpl::GetUnixSockCreationRules(
+    unsigned int domainId, std::list<TeskAccess_UnixSockCreationRule>& rules) {
+  ReadRules(impl->Fresh(), domainId, kUnixSockCreation, rules);
+}
+
+bool TeskAccessInterfaceImpl::CheckCapabilityParamRuleConstraints(
+    const std::string& domainName, std::list<TeskAccess_CapabilityParamRule>& rules) {
+  impl->Fresh().Domains().Get(domainName);
+  LinuxHost::RequireNoConflict(rules);
+  return true;
+}
+
+std::vector<std::string> TeskAccessInterfaceImpl::GetTardiskLaunchDomains() {
+  return {"hostDom", "daemonFrameworkDom"};
+}
+
+std::string TeskAccessInterfaceImpl::GetTardiskExecEventKeyword() {
+  return LinuxHost::kTardiskExec;
+}
+
+std::string TeskAccessInterfaceImpl::GetDefaultTardiskLabel() {
+  return LinuxHost::kDefaultTardiskLabel;
+}
+
+std::string TeskAccessInterfaceImpl::GetDefaultTardiskDomain() { return "appDom"; }
+
+}  // namespace TeskCtl::Security

@@ -1,0 +1,258 @@
+#include "host/linux/operation/saved_policy.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <vector>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/common/private_file.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/store_copy.h"
+#include "host/linux/state/store_seal.h"
+#include "host/linux/state/world_table.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kPurpose[] = "saved state";
+
+[[noreturn]] void ThrowSystemError(const std::string& what) {
+  const int code = errno;
+  throw HostError(code, StrCat(what, ": ", std::strerror(code)));
+}
+
+// A file that takes its name only when it is complete.
+class FileInTheMaking {
+ public:
+  explicit FileInTheMaking(const std::string& target)
+      : wanted(target),
+        directory(std::filesystem::path(target).parent_path()),
+        path(
+            StrCat(directory, "/.", std::filesystem::path(target).filename().string(), ".XXXXXX")) {
+    const Descriptor file(mkstemp(path.data()));
+    if (!file.IsOpen()) ThrowSystemError(StrCat("Unable to make a file in ", directory));
+  }
+  FileInTheMaking(const FileInTheMaking&) = delete;
+  FileInTheMaking& operator=(const FileInTheMaking&) = delete;
+  ~FileInTheMaking() { unlink(path.c_str()); }
+
+  const std::string& Path() const { return path; }
+
+  void TakeName(bool replace) {
+    Flush(path);
+    const int result =
+        replace ? rename(path.c_str(), wanted.c_str()) : link(path.c_str(), wanted.c_str());
+    if (result != 0) ThrowSystemError(StrCat("Unable to make ", wanted));
+    Flush(directory);
+  }
+
+ private:
+  static void Flush(const std::string& path) {
+    const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    if (!file.IsOpen() || fsync(file.Number()) != 0) {
+      ThrowSystemError(StrCat("Unable to write ", path));
+    }
+  }
+
+  const std::string wanted;
+  const std::string directory;
+  std::string path;
+};
+
+// A root that has never run lacks even /var.
+void MakeDirectory(const std::filesystem::path& directory) {
+  std::error_code ignored;
+  std::filesystem::create_directories(directory.parent_path().parent_path(), ignored);
+  mkdir(directory.parent_path().c_str(), S_IRWXU);
+  if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
+    ThrowSystemError(StrCat("Unable to create the directory ", directory.string()));
+  }
+}
+
+bool LacksDescriptors(const HostError& failure) {
+  return failure.Code() == EMFILE || failure.Code() == ENFILE;
+}
+
+// The copy as the database "saved" beside the state.
+class AttachedCopy {
+ public:
+  AttachedCopy(Store& target, const std::string& copy) : store(target) {
+    try {
+      store.Run("ATTACH DATABASE ?1 AS saved", copy);
+    } catch (const HostError& failure) {
+      if (LacksDescriptors(failure)) throw;
+      throw HostError(EIO, kDamaged);
+    }
+  }
+  AttachedCopy(const AttachedCopy&) = delete;
+  AttachedCopy& operator=(const AttachedCopy&) = delete;
+  ~AttachedCopy() {
+    try {
+      store.Run("DETACH DATABASE saved");
+    } catch (const HostError&) {
+      // Stays until the connection goes.
+    }
+  }
+
+  void RequireUsable() {
+    try {
+      RequireSameLayout();
+      Rows rows = store.Select("PRAGMA saved.quick_check(1)");
+      if (rows.Next() && rows.Text(0) == "ok") return;
+    } catch (const HostError& failure) {
+      if (failure.Code() == EPROTO || LacksDescriptors(failure)) throw;
+    }
+    throw HostError(EIO, kDamaged);
+  }
+
+ private:
+  static constexpr char kDamaged[] = "it is damaged";
+
+  void RequireSameLayout() {
+    if (Number("PRAGMA saved.application_id") != Number("PRAGMA main.application_id")) {
+      throw HostError(EPROTO, "it is no saved state");
+    }
+    const std::int64_t saved = Number("PRAGMA saved.user_version");
+    const std::int64_t current = Number("PRAGMA main.user_version");
+    if (saved == current) return;
+    throw HostError(EPROTO, StrCat("it has schema ", saved, ", this program works with schema ",
+                                   current, ": it was saved by another version"));
+  }
+
+  std::int64_t Number(Sql query) {
+    Rows rows = store.Select(query);
+    return rows.Next() ? rows.Integer(0) : 0;
+  }
+
+  Store& store;
+};
+
+void RefuseHomelessWorlds(HostState& state) {
+  std::vector<std::pair<unsigned int, std::string>> gone;
+  {
+    Rows rows = state.Database().Select(
+        "SELECT id, name FROM main.domain WHERE name NOT IN (SELECT name FROM saved.domain) "
+        "ORDER BY name");
+    while (rows.Next()) {
+      gone.emplace_back(static_cast<unsigned int>(rows.Integer(0)), rows.Text(1));
+    }
+  }
+  for (const auto& [id, name] : gone) {
+    if (state.Worlds().CountIn(id) == 0) continue;
+    throw HostError(EBUSY, StrCat("worlds run in the domain '", name,
+                                  "', which it does not have. End them, and run it again"));
+  }
+}
+
+// Domains may have changed places since, so what belongs to worlds follows the names; by way of
+// negative numbers, as two domains may have swapped theirs.
+constexpr Sql kMoveWorlds[] = {
+    R"(DELETE FROM main.world WHERE domain_id NOT IN
+       (SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name))",
+    R"(UPDATE main.world SET domain_id = (SELECT s.id FROM main.domain AS d
+       JOIN saved.domain AS s ON s.name = d.name WHERE d.id = world.domain_id))",
+    R"(DELETE FROM main.file_policy WHERE world = 0 OR domain_id NOT IN
+       (SELECT d.id FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name))",
+    R"(UPDATE main.file_policy SET domain_id = -1 - (SELECT s.id FROM main.domain AS d
+       JOIN saved.domain AS s ON s.name = d.name WHERE d.id = file_policy.domain_id))",
+    R"(UPDATE main.file_policy SET domain_id = -1 - domain_id)",
+    R"(INSERT INTO main.file_policy (domain_id, world, path, permission, line, load)
+       SELECT domain_id, world, path, permission, line, load FROM saved.file_policy WHERE world = 0
+       ORDER BY id)",
+};
+
+// The tables that come back as they were. Their rows are read in the order of their numbers.
+constexpr Sql kReplaceTables[] = {
+    "DELETE FROM main.domain",
+    "INSERT INTO main.domain SELECT * FROM saved.domain",
+    "DELETE FROM main.role",
+    "INSERT INTO main.role SELECT * FROM saved.role",
+    "DELETE FROM main.guest_service",
+    "INSERT INTO main.guest_service SELECT * FROM saved.guest_service",
+    "DELETE FROM main.rule",
+    "INSERT INTO main.rule SELECT * FROM saved.rule",
+    "DELETE FROM main.parameter_rule",
+    "INSERT INTO main.parameter_rule SELECT * FROM saved.parameter_rule",
+    "DELETE FROM main.policy_load",
+    "INSERT INTO main.policy_load SELECT * FROM saved.policy_load",
+    "DELETE FROM main.policy_domain",
+    "INSERT INTO main.policy_domain SELECT * FROM saved.policy_domain",
+    "DELETE FROM main.covered_rule",
+    "INSERT INTO main.covered_rule SELECT * FROM saved.covered_rule",
+    "DELETE FROM main.covered_parameter_rule",
+    "INSERT INTO main.covered_parameter_rule SELECT * FROM saved.covered_parameter_rule",
+    "DELETE FROM main.covered_file_policy",
+    "INSERT INTO main.covered_file_policy SELECT * FROM saved.covered_file_policy",
+    "DELETE FROM main.rule_origin",
+    "INSERT INTO main.rule_origin SELECT * FROM saved.rule_origin",
+};
+
+constexpr Sql kReplaceLabelOrigins[] = {
+    "DELETE FROM main.label_origin",
+    "INSERT INTO main.label_origin SELECT * FROM saved.label_origin",
+};
+
+constexpr Sql kDropLabels =
+    "DELETE FROM main.label WHERE name NOT IN (SELECT name FROM saved.label)";
+constexpr Sql kAddLabels =
+    "INSERT INTO main.label (name) SELECT name FROM saved.label "
+    "WHERE name NOT IN (SELECT name FROM main.label) ORDER BY id";
+constexpr Sql kAddLabelsAsSaved =
+    "INSERT INTO main.label (id, name) SELECT id, name FROM saved.label "
+    "WHERE name NOT IN (SELECT name FROM main.label)";
+
+template <std::size_t count>
+void RunAll(Store& store, const Sql (&statements)[count]) {
+  for (const Sql& statement : statements) store.Run(statement);
+}
+
+}  // namespace
+
+void SaveState(const std::string& from, const std::string& to, bool replace) {
+  MakeDirectory(std::filesystem::path(to).parent_path());
+  FileInTheMaking file(to);
+  PreparePrivateFile(file.Path(), kPurpose);
+  CopyDatabase(from, CopyOf::kState, file.Path());
+  Seal(file.Path());
+  const std::string damage = FindBrokenSeal(file.Path());
+  if (!damage.empty()) throw HostError(EIO, StrCat("Unable to copy ", from, ": ", damage));
+  file.TakeName(replace);
+}
+
+void RestorePolicy(const std::string& copy, LabelNumbers numbers) {
+  HostState& state = HostState::Current();
+  Store& store = state.Database();
+  AttachedCopy attached(store, copy);
+  attached.RequireUsable();
+
+  Transaction transaction(store);
+  RefuseHomelessWorlds(state);
+  RunAll(store, kMoveWorlds);
+  RunAll(store, kReplaceTables);
+  store.Run(kDropLabels);
+  if (numbers == LabelNumbers::kAsSaved) {
+    store.Run(kAddLabelsAsSaved);
+    RunAll(store, kReplaceLabelOrigins);
+  } else {
+    store.Run(kAddLabels);
+  }
+  // Every process notices.
+  store.Run(
+      "UPDATE main.state SET domain_version = domain_version + 1, label_version = label_version + "
+      "1");
+  transaction.Commit();
+  state.Refresh();
+}
+
+}  // namespace LinuxHost

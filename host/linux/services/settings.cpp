@@ -1,0 +1,77 @@
+#include "host/linux/services/settings.h"
+
+#include <algorithm>
+#include <array>
+#include <cctype>
+#include <cerrno>
+#include <charconv>
+#include <string_view>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/services/config_database.h"
+
+namespace LinuxHost {
+namespace {
+
+using Braxo::Misc::StrCat;
+using OrinConfigStore::ConfigStoreObjectId;
+
+constexpr char kLevelKey[] = "enforcement_level";
+constexpr std::array<std::string_view, 3> kLevels{"enforcing", "permissive", "disabled"};
+
+// The object that enforcement is restored from.
+ConfigStoreObjectId DomainSettings(const std::string& domain) {
+  return {"domain_settings", "security", "orin", domain};
+}
+
+std::string LowerCase(std::string text) {
+  std::transform(text.begin(), text.end(), text.begin(),
+                 [](unsigned char letter) { return static_cast<char>(std::tolower(letter)); });
+  return text;
+}
+
+}  // namespace
+
+OptionValue ParseOptionValue(const std::string& text) {
+  long number = 0;
+  const char* end = text.data() + text.size();
+  const auto [stop, error] = std::from_chars(text.data(), end, number);
+  if (error == std::errc() && stop == end) return number;
+  return text;
+}
+
+std::optional<OptionValue> FindWantedOption(const std::string& path) {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  if (database == nullptr) return std::nullopt;
+  return database->FindOption(path);
+}
+
+void StoreWantedOption(const std::string& path, const OptionValue& value) {
+  if (!path.starts_with('/')) {
+    throw HostError(EINVAL, StrCat("The path of an advanced option begins with \"/\": ", path));
+  }
+  ConfigDatabase::Current().StoreOption(path, value);
+}
+
+std::optional<std::string> FindWantedEnforcement(const std::string& domain) {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  if (database == nullptr) return std::nullopt;
+  return database->FindValue(DomainSettings(domain), kLevelKey);
+}
+
+void StoreWantedEnforcement(const std::string& domain, const std::string& level) {
+  const std::string word = LowerCase(level);
+  if (std::find(kLevels.begin(), kLevels.end(), word) == kLevels.end()) {
+    throw HostError(EINVAL, StrCat("Unknown enforcement level ", level,
+                                   ": use enforcing, permissive or disabled"));
+  }
+  ConfigDatabase::Current().StoreValue(DomainSettings(domain), kLevelKey, word);
+}
+
+bool WasEnforcementApplied(const std::string& domain) {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  return database != nullptr && database->BootStatus(DomainSettings(domain));
+}
+
+}  // namespace LinuxHost

@@ -1,0 +1,183 @@
+#include "host/linux/state/file_policy_table.h"
+
+#include <array>
+#include <cerrno>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/state/checked_install.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/world_table.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+struct PermissionLetter {
+  char letter;
+  unsigned int bit;
+};
+constexpr std::array<PermissionLetter, 3> kLetters = {
+    {{'r', kPermitRead}, {'w', kPermitWrite}, {'x', kPermitExecute}}};
+
+void RequirePath(const std::string& path) {
+  if (path.empty()) throw HostError(EINVAL, "a file policy needs a path");
+  if (path.find('\0') != std::string::npos) {
+    throw HostError(EINVAL, StrCat("path '", path.c_str(), "' goes on after a NUL byte"));
+  }
+  if (path.size() > kMaxPolicyPath) {
+    throw HostError(ENAMETOOLONG, StrCat("path '", path, "' is too long: ", path.size(),
+                                         " bytes, at most ", kMaxPolicyPath));
+  }
+}
+
+void RequirePermission(unsigned int permission) {
+  if ((permission & ~kAllPermissions) != 0) {
+    throw HostError(EINVAL, StrCat("unknown permission bits in ", permission));
+  }
+}
+
+void RequireWorld(int world) {
+  if (world != 0) WorldTable::RequireAlive(world);
+}
+
+bool IsForTheSame(const FilePolicy& one, const FilePolicy& other) {
+  return one.path == other.path && one.world == other.world && one.domain.id == other.domain.id &&
+         one.domain.name == other.domain.name;
+}
+
+}  // namespace
+
+unsigned int ParsePermissions(const std::string& letters) {
+  unsigned int permission = 0;
+  for (const char letter : letters) {
+    unsigned int bit = 0;
+    for (const auto& row : kLetters) {
+      if (row.letter == letter) bit = row.bit;
+    }
+    if (bit == 0 || (permission & bit) != 0) {
+      throw HostError(EINVAL, StrCat("permissions '", letters,
+                                     "' must be letters of \"rwx\", each at most once"));
+    }
+    permission |= bit;
+  }
+  return permission;
+}
+
+std::string FormatPermissions(unsigned int permission) {
+  std::string letters;
+  for (const auto& row : kLetters) {
+    if ((permission & row.bit) != 0) letters += row.letter;
+  }
+  return letters;
+}
+
+FilePolicyTable::FilePolicyTable(HostState& owner) : state(owner) {}
+
+void FilePolicyTable::RequireDomain(unsigned int domainId) {
+  state.Refresh();
+  state.Domains().Get(domainId);
+}
+
+void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
+  Transaction transaction(state.Database());
+  for (std::size_t index = 0; index < policies.size(); ++index) {
+    const FilePolicy& policy = policies[index];
+    RequireWorld(policy.world);
+    RequirePath(policy.path);
+    RequirePermission(policy.permission);
+    // A path often comes twice in a row, as it is written and as it resolves: the second one would
+    // replace the first.
+    if (index + 1 < policies.size() && IsForTheSame(policy, policies[index + 1])) continue;
+    InstallChecked(
+        state, [&] { return DomainRefusal(state, policy.domain); },
+        [&] { return InstallIfUnchanged(policy); });
+  }
+  transaction.Commit();
+}
+
+bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
+  if (state.CurrentLoad() != 0) {
+    state.Database().Run(
+        "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
+        "VALUES (?1, ?2, ?3, ?4, ?5, ?6)",
+        policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
+        state.CurrentLoad());
+    return true;
+  }
+  return state.Database().Run(
+             "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6 FROM state WHERE domain_version = ?7",
+             policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
+             state.CurrentLoad(), state.Domains().Version()) != 0;
+}
+
+void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
+  Transaction transaction(state.Database());
+  RequireDomain(domainId);
+  const int removed = state.Database().Run(
+      "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
+      path);
+  if (removed == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+  state.Database().Run(
+      "DELETE FROM covered_file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId,
+      world, path);
+  transaction.Commit();
+}
+
+void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
+                             unsigned int permission) {
+  Transaction transaction(state.Database());
+  RequireDomain(domainId);
+  RequirePermission(permission);
+  const int updated = state.Database().Run(
+      "UPDATE file_policy SET permission = ?3 WHERE domain_id = ?1 AND path = ?2", domainId, path,
+      permission);
+  if (updated == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
+  transaction.Commit();
+}
+
+void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& newPath) {
+  RequirePath(newPath);
+  const int moved = state.Database().Run(
+      "UPDATE OR REPLACE file_policy SET path = ?2 WHERE path = ?1 AND world <> 0", oldPath,
+      newPath);
+  if (moved == 0) throw HostError(ENOENT, StrCat("no world has a file policy for '", oldPath, "'"));
+}
+
+unsigned int FilePolicyTable::Count(unsigned int domainId) {
+  const Transaction transaction(state.Database());
+  RequireDomain(domainId);
+  Rows rows =
+      state.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
+  rows.Next();
+  return static_cast<unsigned int>(rows.Integer(0));
+}
+
+std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
+  const Transaction transaction(state.Database());
+  RequireDomain(domainId);
+  std::vector<FilePolicy> policies;
+  Rows rows = state.Database().Select(
+      "SELECT world, path, permission, line FROM file_policy WHERE domain_id = ?1 ORDER BY id",
+      domainId);
+  while (rows.Next()) {
+    policies.push_back({.domain = {domainId, {}},
+                        .world = static_cast<int>(rows.Integer(0)),
+                        .path = rows.Text(1),
+                        .permission = static_cast<unsigned int>(rows.Integer(2)),
+                        .line = static_cast<unsigned int>(rows.Integer(3))});
+  }
+  return policies;
+}
+
+Rows FilePolicyTable::Read(unsigned int domainId) {
+  return state.Database().Select(
+      "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
+      "ORDER BY id",
+      domainId);
+}
+
+}  // namespace LinuxHost

@@ -1,0 +1,180 @@
+#include "host/linux/state/keyword_tables.h"
+
+#include <seccomp.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <span>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/label_table.h"
+
+using Braxo::Misc::StrCat;
+using TeskCtl::Security::TeskAccess_KeywordType;
+
+namespace LinuxHost {
+namespace {
+
+// The words of a table in the order of their identifiers, from 0.
+using Words = std::span<const std::string>;
+
+Words CapabilityWords() {
+  static const std::array<std::string, 19> words = {"cap_chown",           "cap_dac_override",
+                                                    "cap_dac_read_search", "cap_fowner",
+                                                    "cap_fsetid",          "cap_kill",
+                                                    "cap_setgid",          "cap_setuid",
+                                                    "cap_setpcap",         "cap_net_bind_service",
+                                                    "cap_net_admin",       "cap_net_raw",
+                                                    "cap_ipc_lock",        "cap_sys_module",
+                                                    "cap_sys_rawio",       "cap_sys_chroot",
+                                                    "cap_sys_ptrace",      "cap_sys_admin",
+                                                    "cap_sys_boot"};
+  return words;
+}
+
+Words ParameterCheckWords() {
+  static const std::array<std::string, 10> words = {
+      "socket_family", "socket_type", "bind_port",   "connect_port", "ioctl_request",
+      "prctl_option",  "clone_flags", "kill_signal", "set_uid",      "set_gid"};
+  return words;
+}
+
+Words ObjectAccessWords() {
+  static const std::array<std::string, 6> words = {"read", "write",  "execute",
+                                                   "list", "remove", "truncate"};
+  return words;
+}
+
+Words TransitionWords() {
+  static const std::array<std::string, 3> words = {"exec", kTardiskExec, "enter"};
+  return words;
+}
+
+Words FileCreationWords() {
+  static const std::array<std::string, 6> words = {"regular", "directory",   "symlink",
+                                                   "fifo",    "char_device", "block_device"};
+  return words;
+}
+
+Words SocketCreationWords() {
+  static const std::array<std::string, 3> words = {"stream", "dgram", "seqpacket"};
+  return words;
+}
+
+// What a word of the table is called in messages. Throws for a type that is no table.
+const char* NounOf(TeskAccess_KeywordType type) {
+  switch (type) {
+    case TeskCtl::Security::TESKACCESS_KEYWORD_LABEL:
+      return "label";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY:
+      return "capability";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK:
+      return "parameter check";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS:
+      return "object access kind";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS:
+      return "domain transition kind";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION:
+      return "file creation kind";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION:
+      return "unix socket creation kind";
+    case TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL:
+      return "system call";
+  }
+  throw HostError(EINVAL, StrCat("unknown keyword table ", static_cast<int>(type)));
+}
+
+// The tables that are short lists; empty for the two that are not.
+Words ShortList(TeskAccess_KeywordType type) {
+  switch (type) {
+    case TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY:
+      return CapabilityWords();
+    case TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK:
+      return ParameterCheckWords();
+    case TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS:
+      return ObjectAccessWords();
+    case TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS:
+      return TransitionWords();
+    case TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION:
+      return FileCreationWords();
+    case TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION:
+      return SocketCreationWords();
+    default:
+      return {};
+  }
+}
+
+void AddSystemCalls(int first, int last, std::map<std::string, long>& calls) {
+  for (int number = first; number <= last; ++number) {
+    char* name = seccomp_syscall_resolve_num_arch(SCMP_ARCH_NATIVE, number);
+    if (name == nullptr) continue;
+    calls.emplace(name, number);
+    std::free(name);
+  }
+}
+
+// All system calls of Linux. One that this machine's architecture does not have is known by the
+// negative number that libseccomp gives it.
+std::map<std::string, long> SystemCalls() {
+  constexpr int kLastNumber = 1023;
+  constexpr int kFirstForeign = -10'999;
+  constexpr int kLastForeign = -10'001;
+  std::map<std::string, long> calls;
+  AddSystemCalls(0, kLastNumber, calls);
+  AddSystemCalls(kFirstForeign, kLastForeign, calls);
+  return calls;
+}
+
+bool IsSystemCall(std::string_view word) {
+  return word.find('\0') == std::string_view::npos &&
+         seccomp_syscall_resolve_name(std::string(word).c_str()) != __NR_SCMP_ERROR;
+}
+
+bool IsKeyword(HostState& state, TeskAccess_KeywordType type, std::string_view word) {
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) {
+    return state.Labels().Lookup(word) != kNoLabel || state.Domains().Find(word) != nullptr;
+  }
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return IsSystemCall(word);
+  const Words words = ShortList(type);
+  return std::find(words.begin(), words.end(), word) != words.end();
+}
+
+std::string WordAt(TeskAccess_KeywordType type, std::uint64_t id) {
+  const Words words = ShortList(type);
+  if (id >= words.size()) throw HostError(EINVAL, StrCat("unknown ", NounOf(type), " ", id));
+  return words[id];
+}
+
+}  // namespace
+
+std::map<std::string, long> Keywords(HostState& state, TeskAccess_KeywordType type) {
+  NounOf(type);
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) return state.Labels().All();
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return SystemCalls();
+  std::map<std::string, long> keywords;
+  for (const auto& word : ShortList(type)) {
+    keywords.emplace(word, static_cast<long>(keywords.size()));
+  }
+  return keywords;
+}
+
+std::optional<HostError> KeywordRefusal(HostState& state, TeskAccess_KeywordType type,
+                                        std::string_view word) {
+  const char* noun = NounOf(type);
+  if (IsKeyword(state, type, word)) return std::nullopt;
+  return HostError(EINVAL, StrCat("unknown ", noun, " '", word, "'"));
+}
+
+std::string CapabilityWord(std::uint64_t id) {
+  return WordAt(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY, id);
+}
+
+std::string ParameterCheckWord(std::uint64_t id) {
+  return WordAt(TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, id);
+}
+
+}  // namespace LinuxHost

@@ -1,0 +1,113 @@
+#include "host/linux/state/label_table.h"
+
+#include <cerrno>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/rule_table.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+constexpr std::size_t kMaxLabelLength = 255;
+
+void RequireLabelName(const std::string& name) {
+  if (name.empty()) throw HostError(EINVAL, "a label needs a name");
+  if (name.find('\0') != std::string::npos) {
+    throw HostError(EINVAL, StrCat("label '", name.c_str(), "' goes on after a NUL byte"));
+  }
+  if (name.size() > kMaxLabelLength) {
+    throw HostError(ENAMETOOLONG, StrCat("label '", name, "' is too long: ", name.size(),
+                                         " bytes, at most ", kMaxLabelLength));
+  }
+}
+
+}  // namespace
+
+LabelTable::LabelTable(HostState& owner) : state(owner) {}
+
+void LabelTable::Notice(std::int64_t currentVersion) {
+  if (currentVersion == version) return;
+  version = currentVersion;
+  loaded = false;
+}
+
+void LabelTable::Forget() {
+  version = 0;
+  loaded = false;
+}
+
+void LabelTable::Load() {
+  if (loaded) return;
+  identifiers.clear();
+  names.clear();
+  Rows rows = state.Database().Select("SELECT id, name FROM label");
+  while (rows.Next()) {
+    const auto id = static_cast<unsigned int>(rows.Integer(0));
+    identifiers.emplace(rows.Text(1), id);
+    names.emplace(id, rows.Text(1));
+  }
+  loaded = true;
+}
+
+unsigned int LabelTable::Lookup(std::string_view name) {
+  Load();
+  const auto found = identifiers.find(name);
+  return found == identifiers.end() ? kNoLabel : found->second;
+}
+
+const std::string& LabelTable::Name(unsigned int id) {
+  Load();
+  const auto found = names.find(id);
+  if (found == names.end()) {
+    throw HostError(ENOENT, StrCat("no label has the identifier ", id));
+  }
+  return found->second;
+}
+
+bool LabelTable::IsPredefined(std::string_view name) {
+  return name == kUnlabeled || name == kDefaultTardiskLabel;
+}
+
+std::map<std::string, long> LabelTable::All() {
+  Load();
+  return {identifiers.begin(), identifiers.end()};
+}
+
+void LabelTable::Add(const std::vector<std::string>& added) {
+  for (const auto& name : added) RequireLabelName(name);
+  Transaction transaction(state.Database());
+  state.Refresh();
+  int changes = 0;
+  for (const auto& name : added) {
+    changes += state.Database().Run(
+        "INSERT INTO label (name) SELECT ?1 WHERE NOT EXISTS (SELECT 1 FROM label WHERE name = ?1)",
+        name);
+  }
+  Commit(transaction, changes);
+}
+
+void LabelTable::Remove(const std::vector<std::string>& removed) {
+  Transaction transaction(state.Database());
+  state.Refresh();
+  int changes = 0;
+  for (const auto& name : removed) {
+    if (IsPredefined(name)) continue;
+    changes += state.Database().Run("DELETE FROM label WHERE name = ?1", name);
+  }
+  if (changes != 0) state.Rules().RemoveUnnamed();
+  Commit(transaction, changes);
+}
+
+void LabelTable::Commit(Transaction& transaction, int changes) {
+  if (changes == 0) return;
+  state.Database().Run("UPDATE state SET label_version = label_version + 1");
+  transaction.Commit();
+  // Within a load nothing tells of it before its end.
+  Notice(version + 1);
+}
+
+}  // namespace LinuxHost

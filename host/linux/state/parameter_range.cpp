@@ -1,0 +1,42 @@
+#include "host/linux/state/parameter_range.h"
+
+#include <cerrno>
+#include <charconv>
+#include <string_view>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/host_error.h"
+
+using Braxo::Misc::StrCat;
+
+namespace LinuxHost {
+namespace {
+
+std::uint64_t ParseNumber(const std::string& word) {
+  const bool hexadecimal = word.starts_with("0x") || word.starts_with("0X");
+  const std::string_view digits = std::string_view(word).substr(hexadecimal ? 2 : 0);
+  std::uint64_t number = 0;
+  const auto [end, error] =
+      std::from_chars(digits.data(), digits.data() + digits.size(), number, hexadecimal ? 16 : 10);
+  if (error == std::errc::result_out_of_range) {
+    throw HostError(ERANGE, StrCat("parameter '", word, "' is too large"));
+  }
+  if (error != std::errc() || end != digits.data() + digits.size()) {
+    throw HostError(EINVAL, StrCat("parameter '", word, "' is not an unsigned number"));
+  }
+  return number;
+}
+
+}  // namespace
+
+ParameterRange ParseParameterRange(const std::string& firstWord, const std::string& lastWord) {
+  ParameterRange range;
+  range.first = ParseNumber(firstWord);
+  range.last = lastWord.empty() ? range.first : ParseNumber(lastWord);
+  if (range.first > range.last) {
+    throw HostError(EINVAL, StrCat("parameter range ", firstWord, " to ", lastWord, " is empty"));
+  }
+  return range;
+}
+
+}  // namespace LinuxHost

@@ -1,0 +1,122 @@
+#include "host/linux/state/parameter_rule_table.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <map>
+#include <vector>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/state/checked_install.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/keyword_tables.h"
+
+using Braxo::Misc::StrCat;
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+
+namespace LinuxHost {
+namespace {
+
+struct RangedRule {
+  ParameterRange range;
+  const TeskAccess_CapabilityParamRule* rule;
+};
+
+std::string Describe(const TeskAccess_CapabilityParamRule& rule) {
+  return StrCat(rule.grant ? "grant of " : "revoke of ", rule.firstParam,
+                rule.secondParam.empty() ? "" : " to ", rule.secondParam, " in line ", rule.line);
+}
+
+[[noreturn]] void ThrowConflict(const TeskAccess_CapabilityParamRule& first,
+                                const TeskAccess_CapabilityParamRule& second) {
+  throw HostError(EINVAL, StrCat("parameter check '", first.paramCheck, "': ", Describe(first),
+                                 " conflicts with ", Describe(second)));
+}
+
+// Walks the ranges by where they begin, and keeps of each side the one that reaches furthest: a
+// range overlaps an earlier one exactly when it overlaps that.
+void RequireNoConflict(std::vector<RangedRule>& ranges) {
+  std::stable_sort(ranges.begin(), ranges.end(), [](const auto& left, const auto& right) {
+    return left.range.first < right.range.first;
+  });
+  const RangedRule* furthest[2] = {nullptr, nullptr};
+  for (const auto& ranged : ranges) {
+    const RangedRule* opposite = furthest[ranged.rule->grant ? 0 : 1];
+    if (opposite != nullptr && opposite->range.Overlaps(ranged.range)) {
+      const bool inOrder = opposite->rule->line <= ranged.rule->line;
+      ThrowConflict(inOrder ? *opposite->rule : *ranged.rule,
+                    inOrder ? *ranged.rule : *opposite->rule);
+    }
+    const RangedRule*& own = furthest[ranged.rule->grant ? 1 : 0];
+    if (own == nullptr || own->range.last < ranged.range.last) own = &ranged;
+  }
+}
+
+}  // namespace
+
+void RequireNoConflict(const std::list<TeskAccess_CapabilityParamRule>& rules) {
+  std::map<std::string_view, std::vector<RangedRule>> checks;
+  for (const auto& rule : rules) {
+    checks[rule.paramCheck].push_back(
+        {ParseParameterRange(rule.firstParam, rule.secondParam), &rule});
+  }
+  for (auto& [check, ranges] : checks) RequireNoConflict(ranges);
+}
+
+ParameterRuleTable::ParameterRuleTable(HostState& owner) : state(owner) {}
+
+std::optional<HostError> ParameterRuleTable::Refusal(const ParameterRule& rule) {
+  if (auto refusal = DomainRefusal(state, rule.domain)) return refusal;
+  return KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.check);
+}
+
+bool ParameterRuleTable::InstallIfUnchanged(const ParameterRule& rule) {
+  if (state.CurrentLoad() != 0) {
+    state.Database().Run(
+        "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
+        "last_value, first_word, last_word, granted, line, load) "
+        "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)",
+        rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
+        rule.lastWord, rule.granted, rule.line, state.CurrentLoad());
+    return true;
+  }
+  return state.Database().Run(
+             "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
+             "last_value, first_word, last_word, granted, line, load) "
+             "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9 FROM state WHERE domain_version = ?10",
+             rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
+             rule.lastWord, rule.granted, rule.line, state.CurrentLoad(),
+             state.Domains().Version()) != 0;
+}
+
+void ParameterRuleTable::Install(const ParameterRule& rule) {
+  InstallChecked(
+      state, [&] { return Refusal(rule); }, [&] { return InstallIfUnchanged(rule); });
+}
+
+void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
+                                const ParameterRange& range) {
+  Transaction transaction(state.Database());
+  state.Refresh();
+  state.Domains().Get(domainId);
+  const int removed = state.Database().Run(
+      "DELETE FROM parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "
+      "first_value = ?3 AND last_value = ?4",
+      domainId, check, range.first, range.last);
+  if (removed == 0) throw HostError(ENOENT, StrCat("no rule for parameter check '", check, "'"));
+  state.Database().Run(
+      "DELETE FROM covered_parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "
+      "first_value = ?3 AND last_value = ?4",
+      domainId, check, range.first, range.last);
+  transaction.Commit();
+}
+
+Rows ParameterRuleTable::Read(unsigned int domainId) {
+  return state.Database().Select(
+      "SELECT parameter_check, first_word, last_word, granted, line FROM parameter_rule "
+      "WHERE domain_id = ?1 ORDER BY id",
+      domainId);
+}
+
+}  // namespace LinuxHost

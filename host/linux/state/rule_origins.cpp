@@ -1,0 +1,167 @@
+#include "host/linux/state/rule_origins.h"
+
+#include <unordered_map>
+#include <utility>
+
+#include "host/linux/state/host_state.h"
+
+namespace LinuxHost {
+namespace {
+
+// The latest of some lines that give labels.
+struct LatestLabel {
+  std::int64_t id = 0;
+  std::optional<LabelOrigin> origin;
+};
+
+void KeepLater(Store& store, const std::string& path, bool isTree, LatestLabel& latest) {
+  Rows rows = store.Select(
+      "SELECT id, label, file, line FROM label_origin WHERE path = ?1 AND is_tree = ?2", path,
+      isTree);
+  if (!rows.Next() || rows.Integer(0) < latest.id) return;
+  latest.id = rows.Integer(0);
+  latest.origin = LabelOrigin{.path = path,
+                              .isTree = isTree,
+                              .label = rows.Text(1),
+                              .file = rows.Text(2),
+                              .line = static_cast<unsigned int>(rows.Integer(3))};
+}
+
+}  // namespace
+
+namespace {
+
+// The rules of words have one table.
+struct WordKind {
+  std::string_view keyword;
+  std::string_view kind;
+};
+
+constexpr WordKind kWordKinds[] = {
+    {"-a", "object access"}, {"-c", "capability"},  {"-d", "domain transition"},
+    {"-f", "file creation"}, {"-s", "system call"}, {"-u", "unix socket creation"},
+};
+
+std::vector<RuleSource> ReadSources(Rows rows) {
+  std::vector<RuleSource> sources;
+  while (rows.Next()) {
+    RuleSource source{.kind = std::nullopt,
+                      .directory = rows.Text(1),
+                      .line = static_cast<unsigned int>(rows.Integer(2)),
+                      .isCurrent = rows.Integer(3) != 0};
+    if (rows.Integer(0) != 0) source.kind = static_cast<LoadKind>(rows.Integer(0));
+    sources.push_back(std::move(source));
+  }
+  return sources;
+}
+
+}  // namespace
+
+void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines) {
+  std::unordered_map<std::string_view, unsigned int> lineOf;
+  for (const PathLine& line : lines) lineOf[line.path] = line.line;
+  Store& store = HostState::Current().Database();
+  Transaction transaction(store);
+  std::vector<std::pair<std::int64_t, unsigned int>> found;
+  {
+    Rows rows = store.Select(
+        "SELECT f.id, f.path FROM file_policy AS f JOIN domain AS d ON d.id = f.domain_id "
+        "WHERE d.name = ?1 AND f.world = 0 AND "
+        "f.load = (SELECT max(number) FROM policy_load WHERE kind = ?2) ORDER BY f.id",
+        domain, static_cast<int>(kind));
+    unsigned int line = 0;
+    while (rows.Next()) {
+      const auto written = lineOf.find(rows.Text(1));
+      // Else it is what the path before it resolves to: they are installed together.
+      if (written != lineOf.end()) line = written->second;
+      found.emplace_back(rows.Integer(0), line);
+    }
+  }
+  for (const auto& [id, line] : found) {
+    store.Run("UPDATE file_policy SET line = ?2 WHERE id = ?1", id, line);
+  }
+  transaction.Commit();
+}
+
+std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword) {
+  Store& store = HostState::Current().Database();
+  if (keyword == "-p") {
+    return ReadSources(store.Select(
+        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM parameter_rule AS r "
+        "LEFT JOIN policy_load AS p ON p.number = r.load WHERE r.domain_id = ?1 ORDER BY r.id",
+        id));
+  }
+  if (keyword == "-r") {
+    return ReadSources(store.Select(
+        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM file_policy AS r "
+        "LEFT JOIN policy_load AS p ON p.number = r.load "
+        "WHERE r.domain_id = ?1 AND r.world = 0 ORDER BY r.id",
+        id));
+  }
+  for (const WordKind& row : kWordKinds) {
+    if (row.keyword != keyword) continue;
+    return ReadSources(
+        store.Select("SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+                     "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM rule AS r "
+                     "LEFT JOIN policy_load AS p ON p.number = r.load "
+                     "WHERE r.domain_id = ?1 AND r.kind = +?2 ORDER BY r.id",
+                     id, row.kind));
+  }
+  return {};
+}
+
+std::vector<std::string> FindDomainsWithoutFile() {
+  std::vector<std::string> names;
+  Rows rows = HostState::Current().Database().Select(
+      "SELECT p.name FROM policy_domain AS p JOIN domain AS d ON d.name = p.name "
+      "WHERE NOT d.created_at_run_time AND d.id <> 0 GROUP BY p.name HAVING max(p.load = "
+      "(SELECT max(number) FROM policy_load WHERE kind = p.kind)) = 0 ORDER BY p.name");
+  while (rows.Next()) names.push_back(rows.Text(0));
+  return names;
+}
+
+void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels) {
+  Store& store = HostState::Current().Database();
+  Transaction transaction(store);
+  for (const RuleOrigin& origin : rules) {
+    store.Run("INSERT OR REPLACE INTO rule_origin VALUES (?1, ?2, ?3, ?4)", origin.domain,
+              origin.rule, origin.file, origin.line);
+  }
+  for (const LabelOrigin& origin : labels) {
+    store.Run(
+        "INSERT OR REPLACE INTO label_origin (path, is_tree, label, file, line) "
+        "VALUES (?1, ?2, ?3, ?4, ?5)",
+        origin.path, origin.isTree, origin.label, origin.file, origin.line);
+  }
+  transaction.Commit();
+}
+
+std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain) {
+  std::vector<RuleOrigin> origins;
+  Rows rows = HostState::Current().Database().Select(
+      "SELECT rule, file, line FROM rule_origin WHERE domain = ?1", domain);
+  while (rows.Next()) {
+    origins.push_back({.domain = domain,
+                       .rule = rows.Text(0),
+                       .file = rows.Text(1),
+                       .line = static_cast<unsigned int>(rows.Integer(2))});
+  }
+  return origins;
+}
+
+std::optional<LabelOrigin> FindLabelOrigin(const std::string& path) {
+  Store& store = HostState::Current().Database();
+  LatestLabel latest;
+  KeepLater(store, path, false, latest);
+  std::string tree = path;
+  KeepLater(store, tree, true, latest);
+  while (!tree.empty()) {
+    tree.resize(tree.find_last_of('/') == std::string::npos ? 0 : tree.find_last_of('/'));
+    KeepLater(store, tree, true, latest);
+  }
+  return latest.origin;
+}
+
+}  // namespace LinuxHost

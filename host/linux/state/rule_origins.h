@@ -1,0 +1,69 @@
+#pragma once
+
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/linux/state/policy_load.h"
+
+// Where the policy was written: the kernel is told rules and labels, not the files that they come
+// from, so who loads files records it beside them. An origin says nothing about what is installed
+// now. Everything throws Braxo::Lib::BraxoException when the state cannot be used.
+namespace LinuxHost {
+
+// The load that installed a rule, and the line of the file of its domain.
+struct RuleSource {
+  std::optional<LoadKind> kind;  // none: no load, but a service
+  std::string directory;         // of the policy
+  unsigned int line = 0;         // 0: no line says so, it is the policy's default
+  bool isCurrent = true;         // false: the latest load of the kind has not found it again
+};
+
+// A rule that is not written in a file of its domain.
+struct RuleOrigin {
+  std::string domain;
+  std::string rule;  // as it is displayed: "-a sshKey read grant"
+  std::string file;
+  unsigned int line = 0;
+};
+
+struct LabelOrigin {
+  std::string path;
+  bool isTree = false;  // with everything below the path
+  std::string label;
+  std::string file;
+  unsigned int line = 0;
+};
+
+// Records origins, all or none. A later one of the same rule of a domain, and of the same path,
+// takes the place of an earlier one.
+void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels);
+
+// The recorded origins of rules of a domain, in no particular order.
+std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain);
+
+// A line about a path in the file of a domain. The kernel is told paths without their lines.
+struct PathLine {
+  std::string path;
+  unsigned int line = 0;
+};
+
+// Records the lines of the path rules that the latest load of the kind has installed for the
+// domain; `lines` are those of its file, in order. A rule for what a path resolves to is of the
+// same line.
+void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines);
+
+// The sources of all rules of the domain `id` with the keyword ("-a"), in the order in which the
+// rules are read.
+std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword);
+
+// The domains that the latest load of their kind has not found in any file, by name.
+std::vector<std::string> FindDomainsWithoutFile();
+
+// The line that labels the file at the absolute path `path`: of those for the path and for the
+// trees around it, the one that was recorded last.
+std::optional<LabelOrigin> FindLabelOrigin(const std::string& path);
+
+}  // namespace LinuxHost

@@ -1,0 +1,20 @@
+#include "host/linux/state/stable_view.h"
+
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/store.h"
+
+namespace LinuxHost {
+
+StableView::StableView()
+    : state(HostState::Current().shared_from_this()),
+      snapshot(std::make_unique<Snapshot>(state->Database())) {
+  state->Forget();
+}
+
+// What was learnt meanwhile may be older than the commit that it is taken for.
+StableView::~StableView() {
+  snapshot.reset();
+  state->Forget();
+}
+
+}  // namespace LinuxHost
