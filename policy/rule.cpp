@@ -1,0 +1,142 @@
+#include "policy/rule.h"
+
+#include <array>
+#include <utility>
+
+namespace Policy {
+namespace {
+
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+using TeskCtl::Security::TeskAccess_CapabilityRule;
+using TeskCtl::Security::TeskAccess_DomTransRule;
+using TeskCtl::Security::TeskAccess_FileCreationRule;
+using TeskCtl::Security::TeskAccess_FilePathAccessRule;
+using TeskCtl::Security::TeskAccess_ObjectAccessRule;
+using TeskCtl::Security::TeskAccess_SyscallRule;
+using TeskCtl::Security::TeskAccess_UnixSockCreationRule;
+
+// Which fields of a record are the words of its rule.
+template <class Record, std::size_t count>
+struct RecordForm {
+  RuleKind kind;
+  std::array<std::string Record::*, count> words;
+};
+
+template <class Record>
+constexpr auto kFormOf = nullptr;
+template <>
+constexpr RecordForm<TeskAccess_ObjectAccessRule, 2> kFormOf<TeskAccess_ObjectAccessRule> = {
+    RuleKind::kObjectAccess,
+    {&TeskAccess_ObjectAccessRule::label, &TeskAccess_ObjectAccessRule::accessKind}};
+template <>
+constexpr RecordForm<TeskAccess_CapabilityRule, 1> kFormOf<TeskAccess_CapabilityRule> = {
+    RuleKind::kCapability, {&TeskAccess_CapabilityRule::capability}};
+template <>
+constexpr RecordForm<TeskAccess_DomTransRule, 3> kFormOf<TeskAccess_DomTransRule> = {
+    RuleKind::kDomainTransition,
+    {&TeskAccess_DomTransRule::label, &TeskAccess_DomTransRule::targetDomain,
+     &TeskAccess_DomTransRule::transitionKind}};
+template <>
+constexpr RecordForm<TeskAccess_FileCreationRule, 3> kFormOf<TeskAccess_FileCreationRule> = {
+    RuleKind::kFileCreation,
+    {&TeskAccess_FileCreationRule::label, &TeskAccess_FileCreationRule::secondLabel,
+     &TeskAccess_FileCreationRule::creationKind}};
+template <>
+constexpr RecordForm<TeskAccess_CapabilityParamRule, 3> kFormOf<TeskAccess_CapabilityParamRule> = {
+    RuleKind::kParameterCheck,
+    {&TeskAccess_CapabilityParamRule::paramCheck, &TeskAccess_CapabilityParamRule::firstParam,
+     &TeskAccess_CapabilityParamRule::secondParam}};
+template <>
+constexpr RecordForm<TeskAccess_FilePathAccessRule, 1> kFormOf<TeskAccess_FilePathAccessRule> = {
+    RuleKind::kFilePath, {&TeskAccess_FilePathAccessRule::path}};
+template <>
+constexpr RecordForm<TeskAccess_SyscallRule, 1> kFormOf<TeskAccess_SyscallRule> = {
+    RuleKind::kSyscall, {&TeskAccess_SyscallRule::syscall}};
+template <>
+constexpr RecordForm<TeskAccess_UnixSockCreationRule, 2> kFormOf<TeskAccess_UnixSockCreationRule> =
+    {RuleKind::kUnixSocketCreation,
+     {&TeskAccess_UnixSockCreationRule::label, &TeskAccess_UnixSockCreationRule::sockKind}};
+
+template <class Record>
+concept EndsInGrant = requires(Record record) {
+  record.grant;
+};
+
+}  // namespace
+
+bool Rule::Grants() const {
+  const bool* const grant = std::get_if<bool>(&verdict);
+  return grant != nullptr ? *grant : !Permits().IsEmpty();
+}
+
+ParameterRange Rule::Range() const {
+  return ParseParameterRange(words.at(1), words.size() > 2 ? words[2] : "");
+}
+
+std::string Rule::Text() const {
+  std::string text = FormOf(kind).keyword;
+  for (const std::string& word : words) {
+    text += ' ';
+    text += word;
+  }
+  text += ' ';
+  text += FormOf(kind).endsInGrant ? (Grants() ? "grant" : "revoke") : Permits().Text();
+  return text;
+}
+
+template <class Record>
+Rule ToRule(Record record) {
+  constexpr auto& form = kFormOf<Record>;
+  Rule rule;
+  rule.kind = form.kind;
+  rule.line = record.line;
+  rule.words.reserve(form.words.size());
+  for (const auto word : form.words) rule.words.push_back(std::move(record.*word));
+  while (rule.words.size() > FormOf(form.kind).MinWords() && rule.words.back().empty()) {
+    rule.words.pop_back();
+  }
+  if constexpr (EndsInGrant<Record>) {
+    rule.verdict = record.grant;
+  } else {
+    rule.verdict = Permissions::Parse(record.permissions);
+  }
+  return rule;
+}
+
+template <class Record>
+Record ToRecord(Rule rule, unsigned int domainId, const std::string& domainName) {
+  constexpr auto& form = kFormOf<Record>;
+  Record record;
+  record.line = rule.line;
+  record.domainId = domainId;
+  record.domainName = domainName;
+  for (std::size_t index = 0; index < rule.words.size(); ++index) {
+    record.*form.words.at(index) = std::move(rule.words[index]);
+  }
+  if constexpr (EndsInGrant<Record>) {
+    record.grant = rule.Grants();
+  } else {
+    record.permissions = rule.Permits().Text();
+  }
+  return record;
+}
+
+template Rule ToRule(TeskAccess_ObjectAccessRule);
+template Rule ToRule(TeskAccess_CapabilityRule);
+template Rule ToRule(TeskAccess_DomTransRule);
+template Rule ToRule(TeskAccess_FileCreationRule);
+template Rule ToRule(TeskAccess_CapabilityParamRule);
+template Rule ToRule(TeskAccess_FilePathAccessRule);
+template Rule ToRule(TeskAccess_SyscallRule);
+template Rule ToRule(TeskAccess_UnixSockCreationRule);
+
+template TeskAccess_ObjectAccessRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_CapabilityRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_DomTransRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_FileCreationRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_CapabilityParamRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_FilePathAccessRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_SyscallRule ToRecord(Rule, unsigned int, const std::string&);
+template TeskAccess_UnixSockCreationRule ToRecord(Rule, unsigned int, const std::string&);
+
+}  // namespace Policy
