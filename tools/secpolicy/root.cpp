@@ -5,23 +5,20 @@
 
 #include <cerrno>
 #include <fstream>
-#include <system_error>
+
+#include "host/linux/common/host_error.h"
 
 namespace SecPolicyCli {
 namespace {
 
-bool rootEntered = false;
+using LinuxHost::ThrowErrno;
 
-// Copies errno first: putting the text together may change it.
-[[noreturn]] void RaiseSystemError(const char* what, const std::string& object) {
-  const int error = errno;
-  throw std::system_error(error, std::generic_category(), what + object);
-}
+bool rootEntered = false;
 
 void WriteProcFile(const char* path, const std::string& text) {
   std::ofstream file(path);
   file << text << std::flush;
-  if (!file) RaiseSystemError("cannot write ", path);
+  if (!file) ThrowErrno("cannot write ", path);
 }
 
 // Inside a namespace of its own every user may change the root. The user and the group keep their
@@ -30,8 +27,7 @@ void EnterUserNamespace() {
   const std::string user = std::to_string(geteuid());
   const std::string group = std::to_string(getegid());
   if (unshare(CLONE_NEWUSER) != 0) {
-    RaiseSystemError("cannot enter a root without being root where user namespaces are forbidden",
-                     "");
+    ThrowErrno("cannot enter a root without being root where user namespaces are forbidden");
   }
   WriteProcFile("/proc/self/setgroups", "deny");
   WriteProcFile("/proc/self/uid_map", user + " " + user + " 1");
@@ -43,11 +39,11 @@ bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
 }  // namespace
 
 void EnterRoot(const std::string& directory) {
-  if (chdir(directory.c_str()) != 0) RaiseSystemError("cannot enter the root ", directory);
+  if (chdir(directory.c_str()) != 0) ThrowErrno("cannot enter the root ", directory);
   if (!MakeRoot()) {
-    if (errno != EPERM) RaiseSystemError("cannot enter the root ", directory);
+    if (errno != EPERM) ThrowErrno("cannot enter the root ", directory);
     EnterUserNamespace();
-    if (!MakeRoot()) RaiseSystemError("cannot enter the root ", directory);
+    if (!MakeRoot()) ThrowErrno("cannot enter the root ", directory);
   }
   rootEntered = true;
 }

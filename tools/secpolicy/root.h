@@ -6,7 +6,7 @@ namespace SecPolicyCli {
 
 // Makes `directory` the root directory of this process, for good: every path that the library and
 // the host use is looked up below it. An ordinary user enters it inside a user namespace of its
-// own. Throws std::system_error when that cannot be done.
+// own. Throws Braxo::Lib::BraxoException when that cannot be done.
 void EnterRoot(const std::string& directory);
 
 // What to try after a failure that the rights of the user can explain; nothing for root and for

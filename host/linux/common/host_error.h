@@ -1,8 +1,11 @@
 #pragma once
 
+#include <cerrno>
+#include <cstring>
 #include <string>
 
 #include "braxo/lib/exception.h"
+#include "braxo/misc/strcat.h"
 
 namespace LinuxHost {
 
@@ -26,5 +29,15 @@ class UnusableContent : public HostError {
  public:
   using HostError::HostError;
 };
+
+// Throws a HostError for the call that has just failed: the parts of `what`, joined, and the
+// system's text for errno; without parts that text alone. A part is something that has a name, for
+// to make one in the call might change errno before it is read.
+template <class... Parts>
+[[noreturn]] void ThrowErrno(Parts&... what) {
+  const int code = errno;
+  if constexpr (sizeof...(what) == 0) throw HostError(code, std::strerror(code));
+  throw HostError(code, Braxo::Misc::StrCat(what..., ": ", std::strerror(code)));
+}
 
 }  // namespace LinuxHost

@@ -16,11 +16,6 @@ using Braxo::Misc::StrCat;
 namespace LinuxHost {
 namespace {
 
-[[noreturn]] void ThrowSystemError(const std::string& what) {
-  const int code = errno;
-  throw HostError(code, StrCat(what, ": ", std::strerror(code)));
-}
-
 [[noreturn]] void ThrowParentMissing(const std::string& directory, const std::string& purpose) {
   throw HostError(
       ENOENT, StrCat("Unable to create the directory ", directory, " for the ", purpose, ": ",
@@ -58,7 +53,7 @@ void RequirePrivate(const struct stat& status, const std::string& path, const Us
 struct stat Examine(const Descriptor& file, const std::string& path) {
   struct stat status {};
   if (!file.IsOpen() || fstat(file.Number(), &status) != 0) {
-    ThrowSystemError(StrCat("Unable to examine ", path));
+    ThrowErrno("Unable to examine ", path);
   }
   return status;
 }
@@ -86,8 +81,7 @@ struct stat RequireFile(const Descriptor& directory, const std::string& path, co
 void MakeDirectory(const std::string& directory, const Use& use) {
   if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
     if (errno == ENOENT) ThrowParentMissing(directory, use.purpose);
-    ThrowSystemError(
-        StrCat("Unable to create the directory ", directory, " for the ", use.purpose));
+    ThrowErrno("Unable to create the directory ", directory, " for the ", use.purpose);
   }
 }
 
@@ -97,7 +91,7 @@ void CreateFile(const Descriptor& directory, const std::string& path, const std:
   constexpr int kFlags = O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
   const Descriptor made(openat(directory.Number(), NameOf(path), kFlags, S_IRUSR | S_IWUSR));
   if (made.IsOpen() || errno == EEXIST) return;
-  ThrowSystemError(StrCat("Unable to create the ", purpose, " ", path));
+  ThrowErrno("Unable to create the ", purpose, " ", path);
 }
 
 bool IsMissing(const Descriptor& directory, const std::string& path) {

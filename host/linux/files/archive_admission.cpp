@@ -26,10 +26,6 @@ constexpr char kTardiskPolicy[] = "/tardisks";
   throw HostError(EINVAL, StrCat(name, ": ", reason));
 }
 
-[[noreturn]] void FailAt(std::string_view name, int error) {
-  throw HostError(error, StrCat(name, ": ", std::strerror(error)));
-}
-
 // Where a file system does not tell upper case from lower, they name the same file.
 bool IsSameName(std::string_view one, std::string_view other) {
   return one.size() == other.size() && strncasecmp(one.data(), other.data(), one.size()) == 0;
@@ -179,7 +175,7 @@ ArchiveAdmission::Kind ArchiveAdmission::KindAt(const std::string& path) {
   if (lstat(path.c_str(), &status) != 0) {
     // Below a directory that is still to be made there is nothing.
     if (errno == ENOENT || errno == ENOTDIR) return Kind::kNothing;
-    FailAt(path, errno);
+    ThrowErrno(path);
   }
   if (S_ISLNK(status.st_mode)) return Kind::kLink;
   if (!S_ISDIR(status.st_mode)) return Kind::kOther;

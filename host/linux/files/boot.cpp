@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <set>
@@ -33,7 +32,7 @@ class AtRoot {
  public:
   AtRoot() : before(open(".", O_PATH | O_DIRECTORY | O_CLOEXEC)) {
     if (chdir("/") == 0) return;
-    throw HostError(errno, StrCat("Unable to enter the root: ", std::strerror(errno)));
+    ThrowErrno("Unable to enter the root");
   }
   AtRoot(const AtRoot&) = delete;
   AtRoot& operator=(const AtRoot&) = delete;

@@ -8,7 +8,6 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstring>
 #include <fstream>
 #include <istream>
 #include <utility>
@@ -36,11 +35,6 @@ constexpr char kCarriesNothing = 'N';
 
 std::string JournalBeside(const std::string& statePath) {
   return statePath.substr(0, statePath.rfind('/') + 1) + "labels.undo";
-}
-
-[[noreturn]] void ThrowSystemError(const char* what, const std::string& path) {
-  const int code = errno;
-  throw HostError(code, StrCat(what, path, ": ", std::strerror(code)));
 }
 
 bool IsLink(const char* name) {
@@ -156,9 +150,9 @@ std::optional<LabelJournal> LabelJournal::TakeIfThere(const std::string& path) {
   if (access(path.c_str(), F_OK) != 0 && errno == ENOENT) return std::nullopt;
   RequirePrivateFile(path, kPurpose);
   Descriptor file(open(path.c_str(), O_RDWR | O_NOFOLLOW | O_CLOEXEC));
-  if (!file.IsOpen()) ThrowSystemError("Unable to open the journal of labels ", path);
+  if (!file.IsOpen()) ThrowErrno("Unable to open the journal of labels ", path);
   if (flock(file.Number(), LOCK_EX | LOCK_NB) != 0) {
-    ThrowSystemError("Another process has the journal of labels ", path);
+    ThrowErrno("Another process has the journal of labels ", path);
   }
   LabelJournal journal(path, std::move(file));
   // Whoever had it before may have removed it since it was opened.
@@ -184,7 +178,7 @@ LabelJournal::LabelJournal(const std::string& statePath) : file(-1) {
     path = std::exchange(taken->path, "");
     file = std::move(taken->file);
     if (ftruncate(file.Number(), 0) == 0) return;
-    ThrowSystemError("Unable to write the journal of labels ", path);
+    ThrowErrno("Unable to write the journal of labels ", path);
   }
 }
 
@@ -221,7 +215,7 @@ void LabelJournal::Keep(const NotedLabels& labels) {
 void LabelJournal::Write(const std::string& text) const {
   for (std::size_t done = 0; done < text.size();) {
     const ssize_t written = write(file.Number(), text.data() + done, text.size() - done);
-    if (written < 0) ThrowSystemError("Unable to write the journal of labels ", path);
+    if (written < 0) ThrowErrno("Unable to write the journal of labels ", path);
     done += static_cast<std::size_t>(written);
   }
 }

@@ -44,7 +44,7 @@ class GzipMembers : public ByteSource {
   bool HasMore() {
     if (inflater.avail_in > 0) return true;
     const ssize_t count = read(file, packed.data(), packed.size());
-    if (count < 0) throw HostError(errno, std::strerror(errno));
+    if (count < 0) ThrowErrno();
     inflater.next_in = packed.data();
     inflater.avail_in = static_cast<uInt>(count);
     if (count == 0 && isInMember) throw HostError(EINVAL, kCut);
@@ -106,7 +106,7 @@ class FilteredFile : public ByteSource {
   std::string_view End() {
     isOver = true;
     struct stat status {};
-    if (fstat(file, &status) != 0) throw HostError(errno, std::strerror(errno));
+    if (fstat(file, &status) != 0) ThrowErrno();
     if (archive_filter_bytes(reader.get(), -1) == status.st_size) return {};
     throw HostError(EINVAL, "Its compressed data is followed by something else");
   }
@@ -124,7 +124,7 @@ bool IsGzip(int file) {
 }
 
 std::unique_ptr<ByteSource> NewSource(const Descriptor& file) {
-  if (!file.IsOpen()) throw HostError(errno, std::strerror(errno));
+  if (!file.IsOpen()) ThrowErrno();
   if (IsGzip(file.Number())) return std::make_unique<GzipMembers>(file.Number());
   return std::make_unique<FilteredFile>(file.Number());
 }

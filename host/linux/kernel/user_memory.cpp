@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstring>
 
 #include "host/linux/common/host_error.h"
 
@@ -24,8 +23,8 @@ void Copy(Copier copy, std::uint64_t address, void* own, std::size_t size) {
   const iovec remote{reinterpret_cast<void*>(address), size};
   const ssize_t copied = copy(getpid(), &local, 1, &remote, 1, 0);
   if (copied >= 0 && static_cast<std::size_t>(copied) == size) return;
-  const bool forbidden = copied < 0 && (errno == EPERM || errno == ENOSYS);
-  throw HostError(forbidden ? errno : EFAULT, forbidden ? std::strerror(errno) : "bad address");
+  if (copied < 0 && (errno == EPERM || errno == ENOSYS)) ThrowErrno();
+  throw HostError(EFAULT, "bad address");
 }
 
 }  // namespace

@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <filesystem>
 #include <vector>
 
@@ -27,11 +26,6 @@ namespace {
 
 constexpr char kPurpose[] = "saved state";
 
-[[noreturn]] void ThrowSystemError(const std::string& what) {
-  const int code = errno;
-  throw HostError(code, StrCat(what, ": ", std::strerror(code)));
-}
-
 // A file that takes its name only when it is complete.
 class FileInTheMaking {
  public:
@@ -41,7 +35,7 @@ class FileInTheMaking {
         path(
             StrCat(directory, "/.", std::filesystem::path(target).filename().string(), ".XXXXXX")) {
     const Descriptor file(mkstemp(path.data()));
-    if (!file.IsOpen()) ThrowSystemError(StrCat("Unable to make a file in ", directory));
+    if (!file.IsOpen()) ThrowErrno("Unable to make a file in ", directory);
   }
   FileInTheMaking(const FileInTheMaking&) = delete;
   FileInTheMaking& operator=(const FileInTheMaking&) = delete;
@@ -53,7 +47,7 @@ class FileInTheMaking {
     Flush(path);
     const int result =
         replace ? rename(path.c_str(), wanted.c_str()) : link(path.c_str(), wanted.c_str());
-    if (result != 0) ThrowSystemError(StrCat("Unable to make ", wanted));
+    if (result != 0) ThrowErrno("Unable to make ", wanted);
     Flush(directory);
   }
 
@@ -61,7 +55,7 @@ class FileInTheMaking {
   static void Flush(const std::string& path) {
     const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
     if (!file.IsOpen() || fsync(file.Number()) != 0) {
-      ThrowSystemError(StrCat("Unable to write ", path));
+      ThrowErrno("Unable to write ", path);
     }
   }
 
@@ -76,7 +70,7 @@ void MakeDirectory(const std::filesystem::path& directory) {
   std::filesystem::create_directories(directory.parent_path().parent_path(), ignored);
   mkdir(directory.parent_path().c_str(), S_IRWXU);
   if (mkdir(directory.c_str(), S_IRWXU) != 0 && errno != EEXIST) {
-    ThrowSystemError(StrCat("Unable to create the directory ", directory.string()));
+    ThrowErrno("Unable to create the directory ", directory.native());
   }
 }
 

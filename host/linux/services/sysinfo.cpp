@@ -41,9 +41,7 @@ InodeRecord ReadRecord(std::uint64_t inode) {
   InodeRecord record{};
   record.inode = inode;
   struct statx status;
-  if (!LinuxHost::Examine("/", &status)) {
-    throw HostError(errno, StrCat("Unable to examine the root: ", std::strerror(errno)));
-  }
+  if (!LinuxHost::Examine("/", &status)) LinuxHost::ThrowErrno("Unable to examine the root");
   const std::optional<InodeOrigin> origin =
       LinuxHost::HostState::Current().FindOrigin(LinuxHost::DeviceOf(status), inode);
   if (!origin || !LinuxHost::Examine(origin->path.c_str(), &status)) return record;

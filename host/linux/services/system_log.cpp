@@ -52,9 +52,7 @@ bool SyslogDaemonListens() {
 }
 
 [[noreturn]] void FailToWrite(const char* path) {
-  const int error = errno;
-  throw HostError(error, Braxo::Misc::StrCat("Unable to write the kernel log ", path, ": ",
-                                             std::strerror(error)));
+  ThrowErrno("Unable to write the kernel log ", path);
 }
 
 void WriteWhole(const Descriptor& log, const char* path, std::string_view record) {

@@ -16,6 +16,7 @@
 #include <vector>
 
 #include "braxo/misc/strcat.h"
+#include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
 
@@ -80,28 +81,22 @@ unsigned int ForksUntilNow() {
 class DirectoryLock {
  public:
   explicit DirectoryLock(const std::string& directory)
-      : descriptor(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
-    if (descriptor < 0 || flock(descriptor, LOCK_EX) != 0) {
-      const int code = errno;
-      if (descriptor >= 0) close(descriptor);
-      throw HostError(code, StrCat("Unable to lock ", directory, ": ", std::strerror(code)));
+      : opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
+    if (!opened.IsOpen() || flock(opened.Number(), LOCK_EX) != 0) {
+      ThrowErrno("Unable to lock ", directory);
     }
   }
-  DirectoryLock(const DirectoryLock&) = delete;
-  DirectoryLock& operator=(const DirectoryLock&) = delete;
-  ~DirectoryLock() { close(descriptor); }
 
  private:
-  int descriptor;
+  const Descriptor opened;
 };
 
 }  // namespace
 
 void MoveAside(const std::string& path) {
   const DirectoryLock lock(path.substr(0, path.rfind('/') + 1));
-  if (rename(path.c_str(), (path + ".damaged").c_str()) != 0) {
-    throw HostError(errno, StrCat("Unable to move ", path, ": ", std::strerror(errno)));
-  }
+  const std::string aside = path + ".damaged";
+  if (rename(path.c_str(), aside.c_str()) != 0) ThrowErrno("Unable to move ", path);
   unlink((path + "-wal").c_str());
   unlink((path + "-shm").c_str());
 }

@@ -151,7 +151,6 @@ class Store {
   [[noreturn]] void Fail(int result) const;
   [[noreturn]] void Refuse(int code, const std::string& reason) const;
 
-  void PrepareFile();
   void Open();
   bool IsReady();
   void RequireStructure();

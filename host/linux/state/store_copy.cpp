@@ -170,7 +170,7 @@ class TargetFile {
       : path(target),
         made(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, S_IRUSR | S_IWUSR)) {
     if (made.IsOpen()) return;
-    throw HostError(errno, StrCat("Unable to write ", path, ": ", std::strerror(errno)));
+    ThrowErrno("Unable to write ", path);
   }
   TargetFile(const TargetFile&) = delete;
   TargetFile& operator=(const TargetFile&) = delete;

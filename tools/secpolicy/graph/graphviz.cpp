@@ -8,44 +8,31 @@
 
 #include <cerrno>
 #include <stdexcept>
-#include <system_error>
+
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
 
 namespace SecPolicyCli {
 namespace {
+
+using LinuxHost::Descriptor;
+using LinuxHost::ThrowErrno;
 
 constexpr int kNotFound = 127;  // as a shell says it
 constexpr int kNoFile = -1;
 
 int systemRoot = kNoFile;
 
-// A descriptor that is closed at the end of its life.
-class File {
- public:
-  explicit File(int opened) : descriptor(opened) {}
-  File(const File&) = delete;
-  File& operator=(const File&) = delete;
-  ~File() { close(descriptor); }
-
-  int Descriptor() const { return descriptor; }
-
- private:
-  int descriptor;
-};
-
-[[noreturn]] void RaiseSystemError(const char* what) {
-  throw std::system_error(errno, std::generic_category(), what);
-}
-
 // Leaves `text` to be read from the start in `file`.
-void Fill(const File& file, const std::string& text) {
+void Fill(const Descriptor& file, const std::string& text) {
   std::size_t written = 0;
   while (written < text.size()) {
-    const ssize_t count = write(file.Descriptor(), text.data() + written, text.size() - written);
-    if (count < 0) RaiseSystemError("cannot keep the graph in memory");
+    const ssize_t count = write(file.Number(), text.data() + written, text.size() - written);
+    if (count < 0) ThrowErrno("cannot keep the graph in memory");
     written += static_cast<std::size_t>(count);
   }
-  if (lseek(file.Descriptor(), 0, SEEK_SET) != 0) {
-    RaiseSystemError("cannot keep the graph in memory");
+  if (lseek(file.Number(), 0, SEEK_SET) != 0) {
+    ThrowErrno("cannot keep the graph in memory");
   }
 }
 
@@ -60,8 +47,8 @@ bool ReturnToSystemRoot() {
 }
 
 // The child: becomes Graphviz, or says that there is none.
-[[noreturn]] void BecomeGraphviz(const File& input) {
-  if (dup2(input.Descriptor(), STDIN_FILENO) == STDIN_FILENO && ReturnToSystemRoot()) {
+[[noreturn]] void BecomeGraphviz(const Descriptor& input) {
+  if (dup2(input.Number(), STDIN_FILENO) == STDIN_FILENO && ReturnToSystemRoot()) {
     execlp("dot", "dot", "-Tsvg", static_cast<char*>(nullptr));
   }
   _exit(kNotFound);
@@ -70,7 +57,7 @@ bool ReturnToSystemRoot() {
 int WaitFor(pid_t child) {
   int status = 0;
   while (waitpid(child, &status, 0) < 0) {
-    if (errno != EINTR) RaiseSystemError("cannot wait for Graphviz");
+    if (errno != EINTR) ThrowErrno("cannot wait for Graphviz");
   }
   return WIFEXITED(status) ? WEXITSTATUS(status) : kNoFile;
 }
@@ -80,10 +67,10 @@ int WaitFor(pid_t child) {
 void KeepSystemRoot() { systemRoot = open("/", O_PATH | O_DIRECTORY | O_CLOEXEC); }
 
 void DrawSvg(const std::string& dot) {
-  const File input(memfd_create("graph.dot", MFD_CLOEXEC));
+  const Descriptor input(memfd_create("graph.dot", MFD_CLOEXEC));
   Fill(input, dot);
   const pid_t child = fork();
-  if (child < 0) RaiseSystemError("cannot start Graphviz");
+  if (child < 0) ThrowErrno("cannot start Graphviz");
   if (child == 0) BecomeGraphviz(input);
   const int status = WaitFor(child);
   if (status == 0) return;

@@ -10,8 +10,8 @@
 #include <cstring>
 #include <exception>
 #include <iostream>
-#include <system_error>
 
+#include "host/linux/common/host_error.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -39,7 +39,7 @@ pid_t Fork(const std::function<ExitCode()>& body) {
   std::cerr.flush();
   const pid_t parent = getpid();
   const pid_t child = fork();
-  if (child < 0) throw std::system_error(errno, std::generic_category(), "cannot fork");
+  if (child < 0) LinuxHost::ThrowErrno("cannot fork");
   if (child == 0) {
     DieWith(parent);
     RunChild(body);
@@ -50,7 +50,7 @@ pid_t Fork(const std::function<ExitCode()>& body) {
 ForkedEnd EndOf(pid_t child) {
   int status = 0;
   while (waitpid(child, &status, 0) < 0) {
-    if (errno != EINTR) throw std::system_error(errno, std::generic_category(), "cannot wait");
+    if (errno != EINTR) LinuxHost::ThrowErrno("cannot wait");
   }
   if (WIFEXITED(status)) return {.code = static_cast<ExitCode>(WEXITSTATUS(status)), .death = ""};
   return {.code = kFailed, .death = strsignal(WTERMSIG(status))};

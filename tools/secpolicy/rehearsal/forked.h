@@ -15,7 +15,7 @@ struct ForkedEnd {
 
 // Runs `body` in a child process, which ends with the code that it returns, and waits for it. What
 // the library ends, ends only the child. Connections to the host's state do not outlive a fork, so
-// none may be open. Throws std::system_error when no child can be made.
+// none may be open. Throws Braxo::Lib::BraxoException when no child can be made.
 ForkedEnd RunForked(const std::function<ExitCode()>& body);
 
 }  // namespace SecPolicyCli

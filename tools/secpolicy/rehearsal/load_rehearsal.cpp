@@ -8,9 +8,9 @@
 #include <fstream>
 #include <iterator>
 #include <stdexcept>
-#include <system_error>
 
 #include "forked.h"
+#include "host/linux/common/host_error.h"
 #include "host/linux/services/system_log.h"
 #include "host/linux/state/store_copy.h"
 #include "policy_dir.h"
@@ -30,7 +30,7 @@ namespace {
 void Redirect(int descriptor, const std::string& path) {
   const int file = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
   if (file < 0 || dup2(file, descriptor) < 0) {
-    throw std::system_error(errno, std::generic_category(), "cannot write " + path);
+    LinuxHost::ThrowErrno("cannot write ", path);
   }
   close(file);
 }

@@ -6,6 +6,8 @@
 #include <system_error>
 #include <vector>
 
+#include "host/linux/common/host_error.h"
+
 namespace SecPolicyCli {
 namespace {
 
@@ -18,8 +20,7 @@ std::string MakePrivateDirectory() {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
   }
-  throw std::system_error(errno, std::generic_category(),
-                          "cannot make a directory for the scratch state; TMPDIR can name a place");
+  LinuxHost::ThrowErrno("cannot make a directory for the scratch state; TMPDIR can name a place");
 }
 
 }  // namespace

@@ -7,7 +7,7 @@ namespace SecPolicyCli {
 // A directory that only this user may use; removed, with all that is in it, with this object.
 class ScratchDirectory {
  public:
-  // Throws std::system_error when there is no place for it.
+  // Throws Braxo::Lib::BraxoException when there is no place for it.
   ScratchDirectory();
   ScratchDirectory(const ScratchDirectory&) = delete;
   ScratchDirectory& operator=(const ScratchDirectory&) = delete;

@@ -12,8 +12,8 @@ namespace SecPolicyCli {
 class ScratchState {
  public:
   // Copies the installed state; with `fresh`, and where there is none or this user may not read it,
-  // starts from the state after a boot. Throws std::system_error when there is no place for it, and
-  // what the host throws for a state that cannot be trusted or is damaged.
+  // starts from the state after a boot. Throws Braxo::Lib::BraxoException when there is no place for it,
+  // and for a state that cannot be trusted or is damaged.
   explicit ScratchState(bool fresh);
 
   // False when the state is a new one.
