@@ -7,6 +7,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/require_text.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/rule_table.h"
@@ -20,7 +21,12 @@ namespace {
 
 constexpr char kFirstLevel[] = "enforcing";
 constexpr std::array<std::string_view, 3> kLevels = {kFirstLevel, "permissive", "disabled"};
-constexpr std::size_t kMaxServiceLength = 255;
+constexpr TextLimit kName = {.noun = "domain name",
+                             .whenEmpty = "a domain name must not be empty",
+                             .maxSize = kMaxDomainName};
+constexpr TextLimit kService = {.noun = "guest-communication service",
+                                .whenEmpty = "a guest-communication service must not be empty",
+                                .maxSize = 255};
 constexpr unsigned int kCreatedAtRunTime = 0x8;
 
 // The bit of the state word, and the name in the state, of a part.
@@ -47,17 +53,6 @@ Domain ReadDomain(const Rows& rows) {
           .level = rows.Text(2),
           .defaultRules = static_cast<TeskAccessKsi_DefaultDom>(rows.Integer(3)),
           .createdAtRunTime = rows.Integer(4) != 0};
-}
-
-void RequireText(const std::string& text, const char* what, std::size_t maxLength) {
-  if (text.empty()) throw HostError(EINVAL, StrCat("a ", what, " must not be empty"));
-  if (text.find('\0') != std::string::npos) {
-    throw HostError(EINVAL, StrCat(what, " '", text.c_str(), "' goes on after a NUL byte"));
-  }
-  if (text.size() > maxLength) {
-    throw HostError(ENAMETOOLONG, StrCat(what, " '", text, "' is too long: ", text.size(),
-                                         " bytes, at most ", maxLength));
-  }
 }
 
 }  // namespace
@@ -168,7 +163,7 @@ unsigned int DomainTable::Create(const std::string& name, TeskAccessKsi_DefaultD
 
 unsigned int DomainTable::Insert(const std::string& name, TeskAccessKsi_DefaultDom defaultRules,
                                  bool createdAtRunTime) {
-  RequireText(name, "domain name", kMaxDomainName);
+  RequireText(name, kName);
   if (defaultRules != TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE &&
       defaultRules != TeskCtl::Security::TESKACCESS_DEFAULT_DOM_CHECK_ACCESS) {
     throw HostError(EINVAL, StrCat("unknown default rules ", static_cast<int>(defaultRules),
@@ -273,7 +268,7 @@ unsigned int DomainTable::RolesOf(unsigned int id) {
 }
 
 void DomainTable::AddGuestService(unsigned int id, const std::string& service) {
-  RequireText(service, "guest-communication service", kMaxServiceLength);
+  RequireText(service, kService);
   Transaction transaction(state.Database());
   state.Refresh();
   Get(id);

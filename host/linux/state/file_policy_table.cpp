@@ -5,6 +5,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/require_text.h"
 #include "host/linux/state/checked_install.h"
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
@@ -22,16 +23,8 @@ struct PermissionLetter {
 constexpr std::array<PermissionLetter, 3> kLetters = {
     {{'r', kPermitRead}, {'w', kPermitWrite}, {'x', kPermitExecute}}};
 
-void RequirePath(const std::string& path) {
-  if (path.empty()) throw HostError(EINVAL, "a file policy needs a path");
-  if (path.find('\0') != std::string::npos) {
-    throw HostError(EINVAL, StrCat("path '", path.c_str(), "' goes on after a NUL byte"));
-  }
-  if (path.size() > kMaxPolicyPath) {
-    throw HostError(ENAMETOOLONG, StrCat("path '", path, "' is too long: ", path.size(),
-                                         " bytes, at most ", kMaxPolicyPath));
-  }
-}
+constexpr TextLimit kPath = {
+    .noun = "path", .whenEmpty = "a file policy needs a path", .maxSize = kMaxPolicyPath};
 
 void RequirePermission(unsigned int permission) {
   if ((permission & ~kAllPermissions) != 0) {
@@ -86,7 +79,7 @@ void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
   for (std::size_t index = 0; index < policies.size(); ++index) {
     const FilePolicy& policy = policies[index];
     RequireWorld(policy.world);
-    RequirePath(policy.path);
+    RequireText(policy.path, kPath);
     RequirePermission(policy.permission);
     // A path often comes twice in a row, as it is written and as it resolves: the second one would
     // replace the first.
@@ -140,7 +133,7 @@ void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
 }
 
 void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& newPath) {
-  RequirePath(newPath);
+  RequireText(newPath, kPath);
   const int moved = state.Database().Run(
       "UPDATE OR REPLACE file_policy SET path = ?2 WHERE path = ?1 AND world <> 0", oldPath,
       newPath);

@@ -4,6 +4,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/require_text.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/rule_table.h"
 
@@ -12,18 +13,7 @@ using Braxo::Misc::StrCat;
 namespace LinuxHost {
 namespace {
 
-constexpr std::size_t kMaxLabelLength = 255;
-
-void RequireLabelName(const std::string& name) {
-  if (name.empty()) throw HostError(EINVAL, "a label needs a name");
-  if (name.find('\0') != std::string::npos) {
-    throw HostError(EINVAL, StrCat("label '", name.c_str(), "' goes on after a NUL byte"));
-  }
-  if (name.size() > kMaxLabelLength) {
-    throw HostError(ENAMETOOLONG, StrCat("label '", name, "' is too long: ", name.size(),
-                                         " bytes, at most ", kMaxLabelLength));
-  }
-}
+constexpr TextLimit kName = {.noun = "label", .whenEmpty = "a label needs a name", .maxSize = 255};
 
 }  // namespace
 
@@ -78,7 +68,7 @@ std::map<std::string, long> LabelTable::All() {
 }
 
 void LabelTable::Add(const std::vector<std::string>& added) {
-  for (const auto& name : added) RequireLabelName(name);
+  for (const auto& name : added) RequireText(name, kName);
   Transaction transaction(state.Database());
   state.Refresh();
   int changes = 0;
