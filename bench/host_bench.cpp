@@ -22,7 +22,7 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 #include "secpolicy/domain/domain_policy.h"
 #include "secpolicy/secpolicy.h"
 

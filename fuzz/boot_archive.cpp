@@ -27,8 +27,8 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/files/boot.h"
 #include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/boot.h"
 #include "support/outcome.h"
 #include "support/reference_reader.h"
 #include "support/require.h"

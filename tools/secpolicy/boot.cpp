@@ -1,4 +1,4 @@
-#include "host/linux/files/boot.h"
+#include "host/linux/operation/boot.h"
 
 #include <iostream>
 #include <limits>
@@ -6,7 +6,7 @@
 #include "boot/boot_plan.h"
 #include "braxo/lib/exception.h"
 #include "command_line.h"
-#include "host/linux/files/archive_library.h"
+#include "host/linux/operation/archive_library.h"
 #include "host/linux/operation/mend_state.h"
 #include "kitlibs/file.h"
 #include "library_call.h"

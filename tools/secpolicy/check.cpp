@@ -7,7 +7,7 @@
 #include "check/check_run.h"
 #include "check/report_format.h"
 #include "command_line.h"
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "policy_dir.h"

@@ -3,7 +3,7 @@
 
 #include "command_line.h"
 #include "compare/policy_diff.h"
-#include "host/linux/services/system_log.h"
+#include "host/linux/operation/log_use.h"
 #include "summary.h"
 #include "verb.h"
 
@@ -17,7 +17,7 @@ struct Options {
 };
 
 ExitCode Compare(const Options& options) {
-  LinuxHost::DropLog();
+  const LinuxHost::DroppedLog dropped;
   Side before = ReadSide(options.before);
   Side after = ReadSide(options.after);
   if (before.labels.has_value() != after.labels.has_value()) {

@@ -3,7 +3,7 @@
 #include <list>
 
 #include "command_line.h"
-#include "host/linux/state/stable_view.h"
+#include "host/linux/operation/stable_view.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"

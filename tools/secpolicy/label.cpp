@@ -2,10 +2,10 @@
 #include <vector>
 
 #include "command_line.h"
+#include "host/linux/operation/state_use.h"
 #include "label/label_actions.h"
 #include "library_call.h"
 #include "root.h"
-#include "scratch/used_state.h"
 #include "secpolicy/policy_root.h"
 #include "verb.h"
 
@@ -115,7 +115,7 @@ constexpr LabelKind kLabelKinds[] = {
 
 ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   const std::string verb = std::string("label ") + kind.name;
-  if (IsStateMissing()) {
+  if (LinuxHost::IsStateMissing()) {
     return Refuse(verb,
                   "nothing is installed below this root, so there are no labels. Run 'secpolicy "
                   "boot' first, or name the root that was booted (--root DIR).");

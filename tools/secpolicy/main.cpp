@@ -2,10 +2,11 @@
 
 #include <exception>
 #include <iostream>
+#include <optional>
 #include <string>
 
 #include "command_line.h"
-#include "host/linux/services/system_log.h"
+#include "host/linux/operation/log_use.h"
 #include "root.h"
 #include "standard_descriptors.h"
 #include "text/terminal_guard.h"
@@ -66,7 +67,8 @@ int Run(int argc, char** argv) {
     if (const auto prepare = commandLine.AskedVerb().prepare) prepare();
     if (const auto root = commandLine.Root()) EnterRoot(*root);
     isInRoot = true;
-    if (commandLine.IsVerbose()) LinuxHost::ShowInformation();
+    std::optional<LinuxHost::ShownLog> shown;
+    if (commandLine.IsVerbose()) shown.emplace();
     return FlushOutput(commandLine.Act());
   } catch (const std::exception& failure) {
     const std::string advice = isInRoot ? AdviseOnPrivilege() : "";

@@ -1,14 +1,14 @@
 #include <stdexcept>
 
 #include "host/linux/operation/saved_policy.h"
-#include "host/linux/state/store_copy.h"
+#include "host/linux/operation/state_use.h"
+#include "host/linux/operation/store_copy.h"
 #include "library_call.h"
 #include "load/load_record.h"
 #include "root.h"
 #include "saved/saved_name.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_directory.h"
-#include "scratch/used_state.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -28,7 +28,7 @@ void PutBack(const std::string& name) {
 }
 
 ExitCode RollBack(const std::string& name) {
-  if (IsStateMissing()) return RefuseWithoutState("rollback");
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState("rollback");
   if (!IsSaved(name)) {
     return Refuse("rollback", "there is no saved state '" + name +
                                   "'. 'secpolicy history' lists what is saved.");

@@ -2,18 +2,18 @@
 
 #include "command_line.h"
 #include "host/linux/operation/saved_policy.h"
+#include "host/linux/operation/state_use.h"
 #include "library_call.h"
 #include "root.h"
 #include "saved/saved_name.h"
 #include "saved/saved_state.h"
-#include "scratch/used_state.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 namespace {
 
 ExitCode Save(const std::string& name, bool force) {
-  if (IsStateMissing()) return RefuseWithoutState("save");
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState("save");
   if (!force && IsSaved(name)) {
     return Refuse("save", "there is a saved state '" + name +
                               "' already. Give --force to replace it, or choose another name.");

@@ -1,4 +1,4 @@
-#include "host/linux/services/settings.h"
+#include "host/linux/operation/settings.h"
 
 #include <iostream>
 #include <variant>

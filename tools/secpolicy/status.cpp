@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "command_line.h"
-#include "host/linux/state/load_record.h"
+#include "host/linux/operation/load_record.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "installed/rule_words.h"
@@ -187,7 +187,7 @@ Action Define(Syntax& syntax) {
   return [format] {
     // The host would make a state of its own.
     std::optional<ScratchState> scratch;
-    if (IsStateMissing()) scratch.emplace(true);
+    if (LinuxHost::IsStateMissing()) scratch.emplace(true);
     const Status status = ReadStatus();
     (*format == "json" ? WriteJson : WriteText)(status);
     return EndWith(status);

@@ -6,12 +6,12 @@
 #include <sys/xattr.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <cstring>
 
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/files/inherited_label.h"
-#include "host/linux/files/noted_labels.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
 #include "zorvan/kernel.h"
@@ -22,6 +22,9 @@ namespace {
 constexpr char kContractName[] = "zorvan.security";
 constexpr char kPrivilegedName[] = "security.zorvan";
 constexpr char kOrdinaryName[] = "user.zorvan.security";
+
+// The contract's calls take no parameter for it.
+AttributeStandIn* standIn = nullptr;
 
 // Tries it out on a file without a name, which vanishes with its descriptor.
 bool MayWritePrivileged(const char* directory) {
@@ -85,22 +88,9 @@ std::optional<std::string> ReadCarried(const char* path, const std::string& attr
   return value;
 }
 
-std::optional<FileLabel> ReadLabel(const char* path) {
-  const char* name = LabelAttribute().c_str();
-  FileLabel label;
-  if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
-  if (errno != ENODATA) return std::nullopt;
-  label.isInherited = true;
-  if (ReadInherited(path, LastLink::kKept, name, &label.id, sizeof label.id) >= 0) return label;
-  return std::nullopt;
-}
+AttributeStandIn::AttributeStandIn() { standIn = this; }
 
-int ReplaceLabel(const char* path, std::uint32_t id) {
-  const char* name = LabelAttribute().c_str();
-  const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
-  if (result == 0 || errno != ENODATA) return result;
-  return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
-}
+AttributeStandIn::~AttributeStandIn() { standIn = nullptr; }
 
 }  // namespace LinuxHost
 
@@ -109,8 +99,8 @@ namespace Zorvan::Kernel {
 int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
   const char* realName = LinuxHost::RealName(name);
   if (realName == nullptr) return -1;
-  if (auto* notes = LinuxHost::NotedLabels::Current()) {
-    return notes->Set(path, realName, value, size, flags);
+  if (auto* standIn = LinuxHost::standIn) {
+    return standIn->Set(path, realName, value, size, flags);
   }
   const int result = setxattr(path, realName, value, size, flags);
   if (result == 0 || errno != ENODATA) return result;
@@ -120,8 +110,8 @@ int SetXattr(const char* path, const char* name, const void* value, std::size_t 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
   const char* realName = LinuxHost::RealName(name);
   if (realName == nullptr) return -1;
-  if (auto* notes = LinuxHost::NotedLabels::Current()) {
-    return notes->Get(path, realName, value, size);
+  if (auto* standIn = LinuxHost::standIn) {
+    return standIn->Get(path, realName, value, size);
   }
   const ssize_t result = getxattr(path, realName, value, size);
   if (result >= 0 || errno != ENODATA) return result;

@@ -2,7 +2,7 @@
 
 #include <sys/types.h>
 
-#include <cstdint>
+#include <cstddef>
 #include <optional>
 #include <string>
 
@@ -32,18 +32,18 @@ int GiveFirstLabel(const char* path, const std::string& attribute);
 // the file are followed, the last one is not.
 std::optional<std::string> ReadCarried(const char* path, const std::string& attribute);
 
-struct FileLabel {
-  std::uint32_t id = 0;
-  bool isInherited = false;  // from a directory above; the file itself carries none
+// As long as it lives, it stands in for setxattr(2) and getxattr(2) of the real attribute in the
+// contract's two calls. One at a time.
+class AttributeStandIn {
+ public:
+  AttributeStandIn();
+  AttributeStandIn(const AttributeStandIn&) = delete;
+  AttributeStandIn& operator=(const AttributeStandIn&) = delete;
+  virtual ~AttributeStandIn();
+
+  virtual int Set(const char* path, const char* name, const void* value, std::size_t size,
+                  int flags) = 0;
+  virtual ssize_t Get(const char* path, const char* name, void* value, std::size_t size) = 0;
 };
-
-// The label of the file at `path`; nothing, with errno set, when it has none (ENODATA) or it cannot
-// be read. Links on the way to the file are followed, the last one is not.
-std::optional<FileLabel> ReadLabel(const char* path);
-
-// Gives the file at `path` the label `id` in place of the one it has, be that its own or inherited.
-// Returns 0, or -1 with errno set; ENODATA when it had none. Links on the way to the file are
-// followed, the last one is not.
-int ReplaceLabel(const char* path, std::uint32_t id);
 
 }  // namespace LinuxHost

@@ -14,9 +14,9 @@
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
+#include "host/linux/operation/store_copy.h"
+#include "host/linux/operation/store_seal.h"
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/store_copy.h"
-#include "host/linux/state/store_seal.h"
 #include "host/linux/state/world_table.h"
 
 using Braxo::Misc::StrCat;

@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include "host/linux/services/settings.h"
+#include "host/linux/services/config_database.h"
 #include "teskctl/adv.h"
 
 namespace TeskCtl::Adv {
@@ -24,7 +24,9 @@ class TextOption : public Braxo::Adv::AdvancedOption {};
 }  // namespace
 
 Braxo::Adv::AdvancedOption* AdvancedOptionImpl::FindOption(const std::string& path) {
-  const std::optional<LinuxHost::OptionValue> value = LinuxHost::FindWantedOption(path);
+  LinuxHost::ConfigDatabase* const database = LinuxHost::ConfigDatabase::Find();
+  if (database == nullptr) return nullptr;
+  const std::optional<LinuxHost::OptionValue> value = database->FindOption(path);
   if (!value) return nullptr;
   if (const long* number = std::get_if<long>(&*value)) return new IntegerOption(*number);
   return new TextOption;

@@ -3,12 +3,15 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <variant>
 
-#include "host/linux/services/settings.h"
 #include "host/linux/state/store.h"
 #include "orinconfigstore/config_store.h"
 
 namespace LinuxHost {
+
+// An advanced option is an integer or a text.
+using OptionValue = std::variant<long, std::string>;
 
 // The database of wanted settings. Failures are HostErrors.
 class ConfigDatabase {

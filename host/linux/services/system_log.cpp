@@ -29,12 +29,8 @@ constexpr char kInformationTag[] = "[INFO]";
 // The kernel refuses a record of more than about 976 bytes.
 constexpr std::size_t kMaxRecordText = 900;
 
-bool informationShown = false;
-std::function<void(const std::string&)> logWatcher;
-bool dropped = false;
-
 // Where the library must not go to the system log past the host.
-bool TakesEveryLine() { return informationShown || logWatcher; }
+bool TakesEveryLine(const LogUse& use) { return use.showsInformation || use.watcher; }
 
 // Never waits: a daemon with a full queue does not take messages.
 bool AcceptsConnection(const char* path, int type) {
@@ -118,13 +114,10 @@ void WriteToSyslog(const std::string& message, const std::string& tag) {
 
 }  // namespace
 
-void ShowInformation() { informationShown = true; }
-
-void WatchLog(const std::function<void(const std::string& message)>& watcher) {
-  logWatcher = watcher;
+LogUse& CurrentLogUse() {
+  static LogUse use;
+  return use;
 }
-
-void DropLog() { dropped = true; }
 
 std::vector<std::string> KernelLogRecords(const std::string& message, const std::string& tag) {
   const int priority = LOG_USER | (tag == kInformationTag ? LOG_INFO : LOG_ERR);
@@ -149,16 +142,18 @@ void LogInformation(const std::string& message) {
 namespace TeskCtl::System {
 
 bool SyslogIsRunning() {
-  return !LinuxHost::dropped && !LinuxHost::TakesEveryLine() && LinuxHost::SyslogDaemonListens();
+  const LinuxHost::LogUse& use = LinuxHost::CurrentLogUse();
+  return !use.dropsLines && !LinuxHost::TakesEveryLine(use) && LinuxHost::SyslogDaemonListens();
 }
 
 void WriteToKlog(const std::string& message, const std::string& tag) {
-  if (LinuxHost::logWatcher) LinuxHost::logWatcher(message);
-  if (LinuxHost::dropped) return;
-  if (LinuxHost::informationShown && tag == LinuxHost::kInformationTag) {
+  const LinuxHost::LogUse& use = LinuxHost::CurrentLogUse();
+  if (use.watcher) use.watcher(message);
+  if (use.dropsLines) return;
+  if (use.showsInformation && tag == LinuxHost::kInformationTag) {
     std::cerr << message << std::endl;
   }
-  if (LinuxHost::TakesEveryLine() && LinuxHost::SyslogDaemonListens()) {
+  if (LinuxHost::TakesEveryLine(use) && LinuxHost::SyslogDaemonListens()) {
     return LinuxHost::WriteToSyslog(message, tag);
   }
   LinuxHost::WriteToKernelLog(message, tag);

@@ -4,22 +4,22 @@
 #include <string>
 #include <vector>
 
-// Where this host's log lines go, and what the command may ask of it.
+// Where this host's log lines go.
 namespace LinuxHost {
 
-// From now on shows information lines on standard error too, one a line, as they are logged.
-// While they are shown the host takes every line itself: SyslogIsRunning() answers false, and
-// WriteToKlog() hands the line on to a running system log daemon in the form that the library
-// would have given it, else to the kernel log. So each line still reaches the log it belongs to.
-void ShowInformation();
+// What becomes of lines beside, or in place of, going to their log. While they are shown or watched
+// the host takes every line itself: SyslogIsRunning() answers false, and WriteToKlog() hands the
+// line on to a running system log daemon in the form that the library would have given it, else to
+// the kernel log. So each line still reaches the log it belongs to.
+struct LogUse {
+  bool showsInformation = false;                            // on standard error too, one a line
+  bool dropsLines = false;                                  // those that are shown included
+  std::function<void(const std::string& message)> watcher;  // handed every line; may be empty
+};
 
-// From now on hands every line, errors included, to `watcher` before it goes to its log; an empty
-// function ends that. The host takes every line itself meanwhile, as while information is shown.
-void WatchLog(const std::function<void(const std::string& message)>& watcher);
-
-// From now on drops every line, those that are shown included: what a process only rehearses has
-// not happened.
-void DropLog();
+// That of this process: the functions of the contract take no parameter for it. Only
+// operation/log_use changes it.
+LogUse& CurrentLogUse();
 
 // What the kernel's device gets for a line: a text that is too long for one record goes into
 // several, each with its priority and the tag.

@@ -1,4 +1,4 @@
-#include "host/linux/files/boot.h"
+#include "host/linux/operation/boot.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -11,7 +11,8 @@
 #include <cstring>
 
 #include "host/linux/files/security_attribute.h"
-#include "host/linux/services/settings.h"
+#include "host/linux/operation/file_label.h"
+#include "host/linux/operation/settings.h"
 #include "orinconfigstore/config_store.h"
 #include "scratch_root.h"
 #include "tar_image.h"

@@ -17,6 +17,7 @@
 #include <initializer_list>
 
 #include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/file_label.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 

@@ -1,4 +1,4 @@
-#include "host/linux/state/load_record.h"
+#include "host/linux/operation/load_record.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,4 +1,4 @@
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/noted_labels.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -115,7 +115,7 @@ class NotedLabelsTest : public ::testing::TestWithParam<LabelNotes> {
 };
 
 INSTANTIATE_TEST_SUITE_P(Purposes, NotedLabelsTest,
-                         testing::Values(LabelNotes::kRehearsal, LabelNotes::kForLater));
+                         testing::Values(LabelNotes::kDryRun, LabelNotes::kForLater));
 
 TEST_P(NotedLabelsTest, ReadsBackWhatItGaveAndLeavesTheFile) {
   EXPECT_EQ(RunNoting([](const NotedLabels&) {
@@ -271,7 +271,7 @@ TEST_P(NotedLabelsTest, RehearsesWithoutTraceOnAnOverlay) {
     const std::string given =
         Words({Give("labelled", 8), Give("bare", 8), Give("missing", 8), Give("tree/one", 8),
                Label("labelled"), RealLabel("labelled")});
-    if (GetParam() == LabelNotes::kRehearsal &&
+    if (GetParam() == LabelNotes::kDryRun &&
         !std::filesystem::is_empty(scratch.Directory() / "upper")) {
       return given + " copied";
     }

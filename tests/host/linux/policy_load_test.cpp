@@ -1,6 +1,6 @@
 // A load is seen as a whole or not at all, and leaves exactly what its files, the files of the
 // other kind and services have installed.
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

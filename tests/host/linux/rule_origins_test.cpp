@@ -1,4 +1,4 @@
-#include "host/linux/state/rule_origins.h"
+#include "host/linux/operation/rule_origins.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

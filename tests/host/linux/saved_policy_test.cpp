@@ -10,13 +10,13 @@
 #include <optional>
 
 #include "child_process.h"
+#include "host/linux/operation/rule_origins.h"
+#include "host/linux/operation/store_copy.h"
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/file_policy_table.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
-#include "host/linux/state/rule_origins.h"
 #include "host/linux/state/rule_table.h"
-#include "host/linux/state/store_copy.h"
 #include "host/linux/state/world_table.h"
 #include "message_of.h"
 #include "state_directory.h"

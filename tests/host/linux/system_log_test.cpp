@@ -13,6 +13,7 @@
 #include <array>
 
 #include "host/linux/common/descriptor.h"
+#include "host/linux/operation/log_use.h"
 #include "scratch_root.h"
 #include "teskctl/system.h"
 
@@ -81,8 +82,8 @@ TEST_F(SystemLog, DropsEveryLineWhenToldTo) {
   ASSERT_EQ(scratch.RunInside([] {
     WriteToKlog("first", "[INFO]");
     const LogDaemon daemon(SOCK_DGRAM);
-    LinuxHost::DropLog();
-    LinuxHost::ShowInformation();
+    const LinuxHost::DroppedLog dropped;
+    const LinuxHost::ShownLog shown;
     WriteToKlog("second", "[ERR]");
     LinuxHost::LogInformation("third");
     return std::string(SyslogIsRunning() ? "running, " : "not running, ") + daemon.Next();
@@ -228,7 +229,7 @@ TEST_F(SystemLog, ShowsInformationOnlyWhenAsked) {
   };
   EXPECT_EQ(scratch.RunInside([&] { return ErrorsOf(log); }), "");
   EXPECT_EQ(scratch.RunInside([&] {
-    LinuxHost::ShowInformation();
+    const LinuxHost::ShownLog shown;
     return ErrorsOf(log);
   }),
             "information\n");
@@ -238,7 +239,7 @@ TEST_F(SystemLog, ShowsInformationOnlyWhenAsked) {
 TEST_F(SystemLog, HandsShownLinesToTheDaemon) {
   EXPECT_EQ(scratch.RunInside([] {
     const LogDaemon daemon(SOCK_DGRAM);
-    LinuxHost::ShowInformation();
+    const LinuxHost::ShownLog shown;
     std::string answers = SyslogIsRunning() ? "yes" : "no";
     answers += "|" + ErrorsOf([] {
                  WriteToKlog("100%s", "[INFO]");

@@ -7,8 +7,8 @@
 #include <cstdlib>
 #include <set>
 
-#include "host/linux/files/boot.h"
 #include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/boot.h"
 #include "scratch_root.h"
 #include "tar_image.h"
 

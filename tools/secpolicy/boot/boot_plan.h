@@ -3,7 +3,7 @@
 #include <cstddef>
 #include <iosfwd>
 
-#include "host/linux/files/boot.h"
+#include "host/linux/operation/boot.h"
 
 namespace SecPolicyCli {
 

@@ -5,7 +5,7 @@
 #include <tuple>
 
 #include "check_run.h"
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/noted_labels.h"
 #include "root.h"
 #include "rule_form.h"
 #include "secpolicy/labels/file_label_policy.h"
@@ -190,7 +190,7 @@ void CheckFileLabels(CheckRun& run, const std::string& dir) {
   for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadLabels(run, *named.file, labels);
   std::optional<LinuxHost::NotedLabels> notes;
   if (CanRehearse(run)) {
-    notes.emplace(LinuxHost::LabelNotes::kRehearsal, run.scratch.DirectoryPath());
+    notes.emplace(LinuxHost::LabelNotes::kDryRun, run.scratch.DirectoryPath());
   }
   for (const LabelLine& line : labels) {
     const bool isLabel = CheckLabel(run, line);

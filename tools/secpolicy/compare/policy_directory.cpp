@@ -2,9 +2,9 @@
 
 #include <filesystem>
 
+#include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "scratch/scratch_directory.h"
-#include "scratch/used_state.h"
 #include "secpolicy/carry_on.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/policy_root.h"

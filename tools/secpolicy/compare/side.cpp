@@ -3,10 +3,10 @@
 #include <stdexcept>
 
 #include "compare/policy_directory.h"
+#include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "saved/saved_state.h"
 #include "scratch/state_reader.h"
-#include "scratch/used_state.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -33,7 +33,7 @@ Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::Co
 }
 
 Side ReadInstalled() {
-  if (IsStateMissing()) {
+  if (LinuxHost::IsStateMissing()) {
     throw std::runtime_error(
         "nothing is installed below this root. Name the root that was booted (--root DIR), or run "
         "'secpolicy boot' first.");

@@ -6,8 +6,8 @@
 #include <utility>
 
 #include "domain_file.h"
-#include "host/linux/state/rule_origins.h"
-#include "host/linux/state/stable_view.h"
+#include "host/linux/operation/rule_origins.h"
+#include "host/linux/operation/stable_view.h"
 #include "kitlibs/file.h"
 #include "printed_rules.h"
 #include "secpolicy/domain/domain_policy.h"

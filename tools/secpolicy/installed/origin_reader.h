@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/rule_origins.h"
+#include "host/linux/operation/rule_origins.h"
 #include "secpolicy/secpolicy.h"
 #include "teskctl/security.h"
 

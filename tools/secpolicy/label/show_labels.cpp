@@ -3,7 +3,7 @@
 #include <filesystem>
 
 #include "file_walk.h"
-#include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/file_label.h"
 #include "label_actions.h"
 
 namespace SecPolicyCli {

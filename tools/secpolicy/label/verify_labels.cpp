@@ -1,7 +1,7 @@
 #include <cerrno>
 
 #include "braxo/misc/strcat.h"
-#include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/file_label.h"
 #include "label_actions.h"
 #include "label_plan.h"
 #include "text/count.h"

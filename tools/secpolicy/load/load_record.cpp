@@ -4,7 +4,7 @@
 #include <exception>
 #include <filesystem>
 
-#include "host/linux/state/load_record.h"
+#include "host/linux/operation/load_record.h"
 #include "installed/origin_reader.h"
 #include "secpolicy/policy_root.h"
 #include "summary.h"

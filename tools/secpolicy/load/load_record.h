@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 
 namespace SecPolicyCli {
 

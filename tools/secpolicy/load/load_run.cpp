@@ -13,13 +13,12 @@
 #include <string_view>
 
 #include "error_watch.h"
-#include "host/linux/common/used_paths.h"
-#include "host/linux/files/label_journal.h"
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/label_journal.h"
+#include "host/linux/operation/noted_labels.h"
+#include "host/linux/operation/state_use.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
 #include "root.h"
-#include "scratch/used_state.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
 #include "summary.h"
@@ -144,15 +143,15 @@ class LoadRun {
   void Install() {
     LoadTiming timing(request.timing);
     if (request.mend) request.mend();
-    if (!LinuxHost::IsRehearsing()) PutBackLeftOver();
+    if (!request.dryRun) PutBackLeftOver();
     if (request.prepare) request.prepare(timing);
-    stateIsNew = IsStateMissing();
+    stateIsNew = LinuxHost::IsStateMissing();
     transaction.emplace();
     hasBegun = true;
     if (request.begin) request.begin();
     // A number on a file is to be one that the state knows.
     std::optional<NotedLabels> labels;
-    if (!LinuxHost::IsRehearsing()) labels.emplace(LinuxHost::LabelNotes::kForLater);
+    if (!request.dryRun) labels.emplace(LinuxHost::LabelNotes::kForLater);
     for (const LoadStep& step : request.steps) Take(step, timing);
     if (request.allOrNothing && labels) {
       InstallAllOrNothing(*labels);
@@ -165,7 +164,7 @@ class LoadRun {
 
   // A load that was killed while it gave labels, all of them or none, has left them half done.
   static void PutBackLeftOver() {
-    if (IsStateMissing()) return;
+    if (LinuxHost::IsStateMissing()) return;
     const auto back = LinuxHost::LabelJournal::PutBackLeftOver(LinuxHost::StatePath());
     if (!back) return;
     Summarize("load", "a load before this one was killed, so " +
@@ -281,7 +280,7 @@ class LoadRun {
     std::string summary = failure.empty() ? "failed" : failure;
     if (errors.Count() > 0) summary += " (" + CountOf(errors.Count(), "error") + " above)";
     if (isInstalled) {
-      if (!LinuxHost::IsRehearsing()) {
+      if (!request.dryRun) {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });
       }
       summary += DescribeRemainder(ending, request.keep);

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 #include "load/load_timing.h"
 #include "verb.h"
 
@@ -24,6 +24,7 @@ struct LoadRequest {
   bool keep = false;          // what no file has any more
   bool allOrNothing = false;  // installs nothing after an error
   bool timing = false;        // prints the time of each phase
+  bool dryRun = false;        // who asks has put copies in place of all that a load changes
 
   // What makes a state usable that is not, if anything can.
   std::function<void()> mend;

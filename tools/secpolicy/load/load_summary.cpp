@@ -7,7 +7,7 @@
 #include <string_view>
 
 #include "domain_file.h"
-#include "host/linux/state/policy_count.h"
+#include "host/linux/operation/policy_count.h"
 #include "secpolicy/policy_root.h"
 #include "summary.h"
 #include "text/count.h"

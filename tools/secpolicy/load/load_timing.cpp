@@ -7,7 +7,7 @@
 #include <sstream>
 #include <string_view>
 
-#include "host/linux/services/system_log.h"
+#include "host/linux/operation/log_use.h"
 
 namespace SecPolicyCli {
 namespace {

@@ -3,9 +3,9 @@
 #include <iostream>
 
 #include "command_line.h"
+#include "host/linux/operation/state_use.h"
 #include "library_call.h"
 #include "question.h"
-#include "scratch/used_state.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -18,7 +18,7 @@ std::shared_ptr<const std::string> AddAnswerFormat(Syntax& syntax) {
 
 ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer) {
   // The host would make a state of its own.
-  if (IsStateMissing()) return RefuseWithoutState(verb);
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState(verb);
   try {
     return answer();
   } catch (const QuestionError& error) {

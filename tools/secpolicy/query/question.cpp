@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <map>
 
-#include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/file_label.h"
 #include "host/linux/state/parameter_range.h"
 #include "installed/real_path.h"
 #include "text/suggestion.h"

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/rule_origins.h"
+#include "host/linux/operation/rule_origins.h"
 #include "installed/installed_policy.h"
 
 namespace SecPolicyCli {

@@ -6,7 +6,7 @@
 
 #include "compare/policy_directory.h"
 #include "compare/tardisk_transitions.h"
-#include "scratch/used_state.h"
+#include "host/linux/operation/state_use.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {

@@ -11,11 +11,11 @@
 
 #include "forked.h"
 #include "host/linux/common/host_error.h"
-#include "host/linux/services/system_log.h"
-#include "host/linux/state/store_copy.h"
+#include "host/linux/operation/log_use.h"
+#include "host/linux/operation/state_use.h"
+#include "host/linux/operation/store_copy.h"
 #include "policy_dir.h"
 #include "root.h"
-#include "scratch/used_state.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
@@ -64,7 +64,7 @@ std::string ReadAll(const std::string& path) {
 }  // namespace
 
 LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
-  if (CopyUsedState(StateBefore()) == StateCopy::kForbidden) ThrowForbidden();
+  if (LinuxHost::CopyUsedState(StateBefore()) == LinuxHost::StateCopy::kForbidden) ThrowForbidden();
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
     LinuxHost::CopyDatabase(StateBefore(), LinuxHost::CopyOf::kOwnCopy, StateAfter());
@@ -74,11 +74,13 @@ LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
   const ForkedEnd end = RunForked([&] {
     Redirect(STDOUT_FILENO, scratch.File("output"));
     Redirect(STDERR_FILENO, messageFile);
-    LinuxHost::DropLog();
-    const LinuxHost::NotedLabels notes(LinuxHost::LabelNotes::kRehearsal, scratch.Path());
-    const CopiedSettings settings(scratch.File("config.db"));
+    const LinuxHost::DroppedLog dropped;
+    const LinuxHost::NotedLabels notes(LinuxHost::LabelNotes::kDryRun, scratch.Path());
+    const LinuxHost::CopiedSettings settings(scratch.File("config.db"));
     const LinuxHost::UsedState state(StateAfter());
-    const ExitCode code = RunLoad(load);
+    LoadRequest dryRun = load;
+    dryRun.dryRun = true;
+    const ExitCode code = RunLoad(dryRun);
     WriteLabels(notes, labelFile);
     return code;
   });

@@ -4,7 +4,7 @@
 #include <utility>
 #include <vector>
 
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/noted_labels.h"
 #include "load/load_run.h"
 #include "scratch/scratch_directory.h"
 #include "verb.h"

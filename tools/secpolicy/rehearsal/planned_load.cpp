@@ -3,7 +3,7 @@
 #include <iostream>
 #include <limits>
 
-#include "host/linux/services/system_log.h"
+#include "host/linux/operation/log_use.h"
 #include "load_plan.h"
 #include "policy_dir.h"
 #include "summary.h"
@@ -19,7 +19,7 @@ constexpr std::size_t kShownLabels = 20;
 ExitCode PlanLoad(const LoadRequest& load, const PlanOptions& options) {
   const LoadRehearsal rehearsal(load);
   if (rehearsal.Ending() != kWell) std::cerr << rehearsal.Messages() << std::flush;
-  LinuxHost::DropLog();
+  const LinuxHost::DroppedLog dropped;
   const LoadPlan plan = MakeLoadPlan(rehearsal);
   if (options.format == "json") {
     WritePlanJson(plan, load.policyDir, rehearsal, std::cout);

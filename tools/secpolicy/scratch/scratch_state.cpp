@@ -5,9 +5,9 @@ namespace {
 
 constexpr char kState[] = "host.db";
 
-std::optional<StateCopy> CopyUnless(bool fresh, const std::string& to) {
+std::optional<LinuxHost::StateCopy> CopyUnless(bool fresh, const std::string& to) {
   if (fresh) return std::nullopt;
-  return CopyUsedState(to);
+  return LinuxHost::CopyUsedState(to);
 }
 
 }  // namespace
@@ -16,8 +16,8 @@ ScratchState::ScratchState(bool fresh)
     : copy(CopyUnless(fresh, directory.File(kState))), used(directory.File(kState)) {}
 
 std::string ScratchState::WhyNoCopy() const {
-  if (copy == StateCopy::kMissing) return "nothing is installed";
-  if (copy == StateCopy::kForbidden) return "this user may not read the installed state";
+  if (copy == LinuxHost::StateCopy::kMissing) return "nothing is installed";
+  if (copy == LinuxHost::StateCopy::kForbidden) return "this user may not read the installed state";
   return "";
 }
 

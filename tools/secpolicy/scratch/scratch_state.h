@@ -2,8 +2,8 @@
 
 #include <string>
 
+#include "host/linux/operation/state_use.h"
 #include "scratch_directory.h"
-#include "used_state.h"
 
 namespace SecPolicyCli {
 
@@ -12,12 +12,12 @@ namespace SecPolicyCli {
 class ScratchState {
  public:
   // Copies the installed state; with `fresh`, and where there is none or this user may not read it,
-  // starts from the state after a boot. Throws Braxo::Lib::BraxoException when there is no place for it,
-  // and for a state that cannot be trusted or is damaged.
+  // starts from the state after a boot. Throws Braxo::Lib::BraxoException when there is no place
+  // for it, and for a state that cannot be trusted or is damaged.
   explicit ScratchState(bool fresh);
 
   // False when the state is a new one.
-  bool IsCopy() const { return copy == StateCopy::kMade; }
+  bool IsCopy() const { return copy == LinuxHost::StateCopy::kMade; }
 
   // Why the state is a new one although a copy was wanted; empty when it is not.
   std::string WhyNoCopy() const;
@@ -30,7 +30,7 @@ class ScratchState {
 
  private:
   ScratchDirectory directory;
-  std::optional<StateCopy> copy;
+  std::optional<LinuxHost::StateCopy> copy;
   LinuxHost::UsedState used;
 };
 

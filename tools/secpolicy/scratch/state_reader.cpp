@@ -3,8 +3,8 @@
 #include <stdexcept>
 
 #include "braxo/lib/exception.h"
+#include "host/linux/operation/state_use.h"
 #include "scratch_directory.h"
-#include "used_state.h"
 
 namespace SecPolicyCli {
 namespace {

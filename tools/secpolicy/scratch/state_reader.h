@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "host/linux/state/store_copy.h"
+#include "host/linux/operation/store_copy.h"
 #include "installed/installed_policy.h"
 
 namespace SecPolicyCli {

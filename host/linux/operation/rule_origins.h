@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 
 // Where the policy was written: the kernel is told rules and labels, not the files that they come
 // from, so who loads files records it beside them. An origin says nothing about what is installed

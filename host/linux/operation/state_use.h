@@ -5,7 +5,8 @@
 
 #include "host/linux/common/used_paths.h"
 
-namespace SecPolicyCli {
+// Which state and settings the command works with: those of the host, or copies of its own.
+namespace LinuxHost {
 
 // True when there is surely no state where this process looks for it: one that this user may not
 // look for counts as there.
@@ -15,8 +16,8 @@ bool IsStateMissing();
 // out.
 enum class StateCopy { kMade, kMissing, kForbidden };
 
-// Copies the state that this process works with to the new file `to`. Throws what the host throws
-// for one that cannot be trusted or is damaged; leaves no file unless the copy was made.
+// Copies the state that this process works with to the new file `to`. Throws HostError for one that
+// cannot be trusted or is damaged; leaves no file unless the copy was made.
 StateCopy CopyUsedState(const std::string& to);
 
 // As long as it lives, this process works with a copy of the wanted settings, which becomes the new
@@ -27,7 +28,7 @@ class CopiedSettings {
   explicit CopiedSettings(const std::string& to);
 
  private:
-  std::optional<LinuxHost::UsedSettings> used;
+  std::optional<UsedSettings> used;
 };
 
-}  // namespace SecPolicyCli
+}  // namespace LinuxHost

@@ -1,4 +1,4 @@
-#include "host/linux/state/policy_load.h"
+#include "host/linux/operation/policy_load.h"
 
 #include <algorithm>
 #include <set>

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "host/linux/common/descriptor.h"
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/noted_labels.h"
 
 namespace LinuxHost {
 

@@ -1,4 +1,4 @@
-#include "host/linux/files/noted_labels.h"
+#include "host/linux/operation/noted_labels.h"
 
 #include <fcntl.h>
 #include <linux/magic.h>
@@ -16,12 +16,10 @@
 
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/files/inherited_label.h"
-#include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/file_label.h"
 
 namespace LinuxHost {
 namespace {
-
-NotedLabels* current = nullptr;
 
 int Fail(int error) {
   errno = error;
@@ -85,7 +83,7 @@ int CheckAnywhere(const std::string& path, const char* name, std::uint32_t id, L
     value.emplace(sizeof id, '\0');
     std::memcpy(value->data(), &id, sizeof id);
   }
-  if (purpose == LabelNotes::kRehearsal) return CheckQuietly(path);
+  if (purpose == LabelNotes::kDryRun) return CheckQuietly(path);
   const int error = TryInVain(path, name, value->data(), value->size());
   return error == 0 || error == EEXIST || error == ENODATA || error == EINVAL ? 0 : Fail(error);
 }
@@ -94,19 +92,12 @@ int CheckAnywhere(const std::string& path, const char* name, std::uint32_t id, L
 
 NotedLabels::NotedLabels(LabelNotes purposeOfNotes, const std::string& passedOverPath)
     : purpose(purposeOfNotes) {
-  current = this;
   const auto split = passedOverPath.empty() ? std::nullopt : SplitPath(passedOverPath);
   if (!split) return;
   passedOverName = split->second;
   passedOver = PlaceOf(passedOverPath).value_or(DirectoryPlace{});
   aboveIt = PlaceOf(split->first).value_or(DirectoryPlace{});
 }
-
-NotedLabels::~NotedLabels() { current = nullptr; }
-
-NotedLabels* NotedLabels::Current() { return current; }
-
-bool IsRehearsing() { return current != nullptr && current->purpose == LabelNotes::kRehearsal; }
 
 // Null, with errno set, when there is no such directory.
 const std::uint32_t* NotedLabels::FindDirectory(const std::string& path) {

@@ -1,4 +1,4 @@
-#include "host/linux/files/archive_library.h"
+#include "host/linux/operation/archive_library.h"
 
 #include <dlfcn.h>
 #include <iconv.h>

@@ -1,4 +1,4 @@
-#include "host/linux/services/settings.h"
+#include "host/linux/operation/settings.h"
 
 #include <algorithm>
 #include <array>
@@ -9,7 +9,6 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
-#include "host/linux/services/config_database.h"
 
 namespace LinuxHost {
 namespace {

@@ -1,39 +1,38 @@
-#include "used_state.h"
+#include "host/linux/operation/state_use.h"
 
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
 
-#include "braxo/lib/exception.h"
-#include "host/linux/state/store_copy.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/operation/store_copy.h"
 
-namespace SecPolicyCli {
+namespace LinuxHost {
 
 bool IsStateMissing() {
-  return faccessat(AT_FDCWD, LinuxHost::StatePath().c_str(), F_OK,
-                   AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
+  return faccessat(AT_FDCWD, StatePath().c_str(), F_OK, AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
          (errno == ENOENT || errno == ENOTDIR);
 }
 
 StateCopy CopyUsedState(const std::string& to) {
-  const std::string used = LinuxHost::StatePath();
+  const std::string used = StatePath();
   const int flags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;
   if (faccessat(AT_FDCWD, used.c_str(), R_OK, flags) != 0) {
     if (errno == ENOENT || errno == ENOTDIR) return StateCopy::kMissing;
     if (errno == EACCES) return StateCopy::kForbidden;
   }
-  LinuxHost::CopyDatabase(used, LinuxHost::CopyOf::kState, to);
+  CopyDatabase(used, CopyOf::kState, to);
   return StateCopy::kMade;
 }
 
 CopiedSettings::CopiedSettings(const std::string& to) {
   try {
-    LinuxHost::CopyDatabase(LinuxHost::SettingsPath(), LinuxHost::CopyOf::kSettings, to);
+    CopyDatabase(SettingsPath(), CopyOf::kSettings, to);
     used.emplace(to);
-  } catch (const Braxo::Lib::BraxoException&) {
+  } catch (const HostError&) {
     return;
   }
 }
 
-}  // namespace SecPolicyCli
+}  // namespace LinuxHost

@@ -1,4 +1,4 @@
-#include "host/linux/files/boot.h"
+#include "host/linux/operation/boot.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>

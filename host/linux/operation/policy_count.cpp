@@ -1,4 +1,4 @@
-#include "host/linux/state/policy_count.h"
+#include "host/linux/operation/policy_count.h"
 
 #include "host/linux/state/host_state.h"
 

@@ -1,4 +1,4 @@
-#include "host/linux/files/label_journal.h"
+#include "host/linux/operation/label_journal.h"
 
 #include <fcntl.h>
 #include <linux/limits.h>

@@ -1,4 +1,4 @@
-#include "host/linux/state/store_seal.h"
+#include "host/linux/operation/store_seal.h"
 
 #include <sha2.h>
 #include <sqlite3.h>

@@ -1,4 +1,4 @@
-#include "host/linux/state/stable_view.h"
+#include "host/linux/operation/stable_view.h"
 
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/store.h"

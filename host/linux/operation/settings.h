@@ -2,16 +2,14 @@
 
 #include <optional>
 #include <string>
-#include <variant>
+
+#include "host/linux/services/config_database.h"
 
 // The settings that the user wants of the host. They outlive a boot, in
 // /var/lib/secpolicy/config.db unless SECPOLICY_HOST_CONFIG names another absolute path. All throw
 // Braxo::Lib::BraxoException when the settings cannot be read or stored. Nothing is created to be
 // read: without a file there are no settings.
 namespace LinuxHost {
-
-// An advanced option is an integer or a text.
-using OptionValue = std::variant<long, std::string>;
 
 // The value that `text` stands for: an integer if it is one in decimal, else the text itself.
 OptionValue ParseOptionValue(const std::string& text);

@@ -1,4 +1,4 @@
-#include "host/linux/state/store_copy.h"
+#include "host/linux/operation/store_copy.h"
 
 #include <fcntl.h>
 #include <sqlite3.h>
@@ -13,9 +13,9 @@
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
+#include "host/linux/operation/store_seal.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/store.h"
-#include "host/linux/state/store_seal.h"
 
 namespace LinuxHost {
 namespace {

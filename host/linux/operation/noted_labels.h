@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "host/linux/files/directory_entry.h"
+#include "host/linux/files/security_attribute.h"
 
 namespace LinuxHost {
 
@@ -34,22 +35,19 @@ struct LabelFailure {
 };
 
 enum class LabelNotes {
-  kRehearsal,  // to be looked at; not even the attempt to write shows on a file
-  kForLater,   // to be given
+  kDryRun,    // to be looked at; not even the attempt to write shows on a file
+  kForLater,  // to be given
 };
 
 // As long as this object lives, the labels that this process gives to files are only noted, and
 // read back as if they had been given; the files stay as they are. A label that a file could not be
 // given is refused as it would be. What is no identifier is no label, and labels are only replaced
 // (EINVAL). One at a time.
-class NotedLabels {
+class NotedLabels : public AttributeStandIn {
  public:
   // The directory `passedOver`, and the files right in it, are of who takes the notes: they can be
   // given any label, and none is noted.
   explicit NotedLabels(LabelNotes purpose, const std::string& passedOver = "");
-  NotedLabels(const NotedLabels&) = delete;
-  NotedLabels& operator=(const NotedLabels&) = delete;
-  ~NotedLabels();
 
   // The files that would have been labelled by now, in ascending order of their paths.
   std::vector<LabelChange> Changes() const;
@@ -65,11 +63,9 @@ class NotedLabels {
       std::function<void(const DirectoryPlace& directory, const char* name, std::uint32_t id)>;
   std::vector<LabelFailure> ForEach(const OnNote& visit) const;
 
-  // For the attribute itself: what takes notes now, null when nothing does, and what then stands in
-  // for setxattr(2) and getxattr(2) with the attribute `name`.
-  static NotedLabels* Current();
-  int Set(const char* path, const char* name, const void* value, std::size_t size, int flags);
-  ssize_t Get(const char* path, const char* name, void* value, std::size_t size);
+  int Set(const char* path, const char* name, const void* value, std::size_t size,
+          int flags) override;
+  ssize_t Get(const char* path, const char* name, void* value, std::size_t size) override;
 
  private:
   // Its name stands in `names`, behind the one of the note before.
@@ -92,8 +88,6 @@ class NotedLabels {
   bool IsPassedOver(const Directory& directory, const std::string& name) const;
   void IndexNotes();
 
-  friend bool IsRehearsing();
-
   const LabelNotes purpose;
   DirectoryPlace passedOver;
   DirectoryPlace aboveIt;
@@ -109,8 +103,5 @@ class NotedLabels {
   std::size_t indexedNotes = 0;
   std::size_t indexedNames = 0;
 };
-
-// True while a rehearsal takes the notes.
-bool IsRehearsing();
 
 }  // namespace LinuxHost

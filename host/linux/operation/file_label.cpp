@@ -1,0 +1,29 @@
+#include "host/linux/operation/file_label.h"
+
+#include <sys/xattr.h>
+
+#include <cerrno>
+
+#include "host/linux/files/inherited_label.h"
+#include "host/linux/files/security_attribute.h"
+
+namespace LinuxHost {
+
+std::optional<FileLabel> ReadLabel(const char* path) {
+  const char* name = LabelAttribute().c_str();
+  FileLabel label;
+  if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
+  if (errno != ENODATA) return std::nullopt;
+  label.isInherited = true;
+  if (ReadInherited(path, LastLink::kKept, name, &label.id, sizeof label.id) >= 0) return label;
+  return std::nullopt;
+}
+
+int ReplaceLabel(const char* path, std::uint32_t id) {
+  const char* name = LabelAttribute().c_str();
+  const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
+  if (result == 0 || errno != ENODATA) return result;
+  return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
+}
+
+}  // namespace LinuxHost

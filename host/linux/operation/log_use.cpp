@@ -1,0 +1,21 @@
+#include "host/linux/operation/log_use.h"
+
+#include <utility>
+
+#include "host/linux/services/system_log.h"
+
+namespace LinuxHost {
+
+ShownLog::ShownLog() : before(std::exchange(CurrentLogUse().showsInformation, true)) {}
+
+ShownLog::~ShownLog() { CurrentLogUse().showsInformation = before; }
+
+DroppedLog::DroppedLog() : before(std::exchange(CurrentLogUse().dropsLines, true)) {}
+
+DroppedLog::~DroppedLog() { CurrentLogUse().dropsLines = before; }
+
+void WatchLog(const std::function<void(const std::string& message)>& watcher) {
+  CurrentLogUse().watcher = watcher;
+}
+
+}  // namespace LinuxHost
