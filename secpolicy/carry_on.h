@@ -1,5 +1,7 @@
 #pragma once
 
+#include "secpolicy/observed/policy_observer.h"
+#include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
@@ -7,12 +9,12 @@ namespace SecPolicy {
 // Runs `step`. A BraxoException is reported by its message; anything else passes through. Returns
 // whether the step succeeded.
 template <class Step>
-bool CarryOn(Step step) {
+bool CarryOn(PolicyObserver& observer, Step step) {
   try {
     step();
     return true;
   } catch (const Braxo::Lib::BraxoException& failure) {
-    SecpolicyError(failure.what());
+    ReportError(failure.what(), observer);
     return false;
   }
 }
@@ -20,12 +22,50 @@ bool CarryOn(Step step) {
 // Runs `step` on every one of `items` as CarryOn does, so that a bad one does not stop the others.
 // Returns whether all succeeded.
 template <class Items, class Step>
-bool ForEachCarryOn(Items& items, Step step) {
+bool ForEachCarryOn(Items& items, PolicyObserver& observer, Step step) {
   bool allSucceeded = true;
   for (auto& item : items) {
-    if (!CarryOn([&] { step(item); })) allSucceeded = false;
+    if (!CarryOn(observer, [&] { step(item); })) allSucceeded = false;
   }
   return allSucceeded;
 }
+
+// Runs `step`. A BraxoException is told as a problem of `file` and passes on.
+template <class Step>
+void TellFailure(const std::string& file, PolicyObserver& observer, Step step) {
+  try {
+    step();
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    observer.OnProblem({.file = file, .reason = failure.what()});
+    throw;
+  }
+}
+
+// Runs `readLine` for a line of a policy file; it notes in `problem` what it looks at. The problem
+// of a line that cannot be read is told, and the BraxoException passes on.
+template <class ReadLine>
+void TellRefusal(const Problem& problem, PolicyObserver& observer, ReadLine readLine) {
+  try {
+    readLine();
+  } catch (const Braxo::Lib::BraxoException&) {
+    observer.OnProblem(problem);
+    throw;
+  }
+}
+
+// Tells that a phase of a load begins, and at the end of its life that the phase ends.
+class PhaseOfLoad {
+ public:
+  PhaseOfLoad(LoadPhase begun, PolicyObserver& told) : phase(begun), observer(told) {
+    observer.OnBegin(phase);
+  }
+  PhaseOfLoad(const PhaseOfLoad&) = delete;
+  PhaseOfLoad& operator=(const PhaseOfLoad&) = delete;
+  ~PhaseOfLoad() { observer.OnEnd(phase); }
+
+ private:
+  const LoadPhase phase;
+  PolicyObserver& observer;
+};
 
 }  // namespace SecPolicy

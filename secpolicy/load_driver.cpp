@@ -4,6 +4,7 @@
 #include "secpolicy/carry_on.h"
 #include "secpolicy/domain/check_access_domain.h"
 #include "secpolicy/domain/enforcement.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
@@ -19,13 +20,15 @@ struct WellKnownDomain {
 };
 
 constexpr std::array kWellKnownDomains = {
-    WellKnownDomain{"globalVMDom", CacheGlobalVMDomain, &TeskAccessInterfaceImpl::SetGlobalVMDomain,
+    WellKnownDomain{kGlobalVmDomain, CacheGlobalVMDomain,
+                    &TeskAccessInterfaceImpl::SetGlobalVMDomain,
                     "Failed to fetch domainID for global VM Domain"},
-    WellKnownDomain{"ioFilterDom", CacheIOFilterDomain, &TeskAccessInterfaceImpl::SetIoFilterDomain,
+    WellKnownDomain{kIoFilterDomain, CacheIOFilterDomain,
+                    &TeskAccessInterfaceImpl::SetIoFilterDomain,
                     "Failed to fetch domainID for IOFilter domain"},
-    WellKnownDomain{"appDom", CacheDefaultTardiskDomain, nullptr,
+    WellKnownDomain{kDefaultTardiskDomain, CacheDefaultTardiskDomain, nullptr,
                     "Failed to fetch domainID for default tar disk domain"},
-    WellKnownDomain{"daemonFrameworkDom", CacheDaemonFrameworkDomain,
+    WellKnownDomain{kDaemonFrameworkDomain, CacheDaemonFrameworkDomain,
                     &TeskAccessInterfaceImpl::SetDaemonFrameworkDomain,
                     "Failed to fetch domainID for daemon framework domain"},
 };
@@ -34,15 +37,16 @@ std::string Join(const std::string& root, const char* directory) { return root +
 
 // A host must not come up without its well-known domains, so this ends the process: no exception is
 // being handled here. A caller that loads the policy inside a handler gets its own exception back.
-[[noreturn]] void Stop(const char* message) {
-  SecpolicyError(message);
+[[noreturn]] void StopWithout(const WellKnownDomain& domain, PolicyObserver& observer) {
+  observer.OnMissingDomain(domain.name);
+  ReportError(domain.missing, observer);
   throw;
 }
 
-void ResolveWellKnownDomains(TeskAccessInterfaceImpl& access) {
+void ResolveWellKnownDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   for (const WellKnownDomain& domain : kWellKnownDomains) {
     unsigned int id = 0;
-    if (!access.FindDomain(domain.name, &id)) Stop(domain.missing);
+    if (!access.FindDomain(domain.name, &id)) StopWithout(domain, observer);
     domain.cache(id);
     if (domain.announce != nullptr) (access.*domain.announce)(id);
   }
@@ -51,38 +55,53 @@ void ResolveWellKnownDomains(TeskAccessInterfaceImpl& access) {
 }  // namespace
 
 void LoadPolicy(const std::string& policyDir) {
+  PolicyObserver nobody;
+  LoadPolicy(policyDir, nobody);
+}
+
+void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
   TeskAccessInterfaceImpl access;
   bool failed = false;
-  const auto load = [&failed](auto step) {
-    if (!CarryOn(step)) failed = true;
+  const auto load = [&](auto step) {
+    if (!CarryOn(observer, step)) failed = true;
   };
 
   SecpolicyInfo("Using policy dir " + policyDir);
-  load([&] { LoadPolicyObjects(Join(policyDir, kObjectsDir), access); });
+  load([&] { LoadPolicyObjects(Join(policyDir, kObjectsDir), access, observer); });
   load([&] { CreateCheckAccessPolicyDomain(access); });
-  load([&] { LoadPolicyDomains(Join(policyDir, kDomainsDir), access); });
-  load([&] { LoadPartnerPolicyDomains(access); });
-  ResolveWellKnownDomains(access);
+  load([&] { LoadPolicyDomains(Join(policyDir, kDomainsDir), access, observer); });
+  load([&] { LoadPartnerPolicyDomains(access, observer); });
+  ResolveWellKnownDomains(access, observer);
   // Tardisks are the host's own, whatever policy is loaded: always under the fixed root.
-  load([&] { LoadPolicyTardisks(Join(kPolicyRoot, kTardisksDir), access); });
-  load([&] { LoadPolicyFileLabels(Join(policyDir, kFileLabelsDir), access); });
+  load([&] { LoadPolicyTardisks(Join(kPolicyRoot, kTardisksDir), access, observer); });
+  load([&] { LoadPolicyFileLabels(Join(policyDir, kFileLabelsDir), access, observer); });
 
   if (failed) RaiseError("There were some problems encountered in setting the policy");
   SecpolicyInfo("System security policy has been set successfully");
 }
 
 void LoadPolicyEarly(const std::string& earlyPolicyDir) {
-  CarryOn([&] {
+  PolicyObserver nobody;
+  LoadPolicyEarly(earlyPolicyDir, nobody);
+}
+
+void LoadPolicyEarly(const std::string& earlyPolicyDir, PolicyObserver& observer) {
+  CarryOn(observer, [&] {
     TeskAccessInterfaceImpl access;
     SecpolicyInfo("Using early policy dir " + earlyPolicyDir);
-    LoadPolicyObjects(Join(kPolicyRoot, kObjectsDir), access);
-    LoadPolicyDomains(Join(earlyPolicyDir, kDomainsDir), access);
-    LoadPolicyFileLabels(Join(kPolicyRoot, kFileLabelsDir), access);
+    LoadPolicyObjects(Join(kPolicyRoot, kObjectsDir), access, observer);
+    LoadPolicyDomains(Join(earlyPolicyDir, kDomainsDir), access, observer);
+    LoadPolicyFileLabels(Join(kPolicyRoot, kFileLabelsDir), access, observer);
   });
 }
 
 void RestoreDomainEnforcement() {
-  CarryOn([] {
+  PolicyObserver nobody;
+  RestoreDomainEnforcement(nobody);
+}
+
+void RestoreDomainEnforcement(PolicyObserver& observer) {
+  CarryOn(observer, [] {
     TeskAccessInterfaceImpl access;
     SecpolicyInfo("Restoring domain enforcement");
     RestoreDomainEnforcement(access);
@@ -90,10 +109,15 @@ void RestoreDomainEnforcement() {
 }
 
 void DisplayPolicy(const std::string& domainName) {
+  PolicyObserver nobody;
+  DisplayPolicy(domainName, nobody);
+}
+
+void DisplayPolicy(const std::string& domainName, PolicyObserver& observer) {
   TeskAccessInterfaceImpl access;
-  DisplayPolicyDomains(access, domainName);
+  DisplayPolicyDomains(access, domainName, observer);
   DisplayPolicyObjects(access);
-  DisplayPolicyTardiskLabels(access);
+  DisplayPolicyTardiskLabels(access, observer);
 }
 
 }  // namespace SecPolicy

@@ -20,4 +20,12 @@ inline constexpr char kFileLabelsDir[] = "fileLabels";
 // Where the tardisks themselves lie.
 inline constexpr char kTardiskImagesDir[] = "/tardisks/";
 
+// The domains that every host needs: a load asks for them by name, in this order.
+inline constexpr char kGlobalVmDomain[] = "globalVMDom";
+inline constexpr char kIoFilterDomain[] = "ioFilterDom";
+inline constexpr char kDefaultTardiskDomain[] = "appDom";
+inline constexpr char kDaemonFrameworkDomain[] = "daemonFrameworkDom";
+inline constexpr const char* kNeededDomains[] = {kGlobalVmDomain, kIoFilterDomain,
+                                                 kDefaultTardiskDomain, kDaemonFrameworkDomain};
+
 }  // namespace SecPolicy

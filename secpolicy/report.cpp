@@ -6,6 +6,7 @@
 #include <iostream>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
 #include "teskctl/system.h"
 
@@ -39,6 +40,11 @@ void SecpolicyError(const std::string& message) {
     return;
   }
   TeskCtl::System::WriteToKlog(message, "[ERR]");
+}
+
+void ReportError(const std::string& message, PolicyObserver& observer) {
+  observer.OnError(message);
+  SecpolicyError(message);
 }
 
 void PrintLine(std::string text) {

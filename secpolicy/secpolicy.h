@@ -207,6 +207,8 @@ class SECPOLICY_EXPORT TardiskPolicy {
   void SetPolicy(TeskAccessInterfaceImpl& access);
 
  private:
+  friend class TardiskPolicySteps;
+
   std::string policyFile;
   std::map<std::string, std::unique_ptr<TardiskRules>> ruleSets;
 };

@@ -14,11 +14,9 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void CapabilityRules::AddRule(unsigned int line, const std::string& domainName,
-                              unsigned int domainId, std::queue<std::string> args,
-                              TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_CapabilityRule& rule) { TakeTokens(rule, kTokens, args, access); });
+void CapabilityRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line,
+             [&](TeskAccess_CapabilityRule& rule) { TakeTokens(rule, kTokens, line, access); });
 }
 
 void CapabilityRules::Set(TeskAccessInterfaceImpl& access) {

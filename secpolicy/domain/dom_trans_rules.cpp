@@ -11,26 +11,23 @@ constexpr std::size_t kTokenCount = 4;
 
 // The target is looked up before the rest of the line is read: a line that names an unknown domain
 // says so, whatever else is wrong with it.
-void TakeTransition(TeskAccess_DomTransRule& rule, std::queue<std::string>& args,
+void TakeTransition(TeskAccess_DomTransRule& rule, RuleLine& line,
                     TeskAccessInterfaceImpl& access) {
-  if (args.size() != kTokenCount) RuleSizeError();
-  rule.label = TakeToken(args);
-  rule.targetDomain = TakeToken(args);
-  if (!access.FindDomain(rule.targetDomain, &rule.targetDomainId)) {
-    RaiseError("Failed to fetch domain id for: " + rule.targetDomain);
-  }
-  rule.transitionKind = TakeToken(args);
-  rule.grant = TakeGrant(args);
-  access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, rule.label);
-  access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS, rule.transitionKind);
+  line.RequireCount(kTokenCount);
+  rule.label = line.Take();
+  rule.targetDomain = line.Take();
+  rule.targetDomainId = line.FindDomain(rule.targetDomain, access);
+  rule.transitionKind = line.Take();
+  rule.grant = line.TakeGrant();
+  line.Validate(rule.label, 1, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, access);
+  line.Validate(rule.transitionKind, 3, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS, access);
 }
 
 }  // namespace
 
-void DomTransRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
-                            std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_DomTransRule& rule) { TakeTransition(rule, args, access); });
+void DomTransRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line,
+             [&](TeskAccess_DomTransRule& rule) { TakeTransition(rule, line, access); });
 }
 
 void DomTransRules::Set(TeskAccessInterfaceImpl& access) {

@@ -2,6 +2,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "secpolicy/domain/domain_policy.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
@@ -11,12 +12,12 @@ namespace {
 using Braxo::Lib::BraxoException;
 using Braxo::Misc::StrCat;
 
-void DisplayAllDomains(TeskAccessInterfaceImpl& access) {
+void DisplayAllDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   bool failed = false;
   const unsigned int slots = access.GetMaxDomains();
   for (unsigned int id = 0; id < slots; ++id) {
     try {
-      DisplayDomainPolicy(access, id);
+      DisplayDomainPolicy(access, id, observer);
     } catch (const BraxoException&) {
       failed = true;
     }
@@ -27,16 +28,28 @@ void DisplayAllDomains(TeskAccessInterfaceImpl& access) {
 }  // namespace
 
 void DisplayPolicyDomains(TeskAccessInterfaceImpl& access, const std::string& domain) {
+  PolicyObserver nobody;
+  DisplayPolicyDomains(access, domain, nobody);
+}
+
+void DisplayPolicyDomains(TeskAccessInterfaceImpl& access, const std::string& domain,
+                          PolicyObserver& observer) {
   DisplayHeader("Policy set in the kernel", "");
   if (domain.empty()) {
-    DisplayAllDomains(access);
+    DisplayAllDomains(access, observer);
     return;
   }
   const long id = std::strtol(domain.c_str(), nullptr, 10);
-  DisplayDomainPolicy(access, static_cast<unsigned int>(id));
+  DisplayDomainPolicy(access, static_cast<unsigned int>(id), observer);
 }
 
 void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id) {
+  PolicyObserver nobody;
+  DisplayDomainPolicy(access, id, nobody);
+}
+
+void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id,
+                         PolicyObserver& observer) {
   std::string name;
   std::string level;
   unsigned int state = 0;
@@ -47,7 +60,7 @@ void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id) {
     if (!access.GetCompleteDomainInfo(id, name, level, state, refCount, worldRefCount, dflt))
       return;
   } catch (const BraxoException& failure) {
-    SecpolicyError(StrCat("Failed to get policy for domain :", name, failure.what()));
+    ReportError(StrCat("Failed to get policy for domain :", name, failure.what()), observer);
     return;
   }
 
@@ -55,7 +68,7 @@ void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id) {
                 StrCat("State: ", state, " RefCount: ", refCount, " WorldRefCount: ", worldRefCount,
                        " defaultDom: ", static_cast<int>(dflt)));
   DomainPolicy policy(name, id);
-  policy.ReadSystemPolicy(access);
+  policy.ReadSystemPolicy(access, observer);
   policy.PrintPolicy();
 }
 

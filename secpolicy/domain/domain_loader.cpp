@@ -3,6 +3,7 @@
 #include "kitlibs/file.h"
 #include "secpolicy/carry_on.h"
 #include "secpolicy/domain/domain_policy.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
@@ -17,9 +18,10 @@ unsigned int FindOrCreateDomain(const std::string& name, TeskAccessInterfaceImpl
 }
 
 // All names exist before the first policy is parsed, so that domains can refer to each other.
-std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceImpl& access) {
+std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                                    PolicyObserver& observer) {
   std::map<std::string, std::string> files;
-  GetFileList(dir, files);
+  TellFailure(dir, observer, [&] { GetFileList(dir, files); });
 
   const std::string prefix = dir == kPartnerDomainsDir ? kPartnerPrefix : "";
   std::list<DomainPolicy> domains;
@@ -31,22 +33,24 @@ std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceI
   return domains;
 }
 
-bool ParsePolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access) {
-  const bool parsed =
-      ForEachCarryOn(domains, [&](DomainPolicy& domain) { domain.ParsePolicy(access); });
+bool ParsePolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access,
+                   PolicyObserver& observer) {
+  const bool parsed = ForEachCarryOn(
+      domains, observer, [&](DomainPolicy& domain) { domain.ParsePolicy(access, observer); });
   if (parsed) {
     SecpolicyInfo("Domain policies parsed and syntax validated");
   } else {
-    SecpolicyError("Error in parsing the policy for some domains");
+    ReportError("Error in parsing the policy for some domains", observer);
   }
   return parsed;
 }
 
 // A domain that fails is only kept out of the kernel, which SetPolicies then reports.
-void CheckConstraints(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access) {
-  const bool checked = ForEachCarryOn(domains, [&](DomainPolicy& domain) {
+void CheckConstraints(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access,
+                      PolicyObserver& observer) {
+  const bool checked = ForEachCarryOn(domains, observer, [&](DomainPolicy& domain) {
     try {
-      domain.CheckPolicyConstraints(access);
+      TellFailure(domain.policyFile, observer, [&] { domain.CheckPolicyConstraints(access); });
     } catch (const Braxo::Lib::BraxoException&) {
       domain.hasErrors = true;
       throw;
@@ -55,34 +59,54 @@ void CheckConstraints(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl&
   if (checked) {
     SecpolicyInfo("Constraints check for domain policies succeeded");
   } else {
-    SecpolicyError("Error in policy constraints check for some domains");
+    ReportError("Error in policy constraints check for some domains", observer);
   }
 }
 
-bool SetPolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access) {
-  const bool set = ForEachCarryOn(domains, [&](DomainPolicy& domain) { domain.SetPolicy(access); });
+bool SetPolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& access,
+                 PolicyObserver& observer) {
+  const bool set = ForEachCarryOn(
+      domains, observer, [&](DomainPolicy& domain) { domain.SetPolicy(access, observer); });
   if (set) {
     SecpolicyInfo("Domain policies set");
   } else {
-    SecpolicyError("Error in setting the policy for some domains");
+    ReportError("Error in setting the policy for some domains", observer);
   }
   return set;
+}
+
+void LoadDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                 PolicyObserver& observer) {
+  std::list<DomainPolicy> domains = NameDomains(dir, access, observer);
+  const bool parsed = ParsePolicies(domains, access, observer);
+  CheckConstraints(domains, access, observer);
+  // What was read before a bad line is installed too.
+  const bool set = SetPolicies(domains, access, observer);
+  if (!parsed || !set) RaiseError("Failure in domain policy");
 }
 
 }  // namespace
 
 void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access) {
-  std::list<DomainPolicy> domains = NameDomains(dir, access);
-  const bool parsed = ParsePolicies(domains, access);
-  CheckConstraints(domains, access);
-  // What was read before a bad line is installed too.
-  const bool set = SetPolicies(domains, access);
-  if (!parsed || !set) RaiseError("Failure in domain policy");
+  PolicyObserver nobody;
+  LoadPolicyDomains(dir, access, nobody);
+}
+
+void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                       PolicyObserver& observer) {
+  const PhaseOfLoad phase(LoadPhase::kDomains, observer);
+  LoadDomains(dir, access, observer);
 }
 
 void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  LoadPartnerPolicyDomains(access, nobody);
+}
+
+void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   if (File_Exists(kPartnerDomainsDir) && File_IsDirectory(kPartnerDomainsDir)) {
-    LoadPolicyDomains(kPartnerDomainsDir, access);
+    const PhaseOfLoad phase(LoadPhase::kPartnerDomains, observer);
+    LoadDomains(kPartnerDomainsDir, access, observer);
   }
 }
 

@@ -34,26 +34,49 @@ DomainPolicy::DomainPolicy(const std::string& domainName, unsigned int domainId)
 }
 
 void DomainPolicy::ParsePolicy(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  ParsePolicy(access, nobody);
+}
+
+void DomainPolicy::ParsePolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   if (policyFile.empty()) RaiseError("Policy file path has not been set for domain " + name);
 
   std::map<unsigned int, std::queue<std::string>> parsed;
-  ParseFile(policyFile, parsed);
-  ProcessParsedPolicyFile(access, parsed);
+  TellFailure(policyFile, observer, [&] { ParseFile(policyFile, parsed); });
+  ProcessParsedPolicyFile(access, parsed, observer);
 }
 
 void DomainPolicy::ProcessParsedPolicyFile(
     TeskAccessInterfaceImpl& access, std::map<unsigned int, std::queue<std::string>>& parsed) {
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.empty()) continue;
+  PolicyObserver nobody;
+  ProcessParsedPolicyFile(access, parsed, nobody);
+}
 
-    const std::string keyword = std::move(tokens.front());
-    tokens.pop();
-    const auto rules = ruleSets.find(keyword);
-    if (rules == ruleSets.end()) {
-      RaisePolicyParseError(line, name, "invalid policy rule type (" + keyword + ")");
-    }
-    rules->second->AddRule(line, name, id, tokens, access);
+void DomainPolicy::ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
+                                           std::map<unsigned int, std::queue<std::string>>& parsed,
+                                           PolicyObserver& observer) {
+  Problem problem{.file = policyFile};
+  for (auto& [line, words] : parsed) {
+    if (words.empty()) continue;
+    problem.line = line;
+    TellRefusal(problem, observer,
+                [&, &lineWords = words] { ParseLine(lineWords, access, problem); });
   }
+}
+
+void DomainPolicy::ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access,
+                             Problem& problem) {
+  const std::string keyword = std::move(words.front());
+  words.pop();
+  const auto rules = ruleSets.find(keyword);
+  if (rules == ruleSets.end()) {
+    problem.fault = Fault::kRuleType;
+    problem.word = 0;
+    problem.reason = "invalid policy rule type (" + keyword + ")";
+    RaisePolicyParseError(problem.line, name, problem.reason);
+  }
+  RuleLine line(problem.line, name, id, words, problem);
+  rules->second->AddLine(line, access);
 }
 
 void DomainPolicy::CheckPolicyConstraints(TeskAccessInterfaceImpl& access) {
@@ -61,14 +84,27 @@ void DomainPolicy::CheckPolicyConstraints(TeskAccessInterfaceImpl& access) {
 }
 
 void DomainPolicy::SetPolicy(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  SetPolicy(access, nobody);
+}
+
+void DomainPolicy::SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   if (hasErrors) {
     RaiseError("Skipping the policy for domain " + name + " due to errors in the policy");
   }
-  for (const auto& [keyword, rules] : ruleSets) rules->Set(access);
+  TellFailure(policyFile, observer, [&] {
+    for (const auto& [keyword, rules] : ruleSets) rules->SetObserved(access, observer);
+  });
 }
 
 void DomainPolicy::ReadSystemPolicy(TeskAccessInterfaceImpl& access) {
-  ForEachCarryOn(ruleSets, [&](auto& entry) { entry.second->ReadSystemRules(id, access); });
+  PolicyObserver nobody;
+  ReadSystemPolicy(access, nobody);
+}
+
+void DomainPolicy::ReadSystemPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
+  ForEachCarryOn(ruleSets, observer,
+                 [&](auto& entry) { entry.second->ReadSystemRules(id, access); });
 }
 
 void DomainPolicy::PrintPolicy() {

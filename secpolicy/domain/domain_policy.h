@@ -18,11 +18,19 @@ class DomainPolicy {
 
   // Reads `policyFile` into the rule sets. Throws at the first bad line; the rules before it stay.
   void ParsePolicy(TeskAccessInterfaceImpl& access);
+  void ParsePolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
 
   // Hands every line of `parsed` to the rule set of its first word, which is taken off the line.
   // Throws at the first bad line; the rules before it stay.
   void ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
                                std::map<unsigned int, std::queue<std::string>>& parsed);
+  void ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
+                               std::map<unsigned int, std::queue<std::string>>& parsed,
+                               PolicyObserver& observer);
+
+  // The same for the line `problem.line`, which has words. Before it throws, `problem` says what is
+  // wrong with the line.
+  void ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access, Problem& problem);
 
   // Checks the rules of each set against each other. Throws at the first set that fails.
   void CheckPolicyConstraints(TeskAccessInterfaceImpl& access);
@@ -30,9 +38,11 @@ class DomainPolicy {
   // Installs all rule sets. Throws, having touched none, while `hasErrors` is set, and at the first
   // set that is refused; those before it stay installed.
   void SetPolicy(TeskAccessInterfaceImpl& access);
+  void SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
 
   // Fills the rule sets from the kernel. A set that cannot be read is reported, not thrown.
   void ReadSystemPolicy(TeskAccessInterfaceImpl& access);
+  void ReadSystemPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
 
   // Prints the rules to standard output.
   void PrintPolicy();

@@ -17,11 +17,9 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void FileCreationRules::AddRule(unsigned int line, const std::string& domainName,
-                                unsigned int domainId, std::queue<std::string> args,
-                                TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_FileCreationRule& rule) { TakeTokens(rule, kTokens, args, access); });
+void FileCreationRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line,
+             [&](TeskAccess_FileCreationRule& rule) { TakeTokens(rule, kTokens, line, access); });
 }
 
 void FileCreationRules::Set(TeskAccessInterfaceImpl& access) {

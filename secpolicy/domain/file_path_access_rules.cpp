@@ -29,10 +29,10 @@ const Access& FindAccess(char letter) {
   RaiseError("Unknown access privilege specified.");
 }
 
-void TakePath(TeskAccess_FilePathAccessRule& rule, std::queue<std::string>& args) {
-  if (args.empty() || args.size() > 2) RuleSizeError();
-  rule.path = TakeToken(args);
-  if (!args.empty()) rule.permissions = TakeToken(args);
+void TakePath(TeskAccess_FilePathAccessRule& rule, RuleLine& line) {
+  line.RequireCount(1, 2);
+  rule.path = line.Take();
+  if (line.Left() > 0) rule.permissions = line.Take();
 }
 
 // The kernel matches a path as the program gave it and as it resolves, so a rule is for both, even
@@ -49,11 +49,8 @@ unsigned int FillPaths(PathEntries& entries, const std::string& path) {
 
 }  // namespace
 
-void FilePathAccessRules::AddRule(unsigned int line, const std::string& domainName,
-                                  unsigned int domainId, std::queue<std::string> args,
-                                  TeskAccessInterfaceImpl&) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_FilePathAccessRule& rule) { TakePath(rule, args); });
+void FilePathAccessRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl&) {
+  AppendRule(rules, line, [&](TeskAccess_FilePathAccessRule& rule) { TakePath(rule, line); });
 }
 
 unsigned int FilePathAccessRules::GetPermission(const std::string& permissions) {
@@ -67,8 +64,14 @@ unsigned int FilePathAccessRules::GetPermission(const std::string& permissions) 
   return mask;
 }
 
-void FilePathAccessRules::Set(TeskAccessInterfaceImpl&) {
+void FilePathAccessRules::Set(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  SetObserved(access, nobody);
+}
+
+void FilePathAccessRules::SetObserved(TeskAccessInterfaceImpl&, PolicyObserver& observer) {
   for (const TeskAccess_FilePathAccessRule& rule : rules) {
+    observer.OnPathRule(rule);
     PathEntries entries{};
     const unsigned int count = FillPaths(entries, rule.path);
     // Permissions are checked only here, and their failure is meant to stay bare.

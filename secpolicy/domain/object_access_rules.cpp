@@ -15,11 +15,9 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void ObjectAccessRules::AddRule(unsigned int line, const std::string& domainName,
-                                unsigned int domainId, std::queue<std::string> args,
-                                TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_ObjectAccessRule& rule) { TakeTokens(rule, kTokens, args, access); });
+void ObjectAccessRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line,
+             [&](TeskAccess_ObjectAccessRule& rule) { TakeTokens(rule, kTokens, line, access); });
 }
 
 void ObjectAccessRules::Set(TeskAccessInterfaceImpl& access) {

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "secpolicy/domain/policy_errors.h"
+#include "secpolicy/domain/rule_line.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
@@ -24,46 +25,33 @@ struct RuleToken {
 template <class Rule>
 RuleToken(std::string Rule::*, TeskCtl::Security::TeskAccess_KeywordType) -> RuleToken<Rule>;
 
-// Takes the next word of the line.
-inline std::string TakeToken(std::queue<std::string>& args) {
-  std::string token = std::move(args.front());
-  args.pop();
-  return token;
-}
-
-// Takes the last word of the line, "grant" or "revoke"; throws for any other.
-inline bool TakeGrant(std::queue<std::string>& args) {
-  std::string word = TakeToken(args);
-  return IsGrant(word);
-}
-
 // Fills a record with the line's header and with what `parse` takes from the line, and appends it.
 // A failure becomes a parse error that names the line; nothing is appended then.
 template <class Rule, class Parse>
-void AppendRule(std::list<Rule>& rules, unsigned int line, const std::string& domainName,
-                unsigned int domainId, Parse parse) {
+void AppendRule(std::list<Rule>& rules, const RuleLine& line, Parse parse) {
   try {
     Rule rule;
-    rule.line = line;
-    rule.domainId = domainId;
-    rule.domainName = domainName;
+    rule.line = line.line;
+    rule.domainId = line.domainId;
+    rule.domainName = line.domainName;
     parse(rule);
     rules.push_back(std::move(rule));
   } catch (const Braxo::Lib::BraxoException& failure) {
-    RaisePolicyParseError(line, domainName, failure.what());
+    line.Refuse(failure.what());
   }
 }
 
 // Takes a line of exactly `tokens` and the grant word. The words are checked after all are taken,
 // so a bad grant word is reported before a word that the kernel does not know.
 template <class Rule, std::size_t Count>
-void TakeTokens(Rule& rule, const std::array<RuleToken<Rule>, Count>& tokens,
-                std::queue<std::string>& args, TeskAccessInterfaceImpl& access) {
-  if (args.size() != Count + 1) RuleSizeError();
-  for (const RuleToken<Rule>& token : tokens) rule.*token.field = TakeToken(args);
-  rule.grant = TakeGrant(args);
+void TakeTokens(Rule& rule, const std::array<RuleToken<Rule>, Count>& tokens, RuleLine& line,
+                TeskAccessInterfaceImpl& access) {
+  line.RequireCount(Count + 1);
+  for (const RuleToken<Rule>& token : tokens) rule.*token.field = line.Take();
+  rule.grant = line.TakeGrant();
+  std::size_t word = 0;
   for (const RuleToken<Rule>& token : tokens) {
-    access.ValidateKeyword(token.keywords, rule.*token.field);
+    line.Validate(rule.*token.field, ++word, token.keywords, access);
   }
 }
 

@@ -13,10 +13,9 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void SyscallRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
-                           std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, domainName, domainId,
-             [&](TeskAccess_SyscallRule& rule) { TakeTokens(rule, kTokens, args, access); });
+void SyscallRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, line,
+             [&](TeskAccess_SyscallRule& rule) { TakeTokens(rule, kTokens, line, access); });
 }
 
 void SyscallRules::Set(TeskAccessInterfaceImpl& access) {

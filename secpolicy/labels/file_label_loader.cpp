@@ -1,5 +1,6 @@
 #include "secpolicy/carry_on.h"
 #include "secpolicy/labels/file_label_policy.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
@@ -8,22 +9,23 @@ namespace {
 
 constexpr char kFailure[] = "Failure in file labels policy";
 
-bool ParseFiles(const std::string& dir, FileLabelPolicy& policy, TeskAccessInterfaceImpl& access) {
+bool ParseFiles(const std::string& dir, FileLabelPolicy& policy, TeskAccessInterfaceImpl& access,
+                PolicyObserver& observer) {
   std::map<std::string, std::string> files;
-  GetFileList(dir, files);
+  TellFailure(dir, observer, [&] { GetFileList(dir, files); });
 
   bool failed = false;
   for (const auto& [path, name] : files) {
     try {
-      policy.ParsePolicy(path, access);
+      policy.ParsePolicy(path, access, observer);
     } catch (const Braxo::Lib::BraxoException& failure) {
-      SecpolicyError("Error parsing file " + path);
-      SecpolicyError(failure.what());
+      ReportError("Error parsing file " + path, observer);
+      ReportError(failure.what(), observer);
       failed = true;
     }
   }
   if (failed) {
-    SecpolicyError("Error in parsing some file label mappings.");
+    ReportError("Error in parsing some file label mappings.", observer);
   } else {
     SecpolicyInfo("Parsed all file label mappings");
   }
@@ -33,11 +35,18 @@ bool ParseFiles(const std::string& dir, FileLabelPolicy& policy, TeskAccessInter
 }  // namespace
 
 void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  LoadPolicyFileLabels(dir, access, nobody);
+}
+
+void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& access,
+                          PolicyObserver& observer) {
+  const PhaseOfLoad phase(LoadPhase::kFileLabels, observer);
   FileLabelPolicy policy;
-  const bool parsed = ParseFiles(dir, policy, access);
+  const bool parsed = ParseFiles(dir, policy, access, observer);
   // What was read before a bad line is applied too.
-  if (!CarryOn([&] { policy.SetFileLabels(access); })) {
-    SecpolicyError("Error in setting some file labels.");
+  if (!CarryOn(observer, [&] { policy.SetFileLabels(access, observer); })) {
+    ReportError("Error in setting some file labels.", observer);
     RaiseError(kFailure);
   }
   SecpolicyInfo("Set all file labels");

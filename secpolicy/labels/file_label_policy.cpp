@@ -3,6 +3,7 @@
 #include <string_view>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/carry_on.h"
 #include "secpolicy/report.h"
 
 namespace SecPolicy {
@@ -19,24 +20,23 @@ std::string LineMessage(const std::string& file, unsigned int line, const std::s
   return StrCat(file, ":", line, " : ", message);
 }
 
-FileLabel ParseLine(const std::string& file, unsigned int line, std::queue<std::string>& tokens,
-                    TeskAccessInterfaceImpl& access) {
-  if (tokens.size() != 2) RaiseError(LineMessage(file, line, "incorrect no of parameters"));
-  const std::string& pattern = tokens.front();
-  const std::string& label = tokens.back();
-  // An unknown label is told in the kernel's own words, before the pattern is looked at.
-  access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
+[[noreturn]] void Refuse(Problem& problem, Fault fault, std::size_t word, const char* reason) {
+  problem.fault = fault;
+  problem.word = word;
+  problem.reason = reason;
+  RaiseError(LineMessage(problem.file, problem.line, problem.reason));
+}
 
-  const std::size_t marker = pattern.find(kTreeMarker);
-  const bool recursive = marker != std::string::npos;
-  if (recursive && marker + kTreeMarker.size() != pattern.size()) {
-    RaiseError(LineMessage(file, line, "Unrecognized format for file/dir specification"));
+// An unknown label is told in the kernel's own words.
+void ValidateLabel(const std::string& label, TeskAccessInterfaceImpl& access, Problem& problem) {
+  try {
+    access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
+  } catch (const BraxoException& failure) {
+    problem.fault = Fault::kUnknownWord;
+    problem.word = 1;
+    problem.reason = failure.what();
+    throw;
   }
-  return {.path = pattern.substr(0, marker),
-          .label = label,
-          .recursive = recursive,
-          .policyFile = file,
-          .lineNumber = line};
 }
 
 void Apply(const FileLabel& fileLabel, TeskAccessInterfaceImpl& access) {
@@ -50,22 +50,61 @@ void Apply(const FileLabel& fileLabel, TeskAccessInterfaceImpl& access) {
 }  // namespace
 
 void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  ParsePolicy(file, access, nobody);
+}
+
+void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access,
+                                  PolicyObserver& observer) {
   std::map<unsigned int, std::queue<std::string>> parsed;
-  ParseFile(file, parsed);
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.empty()) continue;
-    fileLabels.push_back(ParseLine(file, line, tokens, access));
+  TellFailure(file, observer, [&] { ParseFile(file, parsed); });
+  Problem problem{.file = file};
+  for (auto& [line, words] : parsed) {
+    if (words.empty()) continue;
+    problem.line = line;
+    TellRefusal(problem, observer,
+                [&, &lineWords = words] { ParseLine(lineWords, access, problem); });
+    observer.OnFileLabel(fileLabels.back());
   }
 }
 
+void FileLabelPolicy::ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access,
+                                Problem& problem) {
+  if (words.size() != 2) {
+    Refuse(problem, Fault::kArgumentCount, Problem::kWholeLine, "incorrect no of parameters");
+  }
+  const std::string& pattern = words.front();
+  const std::string& label = words.back();
+  // Before the pattern is looked at.
+  ValidateLabel(label, access, problem);
+
+  const std::size_t marker = pattern.find(kTreeMarker);
+  const bool recursive = marker != std::string::npos;
+  if (recursive && marker + kTreeMarker.size() != pattern.size()) {
+    Refuse(problem, Fault::kTreeMarker, 0, "Unrecognized format for file/dir specification");
+  }
+  fileLabels.push_back({.path = pattern.substr(0, marker),
+                        .label = label,
+                        .recursive = recursive,
+                        .policyFile = problem.file,
+                        .lineNumber = problem.line});
+}
+
 void FileLabelPolicy::SetFileLabels(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  SetFileLabels(access, nobody);
+}
+
+void FileLabelPolicy::SetFileLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   bool failed = false;
   for (; !fileLabels.empty(); fileLabels.pop_front()) {
     const FileLabel& fileLabel = fileLabels.front();
     try {
       Apply(fileLabel, access);
     } catch (const BraxoException& failure) {
-      SecpolicyError(LineMessage(fileLabel.policyFile, fileLabel.lineNumber, failure.what()));
+      const auto& [path, label, recursive, file, line] = fileLabel;
+      observer.OnProblem({.file = file, .line = line, .reason = failure.what()});
+      ReportError(LineMessage(file, line, failure.what()), observer);
       failed = true;
     }
   }

@@ -1,6 +1,7 @@
 #include "braxo/misc/strcat.h"
 #include "secpolicy/carry_on.h"
 #include "secpolicy/labels/object_policy.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
@@ -9,16 +10,16 @@ namespace {
 
 constexpr char kFailure[] = "Failure in object policy";
 
-bool ParseFiles(const std::string& dir, ObjectPolicy& policy) {
+bool ParseFiles(const std::string& dir, ObjectPolicy& policy, PolicyObserver& observer) {
   std::map<std::string, std::string> files;
-  GetFileList(dir, files);
+  TellFailure(dir, observer, [&] { GetFileList(dir, files); });
 
-  const bool parsed =
-      ForEachCarryOn(files, [&](const auto& file) { policy.ParsePolicy(file.first); });
+  const bool parsed = ForEachCarryOn(
+      files, observer, [&](const auto& file) { policy.ParsePolicy(file.first, observer); });
   if (parsed) {
     SecpolicyInfo("Parsed all objects");
   } else {
-    SecpolicyError("Error in parsing some object files");
+    ReportError("Error in parsing some object files", observer);
   }
   return parsed;
 }
@@ -26,14 +27,21 @@ bool ParseFiles(const std::string& dir, ObjectPolicy& policy) {
 }  // namespace
 
 void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  LoadPolicyObjects(dir, access, nobody);
+}
+
+void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access,
+                       PolicyObserver& observer) {
+  const PhaseOfLoad phase(LoadPhase::kObjects, observer);
   ObjectPolicy policy;
-  const bool parsed = ParseFiles(dir, policy);
+  const bool parsed = ParseFiles(dir, policy, observer);
   // The kernel follows what was read, also where that is only a part: objects that only the broken
   // part of a file defines are removed.
   try {
     policy.SetObjects(access);
   } catch (const Braxo::Lib::BraxoException&) {
-    SecpolicyError("Error in defining some objects");
+    ReportError("Error in defining some objects", observer);
     RaiseError(kFailure);
   }
   SecpolicyInfo("Objects defined and obsolete objects removed");

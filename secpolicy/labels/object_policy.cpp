@@ -1,20 +1,34 @@
 #include "secpolicy/labels/object_policy.h"
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/carry_on.h"
 #include "secpolicy/report.h"
 
 namespace SecPolicy {
 
 void ObjectPolicy::ParsePolicy(const std::string& path) {
+  PolicyObserver nobody;
+  ParsePolicy(path, nobody);
+}
+
+void ObjectPolicy::ParsePolicy(const std::string& path, PolicyObserver& observer) {
   std::map<unsigned int, std::queue<std::string>> parsed;
-  ParseFile(path, parsed);
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.size() != 1) {
-      RaiseError(
-          Braxo::Misc::StrCat(path, ":", line, " : cannot define more than one object per line"));
-    }
-    names.push_back(std::move(tokens.front()));
+  TellFailure(path, observer, [&] { ParseFile(path, parsed); });
+  Problem problem{.file = path};
+  for (auto& [line, words] : parsed) {
+    problem.line = line;
+    TellRefusal(problem, observer, [&, &lineWords = words] { ParseLine(lineWords, problem); });
   }
+}
+
+void ObjectPolicy::ParseLine(std::queue<std::string>& words, Problem& problem) {
+  if (words.size() != 1) {
+    problem.fault = Fault::kArgumentCount;
+    problem.word = Problem::kWholeLine;
+    problem.reason = "cannot define more than one object per line";
+    RaiseError(Braxo::Misc::StrCat(problem.file, ":", problem.line, " : ", problem.reason));
+  }
+  names.push_back(std::move(words.front()));
 }
 
 void ObjectPolicy::SetObjects(TeskAccessInterfaceImpl& access) {

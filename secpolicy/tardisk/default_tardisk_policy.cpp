@@ -1,4 +1,5 @@
 #include "braxo/misc/strcat.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
@@ -10,13 +11,13 @@ using Braxo::Lib::BraxoException;
 // Runs `step`; a failure is reported in two lines, `heading` and its message. Returns whether it
 // succeeded.
 template <class Step>
-bool TryDefault(const char* heading, Step step) {
+bool TryDefault(const char* heading, PolicyObserver& observer, Step step) {
   try {
     step();
     return true;
   } catch (const BraxoException& failure) {
-    SecpolicyError(heading);
-    SecpolicyError(failure.what());
+    ReportError(heading, observer);
+    ReportError(failure.what(), observer);
     return false;
   }
 }
@@ -24,6 +25,12 @@ bool TryDefault(const char* heading, Step step) {
 }  // namespace
 
 void SetDefaultTardiskPolicy(std::list<std::string>& tardisks, TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  SetDefaultTardiskPolicy(tardisks, access, nobody);
+}
+
+void SetDefaultTardiskPolicy(const std::list<std::string>& tardisks,
+                             TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   const std::string defaultLabel = access.GetDefaultTardiskLabel();
   const std::string defaultDomain = access.GetDefaultTardiskDomain();
   const std::vector<std::string> launchDomains = access.GetTardiskLaunchDomains();
@@ -37,7 +44,7 @@ void SetDefaultTardiskPolicy(std::list<std::string>& tardisks, TeskAccessInterfa
       RaiseError("Failed to fetch domain id for " + launchDomain);
     }
     if (launchDomainId == defaultDomainId) continue;
-    const bool set = TryDefault("Failed to set default tardisk rule: ", [&] {
+    const bool set = TryDefault("Failed to set default tardisk rule: ", observer, [&] {
       access.SetDomTransRule({.line = 0,
                               .domainId = launchDomainId,
                               .domainName = launchDomain,
@@ -51,7 +58,7 @@ void SetDefaultTardiskPolicy(std::list<std::string>& tardisks, TeskAccessInterfa
   }
 
   for (const std::string& tardisk : tardisks) {
-    const bool set = TryDefault("Failed to set default tardisk label: ",
+    const bool set = TryDefault("Failed to set default tardisk label: ", observer,
                                 [&] { SetFileLabel(tardisk, defaultLabel, access); });
     if (!set) failed = true;
   }

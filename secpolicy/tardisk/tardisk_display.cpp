@@ -1,15 +1,21 @@
 #include <iostream>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
 
 void DisplayPolicyTardiskLabels(TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  DisplayPolicyTardiskLabels(access, nobody);
+}
+
+void DisplayPolicyTardiskLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   DisplayHeader("Tardisk Path (label)", "");
   std::list<std::string> tardisks;
-  GetAllTardisks(tardisks);
+  GetAllTardisks(tardisks, observer);
   for (const std::string& tardisk : tardisks) {
     // The path stands before the label is read: a tardisk whose label cannot be read leaves its
     // line open.
@@ -17,8 +23,9 @@ void DisplayPolicyTardiskLabels(TeskAccessInterfaceImpl& access) {
     try {
       PrintLine(GetFileLabel(tardisk, access) + ")");
     } catch (const Braxo::Lib::BraxoException& failure) {
-      SecpolicyError(
-          Braxo::Misc::StrCat("Error in reading tardisk label: (", tardisk, "): ", failure.what()));
+      ReportError(
+          Braxo::Misc::StrCat("Error in reading tardisk label: (", tardisk, "): ", failure.what()),
+          observer);
     }
   }
 }

@@ -1,5 +1,7 @@
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
 
+#include <utility>
+
 #include "braxo/misc/strcat.h"
 #include "secpolicy/report.h"
 
@@ -18,36 +20,47 @@ unsigned int DomainId(const std::string& name, TeskAccessInterfaceImpl& access) 
   return id;
 }
 
-void SetLabel(const TeskAccess_TardiskExceptionRule& rule, TeskAccessInterfaceImpl& access) {
+void SetLabel(const TeskAccess_TardiskExceptionRule& rule, TeskAccessInterfaceImpl& access,
+              PolicyObserver& observer) {
   SetFileLabel(rule.tardiskPath, rule.label, access);
+  observer.OnFileLabel({.path = rule.tardiskPath,
+                        .label = rule.label,
+                        .policyFile = rule.policyFile,
+                        .lineNumber = rule.lineNumber});
 }
 
-void SetTransitions(const TeskAccess_TardiskExceptionRule& rule, TeskAccessInterfaceImpl& access) {
+void SetTransitions(const TeskAccess_TardiskExceptionRule& rule, TeskAccessInterfaceImpl& access,
+                    PolicyObserver& observer) {
   if (rule.label == kUnlabeled) return;
   const std::vector<std::string> launchDomains = access.GetTardiskLaunchDomains();
   for (const std::string& launchDomain : launchDomains) {
     const std::string eventKeyword = access.GetTardiskExecEventKeyword();
     const unsigned int launchDomainId = DomainId(launchDomain, access);
     if (launchDomainId == rule.domainId) continue;
-    access.SetDomTransRule({.line = rule.lineNumber,
-                            .domainId = launchDomainId,
-                            .domainName = launchDomain,
-                            .label = rule.label,
-                            .targetDomain = rule.domainName,
-                            .targetDomainId = rule.domainId,
-                            .transitionKind = eventKeyword,
-                            .grant = true});
+    const TeskCtl::Security::TeskAccess_DomTransRule transition = {.line = rule.lineNumber,
+                                                                   .domainId = launchDomainId,
+                                                                   .domainName = launchDomain,
+                                                                   .label = rule.label,
+                                                                   .targetDomain = rule.domainName,
+                                                                   .targetDomainId = rule.domainId,
+                                                                   .transitionKind = eventKeyword,
+                                                                   .grant = true};
+    access.SetDomTransRule(transition);
+    observer.OnTardiskTransition(transition, rule.policyFile);
   }
 }
 
-// Runs `set` on every rule; the first failure is thrown on with the rule's place and tardisk.
+// Runs `set` on every rule; the first failure is told, and thrown on with the rule's place and
+// tardisk.
 template <class SetRule>
 void SetEachRule(const std::list<TeskAccess_TardiskExceptionRule>& rules,
-                 TeskAccessInterfaceImpl& access, SetRule set) {
+                 TeskAccessInterfaceImpl& access, PolicyObserver& observer, SetRule set) {
   for (const TeskAccess_TardiskExceptionRule& rule : rules) {
     try {
-      set(rule, access);
+      set(rule, access, observer);
     } catch (const BraxoException& failure) {
+      observer.OnProblem(
+          {.file = rule.policyFile, .line = rule.lineNumber, .reason = failure.what()});
       RaiseError(StrCat(rule.policyFile, ":", rule.lineNumber, " : Tardisk: ", rule.tardiskPath,
                         " : ", failure.what()));
     }
@@ -59,26 +72,46 @@ void SetEachRule(const std::list<TeskAccess_TardiskExceptionRule>& rules,
 void TardiskExceptionRules::AddRule(unsigned int lineNumber, const std::string& tardiskPath,
                                     const std::string& policyFile, std::queue<std::string> tokens,
                                     TeskAccessInterfaceImpl& access) {
-  // This one failure is meant to name neither file nor line.
-  if (!rules.empty()) RaiseError("Only one rule of this type is allowed");
+  Problem unheard{.file = policyFile, .line = lineNumber};
+  AddLine(tardiskPath, std::move(tokens), access, unheard);
+}
+
+void TardiskExceptionRules::AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
+                                    TeskAccessInterfaceImpl& access, Problem& problem) {
+  problem.word = Problem::kWholeLine;
+  if (!rules.empty()) {
+    problem.fault = Fault::kSecondRule;
+    problem.reason = "Only one rule of this type is allowed";
+    // This one failure is meant to name neither file nor line.
+    RaiseError(problem.reason);
+  }
   try {
+    problem.fault = Fault::kArgumentCount;
     if (tokens.size() != 2) RuleSizeError();
+    problem.fault = Fault::kUnknownDomain;
+    problem.word = 2;
     const std::string& label = tokens.front();
     const std::string& domainName = tokens.back();
-    rules.push_back({.lineNumber = lineNumber,
+    rules.push_back({.lineNumber = problem.line,
                      .tardiskPath = tardiskPath,
                      .label = label,
                      .domainName = domainName,
                      .domainId = DomainId(domainName, access),
-                     .policyFile = policyFile});
+                     .policyFile = problem.file});
   } catch (const BraxoException& failure) {
-    RaiseTardiskParseError(policyFile, lineNumber, failure.what());
+    problem.reason = failure.what();
+    RaiseTardiskParseError(problem.file, problem.line, problem.reason);
   }
 }
 
 void TardiskExceptionRules::Set(TeskAccessInterfaceImpl& access) {
-  SetEachRule(rules, access, SetLabel);
-  SetEachRule(rules, access, SetTransitions);
+  PolicyObserver nobody;
+  SetObserved(access, nobody);
+}
+
+void TardiskExceptionRules::SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
+  SetEachRule(rules, access, observer, SetLabel);
+  SetEachRule(rules, access, observer, SetTransitions);
 }
 
 }  // namespace SecPolicy

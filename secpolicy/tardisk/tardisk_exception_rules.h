@@ -24,6 +24,9 @@ class TardiskExceptionRules : public virtual TardiskRules {
                TeskAccessInterfaceImpl& access) override;
   void Set(TeskAccessInterfaceImpl& access) override;
   ~TardiskExceptionRules() override = default;
+  void AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
+               TeskAccessInterfaceImpl& access, Problem& problem) override;
+  void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) override;
 
   std::list<TeskAccess_TardiskExceptionRule> rules;
 };

@@ -1,10 +1,13 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "secpolicy/carry_on.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/parse/directory.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
+#include "secpolicy/tardisk/tardisk_policy_steps.h"
 
 namespace SecPolicy {
 namespace {
@@ -12,13 +15,13 @@ namespace {
 // Runs `step` on the name of every regular file. Whatever else is there is reported as a directory
 // and skipped.
 template <class Step>
-void ForEachRegularFile(Directory& directory, Step step) {
+void ForEachRegularFile(Directory& directory, PolicyObserver& observer, Step step) {
   while (const dirent* entry = directory.Next()) {
     const std::string name = entry->d_name;
     if (entry->d_type == DT_REG) {
       step(name);
     } else {
-      SecpolicyError("Skipping directory " + name);
+      ReportError("Skipping directory " + name, observer);
     }
   }
 }
@@ -32,16 +35,15 @@ bool HasPolicy(const std::string& tardisk, const std::list<TardiskPolicy*>& poli
 // Adds the policy at `path` to `policies` and takes its tardisk off `tardisks`. A file that came
 // from no tardisk, and a second policy for one, is reported and dropped.
 void AddPolicy(const std::string& path, std::list<TardiskPolicy*>& policies,
-               std::list<std::string>& tardisks) {
+               std::list<std::string>& tardisks, PolicyObserver& observer) {
   auto policy = std::make_unique<TardiskPolicy>(path);
-  const std::string tardisk = policy->GetBackingTardiskPath();
-  if (tardisk.empty()) {
-    SecpolicyError("No backing tardisk for policy file " + path);
-    return;
-  }
+  const std::string tardisk = TardiskPolicySteps(*policy, observer).GetBackingTardiskPath();
+  if (tardisk.empty()) return ReportWithoutTardisk(path, observer);
   if (HasPolicy(tardisk, policies)) {
-    SecpolicyError("More than one exception specification for tardisk " + tardisk);
-    SecpolicyError("Ignoring " + path);
+    const std::string reason = "More than one exception specification for tardisk " + tardisk;
+    observer.OnProblem({.file = path, .reason = reason});
+    ReportError(reason, observer);
+    ReportError("Ignoring " + path, observer);
     return;
   }
   policies.push_back(policy.get());
@@ -52,17 +54,29 @@ void AddPolicy(const std::string& path, std::list<TardiskPolicy*>& policies,
 }  // namespace
 
 void GetAllTardisks(std::list<std::string>& tardisks) {
+  PolicyObserver nobody;
+  GetAllTardisks(tardisks, nobody);
+}
+
+void GetAllTardisks(std::list<std::string>& tardisks, PolicyObserver& observer) {
   errno = 0;
   Directory images(kTardiskImagesDir);
   if (!images.IsOpen()) RaiseError(std::string("Could not open tardisk dir ") + kTardiskImagesDir);
-  ForEachRegularFile(
-      images, [&](const std::string& name) { tardisks.push_back(kTardiskImagesDir + name); });
+  ForEachRegularFile(images, observer, [&](const std::string& name) {
+    tardisks.push_back(kTardiskImagesDir + name);
+  });
 }
 
 void GetTardiskLists(const std::string& policyDir, std::list<TardiskPolicy*>& policies,
                      std::list<std::string>& unmatched) {
+  PolicyObserver nobody;
+  GetTardiskLists(policyDir, policies, unmatched, nobody);
+}
+
+void GetTardiskLists(const std::string& policyDir, std::list<TardiskPolicy*>& policies,
+                     std::list<std::string>& unmatched, PolicyObserver& observer) {
   std::list<std::string> tardisks;
-  GetAllTardisks(tardisks);
+  GetAllTardisks(tardisks, observer);
 
   errno = 0;
   Directory directory(policyDir);
@@ -72,10 +86,11 @@ void GetTardiskLists(const std::string& policyDir, std::list<TardiskPolicy*>& po
       SecpolicyInfo("Skipping tardisk policy as " + policyDir + " does not exist");
       return;
     }
-    RaiseError("Unable to open policy directory for tardisks " + policyDir);
+    TellFailure(policyDir, observer,
+                [&] { RaiseError("Unable to open policy directory for tardisks " + policyDir); });
   }
-  ForEachRegularFile(directory, [&](const std::string& name) {
-    AddPolicy(policyDir + "/" + name, policies, tardisks);
+  ForEachRegularFile(directory, observer, [&](const std::string& name) {
+    AddPolicy(policyDir + "/" + name, policies, tardisks, observer);
   });
   unmatched.splice(unmatched.end(), tardisks);
 }

@@ -1,8 +1,10 @@
 #include <memory>
 
 #include "secpolicy/carry_on.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
+#include "secpolicy/tardisk/tardisk_policy_steps.h"
 
 namespace SecPolicy {
 namespace {
@@ -23,38 +25,54 @@ class OwnedPolicies {
 // Applies the policies of `dir` and collects the tardisks without one. Returns whether all policies
 // were read and applied; they are gone before the default policy is looked at.
 bool SetSpecifiedPolicy(const std::string& dir, std::list<std::string>& unmatched,
-                        TeskAccessInterfaceImpl& access) {
+                        TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   OwnedPolicies owned;
-  GetTardiskLists(dir, owned.policies, unmatched);
-  return CarryOn([&] { ParseAndSetTardiskPolicy(owned.policies, access); });
+  GetTardiskLists(dir, owned.policies, unmatched, observer);
+  return CarryOn(observer, [&] { ParseAndSetTardiskPolicy(owned.policies, access, observer); });
 }
 
 }  // namespace
 
 void ParseAndSetTardiskPolicy(std::list<TardiskPolicy*> policies, TeskAccessInterfaceImpl& access) {
-  const bool parsed =
-      ForEachCarryOn(policies, [&](TardiskPolicy* policy) { policy->ParsePolicy(access); });
+  PolicyObserver nobody;
+  ParseAndSetTardiskPolicy(policies, access, nobody);
+}
+
+void ParseAndSetTardiskPolicy(const std::list<TardiskPolicy*>& policies,
+                              TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
+  const bool parsed = ForEachCarryOn(policies, observer, [&](TardiskPolicy* policy) {
+    TardiskPolicySteps(*policy, observer).ParsePolicy(access);
+  });
   if (parsed) {
     SecpolicyInfo("Parsed all the tardisk policy files");
   } else {
-    SecpolicyError("Error in parsing some tardisk policy files");
+    ReportError("Error in parsing some tardisk policy files", observer);
   }
 
   // What was read before a bad line is applied too.
-  const bool set =
-      ForEachCarryOn(policies, [&](TardiskPolicy* policy) { policy->SetPolicy(access); });
+  const bool set = ForEachCarryOn(policies, observer, [&](TardiskPolicy* policy) {
+    TardiskPolicySteps(*policy, observer).SetPolicy(access);
+  });
   if (set) {
     SecpolicyInfo("Set all the tardisk labels and policy");
   } else {
-    SecpolicyError("Error in setting some tardisk labels and policy");
+    ReportError("Error in setting some tardisk labels and policy", observer);
   }
   if (!parsed || !set) RaiseError("Failure in setting specified tardisk policy");
 }
 
 void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access) {
+  PolicyObserver nobody;
+  LoadPolicyTardisks(dir, access, nobody);
+}
+
+void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access,
+                        PolicyObserver& observer) {
+  const PhaseOfLoad phase(LoadPhase::kTardisks, observer);
   std::list<std::string> unmatched;
-  const bool specified = SetSpecifiedPolicy(dir, unmatched, access);
-  const bool byDefault = CarryOn([&] { SetDefaultTardiskPolicy(unmatched, access); });
+  const bool specified = SetSpecifiedPolicy(dir, unmatched, access, observer);
+  const bool byDefault =
+      CarryOn(observer, [&] { SetDefaultTardiskPolicy(unmatched, access, observer); });
   if (!specified || !byDefault) RaiseError("Failure in setting tardisk policy");
 }
 

@@ -6,10 +6,12 @@
 #include <cstring>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/carry_on.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
+#include "secpolicy/tardisk/tardisk_policy_steps.h"
 #include "teskctl/sysinfo.h"
 
 namespace SecPolicy {
@@ -75,29 +77,59 @@ std::string TardiskPolicy::GetBackingTardiskPath() {
 }
 
 void TardiskPolicy::ParsePolicy(TeskAccessInterfaceImpl& access) {
-  const std::string tardiskPath = GetBackingTardiskPath();
-  if (tardiskPath.empty()) {
-    SecpolicyError("No backing tardisk for policy file " + policyFile);
-    return;
-  }
-
-  std::map<unsigned int, std::queue<std::string>> parsed;
-  ParseFile(policyFile, parsed);
-  for (auto& [lineNumber, tokens] : parsed) {
-    if (tokens.empty()) continue;
-    const std::string type = std::move(tokens.front());
-    tokens.pop();
-    const auto rules = ruleSets.find(type);
-    if (rules == ruleSets.end()) {
-      RaiseTardiskParseError(policyFile, lineNumber,
-                             "invalid tardisk policy rule type (" + type + ")");
-    }
-    rules->second->AddRule(lineNumber, tardiskPath, policyFile, tokens, access);
-  }
+  PolicyObserver nobody;
+  TardiskPolicySteps(*this, nobody).ParsePolicy(access);
 }
 
 void TardiskPolicy::SetPolicy(TeskAccessInterfaceImpl& access) {
-  for (const auto& [type, rules] : ruleSets) rules->Set(access);
+  PolicyObserver nobody;
+  TardiskPolicySteps(*this, nobody).SetPolicy(access);
+}
+
+std::string TardiskPolicySteps::GetBackingTardiskPath() {
+  std::string path;
+  TellFailure(policy.policyFile, observer, [&] { path = policy.GetBackingTardiskPath(); });
+  return path;
+}
+
+void TardiskPolicySteps::ParsePolicy(TeskAccessInterfaceImpl& access) {
+  const std::string& file = policy.policyFile;
+  const std::string tardisk = GetBackingTardiskPath();
+  if (tardisk.empty()) return ReportWithoutTardisk(file, observer);
+
+  std::map<unsigned int, std::queue<std::string>> parsed;
+  TellFailure(file, observer, [&] { ParseFile(file, parsed); });
+  Problem problem{.file = file};
+  for (auto& [line, words] : parsed) {
+    if (words.empty()) continue;
+    problem.line = line;
+    TellRefusal(problem, observer,
+                [&, &lineWords = words] { ParseLine(tardisk, lineWords, access, problem); });
+  }
+}
+
+void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::string>& words,
+                                   TeskAccessInterfaceImpl& access, Problem& problem) {
+  const std::string type = std::move(words.front());
+  words.pop();
+  const auto rules = policy.ruleSets.find(type);
+  if (rules == policy.ruleSets.end()) {
+    problem.fault = Fault::kRuleType;
+    problem.word = 0;
+    problem.reason = "invalid tardisk policy rule type (" + type + ")";
+    RaiseTardiskParseError(problem.file, problem.line, problem.reason);
+  }
+  rules->second->AddLine(tardisk, words, access, problem);
+}
+
+void TardiskPolicySteps::SetPolicy(TeskAccessInterfaceImpl& access) {
+  for (const auto& [type, rules] : policy.ruleSets) rules->SetObserved(access, observer);
+}
+
+void ReportWithoutTardisk(const std::string& policyFile, PolicyObserver& observer) {
+  const std::string message = "No backing tardisk for policy file " + policyFile;
+  observer.OnProblem({.file = policyFile, .reason = message});
+  ReportError(message, observer);
 }
 
 }  // namespace SecPolicy

@@ -3,6 +3,7 @@
 #include <queue>
 #include <string>
 
+#include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
@@ -25,6 +26,14 @@ class TardiskRules {
   virtual void Set(TeskAccessInterfaceImpl& access) = 0;
 
   virtual ~TardiskRules() = default;
+
+  // As AddRule, of the line `problem.line` of the file `problem.file`. Before it throws, `problem`
+  // says what is wrong with the line.
+  virtual void AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
+                       TeskAccessInterfaceImpl& access, Problem& problem) = 0;
+
+  // As Set, and tells `observer` what was installed for which line.
+  virtual void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) = 0;
 
   std::string ruleType;  // the keyword, such as "-E"
 };

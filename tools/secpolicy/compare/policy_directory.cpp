@@ -5,7 +5,6 @@
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "scratch/scratch_directory.h"
-#include "secpolicy/carry_on.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/policy_root.h"
 
@@ -13,6 +12,18 @@ namespace SecPolicyCli {
 namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
+
+// As a load takes its parts: one that fails is reported. Returns whether it succeeded.
+template <class Part>
+bool Try(Part part) {
+  try {
+    part();
+    return true;
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    SecPolicy::SecpolicyError(failure.what());
+    return false;
+  }
+}
 
 std::map<std::string, std::string> FilesOf(const std::string& dir) {
   std::map<std::string, std::string> files;
@@ -35,7 +46,7 @@ std::map<std::string, std::string> ReadLabels(const std::string& dir, bool& isCl
                                               TeskAccessInterfaceImpl& access) {
   SecPolicy::FileLabelPolicy policy;
   for (const auto& [path, name] : FilesOf(dir)) {
-    isClean &= SecPolicy::CarryOn([&, &file = path] { policy.ParsePolicy(file, access); });
+    isClean &= Try([&, &file = path] { policy.ParsePolicy(file, access); });
   }
   std::map<std::string, std::string> labels;
   for (const auto& line : policy.fileLabels) {
@@ -55,7 +66,7 @@ WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& par
   const LinuxHost::UsedState state(scratch.File("host.db"));
   TeskAccessInterfaceImpl access;
   WrittenPolicy written;
-  const auto step = [&](auto part) { written.isClean &= SecPolicy::CarryOn(part); };
+  const auto step = [&](auto part) { written.isClean &= Try(part); };
 
   const std::string earlyDomains = dir + "/early/" + SecPolicy::kDomainsDir;
   step([&] { SecPolicy::LoadPolicyObjects(dir + "/" + SecPolicy::kObjectsDir, access); });

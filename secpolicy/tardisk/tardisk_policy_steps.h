@@ -1,0 +1,36 @@
+#pragma once
+
+#include <queue>
+#include <string>
+
+#include "secpolicy/observed/policy_observer.h"
+#include "secpolicy/secpolicy.h"
+
+namespace SecPolicy {
+
+// What a tardisk policy does, with somebody who is told.
+class TardiskPolicySteps {
+ public:
+  // `tardiskPolicy` and `told` are only borrowed.
+  TardiskPolicySteps(TardiskPolicy& tardiskPolicy, PolicyObserver& told)
+      : policy(tardiskPolicy), observer(told) {}
+
+  // As the policy's own.
+  std::string GetBackingTardiskPath();
+  void ParsePolicy(TeskAccessInterfaceImpl& access);
+  void SetPolicy(TeskAccessInterfaceImpl& access);
+
+  // Reads the line `problem.line` of the policy file; `tardisk` is the tardisk that it came from.
+  // Throws BraxoException for a bad line, after `problem` says what is wrong with it.
+  void ParseLine(const std::string& tardisk, std::queue<std::string>& words,
+                 TeskAccessInterfaceImpl& access, Problem& problem);
+
+ private:
+  TardiskPolicy& policy;
+  PolicyObserver& observer;
+};
+
+// Reports that a policy file came from no tardisk.
+void ReportWithoutTardisk(const std::string& policyFile, PolicyObserver& observer);
+
+}  // namespace SecPolicy
