@@ -69,13 +69,18 @@ bool Rule::Grants() const {
   return grant != nullptr ? *grant : !Permits().IsEmpty();
 }
 
-ParameterRange Rule::Range() const {
-  return ParseParameterRange(words.at(1), words.size() > 2 ? words[2] : "");
+ParameterRange Rule::Range() const { return ParseParameterRange(words[1], words[2]); }
+
+std::span<const std::string> Rule::Words() const {
+  const RuleForm& form = FormOf(kind);
+  std::size_t count = form.words.size();
+  while (count > form.MinWords() && words[count - 1].empty()) --count;
+  return {words.data(), count};
 }
 
 std::string Rule::Text() const {
   std::string text = FormOf(kind).keyword;
-  for (const std::string& word : words) {
+  for (const std::string& word : Words()) {
     text += ' ';
     text += word;
   }
@@ -90,10 +95,8 @@ Rule ToRule(Record record) {
   Rule rule;
   rule.kind = form.kind;
   rule.line = record.line;
-  rule.words.reserve(form.words.size());
-  for (const auto word : form.words) rule.words.push_back(std::move(record.*word));
-  while (rule.words.size() > FormOf(form.kind).MinWords() && rule.words.back().empty()) {
-    rule.words.pop_back();
+  for (std::size_t index = 0; index < form.words.size(); ++index) {
+    rule.words[index] = std::move(record.*form.words[index]);
   }
   if constexpr (EndsInGrant<Record>) {
     rule.verdict = record.grant;
@@ -104,21 +107,17 @@ Rule ToRule(Record record) {
 }
 
 template <class Record>
-Record ToRecord(Rule rule, unsigned int domainId, const std::string& domainName) {
+void MoveInto(Record& record, Rule& rule) {
   constexpr auto& form = kFormOf<Record>;
-  Record record;
   record.line = rule.line;
-  record.domainId = domainId;
-  record.domainName = domainName;
-  for (std::size_t index = 0; index < rule.words.size(); ++index) {
-    record.*form.words.at(index) = std::move(rule.words[index]);
+  for (std::size_t index = 0; index < form.words.size(); ++index) {
+    record.*form.words[index] = std::move(rule.words[index]);
   }
   if constexpr (EndsInGrant<Record>) {
     record.grant = rule.Grants();
   } else {
     record.permissions = rule.Permits().Text();
   }
-  return record;
 }
 
 template Rule ToRule(TeskAccess_ObjectAccessRule);
@@ -130,13 +129,13 @@ template Rule ToRule(TeskAccess_FilePathAccessRule);
 template Rule ToRule(TeskAccess_SyscallRule);
 template Rule ToRule(TeskAccess_UnixSockCreationRule);
 
-template TeskAccess_ObjectAccessRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_CapabilityRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_DomTransRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_FileCreationRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_CapabilityParamRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_FilePathAccessRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_SyscallRule ToRecord(Rule, unsigned int, const std::string&);
-template TeskAccess_UnixSockCreationRule ToRecord(Rule, unsigned int, const std::string&);
+template void MoveInto(TeskAccess_ObjectAccessRule&, Rule&);
+template void MoveInto(TeskAccess_CapabilityRule&, Rule&);
+template void MoveInto(TeskAccess_DomTransRule&, Rule&);
+template void MoveInto(TeskAccess_FileCreationRule&, Rule&);
+template void MoveInto(TeskAccess_CapabilityParamRule&, Rule&);
+template void MoveInto(TeskAccess_FilePathAccessRule&, Rule&);
+template void MoveInto(TeskAccess_SyscallRule&, Rule&);
+template void MoveInto(TeskAccess_UnixSockCreationRule&, Rule&);
 
 }  // namespace Policy

@@ -1,8 +1,9 @@
 #pragma once
 
+#include <array>
+#include <span>
 #include <string>
 #include <variant>
-#include <vector>
 
 #include "policy/parameter_range.h"
 #include "policy/permissions.h"
@@ -24,7 +25,9 @@ using Verdict = std::variant<bool, Permissions>;
 // One rule of a domain.
 struct Rule {
   RuleKind kind = {};
-  std::vector<std::string> words = {};  // as written, between the keyword and the verdict
+  // As written, between the keyword and the verdict. Empty are those that the kind does not have,
+  // and a range's last value where it has but one.
+  std::array<std::string, kMaxRuleWords> words = {};
   Verdict verdict = {};
   unsigned int line = 0;  // that the access-control module was told
   Origin origin = {};     // for whoever knows it
@@ -39,6 +42,9 @@ struct Rule {
   // that are no range.
   ParameterRange Range() const;
 
+  // The words without those that it does not have.
+  std::span<const std::string> Words() const;
+
   // The rule as a policy line, as it is displayed: "-a sshKey read grant".
   std::string Text() const;
 };
@@ -48,9 +54,9 @@ struct Rule {
 template <class Record>
 Rule ToRule(Record record);
 
-// The record of a rule of its kind, of the domain. The identifier of the domain that a transition
-// leads to is left at 0.
+// Moves a rule into a record of its kind. The domain of the record stays as it is, and so does the
+// identifier of the domain that a transition leads to.
 template <class Record>
-Record ToRecord(Rule rule, unsigned int domainId, const std::string& domainName);
+void MoveInto(Record& record, Rule& rule);
 
 }  // namespace Policy

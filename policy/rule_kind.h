@@ -53,6 +53,8 @@ enum class RuleKind {
   kUnixSocketCreation,
 };
 
+inline constexpr std::size_t kMaxRuleWords = 3;
+
 struct RuleForm {
   RuleKind kind;
   const char* keyword;

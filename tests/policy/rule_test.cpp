@@ -3,6 +3,7 @@
 
 #include "policy/rule.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <list>
@@ -21,7 +22,8 @@ template <class Record>
 void Convert(std::list<Record>& records, std::vector<Rule>& rules) {
   for (Record& record : records) {
     rules.push_back(Policy::ToRule(record));
-    record = Policy::ToRecord<Record>(rules.back(), record.domainId, record.domainName);
+    Rule rule = rules.back();
+    Policy::MoveInto(record, rule);
   }
 }
 
@@ -78,10 +80,10 @@ TEST_P(RuleRecord, StaysAsItIsThereAndBack) {
   EXPECT_FALSE(rules.back().Grants());
 }
 
-TEST(RuleRecord, KeepsItsLineAndItsDomain) {
-  const Rule rule = {.kind = RuleKind::kSyscall, .words = {"read"}, .verdict = true, .line = 9};
-  const auto record =
-      Policy::ToRecord<TeskCtl::Security::TeskAccess_SyscallRule>(rule, 42, "appDom");
+TEST(RuleRecord, TakesTheLineButNoDomain) {
+  Rule rule = {.kind = RuleKind::kSyscall, .words = {"read"}, .verdict = true, .line = 9};
+  TeskCtl::Security::TeskAccess_SyscallRule record = {1, 42, "appDom", "write", false};
+  Policy::MoveInto(record, rule);
   EXPECT_EQ(record.line, 9U);
   EXPECT_EQ(record.domainId, 42U);
   EXPECT_EQ(record.domainName, "appDom");
@@ -93,7 +95,7 @@ TEST(RuleRecord, HasNoWordForARangeOfOneValue) {
   const TeskCtl::Security::TeskAccess_CapabilityParamRule record = {
       7, 42, "appDom", "bind_port", "0x50", "", true};
   const Rule rule = Policy::ToRule(record);
-  EXPECT_EQ(rule.words, (std::vector<std::string>{"bind_port", "0x50"}));
+  EXPECT_THAT(rule.Words(), testing::ElementsAre("bind_port", "0x50"));
   EXPECT_EQ(rule.Text(), "-p bind_port 0x50 grant");
   EXPECT_EQ(rule.Range().first, 80U);
   EXPECT_EQ(rule.Range().last, 80U);
@@ -101,7 +103,7 @@ TEST(RuleRecord, HasNoWordForARangeOfOneValue) {
 
 TEST(RuleRecord, KeepsEmptyWordsOfOtherKinds) {
   const TeskCtl::Security::TeskAccess_ObjectAccessRule record = {7, 42, "appDom", "a", "", true};
-  EXPECT_EQ(Policy::ToRule(record).words, (std::vector<std::string>{"a", ""}));
+  EXPECT_THAT(Policy::ToRule(record).Words(), testing::ElementsAre("a", ""));
 }
 
 TEST(Rule, SaysWhatItDecides) {

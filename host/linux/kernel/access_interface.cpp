@@ -1,6 +1,6 @@
-#include <array>
 #include <cerrno>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "braxo/misc/strcat.h"
@@ -13,6 +13,7 @@
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/parameter_rule_table.h"
 #include "host/linux/state/rule_table.h"
+#include "policy/rule.h"
 #include "teskctl/security.h"
 
 using Braxo::Misc::StrCat;
@@ -22,75 +23,34 @@ using LinuxHost::ErrnoGuard;
 using LinuxHost::FilePolicy;
 using LinuxHost::HostError;
 using LinuxHost::HostState;
-using LinuxHost::Rows;
-using LinuxHost::RuleKind;
+using Policy::RuleKind;
 
 namespace TeskCtl::Security {
 namespace {
 
-// Which fields of a record are the words of its rule.
-template <class Record>
-struct RecordShape {
-  RuleKind kind;
-  std::array<std::string Record::*, LinuxHost::kMaxRuleWords> words;
-};
+// Installs the rule of a record into the table of its kind.
+template <class Table, class Record, class... Target>
+void Install(Table& table, Record record, Target... target) {
+  const std::string domainName = std::move(record.domainName);
+  const LinuxHost::DomainReference domain{record.domainId, domainName};
+  table.Install(domain, Policy::ToRule(std::move(record)), target...);
+}
 
-constexpr RecordShape<TeskAccess_SyscallRule> kSyscall = {RuleKind::Syscall,
-                                                          {&TeskAccess_SyscallRule::syscall}};
-constexpr RecordShape<TeskAccess_CapabilityRule> kCapability = {
-    RuleKind::Capability, {&TeskAccess_CapabilityRule::capability}};
-constexpr RecordShape<TeskAccess_ObjectAccessRule> kObjectAccess = {
-    RuleKind::ObjectAccess,
-    {&TeskAccess_ObjectAccessRule::label, &TeskAccess_ObjectAccessRule::accessKind}};
-constexpr RecordShape<TeskAccess_DomTransRule> kDomTrans = {
-    RuleKind::DomainTransition,
-    {&TeskAccess_DomTransRule::label, &TeskAccess_DomTransRule::targetDomain,
-     &TeskAccess_DomTransRule::transitionKind}};
-constexpr RecordShape<TeskAccess_FileCreationRule> kFileCreation = {
-    RuleKind::FileCreation,
-    {&TeskAccess_FileCreationRule::label, &TeskAccess_FileCreationRule::secondLabel,
-     &TeskAccess_FileCreationRule::creationKind}};
-constexpr RecordShape<TeskAccess_UnixSockCreationRule> kUnixSockCreation = {
-    RuleKind::UnixSocketCreation,
-    {&TeskAccess_UnixSockCreationRule::label, &TeskAccess_UnixSockCreationRule::sockKind}};
-
+// Appends the records of rules of the domain.
 template <class Record>
-LinuxHost::Rule ToRule(const Record& record, const RecordShape<Record>& shape) {
-  LinuxHost::Rule rule{.domain = {record.domainId, record.domainName},
-                       .kind = shape.kind,
-                       .words = {},
-                       .granted = record.grant,
-                       .line = record.line};
-  for (std::size_t index = 0; index < shape.words.size(); ++index) {
-    if (shape.words[index] != nullptr) rule.words[index] = record.*shape.words[index];
+void Append(std::vector<Policy::Rule> rules, const Domain& domain, std::list<Record>& records) {
+  for (Policy::Rule& rule : rules) {
+    Record& record = records.emplace_back();
+    record.domainId = domain.id;
+    record.domainName = domain.name;
+    Policy::MoveInto(record, rule);
   }
-  return rule;
-}
-
-// A record behind those of `records`, with its header filled in from the row's column `lineColumn`.
-template <class Record>
-Record& AddRecord(std::list<Record>& records, const Domain& domain, const Rows& rows,
-                  int lineColumn) {
-  Record& record = records.emplace_back();
-  record.line = static_cast<unsigned int>(rows.Integer(lineColumn));
-  record.domainId = domain.id;
-  record.domainName = domain.name;
-  return record;
 }
 
 template <class Record>
-void ReadRules(HostState& state, unsigned int domainId, const RecordShape<Record>& shape,
-               std::list<Record>& records) {
+void ReadRules(HostState& state, unsigned int domainId, RuleKind kind, std::list<Record>& records) {
   const Domain& domain = state.Domains().Get(domainId);
-  Rows rows = state.Rules().Read(domainId, shape.kind);
-  while (rows.Next()) {
-    Record& record = AddRecord(records, domain, rows, 4);
-    for (std::size_t index = 0; index < shape.words.size(); ++index) {
-      if (shape.words[index] == nullptr) continue;
-      record.*shape.words[index] = rows.Text(static_cast<int>(index));
-    }
-    record.grant = rows.Integer(3) != 0;
-  }
+  Append(state.Rules().Read(domainId, kind), domain, records);
 }
 
 // A label space; throws for a number that is none.
@@ -249,40 +209,32 @@ bool TeskAccessInterfaceImpl::RemoveLabels(std::vector<std::string> names,
 }
 
 void TeskAccessInterfaceImpl::SetSyscallRule(TeskAccess_SyscallRule rule) {
-  impl->Any().Rules().Install(ToRule(rule, kSyscall));
+  Install(impl->Any().Rules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetCapabilityRule(TeskAccess_CapabilityRule rule) {
-  impl->Any().Rules().Install(ToRule(rule, kCapability));
+  Install(impl->Any().Rules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetCapabilityParamRule(TeskAccess_CapabilityParamRule rule) {
-  impl->Any().ParameterRules().Install(
-      {.domain = {rule.domainId, rule.domainName},
-       .check = rule.paramCheck,
-       .range = LinuxHost::ParseParameterRange(rule.firstParam, rule.secondParam),
-       .firstWord = rule.firstParam,
-       .lastWord = rule.secondParam,
-       .granted = rule.grant,
-       .line = rule.line});
+  Install(impl->Any().ParameterRules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetObjectAccessRule(TeskAccess_ObjectAccessRule rule) {
-  impl->Any().Rules().Install(ToRule(rule, kObjectAccess));
+  Install(impl->Any().Rules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetDomTransRule(TeskAccess_DomTransRule rule) {
-  auto transition = ToRule(rule, kDomTrans);
-  transition.targetId = rule.targetDomainId;
-  impl->Any().Rules().Install(transition);
+  const unsigned int target = rule.targetDomainId;
+  Install(impl->Any().Rules(), std::move(rule), target);
 }
 
 void TeskAccessInterfaceImpl::SetFileCreationRule(TeskAccess_FileCreationRule rule) {
-  impl->Any().Rules().Install(ToRule(rule, kFileCreation));
+  Install(impl->Any().Rules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetUnixSockCreationRule(TeskAccess_UnixSockCreationRule rule) {
-  impl->Any().Rules().Install(ToRule(rule, kUnixSockCreation));
+  Install(impl->Any().Rules(), std::move(rule));
 }
 
 void TeskAccessInterfaceImpl::SetFilePathAccessRules(
@@ -291,7 +243,7 @@ void TeskAccessInterfaceImpl::SetFilePathAccessRules(
   for (const auto& rule : rules) {
     policies.push_back({.domain = {rule.domainId, rule.domainName},
                         .path = rule.path,
-                        .permission = LinuxHost::ParsePermissions(rule.permissions),
+                        .permission = Policy::Permissions::Parse(rule.permissions).Bits(),
                         .line = rule.line});
   }
   impl->Any().FilePolicies().Install(policies);
@@ -301,47 +253,35 @@ void TeskAccessInterfaceImpl::GetFilePathAccessRules(
     unsigned int domainId, std::list<TeskAccess_FilePathAccessRule>& rules) {
   HostState& state = impl->Fresh();
   const Domain& domain = state.Domains().Get(domainId);
-  Rows rows = state.FilePolicies().Read(domainId);
-  while (rows.Next()) {
-    auto& rule = AddRecord(rules, domain, rows, 2);
-    rule.path = rows.Text(0);
-    rule.permissions = LinuxHost::FormatPermissions(static_cast<unsigned int>(rows.Integer(1)));
-  }
+  Append(state.FilePolicies().Read(domainId), domain, rules);
 }
 
 void TeskAccessInterfaceImpl::GetSyscallRules(unsigned int domainId,
                                               std::list<TeskAccess_SyscallRule>& rules) {
-  ReadRules(impl->Fresh(), domainId, kSyscall, rules);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kSyscall, rules);
 }
 
 void TeskAccessInterfaceImpl::GetCapabilityRules(unsigned int domainId,
                                                  std::list<TeskAccess_CapabilityRule>& rules) {
-  ReadRules(impl->Fresh(), domainId, kCapability, rules);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kCapability, rules);
 }
 
 void TeskAccessInterfaceImpl::GetCapabilityParamRules(
     unsigned int domainId, std::list<TeskAccess_CapabilityParamRule>& rules) {
   HostState& state = impl->Fresh();
   const Domain& domain = state.Domains().Get(domainId);
-  Rows rows = state.ParameterRules().Read(domainId);
-  while (rows.Next()) {
-    auto& rule = AddRecord(rules, domain, rows, 4);
-    rule.paramCheck = rows.Text(0);
-    rule.firstParam = rows.Text(1);
-    rule.secondParam = rows.Text(2);
-    rule.grant = rows.Integer(3) != 0;
-  }
+  Append(state.ParameterRules().Read(domainId), domain, rules);
 }
 
 void TeskAccessInterfaceImpl::GetObjectAccessRules(unsigned int domainId,
                                                    std::list<TeskAccess_ObjectAccessRule>& rules) {
-  ReadRules(impl->Fresh(), domainId, kObjectAccess, rules);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kObjectAccess, rules);
 }
 
 void TeskAccessInterfaceImpl::GetDomTransRules(unsigned int domainId,
                                                std::list<TeskAccess_DomTransRule>& rules) {
   std::list<TeskAccess_DomTransRule> read;
-  ReadRules(impl->Fresh(), domainId, kDomTrans, read);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kDomainTransition, read);
   // A domain takes the transitions into it along: one that is gone by now was just destroyed.
   auto& domains = impl->Fresh().Domains();
   read.remove_if([&](auto& rule) {
@@ -354,12 +294,12 @@ void TeskAccessInterfaceImpl::GetDomTransRules(unsigned int domainId,
 
 void TeskAccessInterfaceImpl::GetFileCreationRules(unsigned int domainId,
                                                    std::list<TeskAccess_FileCreationRule>& rules) {
-  ReadRules(impl->Fresh(), domainId, kFileCreation, rules);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kFileCreation, rules);
 }
 
 void TeskAccessInterfaceImpl::GetUnixSockCreationRules(
     unsigned int domainId, std::list<TeskAccess_UnixSockCreationRule>& rules) {
-  ReadRules(impl->Fresh(), domainId, kUnixSockCreation, rules);
+  ReadRules(impl->Fresh(), domainId, RuleKind::kUnixSocketCreation, rules);
 }
 
 bool TeskAccessInterfaceImpl::CheckCapabilityParamRuleConstraints(

@@ -22,6 +22,8 @@
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"
 
+using Policy::ParameterRange;
+using Policy::RuleKind;
 using TeskCtl::Security::TeskAccess_FileRule;
 using TeskCtl::Security::TeskAccess_ModeParam;
 using TeskCtl::Security::TeskAccessKsi_DefaultDom;
@@ -148,10 +150,9 @@ std::uint32_t AddFilePolicies(HostState& state, Args args) {
 
 std::uint32_t SetCapability(HostState& state, Args args) {
   const std::string capability = CapabilityWord(args[1]);
-  state.Rules().Install({.domain = {Unsigned(args[0]), {}},
-                         .kind = RuleKind::Capability,
-                         .words = {capability},
-                         .granted = args[2] != 0});
+  state.Rules().Install(
+      {Unsigned(args[0]), {}},
+      {.kind = RuleKind::kCapability, .words = {capability}, .verdict = args[2] != 0});
   return 0;
 }
 
@@ -165,14 +166,11 @@ ParameterRange ReadRange(std::uint64_t address) {
 std::uint32_t SetParameterCheck(HostState& state, Args args) {
   const std::string check = ParameterCheckWord(args[1]);
   const ParameterRange range = ReadRange(args[2]);
-  const std::string first = std::to_string(range.first);
-  const std::string last = range.first == range.last ? "" : std::to_string(range.last);
-  state.ParameterRules().Install({.domain = {Unsigned(args[0]), {}},
-                                  .check = check,
-                                  .range = range,
-                                  .firstWord = first,
-                                  .lastWord = last,
-                                  .granted = args[3] != 0});
+  Policy::Rule rule = {.kind = RuleKind::kParameterCheck,
+                       .words = {check, std::to_string(range.first)},
+                       .verdict = args[3] != 0};
+  if (range.first != range.last) rule.words[2] = std::to_string(range.last);
+  state.ParameterRules().Install({Unsigned(args[0]), {}}, rule);
   return 0;
 }
 

@@ -27,21 +27,6 @@ void KeepLater(Store& store, const std::string& path, bool isTree, LatestLabel& 
                               .line = static_cast<unsigned int>(rows.Integer(3))};
 }
 
-}  // namespace
-
-namespace {
-
-// The rules of words have one table.
-struct WordKind {
-  std::string_view keyword;
-  std::string_view kind;
-};
-
-constexpr WordKind kWordKinds[] = {
-    {"-a", "object access"}, {"-c", "capability"},  {"-d", "domain transition"},
-    {"-f", "file creation"}, {"-s", "system call"}, {"-u", "unix socket creation"},
-};
-
 std::vector<RuleSource> ReadSources(Rows rows) {
   std::vector<RuleSource> sources;
   while (rows.Next()) {
@@ -83,16 +68,16 @@ void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const P
   transaction.Commit();
 }
 
-std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword) {
+std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind) {
   Store& store = HostState::Current().Database();
-  if (keyword == "-p") {
+  if (kind == Policy::RuleKind::kParameterCheck) {
     return ReadSources(store.Select(
         "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
         "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM parameter_rule AS r "
         "LEFT JOIN policy_load AS p ON p.number = r.load WHERE r.domain_id = ?1 ORDER BY r.id",
         id));
   }
-  if (keyword == "-r") {
+  if (kind == Policy::RuleKind::kFilePath) {
     return ReadSources(store.Select(
         "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
         "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM file_policy AS r "
@@ -100,16 +85,12 @@ std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keywor
         "WHERE r.domain_id = ?1 AND r.world = 0 ORDER BY r.id",
         id));
   }
-  for (const WordKind& row : kWordKinds) {
-    if (row.keyword != keyword) continue;
-    return ReadSources(
-        store.Select("SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
-                     "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM rule AS r "
-                     "LEFT JOIN policy_load AS p ON p.number = r.load "
-                     "WHERE r.domain_id = ?1 AND r.kind = +?2 ORDER BY r.id",
-                     id, row.kind));
-  }
-  return {};
+  return ReadSources(
+      store.Select("SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+                   "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM rule AS r "
+                   "LEFT JOIN policy_load AS p ON p.number = r.load "
+                   "WHERE r.domain_id = ?1 AND r.kind = +?2 ORDER BY r.id",
+                   id, FormOf(kind).name));
 }
 
 std::vector<std::string> FindDomainsWithoutFile() {

@@ -3,10 +3,10 @@
 #include <optional>
 #include <span>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "host/linux/operation/policy_load.h"
+#include "policy/rule_kind.h"
 
 // Where the policy was written: the kernel is told rules and labels, not the files that they come
 // from, so who loads files records it beside them. An origin says nothing about what is installed
@@ -55,9 +55,9 @@ struct PathLine {
 // same line.
 void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines);
 
-// The sources of all rules of the domain `id` with the keyword ("-a"), in the order in which the
-// rules are read.
-std::vector<RuleSource> FindRuleSources(unsigned int id, std::string_view keyword);
+// The sources of all rules of the kind that the domain `id` has, in the order in which the rules
+// are read.
+std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind);
 
 // The domains that the latest load of their kind has not found in any file, by name.
 std::vector<std::string> FindDomainsWithoutFile();

@@ -1,14 +1,13 @@
 #include "host/linux/operation/settings.h"
 
 #include <algorithm>
-#include <array>
 #include <cctype>
 #include <cerrno>
 #include <charconv>
-#include <string_view>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
+#include "policy/level.h"
 
 namespace LinuxHost {
 namespace {
@@ -17,7 +16,6 @@ using Braxo::Misc::StrCat;
 using OrinConfigStore::ConfigStoreObjectId;
 
 constexpr char kLevelKey[] = "enforcement_level";
-constexpr std::array<std::string_view, 3> kLevels{"enforcing", "permissive", "disabled"};
 
 // The object that enforcement is restored from.
 ConfigStoreObjectId DomainSettings(const std::string& domain) {
@@ -61,7 +59,7 @@ std::optional<std::string> FindWantedEnforcement(const std::string& domain) {
 
 void StoreWantedEnforcement(const std::string& domain, const std::string& level) {
   const std::string word = LowerCase(level);
-  if (std::find(kLevels.begin(), kLevels.end(), word) == kLevels.end()) {
+  if (!Policy::FindLevel(word)) {
     throw HostError(EINVAL, StrCat("Unknown enforcement level ", level,
                                    ": use enforcing, permissive or disabled"));
   }

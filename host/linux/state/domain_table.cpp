@@ -12,6 +12,7 @@
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/rule_table.h"
 #include "host/linux/state/world_table.h"
+#include "policy/level.h"
 
 using Braxo::Misc::StrCat;
 using TeskCtl::Security::TeskAccessKsi_DefaultDom;
@@ -19,8 +20,6 @@ using TeskCtl::Security::TeskAccessKsi_DefaultDom;
 namespace LinuxHost {
 namespace {
 
-constexpr char kFirstLevel[] = "enforcing";
-constexpr std::array<std::string_view, 3> kLevels = {kFirstLevel, "permissive", "disabled"};
 constexpr TextLimit kName = {.noun = "domain name",
                              .whenEmpty = "a domain name must not be empty",
                              .maxSize = kMaxDomainName};
@@ -174,10 +173,10 @@ unsigned int DomainTable::Insert(const std::string& name, TeskAccessKsi_DefaultD
     throw HostError(ENOSPC, StrCat("cannot create domain '", name, "': all ", kDomainSlots - 1,
                                    " domains are in use"));
   }
-  state.Database().Run("INSERT INTO domain VALUES (?1, ?2, ?3, ?4, ?5)", id, name, kFirstLevel,
+  const char* const level = Policy::TextOf(Policy::kLevels.front());
+  state.Database().Run("INSERT INTO domain VALUES (?1, ?2, ?3, ?4, ?5)", id, name, level,
                        static_cast<int>(defaultRules), createdAtRunTime);
-  slots[id] =
-      std::make_unique<Domain>(Domain{id, name, kFirstLevel, defaultRules, createdAtRunTime});
+  slots[id] = std::make_unique<Domain>(Domain{id, name, level, defaultRules, createdAtRunTime});
   identifiers.emplace(name, id);
   return id;
 }
@@ -230,7 +229,7 @@ void DomainTable::RemoveNamed(const std::vector<std::string>& names) {
 }
 
 void DomainTable::SetLevel(const std::string& name, const std::string& level) {
-  if (std::find(kLevels.begin(), kLevels.end(), level) == kLevels.end()) {
+  if (!Policy::FindLevel(level)) {
     const std::string problem = level.empty() ? std::string("no enforcement level")
                                               : StrCat("unknown enforcement level '", level, "'");
     throw HostError(EINVAL, StrCat(problem, " for domain '", name,

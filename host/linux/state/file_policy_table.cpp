@@ -1,6 +1,5 @@
 #include "host/linux/state/file_policy_table.h"
 
-#include <array>
 #include <cerrno>
 
 #include "braxo/misc/strcat.h"
@@ -16,18 +15,11 @@ using Braxo::Misc::StrCat;
 namespace LinuxHost {
 namespace {
 
-struct PermissionLetter {
-  char letter;
-  unsigned int bit;
-};
-constexpr std::array<PermissionLetter, 3> kLetters = {
-    {{'r', kPermitRead}, {'w', kPermitWrite}, {'x', kPermitExecute}}};
-
 constexpr TextLimit kPath = {
     .noun = "path", .whenEmpty = "a file policy needs a path", .maxSize = kMaxPolicyPath};
 
 void RequirePermission(unsigned int permission) {
-  if ((permission & ~kAllPermissions) != 0) {
+  if ((permission & ~Policy::Permissions::kAllBits) != 0) {
     throw HostError(EINVAL, StrCat("unknown permission bits in ", permission));
   }
 }
@@ -42,30 +34,6 @@ bool IsForTheSame(const FilePolicy& one, const FilePolicy& other) {
 }
 
 }  // namespace
-
-unsigned int ParsePermissions(const std::string& letters) {
-  unsigned int permission = 0;
-  for (const char letter : letters) {
-    unsigned int bit = 0;
-    for (const auto& row : kLetters) {
-      if (row.letter == letter) bit = row.bit;
-    }
-    if (bit == 0 || (permission & bit) != 0) {
-      throw HostError(EINVAL, StrCat("permissions '", letters,
-                                     "' must be letters of \"rwx\", each at most once"));
-    }
-    permission |= bit;
-  }
-  return permission;
-}
-
-std::string FormatPermissions(unsigned int permission) {
-  std::string letters;
-  for (const auto& row : kLetters) {
-    if ((permission & row.bit) != 0) letters += row.letter;
-  }
-  return letters;
-}
 
 FilePolicyTable::FilePolicyTable(HostState& owner) : state(owner) {}
 
@@ -166,11 +134,20 @@ std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
   return policies;
 }
 
-Rows FilePolicyTable::Read(unsigned int domainId) {
-  return state.Database().Select(
+std::vector<Policy::Rule> FilePolicyTable::Read(unsigned int domainId) {
+  Rows rows = state.Database().Select(
       "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
       "ORDER BY id",
       domainId);
+  std::vector<Policy::Rule> rules;
+  while (rows.Next()) {
+    Policy::Rule& rule = rules.emplace_back();
+    rule.kind = Policy::RuleKind::kFilePath;
+    rule.words[0] = rows.Text(0);
+    rule.verdict = Policy::Permissions(static_cast<unsigned int>(rows.Integer(1)));
+    rule.line = static_cast<unsigned int>(rows.Integer(2));
+  }
+  return rules;
 }
 
 }  // namespace LinuxHost

@@ -5,8 +5,7 @@
 #include <vector>
 
 #include "host/linux/state/rule_table.h"
-#include "host/linux/state/store.h"
-#include "secpolicyhost/values.h"
+#include "policy/rule.h"
 
 namespace LinuxHost {
 
@@ -14,9 +13,6 @@ class HostState;
 
 // The longest path of a file policy in bytes.
 constexpr std::size_t kMaxPolicyPath = 1983;
-
-// Every permission bit.
-constexpr unsigned int kAllPermissions = kPermitRead | kPermitWrite | kPermitExecute;
 
 // What a domain, or one world in it, may do with a path.
 struct FilePolicy {
@@ -26,11 +22,6 @@ struct FilePolicy {
   unsigned int permission = 0;
   unsigned int line = 0;
 };
-
-// The letters of "rwx" as permission bits, and back, in that order. Parsing throws HostError for
-// any other letter and for one that stands twice.
-unsigned int ParsePermissions(const std::string& letters);
-std::string FormatPermissions(unsigned int permission);
 
 // The file policies of domains, which are their file-path access rules, and those of single worlds.
 // Failures are HostErrors.
@@ -56,9 +47,8 @@ class FilePolicyTable {
   unsigned int Count(unsigned int domainId);
   std::vector<FilePolicy> All(unsigned int domainId);
 
-  // The policies that hold for the whole domain, in the order of their installation: columns are
-  // path, permission, line.
-  [[nodiscard]] Rows Read(unsigned int domainId);
+  // The policies that hold for the whole domain, in the order of their installation.
+  std::vector<Policy::Rule> Read(unsigned int domainId);
 
  private:
   void RequireDomain(unsigned int domainId);

@@ -12,6 +12,7 @@
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
+#include "policy/rule_kind.h"
 
 using Braxo::Misc::StrCat;
 using TeskCtl::Security::TeskAccess_KeywordType;
@@ -67,24 +68,8 @@ Words SocketCreationWords() {
 
 // What a word of the table is called in messages. Throws for a type that is no table.
 const char* NounOf(TeskAccess_KeywordType type) {
-  switch (type) {
-    case TeskCtl::Security::TESKACCESS_KEYWORD_LABEL:
-      return "label";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY:
-      return "capability";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK:
-      return "parameter check";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS:
-      return "object access kind";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS:
-      return "domain transition kind";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION:
-      return "file creation kind";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION:
-      return "unix socket creation kind";
-    case TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL:
-      return "system call";
-  }
+  const Policy::WordForm* const form = Policy::FindWordForm(type);
+  if (form != nullptr) return form->noun;
   throw HostError(EINVAL, StrCat("unknown keyword table ", static_cast<int>(type)));
 }
 

@@ -13,6 +13,8 @@
 #include "host/linux/state/keyword_tables.h"
 
 using Braxo::Misc::StrCat;
+using Policy::ParameterRange;
+using Policy::ParseParameterRange;
 using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 
 namespace LinuxHost {
@@ -66,33 +68,38 @@ void RequireNoConflict(const std::list<TeskAccess_CapabilityParamRule>& rules) {
 
 ParameterRuleTable::ParameterRuleTable(HostState& owner) : state(owner) {}
 
-std::optional<HostError> ParameterRuleTable::Refusal(const ParameterRule& rule) {
-  if (auto refusal = DomainRefusal(state, rule.domain)) return refusal;
-  return KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.check);
+std::optional<HostError> ParameterRuleTable::Refusal(const DomainReference& domain,
+                                                     const Policy::Rule& rule) {
+  if (auto refusal = DomainRefusal(state, domain)) return refusal;
+  return KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK,
+                        rule.words.front());
 }
 
-bool ParameterRuleTable::InstallIfUnchanged(const ParameterRule& rule) {
+bool ParameterRuleTable::InstallIfUnchanged(unsigned int domainId, const Policy::Rule& rule,
+                                            const ParameterRange& range) {
+  const auto& [check, firstWord, lastWord] = rule.words;
   if (state.CurrentLoad() != 0) {
     state.Database().Run(
         "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
         "last_value, first_word, last_word, granted, line, load) "
         "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)",
-        rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
-        rule.lastWord, rule.granted, rule.line, state.CurrentLoad());
+        domainId, check, range.first, range.last, firstWord, lastWord, rule.Grants(), rule.line,
+        state.CurrentLoad());
     return true;
   }
   return state.Database().Run(
              "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
              "last_value, first_word, last_word, granted, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9 FROM state WHERE domain_version = ?10",
-             rule.domain.id, rule.check, rule.range.first, rule.range.last, rule.firstWord,
-             rule.lastWord, rule.granted, rule.line, state.CurrentLoad(),
-             state.Domains().Version()) != 0;
+             domainId, check, range.first, range.last, firstWord, lastWord, rule.Grants(),
+             rule.line, state.CurrentLoad(), state.Domains().Version()) != 0;
 }
 
-void ParameterRuleTable::Install(const ParameterRule& rule) {
+void ParameterRuleTable::Install(const DomainReference& domain, const Policy::Rule& rule) {
+  const ParameterRange range = rule.Range();
   InstallChecked(
-      state, [&] { return Refusal(rule); }, [&] { return InstallIfUnchanged(rule); });
+      state, [&] { return Refusal(domain, rule); },
+      [&] { return InstallIfUnchanged(domain.id, rule, range); });
 }
 
 void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
@@ -112,11 +119,20 @@ void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
   transaction.Commit();
 }
 
-Rows ParameterRuleTable::Read(unsigned int domainId) {
-  return state.Database().Select(
+std::vector<Policy::Rule> ParameterRuleTable::Read(unsigned int domainId) {
+  Rows rows = state.Database().Select(
       "SELECT parameter_check, first_word, last_word, granted, line FROM parameter_rule "
       "WHERE domain_id = ?1 ORDER BY id",
       domainId);
+  std::vector<Policy::Rule> rules;
+  while (rows.Next()) {
+    Policy::Rule& rule = rules.emplace_back();
+    rule.kind = Policy::RuleKind::kParameterCheck;
+    rule.words = {rows.Text(0), rows.Text(1), rows.Text(2)};
+    rule.verdict = rows.Integer(3) != 0;
+    rule.line = static_cast<unsigned int>(rows.Integer(4));
+  }
+  return rules;
 }
 
 }  // namespace LinuxHost

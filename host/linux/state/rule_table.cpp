@@ -10,32 +10,10 @@
 #include "host/linux/state/label_table.h"
 
 using Braxo::Misc::StrCat;
-using TeskCtl::Security::TeskAccess_KeywordType;
+using Policy::FormOf;
+using Policy::RuleKind;
 
 namespace LinuxHost {
-namespace {
-
-// What the words of a kind are taken from.
-struct KindShape {
-  const char* name;  // in the state
-  std::array<std::optional<TeskAccess_KeywordType>, kMaxRuleWords> tables;
-};
-
-constexpr auto kLabel = TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
-
-constexpr std::array<KindShape, 6> kShapes = {{
-    {"system call", {TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL}},
-    {"capability", {TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY}},
-    {"object access", {kLabel, TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS}},
-    {"domain transition", {kLabel, std::nullopt, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS}},
-    {"file creation", {kLabel, kLabel, TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION}},
-    {"unix socket creation", {kLabel, TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION}},
-}};
-
-const KindShape& ShapeOf(RuleKind kind) { return kShapes.at(static_cast<std::size_t>(kind)); }
-
-}  // namespace
-
 std::optional<HostError> DomainRefusal(HostState& state, const DomainReference& reference) {
   const Domain* domain = state.Domains().Find(reference.id);
   if (domain == nullptr) return HostError(ENOENT, StrCat("unknown domain ", reference.id));
@@ -46,30 +24,31 @@ std::optional<HostError> DomainRefusal(HostState& state, const DomainReference& 
 
 RuleTable::RuleTable(HostState& owner) : state(owner) {}
 
-std::optional<HostError> RuleTable::Refusal(const Rule& rule) {
-  if (auto refusal = DomainRefusal(state, rule.domain)) return refusal;
-  if (rule.kind == RuleKind::DomainTransition) {
-    if (auto refusal = DomainRefusal(state, {rule.targetId, rule.words[1]})) return refusal;
+std::optional<HostError> RuleTable::Refusal(const DomainReference& domain, const Policy::Rule& rule,
+                                            unsigned int targetId) {
+  if (auto refusal = DomainRefusal(state, domain)) return refusal;
+  if (rule.kind == RuleKind::kDomainTransition) {
+    if (auto refusal = DomainRefusal(state, {targetId, rule.words[1]})) return refusal;
   }
-  const KindShape& shape = ShapeOf(rule.kind);
-  for (std::size_t index = 0; index < kMaxRuleWords; ++index) {
-    if (!shape.tables[index]) continue;
-    if (auto refusal = KeywordRefusal(state, *shape.tables[index], rule.words[index])) {
-      return refusal;
-    }
+  const auto words = FormOf(rule.kind).Words();
+  for (std::size_t index = 0; index < words.size(); ++index) {
+    const auto& table = FormOf(words[index]).table;
+    if (!table) continue;
+    if (auto refusal = KeywordRefusal(state, *table, rule.words[index])) return refusal;
   }
   return std::nullopt;
 }
 
 // Does nothing and returns false when the tables that the rule was checked against have changed
 // since they were read, which nobody can do while a load lasts.
-bool RuleTable::InstallIfUnchanged(const Rule& rule) {
+bool RuleTable::InstallIfUnchanged(unsigned int domainId, const Policy::Rule& rule) {
+  const char* const kind = FormOf(rule.kind).name;
   if (state.CurrentLoad() != 0) {
     state.Database().Run(
         "INSERT OR REPLACE INTO rule (domain_id, kind, word1, word2, word3, granted, line, load) "
         "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)",
-        rule.domain.id, ShapeOf(rule.kind).name, rule.words[0], rule.words[1], rule.words[2],
-        rule.granted, rule.line, state.CurrentLoad());
+        domainId, kind, rule.words[0], rule.words[1], rule.words[2], rule.Grants(), rule.line,
+        state.CurrentLoad());
     return true;
   }
   return state.Database().Run(
@@ -77,23 +56,39 @@ bool RuleTable::InstallIfUnchanged(const Rule& rule) {
              "(domain_id, kind, word1, word2, word3, granted, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8 FROM state "
              "WHERE domain_version = ?9 AND label_version = ?10",
-             rule.domain.id, ShapeOf(rule.kind).name, rule.words[0], rule.words[1], rule.words[2],
-             rule.granted, rule.line, state.CurrentLoad(), state.Domains().Version(),
-             state.Labels().Version()) != 0;
+             domainId, kind, rule.words[0], rule.words[1], rule.words[2], rule.Grants(), rule.line,
+             state.CurrentLoad(), state.Domains().Version(), state.Labels().Version()) != 0;
 }
 
-void RuleTable::Install(const Rule& rule) {
+void RuleTable::Install(const DomainReference& domain, const Policy::Rule& rule,
+                        unsigned int targetId) {
   InstallChecked(
-      state, [&] { return Refusal(rule); }, [&] { return InstallIfUnchanged(rule); });
+      state, [&] { return Refusal(domain, rule, targetId); },
+      [&] { return InstallIfUnchanged(domain.id, rule); });
 }
 
-Rows RuleTable::Read(unsigned int domainId, RuleKind kind) {
+std::vector<Policy::Rule> RuleTable::Read(unsigned int domainId, RuleKind kind) {
   // Of a bare ?2 the engine would look whether it fits the condition of transition_target, and
   // prepare the statement again for each other kind.
-  return state.Database().Select(
-      "SELECT word1, word2, word3, granted, line FROM rule WHERE domain_id = ?1 AND kind = +?2 "
+  Rows rows = state.Database().Select(
+      "SELECT granted, line, word1, word2, word3 FROM rule WHERE domain_id = ?1 AND kind = +?2 "
       "ORDER BY id",
-      domainId, ShapeOf(kind).name);
+      domainId, FormOf(kind).name);
+  const std::size_t wordCount = FormOf(kind).words.size();
+  // Growing from nothing would move each rule twice; few domains have more of a kind.
+  constexpr std::size_t kRoom = 128;
+  std::vector<Policy::Rule> rules;
+  rules.reserve(kRoom);
+  while (rows.Next()) {
+    Policy::Rule& rule = rules.emplace_back();
+    rule.kind = kind;
+    rule.verdict = rows.Integer(0) != 0;
+    rule.line = static_cast<unsigned int>(rows.Integer(1));
+    for (std::size_t word = 0; word < wordCount; ++word) {
+      rule.words[word] = rows.Text(2 + static_cast<int>(word));
+    }
+  }
+  return rules;
 }
 
 void RuleTable::RemoveDomain(const Domain& domain) {

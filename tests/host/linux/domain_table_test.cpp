@@ -23,7 +23,7 @@ namespace {
 using LinuxHost::Domain;
 using LinuxHost::DomainRole;
 using LinuxHost::HostState;
-using LinuxHost::RuleKind;
+using Policy::RuleKind;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_CHECK_ACCESS;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
@@ -42,14 +42,14 @@ class Domains : public ::testing::Test {
 
   void GrantTransition(unsigned int from, unsigned int to, bool granted = true) {
     const std::string target = state.Domains().Get(to).name;
-    state.Rules().Install({.domain = {from, {}},
-                           .kind = RuleKind::DomainTransition,
+    state.Rules().Install({from, {}},
+                          {.kind = RuleKind::kDomainTransition,
                            .words = {"unlabeled", target, "exec"},
-                           .targetId = to,
-                           .granted = granted});
+                           .verdict = granted},
+                          to);
   }
 
-  bool HasRules(unsigned int id, RuleKind kind) { return state.Rules().Read(id, kind).Next(); }
+  bool HasRules(unsigned int id, RuleKind kind) { return !state.Rules().Read(id, kind).empty(); }
 
   StateDirectory directory;
   HostState& state = HostState::Current();
@@ -130,11 +130,12 @@ TEST_F(Domains, AreNeverCreatedTwiceByTwoConnections) {
 
 TEST_F(Domains, AreDestroyedWithTheirRules) {
   const unsigned int id = Create("a");
-  state.Rules().Install({.domain = {id, "a"}, .words = {"read"}, .granted = true});
+  state.Rules().Install({id, "a"},
+                        {.kind = RuleKind::kSyscall, .words = {"read"}, .verdict = true});
   state.Domains().Destroy(id);
   EXPECT_EQ(state.Domains().Find("a"), nullptr);
   EXPECT_EQ(Create("b"), id);
-  EXPECT_FALSE(HasRules(id, RuleKind::Syscall));
+  EXPECT_FALSE(HasRules(id, RuleKind::kSyscall));
 }
 
 // The next domain gets the slot, and must not get what the one before it was allowed.
@@ -142,17 +143,13 @@ TEST_F(Domains, LeaveNothingToTheNextOneInTheirSlot) {
   const unsigned int id = Create("a");
   const LinuxHost::FilePolicy policy{.domain = {id, ""}, .path = "/etc", .permission = 1};
   state.FilePolicies().Install({&policy, 1});
-  state.ParameterRules().Install({.domain = {id, ""},
-                                  .check = "bind_port",
-                                  .range = {80, 80},
-                                  .firstWord = "80",
-                                  .lastWord = "",
-                                  .granted = true});
+  state.ParameterRules().Install(
+      {id, ""}, {.kind = RuleKind::kParameterCheck, .words = {"bind_port", "80"}, .verdict = true});
   state.Domains().AddGuestService(id, "time");
   state.Domains().Destroy(id);
   ASSERT_EQ(Create("b"), id);
   EXPECT_EQ(state.FilePolicies().Count(id), 0U);
-  EXPECT_FALSE(state.ParameterRules().Read(id).Next());
+  EXPECT_TRUE(state.ParameterRules().Read(id).empty());
   EXPECT_THAT(state.Domains().GuestServices(id), ElementsAre());
 }
 
@@ -163,17 +160,17 @@ TEST_F(Domains, TakeTheTransitionsIntoThemAlong) {
   GrantTransition(from, to);
   GrantTransition(other, from);
   state.Domains().Destroy(to);
-  EXPECT_FALSE(HasRules(from, RuleKind::DomainTransition));
-  EXPECT_TRUE(HasRules(other, RuleKind::DomainTransition));
+  EXPECT_FALSE(HasRules(from, RuleKind::kDomainTransition));
+  EXPECT_TRUE(HasRules(other, RuleKind::kDomainTransition));
 }
 
 TEST_F(Domains, TakeTheRulesThatNameThemAsALabelAlong) {
   const unsigned int id = Create("a");
   const unsigned int other = Create("b");
   state.Rules().Install(
-      {.domain = {other, "b"}, .kind = RuleKind::ObjectAccess, .words = {"a", "read"}});
+      {other, "b"}, {.kind = RuleKind::kObjectAccess, .words = {"a", "read"}, .verdict = false});
   state.Domains().Destroy(id);
-  EXPECT_FALSE(HasRules(other, RuleKind::ObjectAccess));
+  EXPECT_FALSE(HasRules(other, RuleKind::kObjectAccess));
 }
 
 TEST_F(Domains, CannotBeDestroyedTwice) {

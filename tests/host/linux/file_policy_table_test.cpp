@@ -14,29 +14,8 @@ namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::FilePolicy;
-using LinuxHost::FormatPermissions;
 using LinuxHost::HostState;
-using LinuxHost::ParsePermissions;
 using ::testing::ElementsAre;
-
-TEST(Permissions, AreLettersAndBits) {
-  const std::pair<const char*, unsigned int> pairs[] = {{"", 0},      {"r", 0x1},   {"w", 0x2},
-                                                        {"rw", 0x3},  {"x", 0x10},  {"rx", 0x11},
-                                                        {"wx", 0x12}, {"rwx", 0x13}};
-  for (const auto& [letters, bits] : pairs) {
-    EXPECT_EQ(ParsePermissions(letters), bits);
-    EXPECT_EQ(FormatPermissions(bits), letters);
-  }
-  EXPECT_EQ(ParsePermissions("xwr"), 0x13U);
-}
-
-TEST(Permissions, RefuseOtherLettersAndRepetitions) {
-  for (const char* letters : {"R", "rr", "rwxr", "rwa", " ", "r "}) {
-    EXPECT_EQ(
-        MessageOf([&] { ParsePermissions(letters); }),
-        std::string("permissions '") + letters + "' must be letters of \"rwx\", each at most once");
-  }
-}
 
 class FilePolicies : public ::testing::Test {
  protected:
@@ -54,14 +33,14 @@ class FilePolicies : public ::testing::Test {
     std::vector<std::string> texts;
     for (const auto& policy : state.FilePolicies().All(domain)) {
       const std::string world = policy.world == 0 ? "" : policy.world == self ? " self" : " other";
-      texts.push_back(policy.path + " " + FormatPermissions(policy.permission) + world);
+      texts.push_back(policy.path + " " + Policy::Permissions(policy.permission).Text() + world);
     }
     return texts;
   }
 
   std::vector<std::string> Shared() {
     std::vector<std::string> paths;
-    for (auto rows = state.FilePolicies().Read(domain); rows.Next();) paths.push_back(rows.Text(0));
+    for (const auto& rule : state.FilePolicies().Read(domain)) paths.push_back(rule.words.front());
     return paths;
   }
 

@@ -117,12 +117,11 @@ TEST_F(HostStateFile, GoesBackToTheBuiltInContents) {
   state.Labels().Add({"toolLabel"});
   state.Domains().SetRole(LinuxHost::DomainRole::GlobalVm, id);
   state.Domains().AddGuestService(id, "clipboard");
-  state.Rules().Install({.domain = {id, "tool"}, .words = {"read"}, .granted = true});
-  state.ParameterRules().Install({.domain = {id, "tool"},
-                                  .check = "bind_port",
-                                  .range = {80, 80},
-                                  .firstWord = "80",
-                                  .lastWord = ""});
+  state.Rules().Install({id, "tool"},
+                        {.kind = Policy::RuleKind::kSyscall, .words = {"read"}, .verdict = true});
+  state.ParameterRules().Install(
+      {id, "tool"},
+      {.kind = Policy::RuleKind::kParameterCheck, .words = {"bind_port", "80"}, .verdict = true});
   const LinuxHost::FilePolicy policy = {.domain = {id, "tool"}, .path = "/etc", .permission = 1};
   state.FilePolicies().Install({&policy, 1});
   state.Worlds().Place(getpid(), id);
@@ -141,8 +140,8 @@ TEST_F(HostStateFile, GoesBackToTheBuiltInContents) {
   EXPECT_EQ(state.Domains().Create("next", TESKACCESS_DEFAULT_DOM_NONE, false), id);
   EXPECT_EQ(state.Domains().CountReferences(state.Domains().Get(id)).Sum(), 0U);
   EXPECT_THAT(state.Domains().GuestServices(id), ElementsAre());
-  EXPECT_FALSE(state.Rules().Read(id, LinuxHost::RuleKind::Syscall).Next());
-  EXPECT_FALSE(state.ParameterRules().Read(id).Next());
+  EXPECT_TRUE(state.Rules().Read(id, Policy::RuleKind::kSyscall).empty());
+  EXPECT_TRUE(state.ParameterRules().Read(id).empty());
   EXPECT_EQ(state.FilePolicies().Count(id), 0U);
   state.Labels().Add({"first"});
   state.Refresh();

@@ -14,7 +14,7 @@ namespace {
 
 using LinuxHost::HostState;
 using LinuxHost::kNoLabel;
-using LinuxHost::RuleKind;
+using Policy::RuleKind;
 using ::testing::ElementsAre;
 using ::testing::Pair;
 
@@ -71,41 +71,36 @@ TEST_F(Labels, StayWhenTheyArePredefined) {
 TEST_F(Labels, TakeTheRulesThatNameThemAlong) {
   state.Labels().Add({"a", "b"});
   state.Refresh();
-  const auto install = [&](RuleKind kind, std::string_view first, std::string_view second,
-                           std::string_view third) {
-    state.Rules().Install({.domain = {0, {}}, .kind = kind, .words = {first, second, third}});
+  const auto install = [&](RuleKind kind, decltype(Policy::Rule::words) words) {
+    state.Rules().Install({0, {}}, {.kind = kind, .words = std::move(words), .verdict = false});
   };
-  install(RuleKind::ObjectAccess, "a", "read", "");
-  install(RuleKind::ObjectAccess, "b", "read", "");
-  install(RuleKind::FileCreation, "b", "a", "fifo");
-  install(RuleKind::FileCreation, "b", "b", "fifo");
-  install(RuleKind::UnixSocketCreation, "a", "stream", "");
-  install(RuleKind::DomainTransition, "a", "hostDom", "exec");
-  install(RuleKind::Syscall, "read", "", "");
-  install(RuleKind::Capability, "cap_kill", "", "");
+  install(RuleKind::kObjectAccess, {"a", "read"});
+  install(RuleKind::kObjectAccess, {"b", "read"});
+  install(RuleKind::kFileCreation, {"b", "a", "fifo"});
+  install(RuleKind::kFileCreation, {"b", "b", "fifo"});
+  install(RuleKind::kUnixSocketCreation, {"a", "stream"});
+  install(RuleKind::kDomainTransition, {"a", "hostDom", "exec"});
+  install(RuleKind::kSyscall, {"read"});
+  install(RuleKind::kCapability, {"cap_kill"});
 
   state.Labels().Remove({"a"});
 
-  const auto count = [&](RuleKind kind) {
-    int rules = 0;
-    for (auto rows = state.Rules().Read(0, kind); rows.Next();) ++rules;
-    return rules;
-  };
-  EXPECT_EQ(count(RuleKind::ObjectAccess), 1);
-  EXPECT_EQ(count(RuleKind::FileCreation), 1);
-  EXPECT_EQ(count(RuleKind::UnixSocketCreation), 0);
-  EXPECT_EQ(count(RuleKind::DomainTransition), 0);
-  EXPECT_EQ(count(RuleKind::Syscall), 1);
-  EXPECT_EQ(count(RuleKind::Capability), 1);
+  const auto count = [&](RuleKind kind) { return state.Rules().Read(0, kind).size(); };
+  EXPECT_EQ(count(RuleKind::kObjectAccess), 1U);
+  EXPECT_EQ(count(RuleKind::kFileCreation), 1U);
+  EXPECT_EQ(count(RuleKind::kUnixSocketCreation), 0U);
+  EXPECT_EQ(count(RuleKind::kDomainTransition), 0U);
+  EXPECT_EQ(count(RuleKind::kSyscall), 1U);
+  EXPECT_EQ(count(RuleKind::kCapability), 1U);
 }
 
 TEST_F(Labels, LeaveTheRulesThatNameADomainOfTheSameName) {
   state.Domains().Create("a", TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE, false);
   state.Labels().Add({"a"});
   state.Rules().Install(
-      {.domain = {0, {}}, .kind = RuleKind::ObjectAccess, .words = {"a", "read"}});
+      {0, {}}, {.kind = RuleKind::kObjectAccess, .words = {"a", "read"}, .verdict = false});
   state.Labels().Remove({"a"});
-  EXPECT_TRUE(state.Rules().Read(0, RuleKind::ObjectAccess).Next());
+  EXPECT_EQ(state.Rules().Read(0, RuleKind::kObjectAccess).size(), 1U);
 }
 
 TEST_F(Labels, AreSeenByOtherConnections) {

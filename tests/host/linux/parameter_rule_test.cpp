@@ -5,7 +5,6 @@
 
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/parameter_range.h"
 #include "host/linux/state/parameter_rule_table.h"
 #include "message_of.h"
 #include "state_directory.h"
@@ -14,47 +13,8 @@ namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::HostState;
-using LinuxHost::ParseParameterRange;
 using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 using ::testing::ElementsAre;
-
-std::string RangeRefusal(const std::string& first, const std::string& last) {
-  return MessageOf([&] { ParseParameterRange(first, last); });
-}
-
-TEST(ParseParameterRange, ReadsDecimalAndHexadecimalNumbers) {
-  const auto range = ParseParameterRange("80", "0x1bB");
-  EXPECT_EQ(range.first, 80U);
-  EXPECT_EQ(range.last, 443U);
-  EXPECT_EQ(ParseParameterRange("0X10", "").first, 16U);
-  EXPECT_EQ(ParseParameterRange("0", "18446744073709551615").last, ~std::uint64_t{0});
-  EXPECT_EQ(ParseParameterRange("010", "").first, 10U);
-}
-
-TEST(ParseParameterRange, IsOneValueWithoutASecondWord) {
-  const auto range = ParseParameterRange("80", "");
-  EXPECT_EQ(range.first, range.last);
-}
-
-TEST(ParseParameterRange, RefusesWhatIsNoNumber) {
-  for (const char* word : {"", "x", "-1", "+1", "1 ", " 1", "0x", "0xg", "1.5", "12a", "0x-1"}) {
-    EXPECT_EQ(RangeRefusal(word, ""),
-              std::string("parameter '") + word + "' is not an unsigned number");
-  }
-  EXPECT_EQ(RangeRefusal("1", "x"), "parameter 'x' is not an unsigned number");
-}
-
-TEST(ParseParameterRange, RefusesNumbersThatDoNotFit) {
-  EXPECT_EQ(RangeRefusal("18446744073709551616", ""),
-            "parameter '18446744073709551616' is too large");
-  EXPECT_EQ(RangeRefusal("0x10000000000000000", ""),
-            "parameter '0x10000000000000000' is too large");
-}
-
-TEST(ParseParameterRange, RefusesARangeThatRunsBackwards) {
-  EXPECT_EQ(RangeRefusal("443", "80"), "parameter range 443 to 80 is empty");
-  EXPECT_EQ(RangeRefusal("80", "80"), "");
-}
 
 // ---- Conflicts.
 
@@ -149,22 +109,19 @@ class InstalledParameterRules : public ::testing::Test {
  protected:
   void Install(const std::string& first, const std::string& last, bool granted,
                const std::string& check = "bind_port") {
-    state.ParameterRules().Install({.domain = {domain, "owner"},
-                                    .check = check,
-                                    .range = ParseParameterRange(first, last),
-                                    .firstWord = first,
-                                    .lastWord = last,
-                                    .granted = granted,
-                                    .line = 1});
+    const Policy::Rule rule = {.kind = Policy::RuleKind::kParameterCheck,
+                               .words = {check, first, last},
+                               .verdict = granted,
+                               .line = 1};
+    state.ParameterRules().Install({domain, "owner"}, rule);
   }
 
   std::vector<std::string> All() {
-    std::vector<std::string> rules;
-    for (auto rows = state.ParameterRules().Read(domain); rows.Next();) {
-      rules.push_back(rows.Text(0) + " " + rows.Text(1) + " " + rows.Text(2) + " " +
-                      (rows.Integer(3) != 0 ? "grant" : "revoke"));
+    std::vector<std::string> texts;
+    for (const Policy::Rule& rule : state.ParameterRules().Read(domain)) {
+      texts.push_back(rule.Text());
     }
-    return rules;
+    return texts;
   }
 
   StateDirectory directory;
@@ -178,7 +135,7 @@ TEST_F(InstalledParameterRules, AreTheSameHoweverTheirNumbersAreWritten) {
   Install("7", "", true);
   Install("0x50", "0x1bb", false);
   Install("7", "7", true);
-  EXPECT_THAT(All(), ElementsAre("bind_port 0x50 0x1bb revoke", "bind_port 7 7 grant"));
+  EXPECT_THAT(All(), ElementsAre("-p bind_port 0x50 0x1bb revoke", "-p bind_port 7 7 grant"));
 }
 
 TEST_F(InstalledParameterRules, HoldTheGreatestNumber) {

@@ -3,6 +3,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <string>
+#include <tuple>
 #include <vector>
 
 #include "host/linux/state/domain_table.h"
@@ -14,29 +16,31 @@
 namespace LinuxHostTest {
 namespace {
 
+using LinuxHost::DomainReference;
 using LinuxHost::HostState;
-using LinuxHost::Rule;
-using LinuxHost::RuleKind;
+using Policy::Rule;
+using Policy::RuleKind;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using ::testing::ElementsAre;
 
+using Words = decltype(Rule::words);
+
 class RulesOfWords : public ::testing::Test {
  protected:
-  Rule ObjectAccess(std::string_view label, std::string_view kind = "read") const {
-    return {.domain = {domain, "owner"},
-            .kind = RuleKind::ObjectAccess,
-            .words = {label, kind},
-            .granted = true,
-            .line = 1};
+  static Rule ObjectAccess(const std::string& label, const std::string& kind = "read") {
+    return {.kind = RuleKind::kObjectAccess, .words = {label, kind}, .verdict = true, .line = 1};
   }
 
-  std::string Refusal(const Rule& rule) {
-    return MessageOf([&] { state.Rules().Install(rule); });
-  }
+  void Install(const Rule& rule) { state.Rules().Install({domain, "owner"}, rule); }
 
-  std::vector<std::string> Labels(RuleKind kind = RuleKind::ObjectAccess) {
+  std::string Refusal(const Rule& rule, const DomainReference& of, unsigned int targetId = 0) {
+    return MessageOf([&] { state.Rules().Install(of, rule, targetId); });
+  }
+  std::string Refusal(const Rule& rule) { return Refusal(rule, {domain, "owner"}); }
+
+  std::vector<std::string> Labels(RuleKind kind = RuleKind::kObjectAccess) {
     std::vector<std::string> labels;
-    for (auto rows = state.Rules().Read(domain, kind); rows.Next();) labels.push_back(rows.Text(0));
+    for (const Rule& rule : state.Rules().Read(domain, kind)) labels.push_back(rule.words.front());
     return labels;
   }
 
@@ -46,56 +50,64 @@ class RulesOfWords : public ::testing::Test {
 };
 
 TEST_F(RulesOfWords, MustBelongToADomain) {
-  Rule rule = ObjectAccess("unlabeled");
-  rule.domain.id = 77;
-  EXPECT_EQ(Refusal(rule), "unknown domain 77");
+  EXPECT_EQ(Refusal(ObjectAccess("unlabeled"), {77, "owner"}), "unknown domain 77");
 }
 
 TEST_F(RulesOfWords, MustNotConfuseDomains) {
-  Rule rule = ObjectAccess("unlabeled");
-  rule.domain.name = "other";
-  EXPECT_EQ(Refusal(rule), "domain 2 is 'owner', not 'other'");
-  rule.domain.name = "";
-  EXPECT_EQ(Refusal(rule), "");
+  const Rule rule = ObjectAccess("unlabeled");
+  EXPECT_EQ(Refusal(rule, {domain, "other"}), "domain 2 is 'owner', not 'other'");
+  EXPECT_EQ(Refusal(rule, {domain, ""}), "");
 }
 
 TEST_F(RulesOfWords, MustUseWordsThatExist) {
-  EXPECT_EQ(Refusal(ObjectAccess("nothing")), "unknown label 'nothing'");
-  EXPECT_EQ(Refusal(ObjectAccess("unlabeled", "eat")), "unknown object access kind 'eat'");
-  EXPECT_EQ(Refusal(ObjectAccess("", "")), "unknown label ''");
-  EXPECT_EQ(Refusal({.domain = {domain, {}}, .words = {"no_call"}}),
-            "unknown system call 'no_call'");
-  EXPECT_EQ(Refusal({.domain = {domain, {}}, .kind = RuleKind::Capability, .words = {"cap_x"}}),
-            "unknown capability 'cap_x'");
-  EXPECT_EQ(Refusal({.domain = {domain, {}},
-                     .kind = RuleKind::FileCreation,
-                     .words = {"unlabeled", "nothing", "fifo"}}),
-            "unknown label 'nothing'");
-  EXPECT_EQ(Refusal({.domain = {domain, {}},
-                     .kind = RuleKind::UnixSocketCreation,
-                     .words = {"unlabeled", "raw"}}),
-            "unknown unix socket creation kind 'raw'");
+  const std::tuple<RuleKind, Words, const char*> refusals[] = {
+      {RuleKind::kObjectAccess, {"nothing", "read"}, "unknown label 'nothing'"},
+      {RuleKind::kObjectAccess, {"unlabeled", "eat"}, "unknown object access kind 'eat'"},
+      {RuleKind::kObjectAccess, {"", ""}, "unknown label ''"},
+      {RuleKind::kSyscall, {"no_call"}, "unknown system call 'no_call'"},
+      {RuleKind::kCapability, {"cap_x"}, "unknown capability 'cap_x'"},
+      {RuleKind::kFileCreation, {"unlabeled", "nothing", "fifo"}, "unknown label 'nothing'"},
+      {RuleKind::kUnixSocketCreation,
+       {"unlabeled", "raw"},
+       "unknown unix socket creation kind 'raw'"},
+  };
+  for (const auto& [kind, words, refusal] : refusals) {
+    EXPECT_EQ(Refusal({.kind = kind, .words = words, .verdict = true}), refusal);
+  }
   EXPECT_THAT(Labels(), ElementsAre());
 }
 
 TEST_F(RulesOfWords, MustNameTheTargetOfATransition) {
-  Rule rule = {.domain = {domain, {}},
-               .kind = RuleKind::DomainTransition,
+  Rule rule = {.kind = RuleKind::kDomainTransition,
                .words = {"unlabeled", "hostDom", "exec"},
-               .targetId = 0};
-  EXPECT_EQ(Refusal(rule), "");
-  rule.targetId = domain;
-  EXPECT_EQ(Refusal(rule), "domain 2 is 'owner', not 'hostDom'");
-  rule.targetId = 77;
-  EXPECT_EQ(Refusal(rule), "unknown domain 77");
-  rule.targetId = 0;
+               .verdict = true};
+  EXPECT_EQ(Refusal(rule, {domain, {}}, 0), "");
+  EXPECT_EQ(Refusal(rule, {domain, {}}, domain), "domain 2 is 'owner', not 'hostDom'");
+  EXPECT_EQ(Refusal(rule, {domain, {}}, 77), "unknown domain 77");
   rule.words[2] = "jump";
-  EXPECT_EQ(Refusal(rule), "unknown domain transition kind 'jump'");
+  EXPECT_EQ(Refusal(rule, {domain, {}}, 0), "unknown domain transition kind 'jump'");
+}
+
+TEST_F(RulesOfWords, KeepTheirWordsVerdictsAndLines) {
+  Install({.kind = RuleKind::kFileCreation,
+           .words = {"unlabeled", "tardiskDefault", "fifo"},
+           .verdict = true,
+           .line = 7});
+  Install({.kind = RuleKind::kFileCreation,
+           .words = {"tardiskDefault", "unlabeled", "regular"},
+           .verdict = false,
+           .line = 9});
+  const std::vector<Rule> rules = state.Rules().Read(domain, RuleKind::kFileCreation);
+  ASSERT_EQ(rules.size(), 2U);
+  EXPECT_EQ(rules[0].Text(), "-f unlabeled tardiskDefault fifo grant");
+  EXPECT_EQ(rules[0].line, 7U);
+  EXPECT_EQ(rules[1].Text(), "-f tardiskDefault unlabeled regular revoke");
+  EXPECT_EQ(rules[1].line, 9U);
 }
 
 TEST_F(RulesOfWords, SeeWhatAnotherConnectionHasJustMade) {
   const auto other = std::make_shared<HostState>(directory.Database());
-  state.Rules().Install(ObjectAccess("unlabeled"));
+  Install(ObjectAccess("unlabeled"));
   other->Labels().Add({"tool"});
   EXPECT_EQ(Refusal(ObjectAccess("tool")), "");
   EXPECT_THAT(Labels(), ElementsAre("unlabeled", "tool"));
@@ -104,7 +116,7 @@ TEST_F(RulesOfWords, SeeWhatAnotherConnectionHasJustMade) {
 TEST_F(RulesOfWords, AreNotFooledByWhatAnotherConnectionHasJustRemoved) {
   const auto other = std::make_shared<HostState>(directory.Database());
   state.Labels().Add({"tool"});
-  state.Rules().Install(ObjectAccess("tool"));
+  Install(ObjectAccess("tool"));
   other->Refresh();
   other->Labels().Remove({"tool"});
   EXPECT_EQ(Refusal(ObjectAccess("tool")), "unknown label 'tool'");
@@ -116,12 +128,11 @@ TEST_F(RulesOfWords, AreNotFooledByWhatAnotherConnectionHasJustRemoved) {
 }
 
 TEST_F(RulesOfWords, AreKeptApartByKind) {
-  state.Rules().Install({.domain = {domain, {}}, .words = {"read"}});
-  state.Rules().Install(
-      {.domain = {domain, {}}, .kind = RuleKind::Capability, .words = {"cap_kill"}});
-  EXPECT_THAT(Labels(RuleKind::Syscall), ElementsAre("read"));
-  EXPECT_THAT(Labels(RuleKind::Capability), ElementsAre("cap_kill"));
-  EXPECT_THAT(Labels(RuleKind::ObjectAccess), ElementsAre());
+  Install({.kind = RuleKind::kSyscall, .words = {"read"}, .verdict = true});
+  Install({.kind = RuleKind::kCapability, .words = {"cap_kill"}, .verdict = true});
+  EXPECT_THAT(Labels(RuleKind::kSyscall), ElementsAre("read"));
+  EXPECT_THAT(Labels(RuleKind::kCapability), ElementsAre("cap_kill"));
+  EXPECT_THAT(Labels(RuleKind::kObjectAccess), ElementsAre());
 }
 
 }  // namespace

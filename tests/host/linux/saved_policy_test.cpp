@@ -29,8 +29,8 @@ using LinuxHost::CopyOf;
 using LinuxHost::HostState;
 using LinuxHost::LabelNumbers;
 using LinuxHost::RestorePolicy;
-using LinuxHost::RuleKind;
 using LinuxHost::SaveState;
+using Policy::RuleKind;
 
 constexpr auto kNoDefaults = TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 
@@ -41,8 +41,8 @@ class SavedPolicy : public ::testing::Test {
   }
 
   void Grant(unsigned int domain, const std::string& call, bool granted = true) {
-    state.Rules().Install(
-        {.domain = {domain, ""}, .kind = RuleKind::Syscall, .words = {call}, .granted = granted});
+    state.Rules().Install({domain, ""},
+                          {.kind = RuleKind::kSyscall, .words = {call}, .verdict = granted});
   }
 
   void AddPolicy(unsigned int domain, int world, const std::string& path) {
@@ -205,7 +205,9 @@ TEST_F(SavedPolicy, IsSeenByOtherConnections) {
   RestorePolicy(copy, LabelNumbers::kNew);
 
   EXPECT_EQ(MessageOf([&] {
-              other.Rules().Install({.domain = {late, "lateDom"}, .words = {"read"}});
+              other.Rules().Install(
+                  {late, "lateDom"},
+                  {.kind = RuleKind::kSyscall, .words = {"read"}, .verdict = false});
             }),
             "unknown domain " + std::to_string(late));
   EXPECT_EQ(other.Labels().Lookup("lateLabel"), LinuxHost::kNoLabel);

@@ -47,7 +47,8 @@ std::vector<InstalledRule> ReadRules(const std::string& name, unsigned int id,
   // Set by set, because reading a whole domain reports a set that cannot be read and goes on.
   for (const auto& [keyword, ruleSet] : policy.ruleSets) {
     ruleSet->ReadSystemRules(id, access);
-    const std::vector<RuleSource> sources = LinuxHost::FindRuleSources(id, keyword);
+    const std::vector<RuleSource> sources =
+        LinuxHost::FindRuleSources(id, Policy::FindRuleForm(keyword)->kind);
     auto source = sources.begin();
     for (std::string& text : PrintedRules(*ruleSet)) {
       const auto origin = recorded.find(text);

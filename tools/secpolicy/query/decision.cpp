@@ -5,8 +5,8 @@
 #include <string_view>
 
 #include "domain_file.h"
-#include "host/linux/state/parameter_range.h"
 #include "installed/rule_words.h"
+#include "policy/parameter_range.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -171,9 +171,9 @@ std::vector<std::string> MissingForEntry(const std::string& target, const Instal
 // ---- Parameter checks
 
 bool IsInRange(const RuleWords& rule, const std::string& number) {
-  const auto asked = LinuxHost::ParseParameterRange(number, "");
+  const auto asked = Policy::ParseParameterRange(number, "");
   const std::string last = rule.words.size() > 2 ? rule.words[2] : "";
-  return LinuxHost::ParseParameterRange(rule.words[1], last).Overlaps(asked);
+  return Policy::ParseParameterRange(rule.words[1], last).Overlaps(asked);
 }
 
 std::vector<Vote> ParameterVotes(const Question& question, const InstalledDomain& domain) {

@@ -6,8 +6,8 @@
 #include <map>
 
 #include "host/linux/operation/file_label.h"
-#include "host/linux/state/parameter_range.h"
 #include "installed/real_path.h"
+#include "policy/parameter_range.h"
 #include "text/suggestion.h"
 
 namespace SecPolicyCli {
@@ -81,7 +81,7 @@ void RequirePath(const std::string& path) {
 
 void RequireNumber(const std::string& word) {
   try {
-    LinuxHost::ParseParameterRange(word, "");
+    Policy::ParseParameterRange(word, "");
   } catch (const BraxoException&) {
     throw QuestionError("'" + word + "' is not an unsigned number, decimal or hexadecimal with 0x");
   }
