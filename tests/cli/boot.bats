@@ -57,7 +57,7 @@ load helper
   echo "this is no archive" >"$root/tardisks/aaa.tgz"
   secpolicy boot
   exits 1
-  [[ ${stderr##*$'\n'} == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: "* ]]
+  ends_with "secpolicy: boot: Unable to unpack tardisk aaa.tgz: Unrecognized archive format"
 }
 
 @test "boot without a policy is stopped and says where to put one" {
@@ -81,11 +81,13 @@ load helper
   rm -r "$policy/early/domains"
   secpolicy boot
   exits 1
-  [[ $stderr =~ ^"Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
+  diff - <(sed '/^installed now: /s/[0-9]\+/N/g' <<<"$stderr") <<'END'
+Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
 /etc/zorvan/secpolicy/early/domains: 1 error
 'secpolicy check /etc/zorvan/secpolicy' shows the lines, and what may be meant
-installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
-secpolicy: boot: failed (1 error above)"$ ]]
+installed now: N domains, N rules, N objects
+secpolicy: boot: failed (1 error above)
+END
 }
 
 @test "--timing prints each phase of a boot to standard output" {
@@ -126,11 +128,11 @@ add_tardisk() {
   local before
   before=$("$SECPOLICY" --root "$root" display 2>/dev/null)
   rm "$root/usr/sbin/sshd"
-  gzip -dc "$root/tardisks/monitor.tgz" | head -c -10240 >"$root/tardisks/monitor.tar"
+  gzip -dc "$root/tardisks/monitor.tgz" | head -c -4096 >"$root/tardisks/monitor.tar"
   rm "$root/tardisks/monitor.tgz"
   secpolicy boot
   exits 1
-  [[ ${stderr##*$'\n'} == "secpolicy: boot: Unable to unpack tardisk monitor.tar: "* ]]
+  ends_with "secpolicy: boot: Unable to unpack tardisk monitor.tar: It lacks the two blocks of zeros at its end, so it was cut off"
   [[ ! -e $root/usr/sbin/sshd ]]
   [[ $("$SECPOLICY" --root "$root" display 2>/dev/null | grep -v 'tardisks/') == "$(grep -v 'tardisks/' <<<"$before")" ]]
 }
@@ -297,7 +299,7 @@ files to get their first label: "[0-9]* ]]
   echo "this is no archive" >"$root/tardisks/aaa.tgz"
   secpolicy boot --plan
   exits 1
-  [[ -z $output && $stderr == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: "* ]]
+  [[ -z $output && $stderr == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: Unrecognized archive format" ]]
 }
 
 @test "completion offers what boot takes" {

@@ -99,9 +99,7 @@ fileLabels/zz:3 [unknown-word]" ]]
   local name
   name=$(printf 'x%.0s' {1..64})
   touch "$policy/domains/$name"
-  secpolicy check
-  exits 1
-  [[ $output == *"$shown/domains/$name: error: "*" [bad-name]"* ]]
+  finds "$shown/domains/$name: error: domain name '$name' is too long: 64 bytes, at most 63 [bad-name]"
 }
 
 @test "bad-name, where there is no room for more domains" {
@@ -109,17 +107,15 @@ fileLabels/zz:3 [unknown-word]" ]]
   secpolicy check
   exits 1
   [[ $(grep -c 'bad-name' <<<"$output") -eq 1 ]]
-  [[ $output == *"domains are in use [bad-name]
-    hint: neither is there room for 24"*" files after this one"* ]]
+  shows "$shown/domains/x0503: error: cannot create domain 'x0503': all 511 domains are in use [bad-name]"
+  shows "    hint: neither is there room for 2497 files after this one"
 }
 
 @test "bad-name, of an object" {
   local name
   name=$(printf 'x%.0s' {1..256})
   add objects/base "$name"
-  secpolicy check
-  exits 1
-  [[ $output == *"$shown/objects/base:$number:1: error: "*" [bad-name]"* ]]
+  finds "$shown/objects/base:$number:1: error: label '$name' is too long: 256 bytes, at most 255 [bad-name]"
 }
 
 @test "bad-permissions" {
@@ -179,12 +175,10 @@ fileLabels/zz:3 [unknown-word]" ]]
 }
 
 @test "carriage-return" {
-  printf -- '-s bind grant\r\n' >>"$policy/domains/appDom"
-  secpolicy check
-  exits 1
-  [[ $output == *": warning: this carriage return is part of a word: lines end with a line feed alone [carriage-return]
-    -s bind grant^M
-                 ^^"* ]]
+  add domains/appDom $'-s bind grant\r'
+  finds "$shown/domains/appDom:$number:14: warning: this carriage return is part of a word: lines end with a line feed alone [carriage-return]"
+  shows "    -s bind grant^M"
+  shows "                 ^^"
 }
 
 @test "contradicting-rule" {
@@ -193,10 +187,10 @@ fileLabels/zz:3 [unknown-word]" ]]
 }
 
 @test "duplicate-object" {
+  local first
+  first=$(grep -n '^sshKey\b' "$policy/objects/base" | cut -d: -f1)
   add objects/base "sshKey"
-  secpolicy check
-  exits 0
-  [[ $output == *"$shown/objects/base:$number:1: warning: 'sshKey' is declared in line "*" of $shown/objects/base already [duplicate-object]"* ]]
+  warns "$shown/objects/base:$number:1: warning: 'sshKey' is declared in line $first of $shown/objects/base already [duplicate-object]"
 }
 
 @test "duplicate-rule, the letters of paths in any order" {
@@ -436,11 +430,9 @@ END
 
 @test "--disable of an error and of no code is wrong usage" {
   secpolicy check --disable rule-type
-  exits 2
-  [[ $stderr == *"'rule-type' is an error"* ]]
+  wrong_usage check "--disable: 'rule-type' is an error: a load does not end well with it"
   secpolicy check --disable no-such-code
-  exits 2
-  [[ $stderr == *"there is no warning 'no-such-code'"* ]]
+  wrong_usage check "--disable: there is no warning 'no-such-code'"
 }
 
 @test "--format json" {
@@ -506,7 +498,7 @@ END
   printf -- '-s gr\xc3\xbc\xc3\x9fe grnt\n' >>"$policy/domains/appDom"
   number=$(wc -l <"$policy/domains/appDom")
   finds "$shown/domains/appDom:$number:10: error: invalid keyword grnt [grant-word]"
-  [[ $output == *'-s grüße grnt'* ]]
+  shows '    -s grüße grnt'
 }
 
 @test "thousands of misspelt words beside thousands of objects take seconds" {
@@ -534,7 +526,7 @@ END
   # Sanitizers take all addresses there are.
   [[ -z ${SANITIZER-} ]] || limit=unlimited
   run --separate-stderr bash -c "ulimit -v $limit"'; exec timeout 60 "$@"' - "$SECPOLICY" --root "$root" check
-  [[ $output == *"$shown/domains/hugeDom:1:1024: warning: this line has more than 1023 characters"* ]]
+  shows "$shown/domains/hugeDom:1:1024: warning: this line has more than 1023 characters: the rest of it and all lines below it are not read [long-line]"
 }
 
 @test "what is installed counts, but not with --fresh" {

@@ -46,13 +46,13 @@ load helper
   boot
   for word in 3x 0x3 -3 +3 " 3" "" 4294967296; do
     secpolicy display "$word"
-    exits 2
+    wrong_usage display "DOMAIN_ID: '$word' is not the number of a domain; 'secpolicy display' shows the numbers"
   done
   secpolicy display 4294967295
-  [[ $status -ne 2 ]]
+  exits 1
+  says "Error: Failed to get policy for domain :domain 4294967295 is beyond the last slot 511"
   secpolicy display sshDom
-  exits 2
-  [[ $stderr == *"'sshDom' is not the number of a domain; 'secpolicy display' shows the numbers"* ]]
+  wrong_usage display "DOMAIN_ID: 'sshDom' is not the number of a domain; 'secpolicy display' shows the numbers"
 }
 
 @test "display where nothing was booted says what to do" {
@@ -142,5 +142,5 @@ END
   [[ -z $output ]]
   ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' first."
   secpolicy display --format xml
-  exits 2
+  wrong_usage display "--format: xml not in {text,json}"
 }

@@ -114,9 +114,7 @@ load helper
 @test "an unknown domain and an unknown format are wrong usage" {
   boot
   secpolicy graph --domain sshdom
-  exits 2
-  [[ $stderr == "secpolicy: graph: there is no domain 'sshdom'; did you mean 'sshDom'?
-'secpolicy graph --help' explains the usage." ]]
+  wrong_usage graph "graph: there is no domain 'sshdom'; did you mean 'sshDom'?"
   secpolicy graph --format png
-  exits 2
+  wrong_usage graph "--format: png not in {dot,svg}"
 }

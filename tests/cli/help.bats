@@ -41,34 +41,27 @@ load helper
 
 @test "no verb, an unknown verb and an unknown option are wrong usage" {
   run --separate-stderr "$SECPOLICY"
-  exits 2
-  [[ $stderr == "secpolicy: A subcommand is required
-'secpolicy --help' explains the usage." ]]
-  [[ -z $output ]]
+  wrong_usage "" "A subcommand is required"
   run --separate-stderr "$SECPOLICY" lod
-  exits 2
-  [[ $stderr == "secpolicy: there is no verb or option 'lod'; did you mean 'load'?
-'secpolicy --help' explains the usage." ]]
+  wrong_usage "" "there is no verb or option 'lod'; did you mean 'load'?"
   run --separate-stderr "$SECPOLICY" load --rot /x
-  exits 2
-  [[ $stderr == *"--rot
-'secpolicy load --help' explains the usage." ]]
+  wrong_usage load "The following argument was not expected: --rot"
 }
 
 @test "a word too many and a word too few are wrong usage" {
   run --separate-stderr "$SECPOLICY" load a b
-  exits 2
+  wrong_usage load "The following argument was not expected: b"
   run --separate-stderr "$SECPOLICY" settings
-  exits 2
+  wrong_usage settings "A subcommand is required: one of option, enforcement"
   run --separate-stderr "$SECPOLICY" settings enforcement
-  exits 2
+  wrong_usage settings "DOMAIN is required"
   run --separate-stderr "$SECPOLICY" --root
-  exits 2
+  wrong_usage "" "--root: 1 required DIR missing"
 }
 
 @test "wrong usage changes nothing" {
   secpolicy boot extra
-  exits 2
+  wrong_usage boot "The following argument was not expected: extra"
   [[ ! -e $root/usr ]]
 }
 

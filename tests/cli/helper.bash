@@ -7,6 +7,7 @@ SOURCE=$(cd "$BATS_TEST_DIRNAME/../.." && pwd)
 # Every test has a root of its own, with the example host in it.
 setup() {
   root=$BATS_TEST_TMPDIR/root
+  # shellcheck disable=SC2034 # for the tests
   policy=$root/etc/zorvan/secpolicy
   "$SOURCE/scripts/pack-example" "$root"
 }
@@ -55,6 +56,16 @@ ends_with() {
   return 1
 }
 
+# wrong_usage VERB MESSAGE: the latest command was typed in a way that VERB does not take, said so, and
+# did nothing else. The VERB of what is wrong before any is "".
+wrong_usage() {
+  exits 2 || return
+  [[ -z $output && $stderr == "secpolicy: $2
+'secpolicy ${1:+$1 }--help' explains the usage." ]] && return
+  printf 'not just the usage of %s and: %s\nbut:\n%s\n%s\n' "$1" "$2" "$output" "$stderr"
+  return 1
+}
+
 # ends_done VERB: the last line to standard error says that all was done, and counts what is
 # installed.
 ends_done() {
@@ -86,6 +97,7 @@ jsonschema.Draft202012Validator(schema).validate(json.load(sys.stdin))' \
 
 # complete_line WORD...: sets COMPREPLY to what bash offers for the last word of this command line.
 complete_line() {
+  # shellcheck source=completions/secpolicy.bash
   source "$SOURCE/completions/secpolicy.bash"
   compopt() { :; }
   COMP_WORDS=("$@")

@@ -44,7 +44,7 @@ EOF
 }
 
 @test "the installed command finds its libraries" {
-  SECPOLICY=$PREFIX/bin/secpolicy
+  export SECPOLICY=$PREFIX/bin/secpolicy
   boot
   secpolicy display
   exits 0
@@ -55,7 +55,7 @@ EOF
   boot
   cp -r "$PREFIX" "$BATS_TEST_TMPDIR/prefix"
   find "$BATS_TEST_TMPDIR/prefix" -name 'libsecpolicyhost-archive.so*' -delete
-  SECPOLICY=$BATS_TEST_TMPDIR/prefix/bin/secpolicy
+  export SECPOLICY=$BATS_TEST_TMPDIR/prefix/bin/secpolicy
   secpolicy boot
   exits 1
   [[ $stderr == "secpolicy: Unable to load what unpacks tardisks: libsecpolicyhost-archive.so.1: "*". It belongs beside libsecpolicyhost.so.1: install that again" ]]

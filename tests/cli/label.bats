@@ -387,7 +387,7 @@ END
   [[ $output =~ $'\n'"relabelling [................] 0/"([0-9]+)" files, 0 files/s"$'\n' ]]
   local total=${BASH_REMATCH[1]}
   [[ $output =~ $'\n'"relabelling [################] $total/$total files, "[0-9]+" files/s, 0:00 left" ]]
-  [[ $output == *"sshKey: 1 of 1 file relabelled"* ]]
+  shows "sshKey: 1 of 1 file relabelled"
 }
 
 @test "no progress shows elsewhere" {
@@ -408,13 +408,17 @@ END
 }
 
 @test "label without a kind, a file or a label is wrong usage" {
-  for arguments in "" "get" "set" "set sshKey" "lod /etc"; do
+  local kinds="A subcommand is required: one of get, set, verify, relabel" arguments message
+  while IFS='|' read -r arguments message; do
     secpolicy label $arguments
-    exits 2
-  done
-  secpolicy label
-  [[ $stderr == "secpolicy: A subcommand is required: one of get, set, verify, relabel
-'secpolicy label --help' explains the usage." ]]
+    wrong_usage label "$message"
+  done <<END
+|$kinds
+lod /etc|$kinds
+get|PATH is required
+set|LABEL is required
+set sshKey|PATH is required
+END
   secpolicy label get --help
   exits 0
   [[ $output == *"Examples:"*"secpolicy label get -R /etc"* ]]

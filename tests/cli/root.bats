@@ -66,7 +66,7 @@ as_nobody() {
   [[ -f $root/elsewhere/state.db && ! -e $root/run/secpolicy/host.db ]]
   secpolicy display
   exits 0
-  [[ $output == *"Domain Name: sshDom "* ]]
+  shows "/tardisks/monitor.tgz (monitorImage)"
 }
 
 @test "a service uses the runtime interface" {

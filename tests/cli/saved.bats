@@ -139,12 +139,14 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
 }
 
 @test "what cannot be a name is wrong usage" {
-  local name
-  for name in .hidden a/b 'a b' '' installed 'ü' "$(printf 'x%.0s' {1..65})"; do
-    secpolicy save "$name"
-    exits 2
-    secpolicy rollback "$name"
-    exits 2
+  local name verb
+  for verb in save rollback; do
+    for name in .hidden a/b 'a b' '' 'ü' "$(printf 'x%.0s' {1..65})"; do
+      secpolicy "$verb" "$name"
+      wrong_usage "$verb" "NAME: '$name' cannot be a name: it takes 1 to 64 of A-Z a-z 0-9 . _ -, and begins with neither . nor -"
+    done
+    secpolicy "$verb" installed
+    wrong_usage "$verb" "NAME: 'installed' means what is installed now"
   done
   [[ ! -e $saved ]]
   secpolicy save A-z.0_9
@@ -242,12 +244,11 @@ refuses() {
   echo "-s ptrace grant" >>"$policy/domains/appDom"
   secpolicy load
   secpolicy save two
-  local number
   (while [[ ! -e $BATS_TEST_TMPDIR/end ]]; do
     for name in one two; do "$SECPOLICY" --root "$root" rollback "$name" 2>/dev/null || exit 1; done
   done) &
   local flipper=$!
-  for number in {1..20}; do
+  for _ in {1..20}; do
     secpolicy save --force third
     exits 0
     secpolicy diff third one

@@ -18,24 +18,28 @@ load helper
   exits 0
   [[ $stderr == "secpolicy: restore: done" ]]
   secpolicy display
-  [[ $output == *"Domain Name: appDom Domain ID :"*" Enforcement Level: permissive"* ]]
-  grep -q "^Domain Name: sshDom .* Enforcement Level: enforcing" <<<"$output"
+  shows "Domain Name: appDom Domain ID :$(domain_id appDom) Enforcement Level: permissive"
+  shows "Domain Name: sshDom Domain ID :$(domain_id sshDom) Enforcement Level: enforcing"
+}
+
+# nothing_is_stored OF WHAT: there is none for it, and how WHAT is stored is said.
+nothing_is_stored() {
+  # shellcheck disable=SC2086
+  secpolicy settings $1
+  exits 1
+  [[ $stderr == "secpolicy: settings: nothing is stored for $1. Store something with 'secpolicy settings $1 $2'." ]]
 }
 
 @test "a level that the host does not know is refused" {
   secpolicy settings enforcement appDom sometimes
   exits 1
-  [[ $stderr == "secpolicy: settings: "*sometimes* ]]
-  secpolicy settings enforcement appDom
-  exits 1
+  [[ $stderr == "secpolicy: settings: Unknown enforcement level sometimes: use enforcing, permissive or disabled" ]]
+  nothing_is_stored "enforcement appDom" LEVEL
 }
 
 @test "what is not stored is said so" {
-  secpolicy settings enforcement appDom
-  exits 1
-  [[ $stderr == "secpolicy: settings: nothing is stored for enforcement appDom. Store something with 'secpolicy settings enforcement appDom LEVEL'." ]]
-  secpolicy settings option /UserVars/CheckAccessTemplateEnabled
-  exits 1
+  nothing_is_stored "enforcement appDom" LEVEL
+  nothing_is_stored "option /UserVars/CheckAccessTemplateEnabled" VALUE
 }
 
 @test "the template option makes load create the template domain" {

@@ -106,7 +106,7 @@ rules_of() {
   secpolicy status
   exits 1
   shows "policy       not loaded"
-  [[ $output == *"             Unable to unpack tardisk broken.tgz: "* ]]
+  shows "             Unable to unpack tardisk broken.tgz: Unrecognized archive format"
 }
 
 @test "status names the saved state that was put back" {

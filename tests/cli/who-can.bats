@@ -66,11 +66,9 @@ END
 @test "misspelt words are wrong usage" {
   boot
   secpolicy who-can call reed
-  exits 2
-  [[ $stderr == "secpolicy: who-can: there is no system call 'reed'; did you mean 'read'?
-'secpolicy who-can --help' explains the usage." ]]
+  wrong_usage who-can "who-can: there is no system call 'reed'; did you mean 'read'?"
   secpolicy who-can
-  exits 2
+  wrong_usage who-can "WHAT is required"
 }
 
 @test "--format json" {
