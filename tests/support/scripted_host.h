@@ -28,8 +28,8 @@
 //     PolicyTree tree({{"objects/base", "toolLabel\n"}});
 //     TeskAccessInterfaceImpl access;
 //
-//     const Transcript run = Record([&] { SecPolicy::LoadPolicyObjects(tree / "objects", access);
-//     });
+//     const Transcript run =
+//         Record([&] { SecPolicy::LoadPolicyObjects(tree / "objects", access); });
 //
 //     EXPECT_EQ(run.Text(), Lines({
 //         R"(GetKeywordsMap(LABEL))",
@@ -38,22 +38,41 @@
 //     }));
 //   }
 //
+// clang-format off
 // One line of the trace for each:
-//   FindDomain("hostDom")                            a host call with its arguments (not its
-//   results) TeskAccessInterfaceImpl()  ~TeskAccessInterfaceImpl()  Sysinfo(1)  ~Sysinfo()
-//   SetSyscallRule({line: 3, domainId: 7, domainName: "hostDom", syscall: "read", grant: true})
-//   SetFilePathAccessRules([{line: 0, ...}, {...}])
-//   ValidateKeyword(OBJECT_ACCESS, "read")   LookupLabel("tool", OBJECT)   CreateDomain("x", 0)
-//   Call(0x4059, "name", 3, &out)            a kernel call: texts and rules are shown, not
-//   addresses SetXattr("/f", "zorvan.security", 42, 4, 2)      value as a number, size, flags
-//   Sysinfo::AddInstancePath("/policy/file")         the inode of a file given to SetTardisk
-//   FindOption("/UserVars/X")  AdvancedIntegerOption::GetValue("/UserVars/X")
-//   ~AdvancedOption("/UserVars/X") GetDesiredUserConfig({"a", "b", "c", "d"}, 0)
-//   StoreObject::GetValue("key")  SetBootStatus({...}, true) SyslogIsRunning() is NOT traced; what
-//   follows it is: syslog(LOG_ERR, "Error: %s", "message")  or  WriteToKlog("message", "[ERR]")
-//   stderr "Error: message\n"                        one flushed line
-//   stdout "title\n"   stdout unflushed "a\nb\n"     flushed, and not flushed when the next thing
-//   happened
+//
+//   host calls, with their arguments and without their results
+//     FindDomain("hostDom")
+//     ValidateKeyword(OBJECT_ACCESS, "read")
+//     LookupLabel("tool", OBJECT)
+//     CreateDomain("x", 0)
+//     SetSyscallRule({line: 3, domainId: 7, domainName: "hostDom", syscall: "read", grant: true})
+//     SetFilePathAccessRules([{line: 0, ...}, {...}])
+//     FindOption("/UserVars/X")
+//     AdvancedIntegerOption::GetValue("/UserVars/X")
+//     GetDesiredUserConfig({"a", "b", "c", "d"}, 0)
+//     StoreObject::GetValue("key")
+//     SetBootStatus({...}, true)
+//     Sysinfo::AddInstancePath("/policy/file")      the inode of a file given to SetTardisk
+//
+//   objects of the host that come and go
+//     TeskAccessInterfaceImpl()   ~TeskAccessInterfaceImpl()
+//     Sysinfo(1)                  ~Sysinfo()
+//     ~AdvancedOption("/UserVars/X")
+//
+//   kernel calls: texts and rules are shown, not addresses
+//     Call(0x4059, "name", 3, &out)
+//     SetXattr("/f", "zorvan.security", 42, 4, 2)   value as a number, size, flags
+//
+//   the log, but not SyslogIsRunning(), which decides between the two
+//     syslog(LOG_ERR, "Error: %s", "message")
+//     WriteToKlog("message", "[ERR]")
+//
+//   the streams
+//     stderr "Error: message\n"                     one flushed line
+//     stdout "title\n"                              flushed
+//     stdout unflushed "a\nb\n"                     not flushed when the next thing happened
+// clang-format on
 //
 // A failing call is in the trace like any other. errno is overwritten by every allocation and by
 // every host call that may do so, as long as a ScriptedHost exists.

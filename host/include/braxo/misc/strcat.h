@@ -14,9 +14,11 @@ template <class T, class... Others>
 concept AnyOf = (std::same_as<T, Others> || ...);
 
 // A type that is an integer to the language but a letter or a truth value to the reader.
+// clang-format off
 template <class T>
-concept Ambiguous = AnyOf < std::remove_cv_t<T>,
-bool, char, wchar_t, char8_t, char16_t, char32_t > ;
+concept Ambiguous =
+    AnyOf<std::remove_cv_t<T>, bool, char, wchar_t, char8_t, char16_t, char32_t>;
+// clang-format on
 
 template <class T>
 concept Number = std::integral<T> && !Ambiguous<T>;
