@@ -29,7 +29,7 @@
 
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/operation/boot.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
 
@@ -37,6 +37,7 @@ namespace SecPolicyFuzz {
 namespace {
 
 namespace fs = std::filesystem;
+using SecPolicyTest::MessageOf;
 
 constexpr int kSkipped = 77;
 const LinuxHost::TardiskRules kRules{.policyRoot = "/etc/zorvan/secpolicy", .policyTardisks = {}};
@@ -147,7 +148,7 @@ class World {
 
     const bool entered = chroot(path.c_str()) == 0 && chdir("/inside/root") == 0;
     Require(entered, "the root can be entered");
-    const std::string failure = FailureOf([&] {
+    const std::string failure = MessageOf([&] {
       assembled.labelAttribute = LinuxHost::LabelAttribute();
       LinuxHost::UnpackTardisks({"/image.tgz"}, kRules, assembled);
     });

@@ -17,7 +17,7 @@
 #include "secpolicy/domain/syscall_rules.h"
 #include "secpolicy/domain/unix_sock_creation_rules.h"
 #include "support/memory_file.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/policy_host.h"
 #include "support/print.h"
 #include "support/reference_reader.h"
@@ -27,6 +27,7 @@ namespace SecPolicyFuzz {
 namespace {
 
 using SecPolicy::DomainPolicy;
+using SecPolicyTest::MessageOf;
 using SecPolicyTest::TeskAccessInterfaceImpl;
 using Parsed = std::map<unsigned int, std::queue<std::string>>;
 
@@ -74,7 +75,7 @@ Parsed ToLines(const std::string& text) {
 void CheckPrinting(DomainPolicy& policy, const PolicyHost& host, TeskAccessInterfaceImpl& access) {
   Parsed lines = ToLines(PrintedText(policy, host));
   DomainPolicy again(kDomain, kDomainId);
-  const std::string failure = FailureOf([&] { again.ProcessParsedPolicyFile(access, lines); });
+  const std::string failure = MessageOf([&] { again.ProcessParsedPolicyFile(access, lines); });
   RequireEqual(failure, "", "a printed rule is accepted");
   RequireEqual(ShowPolicy(again), ShowPolicy(policy), "a printed rule reads as the same rule");
 }
@@ -99,7 +100,7 @@ void CheckRefusal(const std::string& failure, const DomainPolicy& policy, const 
   lines.erase(refused, lines.end());
 
   DomainPolicy before(kDomain, kDomainId);
-  RequireEqual(FailureOf([&] { before.ProcessParsedPolicyFile(access, lines); }), "",
+  RequireEqual(MessageOf([&] { before.ProcessParsedPolicyFile(access, lines); }), "",
                "the lines before the refused one are accepted");
   RequireEqual(ShowPolicy(policy), ShowPolicy(before), "the rules before the refused line");
 }
@@ -152,7 +153,7 @@ void CheckInstalling(DomainPolicy& policy, PolicyHost& host, TeskAccessInterface
   const std::string expectedPaths = ExpectedPaths(policy, refusal);
   std::string toldPaths;
   ListenForPaths(host, toldPaths);
-  RequireEqual(FailureOf([&] { policy.SetPolicy(access); }), refusal, "what ends installing");
+  RequireEqual(MessageOf([&] { policy.SetPolicy(access); }), refusal, "what ends installing");
   RequireEqual(toldPaths, expectedPaths, "the paths that the kernel is told");
 
   auto expected = Verdicts(PrintedText(policy, host));
@@ -175,10 +176,10 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 
   DomainPolicy policy(kDomain, kDomainId);
   policy.policyFile = file.Path();
-  const std::string failure = FailureOf([&] { policy.ParsePolicy(access); });
+  const std::string failure = MessageOf([&] { policy.ParsePolicy(access); });
   if (!failure.empty()) CheckRefusal(failure, policy, file.Path(), access);
   CheckPrinting(policy, host, access);
-  RequireEqual(FailureOf([&] { policy.CheckPolicyConstraints(access); }), "", "constraints");
+  RequireEqual(MessageOf([&] { policy.CheckPolicyConstraints(access); }), "", "constraints");
   CheckInstalling(policy, host, access);
   return 0;
 }

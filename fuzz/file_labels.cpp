@@ -8,7 +8,7 @@
 
 #include "secpolicy/labels/file_label_policy.h"
 #include "support/memory_file.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/policy_host.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
@@ -16,6 +16,7 @@
 namespace SecPolicyFuzz {
 namespace {
 
+using SecPolicyTest::MessageOf;
 using FileLabel = SecPolicy::FileLabelPolicy::FileLabel;
 
 const std::map<std::string, unsigned int>& Labels(PolicyHost& host) {
@@ -86,7 +87,7 @@ void CheckApplying(SecPolicy::FileLabelPolicy& policy, PolicyHost& host,
     const std::uint32_t id = known->second;
     attributes[label.path].assign(reinterpret_cast<const char*>(&id), sizeof id);
   }
-  RequireEqual(FailureOf([&] { policy.SetFileLabels(access); }),
+  RequireEqual(MessageOf([&] { policy.SetFileLabels(access); }),
                errors.empty() ? "" : "There was a failure in setting file labels", "applying");
   RequireEqual(host.StandardError(), errors, "the labels that failed");
   Require(policy.fileLabels.empty(), "applying uses the labels up");
@@ -102,7 +103,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   SecPolicyTest::TeskAccessInterfaceImpl access;
 
   SecPolicy::FileLabelPolicy policy;
-  const std::string failure = FailureOf([&] { policy.ParsePolicy(file.Path(), access); });
+  const std::string failure = MessageOf([&] { policy.ParsePolicy(file.Path(), access); });
   const Reading expected = ReadReference(file.Path(), ReadFile(Text(data, size)), host);
   RequireEqual(failure, expected.refusal, "the refused line");
   RequireEqual(Show(policy.fileLabels), expected.labels, "the labels before it");

@@ -25,7 +25,7 @@
 #include "host/linux/state/host_state.h"
 #include "secpolicyhost/mode_param.h"
 #include "support/caller_memory.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
 #include "teskctl/security.h"
@@ -34,6 +34,7 @@
 namespace SecPolicyFuzz {
 namespace {
 
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_FileRule;
 using TeskCtl::Security::TeskAccess_ModeParam;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
@@ -298,7 +299,7 @@ void CheckState(StateWitness& witness) {
                              " WHERE domain_id NOT IN (SELECT id FROM domain)"),
                  "0", "entries of domains that are gone");
   }
-  RequireEqual(FailureOf(ReadEverything), "", "reading the state");
+  RequireEqual(MessageOf(ReadEverything), "", "reading the state");
 }
 
 }  // namespace

@@ -4,13 +4,14 @@
 #include <map>
 
 #include "secpolicy/domain/file_path_access_rules.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
 
 namespace SecPolicyFuzz {
 namespace {
 
+using SecPolicyTest::MessageOf;
 using Masks = std::map<std::string, unsigned int>;
 
 void AddLonger(Masks& masks, const std::string& letters, unsigned int mask) {
@@ -36,7 +37,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 
   SecPolicy::FilePathAccessRules rules;
   unsigned int mask = 0;
-  const std::string failure = FailureOf([&] { mask = rules.GetPermission(letters); });
+  const std::string failure = MessageOf([&] { mask = rules.GetPermission(letters); });
 
   const auto known = accepted.find(letters);
   Require(failure.empty() == (known != accepted.end()), "accepted letters: " + letters);

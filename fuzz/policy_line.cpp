@@ -4,17 +4,19 @@
 #include <cstdint>
 
 #include "secpolicy/secpolicy.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
 
 namespace SecPolicyFuzz {
 namespace {
 
+using SecPolicyTest::MessageOf;
+
 void CheckGrantWord(std::string word) {
   const std::string before = word;
   bool grant = false;
-  const std::string failure = FailureOf([&] { grant = SecPolicy::IsGrant(word); });
+  const std::string failure = MessageOf([&] { grant = SecPolicy::IsGrant(word); });
   const bool known = before == "grant" || before == "revoke";
   // A message ends at its first NUL.
   const std::string refusal = "invalid keyword " + before.substr(0, before.find('\0'));

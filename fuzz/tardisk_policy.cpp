@@ -8,13 +8,15 @@
 
 #include "secpolicy/secpolicy.h"
 #include "support/memory_file.h"
-#include "support/outcome.h"
+#include "support/message_of.h"
 #include "support/policy_host.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
 
 namespace SecPolicyFuzz {
 namespace {
+
+using SecPolicyTest::MessageOf;
 
 constexpr char kTardisk[] = "/tardisks/tool.tgz";
 
@@ -86,7 +88,7 @@ std::string InstalledTransitions(PolicyHost& host) {
 void CheckApplying(SecPolicy::TardiskPolicy& policy, const std::string& path,
                    const std::optional<Exception>& exception, PolicyHost& host,
                    SecPolicyTest::TeskAccessInterfaceImpl& access) {
-  const std::string failure = FailureOf([&] { policy.SetPolicy(access); });
+  const std::string failure = MessageOf([&] { policy.SetPolicy(access); });
   const auto& labels = host.labels[TeskCtl::Security::TESKACCESS_LABEL_OBJECT];
   const bool known = exception && labels.contains(exception->label);
   if (exception && !known) {
@@ -112,7 +114,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   SecPolicyTest::TeskAccessInterfaceImpl access;
 
   SecPolicy::TardiskPolicy policy(file.Path());
-  const std::string failure = FailureOf([&] { policy.ParsePolicy(access); });
+  const std::string failure = MessageOf([&] { policy.ParsePolicy(access); });
   const Reading expected = ReadReference(file.Path(), ReadFile(Text(data, size)));
   RequireEqual(failure, expected.refusal, "the refused line");
   CheckApplying(policy, file.Path(), expected.exception, host, access);

@@ -242,11 +242,6 @@ TEST(SecPolicyRetryException, IsABraxoExceptionWithoutFieldsOfItsOwn) {
   EXPECT_EQ(sizeof(SecPolicyRetryException), sizeof(BraxoException));
 }
 
-TEST(SecPolicyRetryException, IsCaughtAsItselfAndAsItsBase) {
-  EXPECT_THROW(throw SecPolicyRetryException("again"), SecPolicyRetryException);
-  EXPECT_THROW(throw SecPolicyRetryException("again"), BraxoException);
-}
-
 TEST(SecPolicyRetryException, HasNoEventMessageUnlessGivenOne) {
   const SecPolicyRetryException plain("again");
   EXPECT_STREQ(plain.what(), "again");

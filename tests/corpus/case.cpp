@@ -6,12 +6,14 @@
 #include <cstdlib>
 #include <fstream>
 
+#include "support/message_of.h"
 #include "teskctl/security.h"
 
 namespace CorpusTest {
 namespace {
 
 using nlohmann::json;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_KeywordType;
 
 std::ifstream Open(const std::string& name) {
@@ -48,7 +50,7 @@ std::string HostRefusal(const json& refused) {
   TeskCtl::Security::TeskAccessInterfaceImpl access;
   const auto kind = static_cast<TeskAccess_KeywordType>(refused.at(0).get<int>());
   const std::string refusal =
-      FailureOf([&] { access.ValidateKeyword(kind, ToText(refused.at(1))); });
+      MessageOf([&] { access.ValidateKeyword(kind, ToText(refused.at(1))); });
   EXPECT_FALSE(refusal.empty()) << "the host accepts " << refused;
   return refusal;
 }

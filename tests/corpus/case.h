@@ -5,7 +5,6 @@
 #include <string>
 #include <vector>
 
-#include "braxo/lib/exception.h"
 #include "words.h"
 
 namespace CorpusTest {
@@ -39,17 +38,6 @@ class Case {
 
 // The cases of the file `suite`.jsonl.
 std::vector<Case> ReadCases(const std::string& suite);
-
-// The message of the BraxoException that `function` throws, empty when it returns.
-template <class Function>
-std::string FailureOf(Function function) {
-  try {
-    function();
-  } catch (const Braxo::Lib::BraxoException& failure) {
-    return failure.what();
-  }
-  return {};
-}
 
 // The file that the inputs are written to; there until the process ends.
 const std::string& WriteInput(const Case& input);

@@ -20,11 +20,13 @@
 #include "secpolicy/domain/unix_sock_creation_rules.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/labels/object_policy.h"
+#include "support/message_of.h"
 
 namespace CorpusTest {
 namespace {
 
 using SecPolicy::DomainPolicy;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
 using Row = std::vector<std::string>;
 using Rows = std::vector<Row>;
@@ -154,7 +156,7 @@ TEST_F(Corpus, Domains) {
     SCOPED_TRACE(input.Name());
     DomainPolicy policy(words.domain, id);
     policy.policyFile = WriteInput(input);
-    EXPECT_EQ(FailureOf([&] { policy.ParsePolicy(access); }),
+    EXPECT_EQ(MessageOf([&] { policy.ParsePolicy(access); }),
               input.Error("error", policy.policyFile));
     EXPECT_EQ(RulesOf(policy), input.Rows("rules"));
     EXPECT_EQ(PrintedText(policy), ExpectedText(input.Rows("rules")));
@@ -166,7 +168,7 @@ TEST_F(Corpus, Objects) {
     SCOPED_TRACE(input.Name());
     SecPolicy::ObjectPolicy policy;
     const std::string& file = WriteInput(input);
-    EXPECT_EQ(FailureOf([&] { policy.ParsePolicy(file); }), input.Error("error", file));
+    EXPECT_EQ(MessageOf([&] { policy.ParsePolicy(file); }), input.Error("error", file));
     EXPECT_EQ(policy.names, input.Texts("names"));
   }
 }
@@ -176,7 +178,7 @@ TEST_F(Corpus, FileLabels) {
     SCOPED_TRACE(input.Name());
     SecPolicy::FileLabelPolicy policy;
     const std::string& file = WriteInput(input);
-    EXPECT_EQ(FailureOf([&] { policy.ParsePolicy(file, access); }), input.Error("error", file));
+    EXPECT_EQ(MessageOf([&] { policy.ParsePolicy(file, access); }), input.Error("error", file));
     Rows labels;
     for (const auto& label : policy.fileLabels) {
       EXPECT_EQ(label.policyFile, file);
@@ -197,9 +199,9 @@ TEST_F(Corpus, Permissions) {
     rules.AddRule(1, words.domain, id, SecPolicy::StringToQueue("/path " + letters), access);
 
     unsigned int mask = 0;
-    EXPECT_EQ(FailureOf([&] { mask = rules.GetPermission(letters); }), input.Text("error"));
+    EXPECT_EQ(MessageOf([&] { mask = rules.GetPermission(letters); }), input.Text("error"));
     EXPECT_EQ(mask, input.Has("mask") ? input.Number("mask") : 0);
-    EXPECT_EQ(FailureOf([&] { rules.Set(access); }), input.Text("error"));
+    EXPECT_EQ(MessageOf([&] { rules.Set(access); }), input.Text("error"));
   }
 }
 

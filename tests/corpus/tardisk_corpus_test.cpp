@@ -6,11 +6,13 @@
 #include "case.h"
 #include "corpus_host.h"
 #include "secpolicy/secpolicy.h"
+#include "support/message_of.h"
 #include "support/scripted_host.h"
 
 namespace CorpusTest {
 namespace {
 
+using SecPolicyTest::MessageOf;
 using SecPolicyTest::ScriptedHost;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
 using Rows = std::vector<std::vector<std::string>>;
@@ -50,8 +52,8 @@ TEST(TardiskCorpus, Tardisks) {
     const std::string& file = WriteInput(input);
 
     SecPolicy::TardiskPolicy policy(file);
-    EXPECT_EQ(FailureOf([&] { policy.ParsePolicy(access); }), input.Error("error", file));
-    EXPECT_EQ(FailureOf([&] { policy.SetPolicy(access); }), input.Error("setError", file));
+    EXPECT_EQ(MessageOf([&] { policy.ParsePolicy(access); }), input.Error("error", file));
+    EXPECT_EQ(MessageOf([&] { policy.SetPolicy(access); }), input.Error("setError", file));
     EXPECT_EQ(LabelOf("/tardisks/" + words.tardisk), input.Text("label"));
     EXPECT_EQ(InstalledTransitions(words), input.Rows("transitions"));
   }

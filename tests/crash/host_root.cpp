@@ -1,6 +1,5 @@
 #include "host_root.h"
 
-#include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <sstream>
@@ -53,22 +52,15 @@ void WritePolicy(const std::filesystem::path& policy) {
 }  // namespace
 
 HostRoot::HostRoot() {
-  std::string name = std::filesystem::temp_directory_path() / "secpolicy-crash-XXXXXX";
-  if (mkdtemp(name.data()) == nullptr) throw std::runtime_error("unable to make " + name);
-  root = name;
   for (const char* directory : {"data", "run", "tardisks"}) {
     std::filesystem::create_directory(root / directory);
   }
   for (int link = 0; link < kLinks; ++link) {
-    WriteFile(root / "data" / Numbered("file", link), "");
-    std::filesystem::create_symlink(Numbered("file", link), root / "data" / Numbered("link", link));
+    WriteFile(Path() / "data" / Numbered("file", link), "");
+    std::filesystem::create_symlink(Numbered("file", link),
+                                    Path() / "data" / Numbered("link", link));
   }
   WritePolicy(root / "etc/zorvan/secpolicy");
-}
-
-HostRoot::~HostRoot() {
-  std::error_code ignored;
-  std::filesystem::remove_all(root, ignored);
 }
 
 void HostRoot::Forget() const { std::filesystem::remove_all(State().parent_path()); }

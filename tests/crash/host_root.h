@@ -3,6 +3,8 @@
 #include <filesystem>
 #include <string>
 
+#include "support/temporary_directory.h"
+
 namespace CrashTest {
 
 // A root directory with a policy in it that has rules of every kind, and no tardisks: `load` works
@@ -10,11 +12,8 @@ namespace CrashTest {
 class HostRoot {
  public:
   HostRoot();
-  HostRoot(const HostRoot&) = delete;
-  HostRoot& operator=(const HostRoot&) = delete;
-  ~HostRoot();
 
-  const std::filesystem::path& Path() const { return root; }
+  std::filesystem::path Path() const { return root.Path(); }
 
   // The database of the state, which is not there before the first load.
   std::filesystem::path State() const { return root / "run/secpolicy/host.db"; }
@@ -23,7 +22,7 @@ class HostRoot {
   void Forget() const;
 
  private:
-  std::filesystem::path root;
+  SecPolicyTest::TemporaryDirectory root;
 };
 
 // The number of domains in the policy whose names begin with "service", and the `-r` rules of each:

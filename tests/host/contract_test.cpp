@@ -9,10 +9,10 @@
 #include <string>
 #include <vector>
 
-#include "braxo/lib/exception.h"
 #include "contract_host.h"
 #include "kitlibs/file.h"
 #include "orinconfigstore/config_store.h"
+#include "support/message_of.h"
 #include "teskctl/adv.h"
 #include "teskctl/security.h"
 #include "teskctl/sysinfo.h"
@@ -21,14 +21,40 @@
 namespace HostContractTest {
 namespace {
 
-using Braxo::Lib::BraxoException;
+using SecPolicyTest::MessageOf;
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+using TeskCtl::Security::TeskAccess_CapabilityRule;
+using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_CHECK_ACCESS;
+using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+using TeskCtl::Security::TeskAccess_DomTransRule;
+using TeskCtl::Security::TeskAccess_FileCreationRule;
+using TeskCtl::Security::TeskAccess_FilePathAccessRule;
+using TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY;
+using TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS;
+using TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION;
+using TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
+using TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS;
+using TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK;
+using TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL;
+using TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION;
+using TeskCtl::Security::TeskAccess_KeywordType;
+using TeskCtl::Security::TESKACCESS_LABEL_DOMAIN;
+using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
+using TeskCtl::Security::TeskAccess_ObjectAccessRule;
+using TeskCtl::Security::TeskAccess_SyscallRule;
+using TeskCtl::Security::TeskAccess_UnixSockCreationRule;
+using TeskCtl::Security::TeskAccessInterfaceImpl;
+using TeskCtl::Security::TeskAccessKsi_DefaultDom;
+using ::testing::AllOf;
 using ::testing::Contains;
+using ::testing::Each;
 using ::testing::ElementsAre;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::IsSupersetOf;
 using ::testing::Key;
 using ::testing::Not;
-using namespace TeskCtl::Security;
 
 constexpr unsigned int kUntouched = 4711;
 constexpr unsigned int kNoLabel = 1;
@@ -160,8 +186,10 @@ TEST_P(HostKeywords, KnowsTheWordsOfItsTable) {
 }
 
 TEST_P(HostKeywords, RefusesOtherWords) {
-  EXPECT_THROW(access.ValidateKeyword(GetParam().type, "no_such_word"), BraxoException);
-  EXPECT_THROW(access.ValidateKeyword(GetParam().type, ""), BraxoException);
+  EXPECT_THAT(MessageOf([&] { access.ValidateKeyword(GetParam().type, "no_such_word"); }),
+              HasSubstr("no_such_word"));
+  EXPECT_THAT(MessageOf([&] { access.ValidateKeyword(GetParam().type, ""); }),
+              HasSubstr("unknown"));
   EXPECT_THAT(access.GetKeywordsMap(GetParam().type), Not(Contains(Key("no_such_word"))));
 }
 
@@ -179,7 +207,8 @@ INSTANTIATE_TEST_SUITE_P(Tables, HostKeywords,
                          });
 
 TEST_F(HostContract, TakesTheNameOfADomainForALabel) {
-  EXPECT_THROW(access.ValidateKeyword(TESKACCESS_KEYWORD_LABEL, "tool"), BraxoException);
+  EXPECT_THAT(MessageOf([&] { access.ValidateKeyword(TESKACCESS_KEYWORD_LABEL, "tool"); }),
+              HasSubstr("tool"));
   Create("tool");
   EXPECT_TRUE(access.ValidateKeyword(TESKACCESS_KEYWORD_LABEL, "tool"));
 }
@@ -201,8 +230,10 @@ TEST_F(HostContract, AnswersOneForAnUnknownLabel) {
 }
 
 TEST_F(HostContract, RefusesToNameAnUnknownIdentifier) {
-  EXPECT_THROW(access.GetLabel(kNoLabel, TESKACCESS_LABEL_OBJECT), BraxoException);
-  EXPECT_THROW(access.GetLabel(99999, TESKACCESS_LABEL_OBJECT), BraxoException);
+  for (const unsigned int id : {kNoLabel, 99999U}) {
+    EXPECT_THAT(MessageOf([&] { access.GetLabel(id, TESKACCESS_LABEL_OBJECT); }),
+                AllOf(HasSubstr("identifier"), EndsWith(" " + std::to_string(id))));
+  }
 }
 
 TEST_F(HostContract, AddsLabelsThatAreMissing) {
@@ -475,9 +506,11 @@ TEST_F(HostContract, NamesWhatTardisksNeed) {
 TEST_F(HostContract, RefusesAnInodeRecordOfAnotherSize) {
   TeskCtl::Util::Sysinfo inode(TeskCtl::Util::KSI_NODE_system_kelpfs_inodes_stats);
   inode.AddInstancePath(1);
-  std::array<char, 549> record{};
-  EXPECT_THROW(inode.Get(record.data(), 547), BraxoException);
-  EXPECT_THROW(inode.Get(record.data(), 549), BraxoException);
+  for (const unsigned int size : {547U, 549U}) {
+    std::array<char, 549> record{};
+    EXPECT_THAT(MessageOf([&] { inode.Get(record.data(), size); }), HasSubstr("record"));
+    EXPECT_THAT(record, Each('\0'));
+  }
 }
 
 TEST_F(HostContract, KnowsNoTardiskOfAnInodeThatCameFromNone) {

@@ -5,6 +5,14 @@
 namespace HostContractTest {
 namespace {
 
+using TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY;
+using TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS;
+using TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION;
+using TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS;
+using TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK;
+using TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL;
+using TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION;
+
 std::map<std::string, long> Table(std::initializer_list<const char*> words) {
   std::map<std::string, long> table;
   for (const char* word : words) table.emplace(word, static_cast<long>(table.size()));
@@ -16,7 +24,6 @@ std::map<std::string, long> Table(std::initializer_list<const char*> words) {
 class ContractHost::Impl {
  public:
   Impl() : tree({{"labelled", ""}}), file(tree / "labelled") {
-    using namespace TeskCtl::Security;
     host.strict = true;
     host.keywords[TESKACCESS_KEYWORD_CAPABILITY] = Table({"cap_chown", "cap_kill"});
     host.keywords[TESKACCESS_KEYWORD_PARAM_CHECK] = Table({"socket_family", "bind_port"});

@@ -13,6 +13,8 @@
 #include <memory>
 #include <stdexcept>
 
+#include "support/message_of.h"
+
 namespace HostileTest {
 namespace {
 
@@ -65,23 +67,8 @@ unsigned int OpenDescriptors() {
   return count - 3;  // ".", ".." and the directory's own
 }
 
-std::string FailureOf(const std::function<void()>& call) {
-  try {
-    call();
-    return "";
-  } catch (const Braxo::Lib::BraxoException& failure) {
-    return failure.what();
-  }
-}
-
 void HostileTree::SetUp() {
-  char name[] = "/tmp/hostile-XXXXXX";
-  Require(mkdtemp(name) != nullptr, "mkdtemp");
-  scratch = name;
-  tree = scratch + "/tree";
-  outside = scratch + "/outside";
-  unlabelled = scratch + "/unlabelled";
-  setenv("SECPOLICY_HOST_STATE", (scratch + "/state/host.db").c_str(), 1);
+  setenv("SECPOLICY_HOST_STATE", (scratch / "state/host.db").c_str(), 1);
   MakeDirectory(tree);
   MakeDirectory(outside);
   Require(mkdir(unlabelled.c_str(), 0755) == 0, unlabelled);
@@ -91,7 +78,7 @@ void HostileTree::SetUp() {
 
 void HostileTree::TearDown() {
   access.reset();
-  RemoveTree(scratch);
+  RemoveTree(scratch.Path());  // The tree may be too deep for the directory to remove it.
 }
 
 void HostileTree::MakeFile(const std::string& path) const {
@@ -107,7 +94,8 @@ void HostileTree::MakeDirectory(const std::string& path) const {
 }
 
 std::string HostileTree::LabelTree() {
-  return FailureOf([this] { SecPolicy::SetDirLabelRecursive(tree, kLabel, *access); });
+  return SecPolicyTest::MessageOf(
+      [this] { SecPolicy::SetDirLabelRecursive(tree, kLabel, *access); });
 }
 
 void RemoveTree(const std::string& path) {

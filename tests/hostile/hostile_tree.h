@@ -3,10 +3,10 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
-#include <functional>
 #include <string>
 
 #include "secpolicy/secpolicy.h"
+#include "support/temporary_directory.h"
 
 namespace HostileTest {
 
@@ -29,9 +29,6 @@ std::string LabelOf(const std::string& path);
 // How many descriptors the process holds.
 unsigned int OpenDescriptors();
 
-// What a call threw: its BraxoException's text, or "" when it returned.
-std::string FailureOf(const std::function<void()>& call);
-
 // A directory with a label in an otherwise empty temporary directory, whatever is made in it is
 // removed at the end; and a state of the Linux host in which kLabel exists. Entries are made with
 // their first label.
@@ -50,16 +47,16 @@ class HostileTree : public testing::Test {
   void MakeFile(const std::string& path) const;
   void MakeDirectory(const std::string& path) const;
 
-  // Labels the tree with kLabel; returns what that threw, as FailureOf.
+  // Labels the tree with kLabel; returns what that threw, as MessageOf.
   std::string LabelTree();
 
   TeskAccessInterfaceImpl& Access() { return *access; }
 
  private:
-  std::string scratch;
-  std::string tree;
-  std::string outside;
-  std::string unlabelled;
+  SecPolicyTest::TemporaryDirectory scratch;
+  const std::string tree = scratch / "tree";
+  const std::string outside = scratch / "outside";
+  const std::string unlabelled = scratch / "unlabelled";
   std::unique_ptr<TeskAccessInterfaceImpl> access;
 };
 

@@ -10,9 +10,12 @@
 #include <cstring>
 
 #include "hostile_tree.h"
+#include "support/message_of.h"
 
 namespace HostileTest {
 namespace {
+
+using SecPolicyTest::MessageOf;
 
 class LabelWalk : public HostileTree {
  protected:
@@ -73,7 +76,7 @@ TEST_F(LabelWalk, EndsWhereThePathGetsTooLong) {
 TEST_F(LabelWalk, EndsWhereDescriptorsRunOut) {
   constexpr unsigned int kLimit = 256;
   MakeChain(5000);
-  ASSERT_EQ(FailureOf([&] { SecPolicy::SetFileLabel(Tree(), kLabel, Access()); }), "");
+  ASSERT_EQ(MessageOf([&] { SecPolicy::SetFileLabel(Tree(), kLabel, Access()); }), "");
   const unsigned int descriptors = OpenDescriptors();
   const unsigned int deepest = kLimit - descriptors;  // one is open at each level
   const DescriptorLimit limit(kLimit);
@@ -125,7 +128,7 @@ TEST_F(LabelWalk, QuotesNamesAsTheyAre) {
   const std::string path = Unlabelled() + "/" + name;
   ASSERT_EQ(mkdir(path.c_str(), 0755), 0);
 
-  EXPECT_EQ(FailureOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }),
+  EXPECT_EQ(MessageOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }),
             "Unable to set file label (toolLabel) for file " + path + ": No data available");
 }
 
@@ -181,7 +184,7 @@ TEST_F(LabelWalk, TakesAPathOfTheGreatestLength) {
   path += path.size() + 2 == PATH_MAX - 1 ? "/f" : "//f";
   ASSERT_EQ(path.size(), PATH_MAX - 1U);
 
-  EXPECT_EQ(FailureOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }), "");
+  EXPECT_EQ(MessageOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }), "");
 
   EXPECT_EQ(LabelOf(*this / "f"), kLabel);
 }
@@ -192,9 +195,9 @@ TEST_F(LabelWalk, RefusesAPathBeyondTheGreatestLength) {
   while (path.size() + 2 < PATH_MAX) path += "/.";
   path += "/f";
 
-  EXPECT_EQ(FailureOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }),
+  EXPECT_EQ(MessageOf([&] { SecPolicy::SetFileLabel(path, kLabel, Access()); }),
             "Unable to set file label (toolLabel) for file " + path + ": File name too long");
-  EXPECT_EQ(FailureOf([&] { SecPolicy::GetFileLabel(path, Access()); }),
+  EXPECT_EQ(MessageOf([&] { SecPolicy::GetFileLabel(path, Access()); }),
             "Unable to get file label for file " + path + ":File name too long");
 
   EXPECT_EQ(LabelOf(*this / "f"), kFirstLabel);

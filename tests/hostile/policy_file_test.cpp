@@ -7,10 +7,12 @@
 
 #include "hostile_tree.h"
 #include "run_child.h"
+#include "support/message_of.h"
 
 namespace HostileTest {
 namespace {
 
+using SecPolicyTest::MessageOf;
 using Parsed = std::map<unsigned int, std::queue<std::string>>;
 
 constexpr unsigned long kMebibyte = 1UL << 20;
@@ -102,9 +104,9 @@ TEST_F(HostilePolicyFile, BeyondTheGreatestPathIsRefused) {
   const std::string path = "/" + std::string(5000, 'p');
   Parsed parsed;
   std::map<std::string, std::string> files;
-  EXPECT_EQ(FailureOf([&] { SecPolicy::ParseFile(path, parsed); }),
+  EXPECT_EQ(MessageOf([&] { SecPolicy::ParseFile(path, parsed); }),
             "Unable to open policy file " + path);
-  EXPECT_EQ(FailureOf([&] { SecPolicy::GetFileList(path, files); }),
+  EXPECT_EQ(MessageOf([&] { SecPolicy::GetFileList(path, files); }),
             "Unable to open policy directory " + path);
 }
 

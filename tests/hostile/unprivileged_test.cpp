@@ -8,6 +8,7 @@
 
 #include "hostile_tree.h"
 #include "run_child.h"
+#include "support/temporary_directory.h"
 
 namespace HostileTest {
 namespace {
@@ -15,23 +16,15 @@ namespace {
 constexpr unsigned int kUser = 65534;
 constexpr char kAttribute[] = "user.zorvan.security";  // where an ordinary user's labels lie
 
-// The library in the hands of a user whom the file system may refuse.
 class Unprivileged : public testing::Test {
  protected:
   void SetUp() override {
     if (geteuid() != 0) GTEST_SKIP() << "only the superuser can become another user";
-    char name[] = "/tmp/hostile-XXXXXX";
-    ASSERT_NE(mkdtemp(name), nullptr);
-    scratch = name;
-    ASSERT_EQ(chown(name, kUser, kUser), 0);
+    ASSERT_EQ(chown(scratch.Path().c_str(), kUser, kUser), 0);
     Make("tree", 0755);
   }
 
-  void TearDown() override {
-    if (!scratch.empty()) RemoveTree(scratch);
-  }
-
-  std::string operator/(const std::string& name) const { return scratch + "/" + name; }
+  std::string operator/(const std::string& name) const { return scratch / name; }
 
   // Makes a directory of the user with its first label.
   void Make(const std::string& name, mode_t mode) const {
@@ -58,7 +51,7 @@ class Unprivileged : public testing::Test {
   }
 
  private:
-  std::string scratch;
+  SecPolicyTest::TemporaryDirectory scratch;
 };
 
 TEST_F(Unprivileged, LabelsItsOwnTree) {

@@ -6,6 +6,7 @@
 #include <cerrno>
 
 #include "secpolicy/secpolicy.h"
+#include "support/message_of.h"
 #include "support/policy_tree.h"
 #include "support/scripted_host.h"
 
@@ -53,7 +54,8 @@ TEST_F(SetDirLabelRecursiveOpening, FollowsTheLabel) {
 
 TEST_F(SetDirLabelRecursiveOpening, DoesNotHappenWithoutTheLabel) {
   host.FailErrno("SetXattr", tree / "inner", ENODATA);
-  EXPECT_THROW(SecPolicy::SetDirLabelRecursive(tree / "inner", "tool", access), BraxoException);
+  EXPECT_EQ(MessageOf([&] { SecPolicy::SetDirLabelRecursive(tree / "inner", "tool", access); }),
+            "Unable to set file label (tool) for file " + tree / "inner" + ": No data available");
   EXPECT_FALSE(watch.WasOpened());
 }
 

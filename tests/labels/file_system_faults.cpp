@@ -50,10 +50,8 @@ unsigned int OpenDescriptors() {
   return open;
 }
 
-}  // namespace SecPolicyTest
-
+// An extern "C" function is the same one in any namespace.
 extern "C" __attribute__((visibility("default"))) dirent* readdir(DIR* directory) {
-  using namespace SecPolicyTest;
   static auto* const original = Original<dirent*(DIR*)>("readdir");
   static dirent repeated;
   if (repeatNext == directory) {
@@ -72,9 +70,10 @@ extern "C" __attribute__((visibility("default"))) dirent* readdir(DIR* directory
 
 extern "C" __attribute__((visibility("default"))) int fstat(int descriptor,
                                                             struct stat* attributes) noexcept {
-  using namespace SecPolicyTest;
   static auto* const original = Original<int(int, struct stat*)>("fstat");
   if (!attributesUnreadable) return original(descriptor, attributes);
   errno = EIO;
   return -1;
 }
+
+}  // namespace SecPolicyTest

@@ -1,5 +1,6 @@
 # A program of its own: it sees the public header and links libsecpolicy.so, nothing of its objects.
 add_executable(package_consumer "${CMAKE_CURRENT_LIST_DIR}/exception_border_test.cpp")
+target_include_directories(package_consumer PRIVATE "${PROJECT_SOURCE_DIR}/tests")
 target_link_libraries(package_consumer PRIVATE secpolicy GTest::gtest GTest::gtest_main)
 gtest_discover_tests(package_consumer DISCOVERY_MODE PRE_TEST)
 

@@ -5,13 +5,13 @@
 
 #include <gtest/gtest.h>
 
-#include "host/linux/message_of.h"
+#include "support/message_of.h"
 
 namespace PolicyTest {
 namespace {
 
-using LinuxHostTest::MessageOf;
 using Policy::ParseParameterRange;
+using SecPolicyTest::MessageOf;
 
 std::string RangeRefusal(const std::string& first, const std::string& last) {
   return MessageOf([&] { ParseParameterRange(first, last); });

@@ -5,14 +5,14 @@
 
 #include <gtest/gtest.h>
 
-#include "host/linux/message_of.h"
+#include "support/message_of.h"
 
 namespace PolicyTest {
 namespace {
 
-using LinuxHostTest::MessageOf;
 using Policy::Permission;
 using Policy::Permissions;
+using SecPolicyTest::MessageOf;
 
 TEST(Permissions, AreLettersAndBits) {
   const std::pair<const char*, unsigned int> pairs[] = {{"", 0},      {"r", 0x1},   {"w", 0x2},

@@ -2,7 +2,6 @@
 
 #include <dirent.h>
 
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -10,14 +9,8 @@
 
 namespace SecPolicyTest {
 
-PolicyTree::PolicyTree(std::initializer_list<TreeEntry> entries) : root("/tmp/secpolicy.XXXXXX") {
-  if (mkdtemp(root.data()) == nullptr) throw std::runtime_error("no temporary directory");
+PolicyTree::PolicyTree(std::initializer_list<TreeEntry> entries) {
   for (const TreeEntry& entry : entries) Write(entry.path, entry.text);
-}
-
-PolicyTree::~PolicyTree() {
-  std::error_code ignored;
-  std::filesystem::remove_all(root, ignored);
 }
 
 void PolicyTree::Write(const std::string& path, const std::string& text) const {

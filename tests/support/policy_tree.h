@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+#include "support/temporary_directory.h"
+
 namespace SecPolicyTest {
 
 // A path with the file's text; a path that ends in "/" is a directory.
@@ -19,18 +21,15 @@ struct TreeEntry {
 class PolicyTree {
  public:
   PolicyTree(std::initializer_list<TreeEntry> entries = {});
-  PolicyTree(const PolicyTree&) = delete;
-  PolicyTree& operator=(const PolicyTree&) = delete;
-  ~PolicyTree();
 
   // Adds a file or directory, and the directories above it.
   void Write(const std::string& path, const std::string& text) const;
 
-  const std::string& Root() const { return root; }
-  std::string operator/(const std::string& path) const { return root + "/" + path; }
+  const std::string& Root() const { return root.Path(); }
+  std::string operator/(const std::string& path) const { return root / path; }
 
  private:
-  std::string root;
+  TemporaryDirectory root;
 };
 
 // Writes a file, or a directory when `path` ends in "/", with the directories above it.

@@ -4,15 +4,30 @@
 #include <filesystem>
 
 #include "child_process.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"
 
 namespace LinuxHostTest {
 namespace {
 
-using namespace TeskCtl::Security;
+using SecPolicyTest::MessageOf;
+using TeskCtl::Security::TeskAccess_CapabilityParamRule;
+using TeskCtl::Security::TeskAccess_CapabilityRule;
+using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+using TeskCtl::Security::TeskAccess_DomTransRule;
+using TeskCtl::Security::TeskAccess_FileCreationRule;
+using TeskCtl::Security::TeskAccess_FilePathAccessRule;
+using TeskCtl::Security::TeskAccess_FileRule;
+using TeskCtl::Security::TESKACCESS_LABEL_DOMAIN;
+using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
+using TeskCtl::Security::TeskAccess_ObjectAccessRule;
+using TeskCtl::Security::TeskAccess_SyscallRule;
+using TeskCtl::Security::TeskAccess_UnixSockCreationRule;
+using TeskCtl::Security::TeskAccessInterfaceImpl;
+using TeskCtl::Security::TeskAccessKsi_DefaultDom;
+using TeskCtl::Security::TeskAccessLabelType;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 

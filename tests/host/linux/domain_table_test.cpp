@@ -13,8 +13,8 @@
 #include "host/linux/state/parameter_rule_table.h"
 #include "host/linux/state/rule_table.h"
 #include "host/linux/state/world_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 #include "teskctl/security.h"
 
 namespace LinuxHostTest {
@@ -24,6 +24,7 @@ using LinuxHost::Domain;
 using LinuxHost::DomainRole;
 using LinuxHost::HostState;
 using Policy::RuleKind;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_CHECK_ACCESS;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using TeskCtl::Security::TeskAccessInterfaceImpl;

@@ -17,14 +17,15 @@
 #include "host/linux/state/parameter_rule_table.h"
 #include "host/linux/state/rule_table.h"
 #include "host/linux/state/world_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::HostState;
 using LinuxHost::InodeOrigin;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using ::testing::ElementsAre;
 using ::testing::Pair;

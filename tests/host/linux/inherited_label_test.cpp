@@ -14,56 +14,21 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
-#include <initializer_list>
 
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/operation/file_label.h"
+#include "label_calls.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 
 namespace LinuxHostTest {
 namespace {
 
-constexpr char kName[] = "zorvan.security";
-
-std::string Told(ssize_t result) {
-  return result < 0 ? strerrorname_np(errno) : std::to_string(result);
-}
-
-// Each is asked for before the next one.
-std::string Words(std::initializer_list<std::string> words) {
-  std::string text;
-  for (const std::string& word : words) text += (text.empty() ? "" : " ") + word;
-  return text;
-}
-
-std::string First(const char* path, std::uint32_t id) {
-  return Told(Zorvan::Kernel::SetXattr(path, kName, &id, sizeof id, 0));
-}
-
-std::string Replace(const char* path, std::uint32_t id) {
-  return Told(Zorvan::Kernel::SetXattr(path, kName, &id, sizeof id, XATTR_REPLACE));
-}
-
-// The label that the library sees.
-std::string Label(const char* path) {
-  std::uint32_t id = 0;
-  const ssize_t size = Zorvan::Kernel::GetXattr(path, kName, &id, sizeof id);
-  return size == sizeof id ? std::to_string(id) : Told(size);
-}
-
 // The same for who does not follow links.
 std::string OwnOrInherited(const char* path) {
   const auto label = LinuxHost::ReadLabel(path);
   if (!label) return strerrorname_np(errno);
   return std::to_string(label->id) + (label->isInherited ? " inherited" : " own");
-}
-
-// What the file itself carries.
-std::string Carried(const char* path) {
-  std::uint32_t id = 0;
-  const ssize_t size = lgetxattr(path, LinuxHost::LabelAttribute().c_str(), &id, sizeof id);
-  return size == sizeof id ? std::to_string(id) : Told(size);
 }
 
 bool MountInPrivate(const char* source, const char* target, const char* type, unsigned long flags) {
@@ -87,26 +52,22 @@ bool RefuseEntryCalls(int error) {
 }
 
 // "tree" carries 7, nothing above it and nothing in it carries a label.
-class InheritedLabel : public ::testing::Test {
+class InheritedLabel : public ScratchRootTest {
  protected:
   void SetUp() override {
     scratch.Write("bare", "text");
     scratch.Write("tree/file", "text");
     scratch.Write("tree/deep/er/file", "text");
     scratch.Write("elsewhere/file", "text");
-    ASSERT_EQ(Run([] { return First("tree", 7); }), "0");
+    ASSERT_EQ(Run([] { return Give("tree", 7, 0); }), "0");
   }
-
-  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
-
-  ScratchRoot scratch;
 };
 
 TEST_F(InheritedLabel, IsThatOfTheNearestLabelledDirectory) {
   EXPECT_EQ(Run([] {
               const std::string before =
                   Label("tree/file") + " " + Label("tree/deep") + " " + Label("tree/deep/er/file");
-              First("tree/deep", 8);
+              Give("tree/deep", 8, 0);
               return before + ", " +
                      Words({Label("tree/file"), Label("tree/deep/er"), Label("tree/deep/er/file")});
             }),
@@ -115,16 +76,16 @@ TEST_F(InheritedLabel, IsThatOfTheNearestLabelledDirectory) {
 
 TEST_F(InheritedLabel, IsNoneWhereNoDirectoryAboveHasOne) {
   EXPECT_EQ(Run([] {
-              return Words({Label("bare"), Replace("bare", 8), OwnOrInherited("elsewhere"),
-                            Label("/"), Carried("bare")});
+              return Words({Label("bare"), Give("bare", 8), OwnOrInherited("elsewhere"), Label("/"),
+                            Carried("bare")});
             }),
             "ENODATA ENODATA ENODATA ENODATA ENODATA");
 }
 
 TEST_F(InheritedLabel, BecomesTheFilesOwnWhenReplaced) {
   EXPECT_EQ(Run([] {
-              const std::string replaced = Replace("tree/deep/er/file", 9);
-              First("tree", 6);
+              const std::string replaced = Give("tree/deep/er/file", 9);
+              Give("tree", 6, 0);
               return Words({replaced, Label("tree/deep/er/file"), Carried("tree/deep/er/file"),
                             Label("tree/deep/er"), Carried("tree/deep/er")});
             }),
@@ -153,8 +114,8 @@ TEST_F(InheritedLabel, IsThatOfTheDirectoryItselfByWhateverName) {
                 labels += Label(path) + " ";
               }
               if (chdir("tree/sub") != 0) return std::string("no way");
-              return labels + Words({Label("."), Label("x"), Label(".."), Replace(".", 5),
-                                     Carried("../sub")});
+              return labels +
+                     Words({Label("."), Label("x"), Label(".."), Give(".", 5), Carried("../sub")});
             }),
             "7 7 7 7 7 7 7 7 7 0 5");
 }
@@ -166,8 +127,8 @@ TEST_F(InheritedLabel, IsThatOfTheLinksTarget) {
   std::filesystem::create_symlink("../elsewhere/into", scratch.Root() / "tree/twice");
   EXPECT_EQ(Run([] {
               return Words({Label("elsewhere/into"), Label("tree/out"), Label("way/er/file"),
-                            Label("tree/twice"), Replace("elsewhere/into", 9), Carried("tree/file"),
-                            Replace("tree/out", 9), Carried("bare")});
+                            Label("tree/twice"), Give("elsewhere/into", 9), Carried("tree/file"),
+                            Give("tree/out", 9), Carried("bare")});
             }),
             "7 ENODATA 7 7 0 9 ENODATA ENODATA");
 }
@@ -185,21 +146,21 @@ TEST_F(InheritedLabel, IsNotThatOfALink) {
 }
 
 TEST_F(InheritedLabel, IsReadAsAnAttributeIs) {
-  EXPECT_EQ(
-      Run([] {
-        char buffer[3];
-        return Words({Told(Zorvan::Kernel::GetXattr("tree/file", kName, nullptr, 0)),
-                      Told(Zorvan::Kernel::GetXattr("tree/file", kName, buffer, sizeof buffer))});
-      }),
-      "4 ERANGE");
+  EXPECT_EQ(Run([] {
+              char buffer[3];
+              return Words(
+                  {Told(Zorvan::Kernel::GetXattr("tree/file", kLabelName, nullptr, 0)),
+                   Told(Zorvan::Kernel::GetXattr("tree/file", kLabelName, buffer, sizeof buffer))});
+            }),
+            "4 ERANGE");
 }
 
 TEST_F(InheritedLabel, IsCreatedAndSetAsWithoutIt) {
   const std::uint32_t id = 9;
   EXPECT_EQ(Run([&] {
-              return Words(
-                  {Told(Zorvan::Kernel::SetXattr("tree/file", kName, &id, sizeof id, XATTR_CREATE)),
-                   Carried("tree/file")});
+              return Words({Told(Zorvan::Kernel::SetXattr("tree/file", kLabelName, &id, sizeof id,
+                                                          XATTR_CREATE)),
+                            Carried("tree/file")});
             }),
             "0 9");
 }
@@ -212,8 +173,8 @@ TEST_F(InheritedLabel, IsFoundInAnyDepthWithFewDescriptors) {
                 if (mkdir("d", 0755) != 0 || chdir("d") != 0) return std::strerror(errno);
               }
               close(open("bottom", O_CREAT | O_WRONLY | O_CLOEXEC, 0600));
-              return Words({OwnOrInherited("bottom"), Replace("bottom", 9),
-                            OwnOrInherited("bottom"), OwnOrInherited(".")});
+              return Words({OwnOrInherited("bottom"), Give("bottom", 9), OwnOrInherited("bottom"),
+                            OwnOrInherited(".")});
             }),
             "7 inherited 0 9 own 7 inherited");
 }
@@ -222,10 +183,10 @@ TEST_F(InheritedLabel, IsFoundOnAKernelThatTakesNoEntries) {
   for (const int error : {ENOSYS, EPERM}) {
     EXPECT_EQ(
         Run([&]() -> std::string {
-          First("tree/deep", 8);
+          Give("tree/deep", 8, 0);
           if (!RefuseEntryCalls(error)) return "no way";
           const std::string before = Words({Label("tree/deep/er/file"), Label("tree/file")});
-          const std::string replaced = Replace("tree/deep/er/file", 9);
+          const std::string replaced = Give("tree/deep/er/file", 9);
           removexattr("tree/deep", LinuxHost::LabelAttribute().c_str());
           return before + ", " +
                  Words({replaced, Carried("tree/deep/er/file"), Label("tree/deep"), Label("bare")});
@@ -239,8 +200,8 @@ TEST_F(InheritedLabel, EndsAtAnotherFileSystem) {
   EXPECT_EQ(Run([]() -> std::string {
               if (!MountInPrivate("none", "tree/deep", "tmpfs", 0)) return "(no mounts here)";
               close(open("tree/deep/file", O_CREAT | O_WRONLY | O_CLOEXEC, 0600));
-              return Words({Label("tree/deep"), Label("tree/deep/file"),
-                            Replace("tree/deep/file", 9), Label("tree/file")});
+              return Words({Label("tree/deep"), Label("tree/deep/file"), Give("tree/deep/file", 9),
+                            Label("tree/file")});
             }),
             geteuid() == 0 ? "ENODATA ENODATA ENODATA 7" : "(no mounts here)");
 }
@@ -251,20 +212,20 @@ TEST_F(InheritedLabel, EndsAtABindMount) {
   EXPECT_EQ(Run([]() -> std::string {
               if (!MountInPrivate("elsewhere", "tree/deep", nullptr, MS_BIND))
                 return "(no mounts here)";
-              return Words({Label("tree/deep"), Label("tree/deep/file"),
-                            Replace("tree/deep/file", 9), Label("tree/file")});
+              return Words({Label("tree/deep"), Label("tree/deep/file"), Give("tree/deep/file", 9),
+                            Label("tree/file")});
             }),
             geteuid() == 0 ? "ENODATA ENODATA ENODATA 7" : "(no mounts here)");
   EXPECT_EQ(Run([]() -> std::string {
               if (!MountInPrivate("tree", "elsewhere", nullptr, MS_BIND)) return "(no mounts here)";
               return Words({Label("elsewhere"), Label("elsewhere/deep/er/file"),
-                            Replace("elsewhere/file", 9), Carried("tree/file")});
+                            Give("elsewhere/file", 9), Carried("tree/file")});
             }),
             geteuid() == 0 ? "7 7 0 9" : "(no mounts here)");
   EXPECT_EQ(Run([]() -> std::string {
               if (!MountInPrivate("bare", "tree/deep/er/file", nullptr, MS_BIND))
                 return "(no mounts here)";
-              return Words({Label("tree/deep/er/file"), Replace("tree/deep/er/file", 9)});
+              return Words({Label("tree/deep/er/file"), Give("tree/deep/er/file", 9)});
             }),
             geteuid() == 0 ? "ENODATA ENODATA" : "(no mounts here)");
 }
@@ -274,7 +235,7 @@ TEST_F(InheritedLabel, IsThatOfPipesToo) {
               if (mkfifo("tree/pipe", 0600) != 0) return std::strerror(errno);
               const bool mayCarry = LinuxHost::CanCarryLabel(S_IFIFO, LinuxHost::LabelAttribute());
               const std::string label = Label("tree/pipe");
-              const std::string replaced = Replace("tree/pipe", 9);
+              const std::string replaced = Give("tree/pipe", 9);
               return label + (replaced == (mayCarry ? "0" : "EPERM") ? " as it should" : replaced);
             }),
             "7 as it should");

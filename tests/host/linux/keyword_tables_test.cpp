@@ -5,9 +5,9 @@
 #include <sys/capability.h>
 
 #include "host/linux/state/host_state.h"
-#include "message_of.h"
 #include "secpolicyhost/values.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -15,6 +15,7 @@ namespace {
 using LinuxHost::HostState;
 using LinuxHost::KeywordRefusal;
 using LinuxHost::Keywords;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_KeywordType;
 using ::testing::ElementsAre;
 using ::testing::Pair;

@@ -4,20 +4,18 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
-#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <csignal>
 #include <cstring>
 #include <initializer_list>
-#include <stdexcept>
 
 #include "host/linux/common/host_error.h"
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/state/host_state.h"
+#include "label_calls.h"
 #include "scratch_root.h"
-#include "zorvan/kernel.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -27,29 +25,9 @@ using LinuxHost::LabelNotes;
 using LinuxHost::LabelsPutBack;
 using LinuxHost::NotedLabels;
 
-// Each is asked for before the next one.
-std::string Words(std::initializer_list<std::string> words) {
+std::string AllCarried(std::initializer_list<const char*> paths) {
   std::string text;
-  for (const std::string& word : words) text += (text.empty() ? "" : " ") + word;
-  return text;
-}
-
-void Give(const std::string& path, std::uint32_t id) {
-  const auto give = [&](int flags) {
-    return Zorvan::Kernel::SetXattr(path.c_str(), "zorvan.security", &id, sizeof id, flags) == 0;
-  };
-  // A file's first label replaces none.
-  if (!give(XATTR_REPLACE) && !give(0)) throw std::runtime_error(path);
-}
-
-// What the files carry themselves.
-std::string Carried(std::initializer_list<const char*> paths) {
-  std::string text;
-  for (const char* path : paths) {
-    std::uint32_t id = 0;
-    const ssize_t size = lgetxattr(path, LinuxHost::LabelAttribute().c_str(), &id, sizeof id);
-    text += (text.empty() ? "" : " ") + (size < 0 ? strerrorname_np(errno) : std::to_string(id));
-  }
+  for (const char* path : paths) text += (text.empty() ? "" : " ") + Carried(path);
   return text;
 }
 
@@ -70,26 +48,13 @@ std::string LeftOver() {
   return back ? Told(*back) : "none";
 }
 
-// Runs `body`, which kills its process, in one of its own.
-void RunInKilled(const std::function<void()>& body) {
-  const pid_t child = fork();
-  if (child == 0) body();
-  waitpid(child, nullptr, 0);
-}
-
 // The files "one" and "two" in "tree" carry 7 and nothing, "tree" carries 6.
-class Journal : public ::testing::Test {
+class Journal : public ScratchRootTest {
  protected:
   void SetUp() override {
     for (const char* path : {"tree/one", "tree/two", "tree/sub/three"}) scratch.Write(path, "text");
-    Run([] {
-      Give("tree", 6);
-      Give("tree/one", 7);
-      return "";
-    });
+    ASSERT_EQ(Run([] { return Words({Give("tree", 6, 0), Give("tree/one", 7, 0)}); }), "0 0");
   }
-
-  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
 
   // Notes labels for all files, and keeps what they have.
   static void NoteAndKeep(const NotedLabels& notes, LabelJournal& journal) {
@@ -101,7 +66,18 @@ class Journal : public ::testing::Test {
     journal.Keep(notes);
   }
 
-  ScratchRoot scratch;
+  // A process that has given the labels, and is killed while it still has its journal.
+  static void GiveAndDie() {
+    const pid_t child = fork();
+    if (child == 0) {
+      const NotedLabels notes(LabelNotes::kForLater);
+      LabelJournal journal(StatePath());
+      NoteAndKeep(notes, journal);
+      notes.Apply();
+      raise(SIGKILL);
+    }
+    waitpid(child, nullptr, 0);
+  }
 };
 
 TEST_F(Journal, PutsBackWhatFilesCarried) {
@@ -111,10 +87,10 @@ TEST_F(Journal, PutsBackWhatFilesCarried) {
               NoteAndKeep(notes, journal);
               notes.Apply();
               const std::string given =
-                  Carried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
+                  AllCarried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
               const std::string back = Told(journal.PutBack());
               return given + ", " + back + ", " +
-                     Carried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
+                     AllCarried({"tree", "tree/one", "tree/two", "tree/sub", "tree/sub/three"});
             }),
             "8 9 8 ENODATA 8, 4, 6 7 ENODATA ENODATA ENODATA");
 }
@@ -124,7 +100,7 @@ TEST_F(Journal, ChangesNothingThatIsAsItWas) {
               const NotedLabels notes(LabelNotes::kForLater);
               LabelJournal journal(StatePath());
               NoteAndKeep(notes, journal);
-              return Told(journal.PutBack()) + ", " + Carried({"tree", "tree/one", "tree/two"});
+              return Told(journal.PutBack()) + ", " + AllCarried({"tree", "tree/one", "tree/two"});
             }),
             "0, 6 7 ENODATA");
 }
@@ -139,37 +115,25 @@ TEST_F(Journal, GoesWithItsObject) {
                 notes.Apply();
                 during = Journals();
               }
-              return Words({during, Journals(), LeftOver(), Carried({"tree/one"})});
+              return Words({during, Journals(), LeftOver(), Carried("tree/one")});
             }),
             "there gone none 9");
 }
 
 TEST_F(Journal, IsPutBackByTheNextProcessWhenItsOwnDied) {
   EXPECT_EQ(Run([] {
-              RunInKilled([] {
-                const NotedLabels notes(LabelNotes::kForLater);
-                LabelJournal journal(StatePath());
-                NoteAndKeep(notes, journal);
-                notes.Apply();
-                raise(SIGKILL);
-              });
-              return Words({Carried({"tree/one"}), Journals(), LeftOver(), Journals(),
-                            Carried({"tree", "tree/one", "tree/two"})});
+              GiveAndDie();
+              return Words({Carried("tree/one"), Journals(), LeftOver(), Journals(),
+                            AllCarried({"tree", "tree/one", "tree/two"})});
             }),
             "9 there 4 gone 6 7 ENODATA");
 }
 
 TEST_F(Journal, IsPutBackBeforeTheNextOneBegins) {
   EXPECT_EQ(Run([] {
-              RunInKilled([] {
-                const NotedLabels notes(LabelNotes::kForLater);
-                LabelJournal journal(StatePath());
-                NoteAndKeep(notes, journal);
-                notes.Apply();
-                raise(SIGKILL);
-              });
+              GiveAndDie();
               LabelJournal next(StatePath());
-              return Words({Carried({"tree", "tree/one", "tree/two"}), Told(next.PutBack())});
+              return Words({AllCarried({"tree", "tree/one", "tree/two"}), Told(next.PutBack())});
             }),
             "6 7 ENODATA 0");
 }
@@ -186,7 +150,7 @@ TEST_F(Journal, IsLeftAloneWhileItsProcessLives) {
               } catch (const LinuxHost::HostError& error) {
                 second = strerrorname_np(error.Code());
               }
-              return Words({LeftOver(), second, Journals(), Carried({"tree/one"})});
+              return Words({LeftOver(), second, Journals(), Carried("tree/one")});
             }),
             "none EAGAIN there 9");
 }
@@ -211,7 +175,7 @@ TEST_F(Journal, CountsAsFarAsItsWriterCame) {
                 if (!isWritten || !back || !back->failures.empty()) return std::string("failed");
                 put += back->count;
               }
-              return Words({std::to_string(put), Carried({"tree", "tree/one", "tree/two"})});
+              return Words({std::to_string(put), AllCarried({"tree", "tree/one", "tree/two"})});
             }),
             "4 6 7 ENODATA");
 }
@@ -220,7 +184,7 @@ TEST_F(Journal, FollowsNothingThatWasReplaced) {
   scratch.Write("other/one", "text");
   EXPECT_EQ(
       Run([]() -> std::string {
-        Give("other/one", 3);
+        Give("other/one", 3, 0);
         const NotedLabels notes(LabelNotes::kForLater);
         LabelJournal journal(StatePath());
         NoteAndKeep(notes, journal);
@@ -232,7 +196,7 @@ TEST_F(Journal, FollowsNothingThatWasReplaced) {
         }
         const LabelsPutBack back = journal.PutBack();
         return Words({std::to_string(back.count), std::to_string(back.failures.size()),
-                      Carried({"tree", "tree/two", "other/one", "aside/three"})});
+                      AllCarried({"tree", "tree/two", "other/one", "aside/three"})});
       }),
       "2 3 6 ENODATA 3 8");
 }

@@ -6,8 +6,8 @@
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/rule_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -15,6 +15,7 @@ namespace {
 using LinuxHost::HostState;
 using LinuxHost::kNoLabel;
 using Policy::RuleKind;
+using SecPolicyTest::MessageOf;
 using ::testing::ElementsAre;
 using ::testing::Pair;
 

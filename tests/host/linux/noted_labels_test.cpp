@@ -12,9 +12,9 @@
 
 #include <cerrno>
 #include <cstring>
-#include <initializer_list>
 
 #include "host/linux/files/security_attribute.h"
+#include "label_calls.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 
@@ -23,29 +23,6 @@ namespace {
 
 using LinuxHost::LabelNotes;
 using LinuxHost::NotedLabels;
-
-constexpr char kName[] = "zorvan.security";
-
-std::string Told(ssize_t result) {
-  return result < 0 ? strerrorname_np(errno) : std::to_string(result);
-}
-
-// Each is asked for before the next one.
-std::string Words(std::initializer_list<std::string> words) {
-  std::string text;
-  for (const std::string& word : words) text += (text.empty() ? "" : " ") + word;
-  return text;
-}
-
-std::string Give(const char* path, std::uint32_t id, int flags = XATTR_REPLACE) {
-  return Told(Zorvan::Kernel::SetXattr(path, kName, &id, sizeof id, flags));
-}
-
-std::string Label(const char* path) {
-  std::uint32_t id = 0;
-  const ssize_t size = Zorvan::Kernel::GetXattr(path, kName, &id, sizeof id);
-  return size == sizeof id ? std::to_string(id) : Told(size);
-}
 
 // The real attribute, whatever is noted.
 std::string RealLabel(const char* path) {
@@ -94,7 +71,7 @@ bool BindReadOnly(const char* path) {
 
 // The file "labelled" carries 7; "bare" carries nothing. The directory "tree" carries 6, and its
 // files nothing.
-class NotedLabelsTest : public ::testing::TestWithParam<LabelNotes> {
+class NotedLabelsTest : public ScratchRootTest, public ::testing::WithParamInterface<LabelNotes> {
  protected:
   void SetUp() override {
     scratch.Write("labelled", "text");
@@ -104,14 +81,10 @@ class NotedLabelsTest : public ::testing::TestWithParam<LabelNotes> {
     ASSERT_EQ(Run([] { return Words({Give("labelled", 7, 0), Give("tree", 6, 0)}); }), "0 0");
   }
 
-  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
-
   std::string RunNoting(const std::function<std::string(const NotedLabels& notes)>& body,
                         const std::string& passedOver = "") {
     return Run([&] { return body(NotedLabels(GetParam(), passedOver)); });
   }
-
-  ScratchRoot scratch;
 };
 
 INSTANTIATE_TEST_SUITE_P(Purposes, NotedLabelsTest,
@@ -141,8 +114,8 @@ TEST_P(NotedLabelsTest, FailsWhereGivingWould) {
   const auto give = [] {
     return Words({Give("bare", 8), Give("missing", 8), Give("labelled/x", 8), Give("labelled/", 8),
                   Give("", 8), Give("dangling", 8), Give("loop", 8), Give("link", 8),
-                  Give("none/x", 8), Give(std::string(5000, 'x').c_str(), 8),
-                  Give((std::string(300, 'x') + "/y").c_str(), 8), Label("bare")});
+                  Give("none/x", 8), Give(std::string(5000, 'x'), 8),
+                  Give(std::string(300, 'x') + "/y", 8), Label("bare")});
   };
   const std::string really = Run(give);
   EXPECT_EQ(really,
@@ -152,20 +125,20 @@ TEST_P(NotedLabelsTest, FailsWhereGivingWould) {
 }
 
 TEST_P(NotedLabelsTest, TakesOnlyIdentifiersAndReplacements) {
-  EXPECT_EQ(
-      RunNoting([](const NotedLabels& notes) {
-        return Words({Told(Zorvan::Kernel::SetXattr("labelled", kName, "odd", 3, XATTR_REPLACE)),
-                      Give("labelled", 8, 0), Changes(notes)});
-      }),
-      "EINVAL EINVAL ");
+  EXPECT_EQ(RunNoting([](const NotedLabels& notes) {
+              return Words(
+                  {Told(Zorvan::Kernel::SetXattr("labelled", kLabelName, "odd", 3, XATTR_REPLACE)),
+                   Give("labelled", 8, 0), Changes(notes)});
+            }),
+            "EINVAL EINVAL ");
 }
 
 TEST_P(NotedLabelsTest, NeedsBufferThatIsLargeEnough) {
   EXPECT_EQ(RunNoting([](const NotedLabels&) {
               char buffer[3];
               return Words({Give("labelled", 8),
-                            Told(Zorvan::Kernel::GetXattr("labelled", kName, nullptr, 0)),
-                            Told(Zorvan::Kernel::GetXattr("labelled", kName, buffer, 3))});
+                            Told(Zorvan::Kernel::GetXattr("labelled", kLabelName, nullptr, 0)),
+                            Told(Zorvan::Kernel::GetXattr("labelled", kLabelName, buffer, 3))});
             }),
             "0 4 ERANGE");
 }
@@ -344,7 +317,7 @@ TEST_P(NotedLabelsTest, AppliesWithFewDescriptors) {
               std::size_t given = 0;
               for (int i = 0; i < 100; ++i) {
                 const std::string file = "tree/" + std::to_string(i) + "/file";
-                if (Give(file.c_str(), 8) == "0") ++given;
+                if (Give(file, 8) == "0") ++given;
               }
               const rlimit limit = {16, 16};
               if (setrlimit(RLIMIT_NOFILE, &limit) != 0) return "no way";

@@ -6,13 +6,14 @@
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/parameter_rule_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::HostState;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 using ::testing::ElementsAre;
 

@@ -15,8 +15,8 @@
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/world_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 #include "teskctl/security.h"
 
 namespace LinuxHostTest {
@@ -26,6 +26,7 @@ using LinuxHost::HostState;
 using LinuxHost::LoadEnding;
 using LinuxHost::LoadKind;
 using LinuxHost::PolicyTransaction;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 using TeskCtl::Security::TeskAccessInterfaceImpl;

@@ -21,7 +21,11 @@ namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::HostState;
-using namespace TeskCtl::Security;
+using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+using TeskCtl::Security::TeskAccess_FilePathAccessRule;
+using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
+using TeskCtl::Security::TeskAccess_ObjectAccessRule;
+using TeskCtl::Security::TeskAccessInterfaceImpl;
 
 // What a load does, with `domains` domains of `rules` rules each.
 void Load(int domains, int rules) {

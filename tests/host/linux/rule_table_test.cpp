@@ -10,8 +10,8 @@
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -20,6 +20,7 @@ using LinuxHost::DomainReference;
 using LinuxHost::HostState;
 using Policy::Rule;
 using Policy::RuleKind;
+using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 using ::testing::ElementsAre;
 

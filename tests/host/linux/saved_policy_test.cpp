@@ -18,8 +18,8 @@
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/rule_table.h"
 #include "host/linux/state/world_table.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -31,6 +31,7 @@ using LinuxHost::LabelNumbers;
 using LinuxHost::RestorePolicy;
 using LinuxHost::SaveState;
 using Policy::RuleKind;
+using SecPolicyTest::MessageOf;
 
 constexpr auto kNoDefaults = TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 

@@ -72,16 +72,8 @@ std::string RunInChild(const std::function<std::string()>& body) {
 }  // namespace
 
 ScratchRoot::ScratchRoot() {
-  std::string name = (std::filesystem::temp_directory_path() / "linux-host-XXXXXX").string();
-  if (mkdtemp(name.data()) == nullptr) throw std::runtime_error("unable to make " + name);
-  directory = name;
   std::filesystem::create_directories(Root() / "run");
   std::filesystem::create_directories(Root() / "tardisks");
-}
-
-ScratchRoot::~ScratchRoot() {
-  std::error_code ignored;
-  std::filesystem::remove_all(directory, ignored);
 }
 
 void ScratchRoot::Write(const std::string& path, const std::string& content) const {
@@ -100,8 +92,8 @@ std::string ScratchRoot::RunInside(const std::function<std::string()>& body) con
 
 std::string ScratchRoot::RunBeneath(const std::function<std::string()>& body) const {
   return RunInChild([&]() -> std::string {
-    setenv("SECPOLICY_HOST_STATE", (directory / "state" / "host.db").c_str(), 1);
-    setenv("SECPOLICY_HOST_CONFIG", (directory / "config" / "config.db").c_str(), 1);
+    setenv("SECPOLICY_HOST_STATE", (directory / "state/host.db").c_str(), 1);
+    setenv("SECPOLICY_HOST_CONFIG", (directory / "config/config.db").c_str(), 1);
     if (chdir(Root().c_str()) != 0) return "(the root cannot be entered)";
     return body();
   });

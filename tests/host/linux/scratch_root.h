@@ -1,8 +1,12 @@
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <filesystem>
 #include <functional>
 #include <string>
+
+#include "support/temporary_directory.h"
 
 namespace LinuxHostTest {
 
@@ -11,11 +15,8 @@ namespace LinuxHostTest {
 class ScratchRoot {
  public:
   ScratchRoot();
-  ScratchRoot(const ScratchRoot&) = delete;
-  ScratchRoot& operator=(const ScratchRoot&) = delete;
-  ~ScratchRoot();
 
-  const std::filesystem::path& Directory() const { return directory; }
+  std::filesystem::path Directory() const { return directory.Path(); }
   std::filesystem::path Root() const { return directory / "root"; }
 
   // Writes `content` to the file `path` below Root(), and makes the directories on the way.
@@ -29,7 +30,18 @@ class ScratchRoot {
   std::string RunBeneath(const std::function<std::string()>& body) const;
 
  private:
-  std::filesystem::path directory;
+  SecPolicyTest::TemporaryDirectory directory;
+};
+
+// A test with a scratch root of its own.
+class ScratchRootTest : public ::testing::Test {
+ protected:
+  // Runs `body` as ScratchRoot::RunBeneath.
+  std::string Run(const std::function<std::string()>& body) const {
+    return scratch.RunBeneath(body);
+  }
+
+  ScratchRoot scratch;
 };
 
 // The whole content of the file at `path`; empty when there is none.

@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "label_calls.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
 
@@ -18,16 +19,10 @@ namespace {
 using Zorvan::Kernel::GetXattr;
 using Zorvan::Kernel::SetXattr;
 
-constexpr char kName[] = "zorvan.security";
 constexpr std::uint32_t kValue = 0x12345678;
 
-// What a call answered: its result, or the name of the error.
-std::string Told(ssize_t result) {
-  return result < 0 ? strerrorname_np(errno) : std::to_string(result);
-}
-
 int Put(const char* path, int flags) {
-  return SetXattr(path, kName, &kValue, sizeof kValue, flags);
+  return SetXattr(path, kLabelName, &kValue, sizeof kValue, flags);
 }
 
 // The real attributes that `path` carries.
@@ -49,20 +44,16 @@ bool DropSystemAdministration() {
   return syscall(SYS_capset, &header, data) == 0;
 }
 
-class SecurityAttribute : public ::testing::Test {
+class SecurityAttribute : public ScratchRootTest {
  protected:
   void SetUp() override { scratch.Write("file", "text"); }
-
-  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
-
-  ScratchRoot scratch;
 };
 
 TEST_F(SecurityAttribute, IsReadAsWritten) {
   EXPECT_EQ(Run([] {
               std::uint32_t value = 0;
               const std::string set = Told(Put("file", 0));
-              const std::string got = Told(GetXattr("file", kName, &value, sizeof value));
+              const std::string got = Told(GetXattr("file", kLabelName, &value, sizeof value));
               return set + " " + got + (value == kValue ? " same" : " different");
             }),
             "0 4 same");
@@ -88,16 +79,16 @@ TEST_F(SecurityAttribute, FailsAsTheSystemCallsDo) {
   EXPECT_EQ(Run([] { return Told(Put("file/below", 0)); }), "ENOTDIR");
   EXPECT_EQ(Run([] { return Told(Put("", 0)); }), "ENOENT");
   EXPECT_EQ(Run([] { return Told(Put("file", 0x1000)); }), "EINVAL");
-  EXPECT_EQ(Run([] { return Told(GetXattr("missing", kName, nullptr, 0)); }), "ENOENT");
-  EXPECT_EQ(Run([] { return Told(GetXattr("file", kName, nullptr, 0)); }), "ENODATA");
+  EXPECT_EQ(Run([] { return Told(GetXattr("missing", kLabelName, nullptr, 0)); }), "ENOENT");
+  EXPECT_EQ(Run([] { return Told(GetXattr("file", kLabelName, nullptr, 0)); }), "ENODATA");
 }
 
 TEST_F(SecurityAttribute, NeedsBufferThatIsLargeEnough) {
   Run([] { return Told(Put("file", 0)); });
-  EXPECT_EQ(Run([] { return Told(GetXattr("file", kName, nullptr, 0)); }), "4");
+  EXPECT_EQ(Run([] { return Told(GetXattr("file", kLabelName, nullptr, 0)); }), "4");
   EXPECT_EQ(Run([] {
               char buffer[3];
-              return Told(GetXattr("file", kName, buffer, sizeof buffer));
+              return Told(GetXattr("file", kLabelName, buffer, sizeof buffer));
             }),
             "ERANGE");
 }
@@ -106,7 +97,7 @@ TEST_F(SecurityAttribute, IsFoundThroughLinks) {
   std::filesystem::create_symlink("file", scratch.Root() / "link");
   EXPECT_EQ(Run([] {
               Put("link", 0);
-              return Told(GetXattr("file", kName, nullptr, 0));
+              return Told(GetXattr("file", kLabelName, nullptr, 0));
             }),
             "4");
 }

@@ -21,13 +21,9 @@ using OrinConfigStore::ConfigStoreObjectId;
 using OrinConfigStore::FLAG_NONE;
 using OrinConfigStore::GetDesiredUserConfig;
 
-class Settings : public ::testing::Test {
+class Settings : public ScratchRootTest {
  protected:
-  std::string Run(const std::function<std::string()>& body) { return scratch.RunBeneath(body); }
-
   std::filesystem::path Database() const { return scratch.Directory() / "config/config.db"; }
-
-  ScratchRoot scratch;
 };
 
 // The option as the library sees it.

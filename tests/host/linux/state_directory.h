@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "support/temporary_directory.h"
+
 namespace LinuxHostTest {
 
 // A host state of a test's own: SECPOLICY_HOST_STATE names a file in a directory that only this
@@ -14,14 +16,14 @@ class StateDirectory {
   ~StateDirectory();
 
   // The directory, and the database in it, which is not there before its first use.
-  const std::string& Path() const { return directory; }
-  std::string Database() const { return directory + "/host.db"; }
+  const std::string& Path() const { return directory.Path(); }
+  std::string Database() const { return directory / "host.db"; }
 
   // Writes a file in the directory.
   void Write(const std::string& name, const std::string& content) const;
 
  private:
-  std::string directory;
+  SecPolicyTest::TemporaryDirectory directory;
 };
 
 }  // namespace LinuxHostTest

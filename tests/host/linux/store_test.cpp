@@ -13,8 +13,8 @@
 
 #include "child_process.h"
 #include "host/linux/common/host_error.h"
-#include "message_of.h"
 #include "state_directory.h"
+#include "support/message_of.h"
 
 namespace LinuxHostTest {
 namespace {
@@ -24,6 +24,7 @@ using LinuxHost::Rows;
 using LinuxHost::Store;
 using LinuxHost::StoreLayout;
 using LinuxHost::Transaction;
+using SecPolicyTest::MessageOf;
 
 constexpr StoreLayout kLayout = {.purpose = "shopping list",
                                  .remedy = "Write a new one",

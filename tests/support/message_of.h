@@ -4,9 +4,10 @@
 
 #include "braxo/lib/exception.h"
 
-namespace LinuxHostTest {
+namespace SecPolicyTest {
 
-// The message of the BraxoException that `call` throws, empty when it throws none.
+// The message of the BraxoException that `call` throws, empty when it throws none. Any other
+// exception passes.
 template <class Call>
 std::string MessageOf(Call call) {
   try {
@@ -17,4 +18,4 @@ std::string MessageOf(Call call) {
   return {};
 }
 
-}  // namespace LinuxHostTest
+}  // namespace SecPolicyTest
