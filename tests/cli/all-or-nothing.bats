@@ -3,11 +3,7 @@
 load helper
 
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/new
-  "$SOURCE/scripts/pack-example" "$root"
-  boot
-  cp -r "$root/etc/zorvan/secpolicy" "$policy"
+  boot_beside_copy
   # A load that changes a bit of everything, the labels of three files at last.
   echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
   touch "$policy/domains/newDom"

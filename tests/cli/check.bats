@@ -4,11 +4,9 @@ load helper
 
 # Every test but those of the real root checks the booted example, changed in one way.
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/etc/zorvan/secpolicy
+  make_root
+  boot
   shown=/etc/zorvan/secpolicy
-  "$SOURCE/scripts/pack-example" "$root"
-  "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err"
 }
 
 # add FILE LINE...: appends the lines to the policy file, and keeps the number of the last one.

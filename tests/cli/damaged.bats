@@ -3,10 +3,9 @@
 load helper
 
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  state=$root/run/secpolicy/host.db
-  "$SOURCE/scripts/pack-example" "$root"
+  make_root
   boot
+  state=$root/run/secpolicy/host.db
   "$SECPOLICY" --root "$root" save good
 }
 

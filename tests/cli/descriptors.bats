@@ -3,8 +3,7 @@
 load helper
 
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  "$SOURCE/scripts/pack-example" "$root"
+  make_root
   boot
   "$SECPOLICY" --root "$root" save good
 }

@@ -2,14 +2,7 @@
 
 load helper
 
-# The booted example, with a copy of its policy to change.
-setup() {
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/new
-  "$SOURCE/scripts/pack-example" "$root"
-  boot
-  cp -r "$root/etc/zorvan/secpolicy" "$policy"
-}
+setup() { boot_beside_copy; }
 
 left_out="secpolicy: diff: file labels and the transitions of tardisks are left out: a directory has the labels only, and a state the transitions"
 

@@ -5,11 +5,20 @@ bats_require_minimum_version 1.5.0
 SOURCE=$(cd "$BATS_TEST_DIRNAME/../.." && pwd)
 
 # Every test has a root of its own, with the example host in it.
-setup() {
+setup() { make_root; }
+
+make_root() {
   root=$BATS_TEST_TMPDIR/root
-  # shellcheck disable=SC2034 # for the tests
   policy=$root/etc/zorvan/secpolicy
   "$SOURCE/scripts/pack-example" "$root"
+}
+
+# boot_beside_copy: boots the example, with a copy of its policy in /new for the test to change.
+boot_beside_copy() {
+  make_root
+  boot
+  cp -r "$policy" "$root/new"
+  policy=$root/new
 }
 
 # secpolicy ARGUMENT...: runs the command below $root and keeps $status, $output and $stderr.

@@ -4,11 +4,7 @@ load helper
 
 # Every test plans a load of a changed copy of the booted example.
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/new
-  "$SOURCE/scripts/pack-example" "$root"
-  boot
-  cp -r "$root/etc/zorvan/secpolicy" "$policy"
+  boot_beside_copy
   rm -r "$policy/tardisks"
 }
 

@@ -3,12 +3,8 @@
 load helper
 
 setup() {
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/new
+  boot_beside_copy
   saved=$root/var/lib/secpolicy/saved
-  "$SOURCE/scripts/pack-example" "$root"
-  boot
-  cp -r "$root/etc/zorvan/secpolicy" "$policy"
 }
 
 # What is installed, without the numbers of objects.
