@@ -1,3 +1,6 @@
+// The four domains that a load keeps for its host: zero before any load, never mixed up, the
+// latest load's.
+
 #include "secpolicy/cached_domains.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,5 @@
+// A directory that hosts keep their policy in and that the library looks for elsewhere.
+
 #include "secpolicy/policy_root.h"
 
 #include <gtest/gtest.h>

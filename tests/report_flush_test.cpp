@@ -1,3 +1,5 @@
+// An error that is lost with the process, since standard error was buffered.
+
 #include <gtest/gtest.h>
 
 #include <iostream>

@@ -1,3 +1,6 @@
+// Messages and headers: in which words, on which stream and in which log, in what order and
+// whether flushed; and what the exceptions carry.
+
 #include "secpolicy/report.h"
 
 #include <gmock/gmock.h>

@@ -1,4 +1,5 @@
-# secpolicy load --all-or-nothing
+# secpolicy load --all-or-nothing: a load that fails, is killed or asked to end leaves all or nothing,
+# labels and their numbers included.
 
 load helper
 

@@ -1,4 +1,4 @@
-# secpolicy boot
+# secpolicy boot: what it unpacks, replaces and refuses, and what is left when it fails.
 
 load helper
 

@@ -1,4 +1,5 @@
-# secpolicy check
+# secpolicy check: each kind of problem is told with its place, a mark and a hint, as a load tells it,
+# and looking changes nothing.
 
 load helper
 

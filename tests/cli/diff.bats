@@ -1,4 +1,5 @@
-# secpolicy diff
+# secpolicy diff: each kind of difference between directories, saved states and what is installed, and
+# what cannot be compared.
 
 load helper
 

@@ -1,4 +1,4 @@
-# secpolicy display
+# secpolicy display: all that is installed, or one domain of it, as text and as JSON.
 
 load helper
 

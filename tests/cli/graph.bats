@@ -1,4 +1,4 @@
-# secpolicy graph
+# secpolicy graph: the same picture for the same policy, odd names escaped, long lists cut.
 
 load helper
 

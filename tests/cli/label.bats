@@ -1,4 +1,5 @@
-# secpolicy label
+# secpolicy label: what it gets, sets, verifies and gives again agrees with what a load labels, and no
+# link leads it astray.
 
 load helper
 

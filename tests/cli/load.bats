@@ -1,4 +1,5 @@
-# secpolicy load and secpolicy load-early
+# secpolicy load and load-early: what is installed and what is removed, how each failure is told and
+# counted, and loads that are killed.
 
 load helper
 

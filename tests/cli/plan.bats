@@ -1,4 +1,4 @@
-# secpolicy load --plan
+# secpolicy load --plan: what it shows is what the load then does, and showing it changes nothing.
 
 load helper
 

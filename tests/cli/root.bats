@@ -1,4 +1,4 @@
-# secpolicy --root
+# secpolicy --root: all verbs keep below it, for ordinary users too, and services beside it.
 
 load helper
 

@@ -1,4 +1,5 @@
-# secpolicy save, history and rollback
+# secpolicy save, history and rollback: what was saved comes back whole, and what is damaged, foreign
+# or open to others never does.
 
 load helper
 

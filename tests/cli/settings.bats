@@ -1,4 +1,4 @@
-# secpolicy settings and secpolicy restore
+# secpolicy settings and restore: what was stored is read back and applied, and to nothing else.
 
 load helper
 

@@ -1,4 +1,4 @@
-# secpolicy status
+# secpolicy status: how the latest load ended, whichever it was, and what is installed now.
 
 load helper
 

@@ -1,4 +1,4 @@
-# secpolicy who-can
+# secpolicy who-can: each domain that may, and no other, as why answers for it.
 
 load helper
 

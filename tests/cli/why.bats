@@ -1,4 +1,4 @@
-# secpolicy why
+# secpolicy why: the rules and lines that decide, or what is missing, for every question.
 
 load helper
 

@@ -1,3 +1,6 @@
+// JSON that another writer would have written otherwise: bytes that are no UTF-8, control
+// characters, nesting, the order of members.
+
 #include "json.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,5 @@
+// The corpus's host when it is the Linux host.
+
 #include "corpus_host.h"
 #include "host/linux/state_directory.h"
 

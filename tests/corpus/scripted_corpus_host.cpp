@@ -1,3 +1,5 @@
+// The corpus's host when it is the scripted one.
+
 #include "corpus_host.h"
 #include "support/scripted_host.h"
 

@@ -1,3 +1,6 @@
+// Parameter checks of one or two parameters, and conflicts between them: who is asked, when, and
+// how a refusal is told.
+
 #include "secpolicy/domain/capability_param_rules.h"
 
 #include "domain/rule_families.h"

@@ -1,3 +1,6 @@
+// The template domain for checking access: made only when the option says so, once, with its one
+// rule; the option is freed whatever fails.
+
 #include "secpolicy/domain/check_access_domain.h"
 
 #include "support/scripted_host.h"

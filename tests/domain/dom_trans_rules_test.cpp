@@ -1,3 +1,5 @@
+// The target of a transition: looked up while the line is read, once, and reported in its place.
+
 #include "secpolicy/domain/dom_trans_rules.h"
 
 #include "domain/rule_families.h"

@@ -1,3 +1,6 @@
+// What a display shows of domains, slot by slot, and what it leaves out or ends at when the host
+// fails.
+
 #include <climits>
 
 #include "secpolicy/secpolicy.h"

@@ -1,3 +1,6 @@
+// The four phases of loading a directory of domains: their order, what one bad file keeps from
+// being installed, and what it does not.
+
 #include <sys/stat.h>
 #include <unistd.h>
 

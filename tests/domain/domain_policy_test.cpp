@@ -1,3 +1,6 @@
+// The policy of one domain: which line goes to which kind of rules, where a bad line or a refusal
+// ends it, in which order rules are checked, set, read and printed.
+
 #include "secpolicy/domain/domain_policy.h"
 
 #include <typeinfo>

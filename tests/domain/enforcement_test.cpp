@@ -1,3 +1,6 @@
+// Enforcement levels that were stored: each domain gets its own and no other, in small letters,
+// and a failure ends the walk.
+
 #include "secpolicy/domain/enforcement.h"
 
 #include "support/scripted_host.h"

@@ -1,3 +1,6 @@
+// Rules for file paths: both the path as written and as it resolves, paths too long for the
+// kernel's record, every wrong set of permission letters.
+
 #include "secpolicy/domain/file_path_access_rules.h"
 
 #include <cerrno>

@@ -1,3 +1,5 @@
+// The words in which a bad line of a domain's policy is told.
+
 #include "secpolicy/domain/policy_errors.h"
 
 #include "support/scripted_host.h"

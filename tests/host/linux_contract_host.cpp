@@ -1,3 +1,5 @@
+// The contract tests' host when it is the Linux host.
+
 #include "contract_host.h"
 #include "host/linux/files/security_attribute.h"
 #include "linux/state_directory.h"

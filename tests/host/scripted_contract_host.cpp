@@ -1,3 +1,5 @@
+// The contract tests' host when it is the scripted one.
+
 #include "contract_host.h"
 #include "support/policy_tree.h"
 #include "support/scripted_host.h"

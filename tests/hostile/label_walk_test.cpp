@@ -1,3 +1,5 @@
+// Trees that are too deep, too wide or oddly named for a walk, and entries of every type.
+
 #include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/socket.h>

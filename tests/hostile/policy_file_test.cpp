@@ -1,3 +1,6 @@
+// Policy files without line ends or without end, devices in their place, and names of any bytes:
+// how much memory they take.
+
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,3 +1,6 @@
+// An ordinary user's labelling and reading: it works on what is the user's own and ends where the
+// system refuses.
+
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <sys/xattr.h>

@@ -1,3 +1,5 @@
+// A directory that is opened before it carries its label.
+
 #include <gtest/gtest.h>
 #include <sys/inotify.h>
 #include <unistd.h>

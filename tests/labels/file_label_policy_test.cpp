@@ -1,3 +1,6 @@
+// Lines of file labels: which are read, in which order they are applied, what a bad line or a file
+// that cannot be labelled ends, and what it does not.
+
 #include "secpolicy/labels/file_label_policy.h"
 
 #include <gtest/gtest.h>

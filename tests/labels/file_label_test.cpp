@@ -1,3 +1,6 @@
+// Labels of files and trees: which entries get one, in which order, how often, what ends a walk,
+// and that every directory is closed.
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <pthread.h>

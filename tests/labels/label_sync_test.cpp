@@ -1,3 +1,6 @@
+// Labels of the policy beside those of the kernel: which are removed and added, in which order,
+// and what is printed of them.
+
 #include <gtest/gtest.h>
 
 #include <algorithm>

@@ -1,3 +1,6 @@
+// Files of object names: which are read, what one bad line takes away from the kernel, and how
+// objects are displayed.
+
 #include "secpolicy/labels/object_policy.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,6 @@
+// Words and lines of a policy file: comments, blanks, NUL bytes, lines of 1023 characters and
+// more; and which files a directory has.
+
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>

@@ -1,3 +1,6 @@
+// Capabilities and parameter checks at run time: the range of each, the widening of signed
+// numbers, and which refusal comes first.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>

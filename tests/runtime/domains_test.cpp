@@ -1,3 +1,6 @@
+// Domains at run time: arguments in the kernel's order, answers where the kernel stores none, and
+// an interface that is always destroyed.
+
 #include <gtest/gtest.h>
 
 #include <algorithm>

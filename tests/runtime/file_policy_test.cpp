@@ -1,3 +1,6 @@
+// File policies at run time: arguments in the kernel's order, empty paths, and the one failure
+// that asks to try again.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>

@@ -1,3 +1,5 @@
+// What all operations of one kernel call share: how they fail, and what becomes of errno.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>
@@ -11,8 +13,6 @@
 namespace SecPolicyTest {
 namespace {
 
-// What all operations that are one kernel call have in common: how they fail and what becomes of
-// errno.
 struct Operation {
   std::string name;
   std::uint32_t number;

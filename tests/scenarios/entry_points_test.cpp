@@ -1,9 +1,11 @@
+// The early load, the restore of levels and the display, whole: what each shows, and where each
+// ends when a part fails.
+
 #include <filesystem>
 
 #include "scenarios/good_host.h"
 #include "secpolicy/secpolicy.h"
 
-// The early load, the restore of enforcement levels, and the display.
 namespace SecPolicyTest {
 namespace {
 

@@ -1,3 +1,6 @@
+// Every host call of an entry point fails in turn. That the interface object and everything else is
+// gone afterwards is checked by the scripted host at the end of each run.
+
 #include <algorithm>
 #include <filesystem>
 #include <functional>
@@ -5,8 +8,6 @@
 #include "scenarios/good_host.h"
 #include "secpolicy/secpolicy.h"
 
-// Every host call of an entry point fails in turn. That the interface object and everything else is
-// gone afterwards is checked by the scripted host at the end of each run.
 namespace SecPolicyTest {
 namespace {
 

@@ -1,3 +1,6 @@
+// A whole load: every call, message and flush in order; each part failing in turn; domains that a
+// host cannot do without missing.
+
 #include <csignal>
 #include <cstdio>
 #include <filesystem>

@@ -1,9 +1,10 @@
+// Allocations that change errno, as they may. While a scripted host exists each one does, so that
+// a late read of errno shows.
+
 #include <cerrno>
 #include <cstdlib>
 #include <new>
 
-// An allocation may change errno. While a scripted host exists, each one does, so that a late read
-// of errno shows.
 namespace SecPolicyTest {
 extern bool overwriteErrno;
 namespace {

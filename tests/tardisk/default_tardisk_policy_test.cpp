@@ -1,3 +1,6 @@
+// Tardisks that no policy claims: their transitions and label, and what a failing step keeps from
+// the others.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>

@@ -1,3 +1,5 @@
+// A policy file that is opened as descriptor 0 and taken for unopened.
+
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <unistd.h>

@@ -1,3 +1,6 @@
+// Which tardisk a policy file belongs to: names without an end, files from none, two policies for
+// one, and directories that cannot be listed.
+
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 

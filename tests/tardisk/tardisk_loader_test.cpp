@@ -1,3 +1,5 @@
+// Loading and displaying tardisks: the policies first, the default always, one failure at the end.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>

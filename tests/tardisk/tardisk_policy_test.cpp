@@ -1,3 +1,6 @@
+// The one rule of a tardisk's policy: how it is read, refused and set, and what a bad file keeps
+// from the others.
+
 #include <gtest/gtest.h>
 
 #include <cerrno>

@@ -1,3 +1,6 @@
+// The host's interface where it has more to say than the contract: slots, roles, the two spaces of
+// labels, lists installed all or none, conflicts of parameter checks.
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

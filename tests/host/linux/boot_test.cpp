@@ -1,3 +1,6 @@
+// A boot: every file gets its first label and none of the running system, links lead nowhere, a
+// failure keeps what was installed, and where each inode came from is told.
+
 #include "host/linux/operation/boot.h"
 
 #include <fcntl.h>

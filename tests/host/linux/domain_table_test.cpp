@@ -1,3 +1,6 @@
+// Domains and their slots: names, levels, roles, what keeps them from being destroyed, and what
+// must not be left to the next one in the slot.
+
 #include "host/linux/state/domain_table.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,6 @@
+// File policies of domains and of worlds: batches all or none, updates and removals of exactly one,
+// and owners, paths and permissions that do not exist.
+
 #include "host/linux/state/file_policy_table.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,5 @@
+// Paths as the host resolves them: links, dots, loops, and the last byte of the caller's buffer.
+
 #include <gtest/gtest.h>
 
 #include <climits>

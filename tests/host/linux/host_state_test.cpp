@@ -1,3 +1,6 @@
+// The state behind the tables: where it lies, what it starts with, who has it open, and what is
+// left after a reset.
+
 #include "host/linux/state/host_state.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,6 @@
+// Labels that files without one have from a directory above: from the nearest, never across a
+// mount or through a link, at any depth.
+
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <linux/filter.h>

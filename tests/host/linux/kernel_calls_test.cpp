@@ -1,3 +1,6 @@
+// The numbered kernel calls: bad numbers, counts, addresses and owners are told by their errno,
+// and nothing is half done.
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/mman.h>

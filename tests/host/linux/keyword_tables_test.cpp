@@ -1,3 +1,6 @@
+// Words that the host knows: numbered as the system and the installed headers number them,
+// compared whole.
+
 #include "host/linux/state/keyword_tables.h"
 
 #include <gmock/gmock.h>

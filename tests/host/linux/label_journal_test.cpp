@@ -1,3 +1,6 @@
+// Labels of a load that did not end: each file gets back what it carried, also after a kill, and
+// nothing that was replaced meanwhile.
+
 #include "host/linux/operation/label_journal.h"
 
 #include <fcntl.h>

@@ -1,3 +1,6 @@
+// Labels of objects: numbers are never used again, names fit, and a label that goes takes its
+// rules along.
+
 #include "host/linux/state/label_table.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,5 @@
+// What is kept of the latest load: all of it, of no other, and gone with a boot.
+
 #include "host/linux/operation/load_record.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,6 @@
+// Labels that a load notes and gives at its end: read back as if given, refused where giving would
+// be, given to nothing that was replaced meanwhile.
+
 #include "host/linux/operation/noted_labels.h"
 
 #include <fcntl.h>

@@ -1,3 +1,6 @@
+// Parameter rules: which of them conflict, that the quick search for conflicts misses none, and
+// removals of exactly one range.
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

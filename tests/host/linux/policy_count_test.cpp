@@ -1,3 +1,5 @@
+// The count of what is installed, where policies of worlds are none of the rules.
+
 #include "host/linux/operation/policy_count.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,5 @@
+// Which line of which file a rule or a label came from: the latest one that reaches the path.
+
 #include "host/linux/operation/rule_origins.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,6 @@
+// Rules with domains or words that do not exist, also when another process has just made or
+// removed them.
+
 #include "host/linux/state/rule_table.h"
 
 #include <gmock/gmock.h>

@@ -1,3 +1,6 @@
+// Saved states: put back whole or not at all, with worlds still in their domains, and refused when
+// old, damaged, foreign or open to others.
+
 #include "host/linux/operation/saved_policy.h"
 
 #include <gtest/gtest.h>

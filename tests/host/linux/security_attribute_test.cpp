@@ -1,3 +1,6 @@
+// The attribute that carries a label: one real attribute for each state, errors as the system
+// calls give them, and the choice between the two kinds.
+
 #include <gtest/gtest.h>
 #include <linux/capability.h>
 #include <sys/stat.h>

@@ -1,3 +1,6 @@
+// Stored options and levels: kind and value come back, the absent is told from the empty, and
+// files are for their owner.
+
 #include "host/linux/operation/settings.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,6 @@
+// The database file: what it refuses to open, what others see of a transaction and when, and files
+// that vanish beneath it.
+
 #include "host/linux/state/store.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,6 @@
+// Lines of the log: no message forges one or follows a link, the device comes first, and the
+// daemon is found when it runs.
+
 #include "host/linux/services/system_log.h"
 
 #include <fcntl.h>

@@ -1,3 +1,6 @@
+// Archives that lead out of the root, that are damaged, or that bring what is not theirs; and what
+// a good one leaves on the disk.
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>

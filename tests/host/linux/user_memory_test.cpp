@@ -1,3 +1,6 @@
+// Memory of the caller: what lies at a page's end is read and written, and a bad address is told,
+// not fallen over.
+
 #include "host/linux/kernel/user_memory.h"
 
 #include <gtest/gtest.h>

@@ -1,3 +1,5 @@
+// Worlds in domains: gone with their process, and never taken for a later one of the same number.
+
 #include "host/linux/state/world_table.h"
 
 #include <gtest/gtest.h>
