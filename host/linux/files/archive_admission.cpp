@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <climits>
+#include <cstdint>
 #include <cstring>
 
 #include "braxo/misc/strcat.h"
@@ -63,6 +64,15 @@ bool OnlyOwnerMayWrite(archive_entry* entry) {
   return !othersMayWrite && (geteuid() != 0 || archive_entry_uid(entry) == 0);
 }
 
+// The system would cut the number to 32 bits, so that 2^32 is the superuser.
+void CheckOwner(const std::string& name, archive_entry* entry) {
+  constexpr std::int64_t kNobody = static_cast<uid_t>(-1);
+  for (const std::int64_t number : {archive_entry_uid(entry), archive_entry_gid(entry)}) {
+    if (number >= 0 && number < kNobody) continue;
+    Refuse(name, StrCat("No user and no group can have the number ", number));
+  }
+}
+
 }  // namespace
 
 ArchiveAdmission::ArchiveAdmission(const TardiskRules& given) : rules(given) {
@@ -90,6 +100,7 @@ bool ArchiveAdmission::Admits(archive_entry* entry) {
   CheckName(name);
   CheckSystemPlace(name, entry);
   CheckType(name, entry);
+  CheckOwner(name, entry);
   const std::string path = PlainPath(name);
   CheckWay(name, path);
   const Kind kind = KindAt(path);

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
+#include <unistd.h>
 
 #include <climits>
 #include <cstdlib>
@@ -317,6 +318,33 @@ TEST_F(UnpackTardisks, RefusesBlockDevice) {
             "Unable to unpack tardisk disk.tgz: drive: Devices and sockets are made by the "
             "running system");
   EXPECT_FALSE(Exists("drive"));
+}
+
+// Cut to the 32 bits of the system, the first of them would be the superuser.
+TEST_F(UnpackTardisks, RefusesOwnersThatNoSystemHas) {
+  for (const char* whose : {"uid", "gid"}) {
+    for (const char* number : {"4294967296", "4294967295", "-1"}) {
+      TarImage image;
+      image.Extended(whose, number).File("program", "code", 04755);
+      EXPECT_EQ(
+          Unpack(image),
+          "Unable to unpack tardisk disk.tgz: program: No user and no group can have the number " +
+              std::string(number))
+          << whose;
+      EXPECT_FALSE(Exists("program"));
+    }
+  }
+}
+
+TEST_F(UnpackTardisks, GivesFilesToTheLastOwnerThereIs) {
+  TarImage image;
+  image.Extended("uid", "4294967294").Extended("gid", "4294967294").File("program", "code");
+  EXPECT_EQ(Unpack(image), "unpacked");
+  struct stat status {};
+  ASSERT_EQ(stat(In("program").c_str(), &status), 0);
+  const bool keepsOwners = geteuid() == 0;
+  EXPECT_EQ(status.st_uid, keepsOwners ? 4294967294U : geteuid());
+  EXPECT_EQ(status.st_gid, keepsOwners ? 4294967294U : getegid());
 }
 
 TEST_F(UnpackTardisks, RefusesTooLongComponent) {
