@@ -69,6 +69,22 @@ as_nobody() {
   shows "/tardisks/monitor.tgz (monitorImage)"
 }
 
+@test "a relative SECPOLICY_HOST_STATE is refused by every verb, and makes nothing" {
+  boot
+  cd "$BATS_TEST_TMPDIR"
+  export SECPOLICY_HOST_STATE=run/secpolicy/host.db
+  local verb
+  for verb in boot load load-early restore "load --plan" "load --all-or-nothing" check "diff installed /etc/zorvan/secpolicy" \
+    display status graph "why sshDom read /etc" "who-can read /etc" "save good" "label get /etc"; do
+    # shellcheck disable=SC2086
+    secpolicy $verb
+    exits $((status == 2 ? 2 : 1))
+    [[ $stderr$'\n' == *': The host state needs the absolute path of a file, not "run/secpolicy/host.db"'$'\n'* ]] ||
+      ends_with "$verb refuses it"
+  done
+  [[ ! -e $BATS_TEST_TMPDIR/run ]]
+}
+
 @test "a service uses the runtime interface" {
   local state=$BATS_TEST_TMPDIR/state/host.db
   SECPOLICY_HOST_STATE=$state run --separate-stderr "$RUNTIME_EXAMPLE"

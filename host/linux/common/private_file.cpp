@@ -101,15 +101,18 @@ bool IsMissing(const Descriptor& directory, const std::string& path) {
 }
 
 std::string DirectoryOf(const std::string& path, const std::string& purpose) {
+  RequireFilePath(path, purpose);
   const auto slash = path.rfind('/');
-  if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
-    throw HostError(
-        EINVAL, StrCat("The ", purpose, " needs the absolute path of a file, not \"", path, "\""));
-  }
   return slash == 0 ? "/" : path.substr(0, slash);
 }
 
 }  // namespace
+
+void RequireFilePath(const std::string& path, const std::string& purpose) {
+  if (path.starts_with('/') && !path.ends_with('/')) return;
+  throw HostError(
+      EINVAL, StrCat("The ", purpose, " needs the absolute path of a file, not \"", path, "\""));
+}
 
 struct stat PreparePrivateFile(const std::string& path, const std::string& purpose) {
   const Use use{.purpose = purpose, .alternative = kElsewhere};

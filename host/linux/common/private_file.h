@@ -16,4 +16,7 @@ struct stat PreparePrivateFile(const std::string& path, const std::string& purpo
 // The same for a file that is only read: makes nothing, and throws also when there is no such file.
 struct stat RequirePrivateFile(const std::string& path, const std::string& purpose);
 
+// Throws HostError unless `path` is absolute and does not end in a slash.
+void RequireFilePath(const std::string& path, const std::string& purpose);
+
 }  // namespace LinuxHost

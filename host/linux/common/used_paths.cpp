@@ -3,6 +3,8 @@
 #include <cstdlib>
 #include <utility>
 
+#include "host/linux/common/private_file.h"
+
 namespace LinuxHost {
 namespace {
 
@@ -23,7 +25,14 @@ std::string PathIn(const char* variable, const char* otherwise) {
 
 }  // namespace
 
-std::string StatePath() { return usedState ? *usedState : PathIn(kStateVariable, kState); }
+// A relative path would be looked up in a directory that nobody has chosen, and show no state
+// there.
+std::string StatePath() {
+  if (usedState) return *usedState;
+  const std::string path = PathIn(kStateVariable, kState);
+  RequireFilePath(path, "host state");
+  return path;
+}
 
 std::string SettingsPath() {
   return usedSettings ? *usedSettings : PathIn(kSettingsVariable, kSettings);

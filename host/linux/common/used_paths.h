@@ -6,8 +6,8 @@
 // Where this process finds the files of the host.
 namespace LinuxHost {
 
-// The host's state: /run/secpolicy/host.db, unless SECPOLICY_HOST_STATE names another absolute
-// path.
+// The host's state: /run/secpolicy/host.db, unless SECPOLICY_HOST_STATE names another file. Throws
+// HostError when it names none by an absolute path.
 std::string StatePath();
 
 // The wanted settings: /var/lib/secpolicy/config.db, unless SECPOLICY_HOST_CONFIG names another
