@@ -268,6 +268,8 @@ files to get their first label: "[0-9]* ]]
   fits_schema boot-plan
   local planned
   planned=$(jq .firstLabels <<<"$output")
+  secpolicy boot --plan
+  shows "files to get their first label: $planned"
   boot
   local labelled
   labelled=$(find "$root" -path "$root/run" -prune -o -print0 |

@@ -173,6 +173,19 @@ fileLabels/zz:3 [unknown-word]" ]]
   finds "$shown/fileLabels: error: Unable to open policy directory $shown/fileLabels [unreadable]"
 }
 
+@test "unreadable, of a file in place of a directory, and of a directory that may not be opened" {
+  rm -r "$policy/fileLabels"
+  touch "$policy/fileLabels"
+  finds "$shown/fileLabels: error: Unable to open policy directory $shown/fileLabels [unreadable]"
+  chmod 000 "$policy/objects"
+  # With all its rights the superuser may open any directory.
+  local bound=()
+  [[ $EUID -ne 0 ]] || bound=(setpriv "--bounding-set=-dac_override,-dac_read_search" --inh-caps=-all)
+  run --separate-stderr "${bound[@]}" "$SECPOLICY" --root "$root" check
+  exits 1
+  shows "$shown/objects: error: Unable to open policy directory $shown/objects [unreadable]"
+}
+
 @test "carriage-return" {
   add domains/appDom $'-s bind grant\r'
   finds "$shown/domains/appDom:$number:14: warning: this carriage return is part of a word: lines end with a line feed alone [carriage-return]"

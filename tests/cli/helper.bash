@@ -88,6 +88,17 @@ is_done() {
   [[ $stderr != *$'\n'* ]] && ends_done "$1"
 }
 
+# until_true CONDITION: waits for it, ten seconds at most.
+until_true() {
+  local _
+  for _ in {1..100}; do
+    eval "$1" && return
+    sleep 0.1
+  done
+  printf 'never true: %s\n' "$1"
+  return 1
+}
+
 # domain_id NAME: the identifier that display gives the domain.
 domain_id() {
   "$SECPOLICY" --root "$root" display 2>/dev/null |

@@ -122,6 +122,35 @@ END
   /tmp/file: unlabeled -> hostConfig" ]]
 }
 
+@test "a plan that is killed leaves no process behind, and its copies to nobody else" {
+  # The process that tries the load out waits where it tries out a label.
+  cc -shared -fPIC -o "$BATS_TEST_TMPDIR/wait.so" -x c - <<'END'
+#include <fcntl.h>
+#include <stdio.h>
+#include <unistd.h>
+int setxattr(const char* path, const char* name, const void* value, size_t size, int flags) {
+  dprintf(open("/child", O_CREAT | O_WRONLY, 0600), "%d\n", getpid());
+  for (;;) pause();
+}
+int lsetxattr(const char* path, const char* name, const void* value, size_t size, int flags) {
+  return setxattr(path, name, value, size, flags);
+}
+END
+  mkdir "$root/tmp"
+  echo "/etc/services.conf sshKey" >"$policy/fileLabels/zz"
+  env LD_PRELOAD="$BATS_TEST_TMPDIR/wait.so" ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0 TMPDIR=/tmp \
+    "$SECPOLICY" --root "$root" load --plan /new >/dev/null 2>&1 3>&- &
+  local plan=$! child
+  until_true "[[ -s $root/child ]]"
+  child=$(cat "$root/child")
+  [[ $child -ne $plan && -e /proc/$child/exe ]]
+  kill -KILL "$plan"
+  wait "$plan" || true
+  # A process that has ended but is not waited for runs no program.
+  until_true "[[ ! -e /proc/$child/exe ]]"
+  [[ $(stat -c %a "$root"/tmp/secpolicy.*) == 700 ]]
+}
+
 @test "the problems of the load are told as the load tells them" {
   echo "-s no_such_call grant" >>"$policy/domains/appDom"
   echo "/no/such hostConfig" >"$policy/fileLabels/zz"

@@ -1,5 +1,6 @@
 // A load is seen as a whole or not at all, and leaves exactly what its files, the files of the
 // other kind and services have installed.
+
 #include "host/linux/operation/policy_load.h"
 
 #include <gmock/gmock.h>
@@ -28,6 +29,7 @@ using LinuxHost::LoadKind;
 using LinuxHost::PolicyTransaction;
 using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
+using TeskCtl::Security::TESKACCESS_LABEL_DOMAIN;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 using TeskCtl::Security::TeskAccessInterfaceImpl;
 using ::testing::ElementsAre;
@@ -48,6 +50,34 @@ class PolicyLoad : public ::testing::Test {
                            .domainName = {},
                            .syscall = grant ? call : call.substr(1),
                            .grant = grant});
+  }
+
+  // A rule of each table: from line `line` of a file, or from a service when that is 0.
+  void GrantOfEachTable(unsigned int id, unsigned int line, bool grant) {
+    GrantCall(id, grant ? "open" : "!open", line);
+    access.SetCapabilityParamRule({.line = line,
+                                   .domainId = id,
+                                   .domainName = {},
+                                   .paramCheck = "bind_port",
+                                   .firstParam = "80",
+                                   .secondParam = {},
+                                   .grant = grant});
+    std::list<TeskCtl::Security::TeskAccess_FilePathAccessRule> paths = {
+        {.line = line,
+         .domainId = id,
+         .domainName = {},
+         .path = "/etc",
+         .permissions = grant ? "rw" : "r"}};
+    access.SetFilePathAccessRules(paths);
+  }
+
+  // How many rules wait for others to go, in each table.
+  static std::string Covered() {
+    auto rows = HostState::Current().Database().Select(
+        "SELECT (SELECT count(*) FROM covered_rule) || ' ' || "
+        "(SELECT count(*) FROM covered_parameter_rule) || ' ' || "
+        "(SELECT count(*) FROM covered_file_policy)");
+    return rows.Next() ? rows.Text(0) : "";
   }
 
   // As the library does it: all domains first, then their rules.
@@ -203,24 +233,14 @@ TEST_F(PolicyLoad, RemovesRulesOfEveryTable) {
     transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
     Install({{"d", {}}});
     const unsigned int id = IdOf("d");
-    if (withRules) {
-      access.SetCapabilityParamRule({.line = 1,
-                                     .domainId = id,
-                                     .domainName = {},
-                                     .paramCheck = "bind_port",
-                                     .firstParam = "80",
-                                     .secondParam = {},
-                                     .grant = true});
-      std::list<TeskCtl::Security::TeskAccess_FilePathAccessRule> paths = {
-          {.line = 2, .domainId = id, .domainName = {}, .path = "/etc", .permissions = "r"}};
-      access.SetFilePathAccessRules(paths);
-    }
+    if (withRules) GrantOfEachTable(id, 1, true);
     const LoadEnding ending = transaction.EndLoad(true);
     transaction.Commit();
     return ending;
   };
   load(true);
-  EXPECT_EQ(load(false).removed.rules, 2U);
+  EXPECT_EQ(load(false).removed.rules, 3U);
+  EXPECT_THAT(CallsOf("d"), IsEmpty());
   std::list<TeskCtl::Security::TeskAccess_CapabilityParamRule> checks;
   access.GetCapabilityParamRules(IdOf("d"), checks);
   EXPECT_THAT(checks, IsEmpty());
@@ -256,6 +276,21 @@ TEST_F(PolicyLoad, PutsBackWhatAServiceHadMadeAndAFileHadCovered) {
   Load({{"d", {"open"}}});
   EXPECT_TRUE(Load({{"d", {}}}).removed.IsEmpty());
   EXPECT_THAT(CallsOf("d"), ElementsAre("!open"));
+}
+
+// The next domain in the slot would get them back.
+TEST_F(PolicyLoad, ADestroyedDomainTakesWhatWasCoveredAlong) {
+  Load({{"d", {}}});
+  const unsigned int id = IdOf("d");
+  GrantOfEachTable(id, 0, false);
+  PolicyTransaction transaction;
+  transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
+  GrantOfEachTable(id, 1, true);
+  transaction.EndLoad(true);
+  transaction.Commit();
+  ASSERT_EQ(Covered(), "1 1 1");
+  access.RemoveLabels({"d"}, TESKACCESS_LABEL_DOMAIN);
+  EXPECT_EQ(Covered(), "0 0 0");
 }
 
 TEST_F(PolicyLoad, LeavesTheEarlyPolicyAlone) {
