@@ -32,6 +32,7 @@
 #include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
+#include "support/temporary_directory.h"
 
 namespace SecPolicyFuzz {
 namespace {
@@ -106,9 +107,6 @@ class World {
   World()
       : outerRoot(open("/", O_PATH | O_DIRECTORY | O_CLOEXEC)),
         outerDirectory(open(".", O_PATH | O_DIRECTORY | O_CLOEXEC)) {
-    std::string name = fs::temp_directory_path() / "secpolicy-fuzz-XXXXXX";
-    Require(mkdtemp(name.data()) != nullptr, "a temporary directory can be made");
-    path = name;
     for (const char* directory : {"etc", "beside", "state", "inside"}) {
       fs::create_directory(path / directory);
     }
@@ -123,7 +121,6 @@ class World {
   World(const World&) = delete;
   World& operator=(const World&) = delete;
   ~World() {
-    fs::remove_all(path);
     close(outerDirectory);
     close(outerRoot);
   }
@@ -217,7 +214,8 @@ class World {
 
   int outerRoot;
   int outerDirectory;
-  fs::path path;
+  const SecPolicyTest::TemporaryDirectory scratch;
+  const fs::path path = scratch.Path();
   std::string before;
 };
 

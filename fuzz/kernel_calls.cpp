@@ -16,7 +16,6 @@
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <list>
 #include <sstream>
 #include <string>
@@ -28,6 +27,7 @@
 #include "support/message_of.h"
 #include "support/reference_reader.h"
 #include "support/require.h"
+#include "support/temporary_directory.h"
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"
 
@@ -110,18 +110,12 @@ class StateWitness {
 class StateDirectory {
  public:
   StateDirectory() {
-    std::string name = std::filesystem::temp_directory_path() / "secpolicy-fuzz-XXXXXX";
-    Require(mkdtemp(name.data()) != nullptr, "a temporary directory can be made");
-    path = name;
-    setenv("SECPOLICY_HOST_STATE", (path / "host.db").c_str(), 1);
+    setenv("SECPOLICY_HOST_STATE", (directory / "host.db").c_str(), 1);
     LinuxHost::HostState::Current();
   }
-  StateDirectory(const StateDirectory&) = delete;
-  StateDirectory& operator=(const StateDirectory&) = delete;
-  ~StateDirectory() { std::filesystem::remove_all(path); }
 
  private:
-  std::filesystem::path path;
+  SecPolicyTest::TemporaryDirectory directory;
 };
 
 // Words that are no number are 0.
