@@ -166,6 +166,7 @@ END
   break_labels fail settings
   load_broken
   exits 1
+  ends_with "secpolicy: load: failed (1 error above); nothing was installed"
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 
@@ -222,6 +223,7 @@ PYTHON
   break_labels fail settings
   load_broken
   exits 1
+  says "Error: Unable to label /var/lib/vms/demo/settings: Input/output error"
   (cd "$root" && find . ! -name kernel.log | sort) | diff "$BATS_TEST_TMPDIR/before" -
   local labelled="^$root/(usr|var)/.*zorvan"
   grep -cE "$labelled" "$BATS_TEST_TMPDIR/labels"

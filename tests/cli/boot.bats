@@ -144,8 +144,10 @@ add_tardisk() {
   secpolicy boot
   exits 1
   ends_with "secpolicy: boot: Unable to unpack tardisk addon.tgz: ./etc/zorvan/secpolicy/domains/: It belongs to the policy, which a tardisk brings only when it is named by --policy-from"
+  local refusal=$stderr
   secpolicy boot --policy-from base.tgz
   exits 1
+  [[ $stderr == "$refusal" ]]
   secpolicy boot --policy-from base.tgz --policy-from addon.tgz
   exits 0
   is_done boot

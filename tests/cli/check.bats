@@ -344,6 +344,7 @@ END
   finds "$shown/tardisks/late: error: No backing tardisk for policy file $shown/tardisks/late [no-tardisk]"
   secpolicy load
   exits 1
+  says "Error: No backing tardisk for policy file $shown/tardisks/late"
 }
 
 @test "tardisk-entry, among the policies and among the tardisks" {
@@ -352,6 +353,7 @@ END
   shows "/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
   secpolicy load
   exits 1
+  says "Error: Skipping directory inner"
 }
 
 @test "where tardisk policies come from counts in the policy root only" {
