@@ -64,6 +64,12 @@ concept EndsInGrant = requires(Record record) {
 
 }  // namespace
 
+std::string TextOf(const Verdict& verdict) {
+  const bool* const grant = std::get_if<bool>(&verdict);
+  if (grant == nullptr) return std::get<Permissions>(verdict).Text();
+  return *grant ? "grant" : "revoke";
+}
+
 bool Rule::Grants() const {
   const bool* const grant = std::get_if<bool>(&verdict);
   return grant != nullptr ? *grant : !Permits().IsEmpty();
@@ -85,8 +91,7 @@ std::string Rule::Text() const {
     text += word;
   }
   text += ' ';
-  text += FormOf(kind).endsInGrant ? (Grants() ? "grant" : "revoke") : Permits().Text();
-  return text;
+  return text + TextOf(verdict);
 }
 
 template <class Record>

@@ -3,6 +3,7 @@
 #include <array>
 #include <span>
 #include <string>
+#include <tuple>
 #include <variant>
 
 #include "policy/parameter_range.h"
@@ -21,6 +22,9 @@ struct Origin {
 
 // What a rule decides: whether it grants or, of a rule about a path, what it permits.
 using Verdict = std::variant<bool, Permissions>;
+
+// "grant" or "revoke", or letters of "rwx", which may be none.
+std::string TextOf(const Verdict& verdict);
 
 // One rule of a domain.
 struct Rule {
@@ -47,6 +51,13 @@ struct Rule {
 
   // The rule as a policy line, as it is displayed: "-a sshKey read grant".
   std::string Text() const;
+};
+
+// Orders rules by what they are about: their kind and their words.
+struct BySubject {
+  bool operator()(const Rule& one, const Rule& other) const {
+    return std::tie(one.kind, one.words) < std::tie(other.kind, other.words);
+  }
 };
 
 // The rule of a record, which is one of the contract's eight. Throws BraxoException for letters
