@@ -25,7 +25,7 @@ ExitCode Compare(const Options& options) {
               "file labels and the transitions of tardisks are left out: a directory has the "
               "labels only, and a state the transitions");
   }
-  const PolicyDiff diff = Diff(std::move(before), std::move(after));
+  const Comparison diff = Diff(std::move(before), std::move(after));
   if (options.format == "json") {
     WriteDiffJson(diff, std::cout);
   } else {

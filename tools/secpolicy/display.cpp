@@ -42,13 +42,15 @@ void RequireTardisks() {
 void WriteJson(const std::string& domainId) {
   RequireTardisks();
   SecPolicy::TeskAccessInterfaceImpl access;
-  InstalledPolicy policy = ReadInstalledPolicy(access);
+  Policy::InstalledPolicy policy = ReadInstalledPolicy(access);
   if (!domainId.empty()) {
-    std::erase_if(policy.domains,
-                  [&](const InstalledDomain& domain) { return domain.id != std::stoul(domainId); });
+    std::erase_if(policy.domains, [&](const Policy::InstalledDomain& domain) {
+      return domain.id != std::stoul(domainId);
+    });
   }
   Json json = {{"schema", "secpolicy.display/1"}};
   json.Add(ToJson(policy));
+  json["tardisks"] = ToJson(ReadTardisks(access));
   std::cout << json.Text();
 }
 

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -14,14 +15,17 @@
 namespace SecPolicyCli {
 namespace {
 
-DotGraph Draw(const std::string& name, const InstalledPolicy& policy) {
+DotGraph Draw(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
+  const Policy::InstalledPolicy policy = ReadInstalledPolicy(access);
   if (name.empty()) return DrawDomains(policy);
-  return DrawDomain(FindAskedDomain(name, policy), policy);
+  const auto domain = std::ranges::find(policy.domains, name, &Policy::InstalledDomain::name);
+  if (domain == policy.domains.end()) RefuseDomain(name, access);
+  return DrawDomain(*domain, policy);
 }
 
 ExitCode Graph(const std::string& name, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const std::string dot = Draw(name, ReadInstalledPolicy(access)).Text();
+  const std::string dot = Draw(name, access).Text();
   if (format == "dot") {
     std::cout << dot << std::flush;
     return kWell;

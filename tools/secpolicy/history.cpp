@@ -16,9 +16,9 @@
 namespace SecPolicyCli {
 namespace {
 
-std::string Describe(const InstalledPolicy& policy) {
+std::string Describe(const Policy::InstalledPolicy& policy) {
   std::size_t rules = 0;
-  for (const InstalledDomain& domain : policy.domains) rules += domain.rules.size();
+  for (const Policy::InstalledDomain& domain : policy.domains) rules += domain.rules.size();
   return CountOf(policy.domains.size(), "domain") + ", " + CountOf(rules, "rule");
 }
 

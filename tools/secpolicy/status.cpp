@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <array>
 #include <iomanip>
 #include <iostream>
 #include <map>
@@ -11,7 +10,6 @@
 #include "host/linux/operation/load_record.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
-#include "installed/rule_words.h"
 #include "scratch/scratch_state.h"
 #include "summary.h"
 #include "text/count.h"
@@ -22,30 +20,17 @@
 namespace SecPolicyCli {
 namespace {
 
-struct RuleKind {
-  const char* keyword;
-  const char* name;
-};
-
-constexpr std::array kRuleKinds = {
-    RuleKind{"-a", "object access"},     RuleKind{"-c", "capability"},
-    RuleKind{"-d", "domain transition"}, RuleKind{"-f", "file creation"},
-    RuleKind{"-p", "parameter check"},   RuleKind{"-r", "file path"},
-    RuleKind{"-s", "system call"},       RuleKind{"-u", "unix socket creation"},
-};
-
-constexpr std::array kLevels = {"enforcing", "permissive", "disabled"};
-
 // Of the errors of a load, as many as fit the screen.
 constexpr std::size_t kShownErrors = 10;
 
 constexpr int kTitleWidth = 13;
 
 struct Status {
-  InstalledPolicy policy;
+  Policy::InstalledPolicy policy;
+  std::vector<InstalledTardisk> tardisks;
   std::optional<LinuxHost::LoadRecord> load;
-  std::map<std::string, std::vector<std::string>> domainsByLevel;
-  std::map<std::string, std::size_t> rulesByKeyword;
+  std::map<Policy::Level, std::vector<std::string>> domainsByLevel;
+  std::map<Policy::RuleKind, std::size_t> rulesByKind;
   std::size_t ruleCount = 0;
   std::vector<std::string>
       domainsWithoutFile;  // what loads have installed and no file has any more
@@ -60,14 +45,15 @@ Status ReadStatus() {
   SecPolicy::TeskAccessInterfaceImpl access;
   Status status;
   status.policy = ReadInstalledPolicy(access);
+  status.tardisks = ReadTardisks(access);
   status.load = LinuxHost::LatestLoad();
-  for (const InstalledDomain& domain : status.policy.domains) {
+  for (const Policy::InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);
     status.ruleCount += domain.rules.size();
-    if (domain.hasNoFile) status.domainsWithoutFile.push_back(domain.name);
-    for (const InstalledRule& rule : domain.rules) {
-      if (rule.hasNoLine) ++status.rulesWithoutLine;
-      ++status.rulesByKeyword[SplitRule(rule.text).keyword];
+    if (domain.isGone) status.domainsWithoutFile.push_back(domain.name);
+    for (const Policy::Rule& rule : domain.rules) {
+      if (rule.origin.isGone) ++status.rulesWithoutLine;
+      ++status.rulesByKind[rule.kind];
     }
   }
   return status;
@@ -87,13 +73,13 @@ std::string DescribeLoad(const LinuxHost::LoadRecord& load) {
 std::string DescribeDomains(const Status& status) {
   std::string text = std::to_string(status.policy.domains.size());
   const char* separator = ": ";
-  for (const char* const level : kLevels) {
+  for (const Policy::Level level : Policy::kLevels) {
     const auto found = status.domainsByLevel.find(level);
     if (found == status.domainsByLevel.end()) continue;
     const std::vector<std::string>& names = found->second;
-    text += separator + std::to_string(names.size()) + " " + level;
+    text += separator + std::to_string(names.size()) + " " + TextOf(level);
     separator = ", ";
-    if (level == kLevels.front()) continue;
+    if (level == Policy::Level::kEnforcing) continue;
     for (std::size_t index = 0; index < names.size(); ++index) {
       text += (index == 0 ? " (" : " ") + names[index];
     }
@@ -118,12 +104,12 @@ void WriteText(const Status& status) {
   WriteLine("objects", std::to_string(status.policy.objects.size()));
   WriteLine("rules", std::to_string(status.ruleCount));
   const std::size_t width = std::to_string(status.ruleCount).size();
-  for (const RuleKind& kind : kRuleKinds) {
-    const auto found = status.rulesByKeyword.find(kind.keyword);
-    const std::size_t count = found == status.rulesByKeyword.end() ? 0 : found->second;
+  for (const Policy::RuleForm& form : Policy::kRuleForms) {
+    const auto found = status.rulesByKind.find(form.kind);
+    const std::size_t count = found == status.rulesByKind.end() ? 0 : found->second;
     const std::string number = std::to_string(count);
-    WriteLine(std::string("  ") + kind.keyword,
-              std::string(width - number.size(), ' ') + number + " " + kind.name);
+    WriteLine(std::string("  ") + form.keyword,
+              std::string(width - number.size(), ' ') + number + " " + form.name);
   }
   if (status.rulesWithoutLine > 0) {
     WriteLine("in no file", CountOf(status.rulesWithoutLine, "rule"));
@@ -131,8 +117,8 @@ void WriteText(const Status& status) {
   for (const std::string& domain : status.domainsWithoutFile) {
     WriteLine("in no file", "domain " + domain);
   }
-  WriteLine("tardisks", std::to_string(status.policy.tardisks.size()));
-  for (const InstalledTardisk& tardisk : status.policy.tardisks) {
+  WriteLine("tardisks", std::to_string(status.tardisks.size()));
+  for (const InstalledTardisk& tardisk : status.tardisks) {
     WriteLine("", tardisk.path + " " + (tardisk.label.empty() ? "(no label)" : tardisk.label));
   }
 }
@@ -149,11 +135,11 @@ Json ToJson(const LinuxHost::LoadRecord& load) {
 
 void WriteJson(const Status& status) {
   Json levels = Json::Object();
-  for (const char* const level : kLevels) levels[level] = Json::Array();
-  for (const auto& [level, names] : status.domainsByLevel) levels[level] = names;
+  for (const Policy::Level level : Policy::kLevels) levels[TextOf(level)] = Json::Array();
+  for (const auto& [level, names] : status.domainsByLevel) levels[TextOf(level)] = names;
   Json rules = Json::Object();
-  for (const RuleKind& kind : kRuleKinds) rules[kind.keyword] = 0;
-  for (const auto& [keyword, count] : status.rulesByKeyword) rules[keyword] = count;
+  for (const Policy::RuleForm& form : Policy::kRuleForms) rules[form.keyword] = 0;
+  for (const auto& [kind, count] : status.rulesByKind) rules[FormOf(kind).keyword] = count;
   Json load;
   if (status.load) load = ToJson(*status.load);
   const Json screen = {
@@ -166,7 +152,7 @@ void WriteJson(const Status& status) {
       {"rules", status.ruleCount},
       {"rulesByKeyword", rules},
       {"inNoFile", {{"domains", status.domainsWithoutFile}, {"rules", status.rulesWithoutLine}}},
-      {"tardisks", ToJson(status.policy.tardisks)}};
+      {"tardisks", ToJson(status.tardisks)}};
   std::cout << screen.Text();
 }
 

@@ -8,7 +8,6 @@
 #include "installed/installed_policy.h"
 #include "query/answer.h"
 #include "query/ask.h"
-#include "query/decision.h"
 #include "query/question.h"
 #include "summary.h"
 #include "text/count.h"
@@ -19,14 +18,14 @@ namespace {
 
 // A domain that may.
 struct Found {
-  const InstalledDomain& domain;
-  Decision decision;
+  const Policy::InstalledDomain& domain;
+  Policy::Decision decision;
 };
 
-std::vector<Found> FindDomains(const Question& question, const InstalledPolicy& policy) {
+std::vector<Found> FindDomains(const Question& question, const Policy::InstalledPolicy& policy) {
   std::vector<Found> found;
-  for (const InstalledDomain& domain : policy.domains) {
-    Decision decision = Decide(question, domain, policy);
+  for (const Policy::InstalledDomain& domain : policy.domains) {
+    Policy::Decision decision = Policy::Decide(question.asked, domain);
     if (decision.IsAllowed()) found.push_back(Found{domain, std::move(decision)});
   }
   return found;
@@ -47,8 +46,8 @@ void WriteJson(const Question& question, const std::vector<Found>& found) {
 
 ExitCode Answer(const std::vector<std::string>& words, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const InstalledPolicy policy = ReadInstalledPolicy(access);
-  const Question question = ReadQuestion(words, policy, access);
+  const Policy::InstalledPolicy policy = ReadInstalledPolicy(access);
+  const Question question = ReadQuestion(words, access);
   const std::vector<Found> found = FindDomains(question, policy);
   if (format == "json") {
     WriteJson(question, found);

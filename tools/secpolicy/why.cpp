@@ -8,7 +8,6 @@
 #include "installed/installed_policy.h"
 #include "query/answer.h"
 #include "query/ask.h"
-#include "query/decision.h"
 #include "query/question.h"
 #include "verb.h"
 
@@ -18,16 +17,16 @@ namespace {
 ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
                 const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const InstalledPolicy policy = ReadInstalledPolicy(access);
-  const InstalledDomain& domain = FindAskedDomain(name, policy);
-  const Question question = ReadQuestion(words, policy, access);
-  const Decision decision = Decide(question, domain, policy);
+  const auto domain = ReadInstalledDomain(name, access);
+  if (!domain) RefuseDomain(name, access);
+  const Question question = ReadQuestion(words, access);
+  const Policy::Decision decision = Policy::Decide(question.asked, *domain);
   if (format == "json") {
     Json json = {{"schema", "secpolicy.why/1"}, {"question", QuestionToJson(question)}};
-    json.Add(AnswerToJson(domain, decision));
+    json.Add(AnswerToJson(*domain, decision));
     std::cout << json.Text();
   } else {
-    WriteAnswer(question, domain, decision, std::cout);
+    WriteAnswer(question, *domain, decision, std::cout);
   }
   return decision.IsAllowed() ? kWell : kFailed;
 }

@@ -30,10 +30,8 @@ void KeepLater(Store& store, const std::string& path, bool isTree, LatestLabel& 
 std::vector<RuleSource> ReadSources(Rows rows) {
   std::vector<RuleSource> sources;
   while (rows.Next()) {
-    RuleSource source{.kind = std::nullopt,
-                      .directory = rows.Text(1),
-                      .line = static_cast<unsigned int>(rows.Integer(2)),
-                      .isCurrent = rows.Integer(3) != 0};
+    RuleSource source{
+        .kind = std::nullopt, .directory = rows.Text(1), .isCurrent = rows.Integer(2) != 0};
     if (rows.Integer(0) != 0) source.kind = static_cast<LoadKind>(rows.Integer(0));
     sources.push_back(std::move(source));
   }
@@ -72,21 +70,21 @@ std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind) 
   Store& store = HostState::Current().Database();
   if (kind == Policy::RuleKind::kParameterCheck) {
     return ReadSources(store.Select(
-        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "SELECT p.kind, p.directory, p.kind IS NULL OR p.number = "
         "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM parameter_rule AS r "
         "LEFT JOIN policy_load AS p ON p.number = r.load WHERE r.domain_id = ?1 ORDER BY r.id",
         id));
   }
   if (kind == Policy::RuleKind::kFilePath) {
     return ReadSources(store.Select(
-        "SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+        "SELECT p.kind, p.directory, p.kind IS NULL OR p.number = "
         "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM file_policy AS r "
         "LEFT JOIN policy_load AS p ON p.number = r.load "
         "WHERE r.domain_id = ?1 AND r.world = 0 ORDER BY r.id",
         id));
   }
   return ReadSources(
-      store.Select("SELECT p.kind, p.directory, r.line, p.kind IS NULL OR p.number = "
+      store.Select("SELECT p.kind, p.directory, p.kind IS NULL OR p.number = "
                    "(SELECT max(number) FROM policy_load WHERE kind = p.kind) FROM rule AS r "
                    "LEFT JOIN policy_load AS p ON p.number = r.load "
                    "WHERE r.domain_id = ?1 AND r.kind = +?2 ORDER BY r.id",
@@ -108,7 +106,7 @@ void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigi
   Transaction transaction(store);
   for (const RuleOrigin& origin : rules) {
     store.Run("INSERT OR REPLACE INTO rule_origin VALUES (?1, ?2, ?3, ?4)", origin.domain,
-              origin.rule, origin.file, origin.line);
+              origin.rule.Text(), origin.rule.origin.file, origin.rule.origin.line);
   }
   for (const LabelOrigin& origin : labels) {
     store.Run(
@@ -119,17 +117,22 @@ void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigi
   transaction.Commit();
 }
 
-std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain) {
-  std::vector<RuleOrigin> origins;
+void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules) {
+  // A rule's text stands for its kind, words and verdict.
+  std::unordered_map<std::string, Policy::Origin> recorded;
   Rows rows = HostState::Current().Database().Select(
       "SELECT rule, file, line FROM rule_origin WHERE domain = ?1", domain);
   while (rows.Next()) {
-    origins.push_back({.domain = domain,
-                       .rule = rows.Text(0),
-                       .file = rows.Text(1),
-                       .line = static_cast<unsigned int>(rows.Integer(2))});
+    recorded[rows.Text(0)] = {.file = rows.Text(1),
+                              .line = static_cast<unsigned int>(rows.Integer(2))};
   }
-  return origins;
+  if (recorded.empty()) return;
+  for (Policy::Rule& rule : rules) {
+    const auto found = recorded.find(rule.Text());
+    if (found == recorded.end()) continue;
+    rule.origin.file = found->second.file;
+    rule.origin.line = found->second.line;
+  }
 }
 
 std::optional<LabelOrigin> FindLabelOrigin(const std::string& path) {

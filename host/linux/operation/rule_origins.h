@@ -6,27 +6,24 @@
 #include <vector>
 
 #include "host/linux/operation/policy_load.h"
-#include "policy/rule_kind.h"
+#include "policy/rule.h"
 
 // Where the policy was written: the kernel is told rules and labels, not the files that they come
 // from, so who loads files records it beside them. An origin says nothing about what is installed
 // now. Everything throws Braxo::Lib::BraxoException when the state cannot be used.
 namespace LinuxHost {
 
-// The load that installed a rule, and the line of the file of its domain.
+// The load that installed a rule.
 struct RuleSource {
   std::optional<LoadKind> kind;  // none: no load, but a service
   std::string directory;         // of the policy
-  unsigned int line = 0;         // 0: no line says so, it is the policy's default
   bool isCurrent = true;         // false: the latest load of the kind has not found it again
 };
 
-// A rule that is not written in a file of its domain.
+// A rule, with its origin, that is not written in the file of its domain.
 struct RuleOrigin {
   std::string domain;
-  std::string rule;  // as it is displayed: "-a sshKey read grant"
-  std::string file;
-  unsigned int line = 0;
+  Policy::Rule rule;
 };
 
 struct LabelOrigin {
@@ -41,8 +38,8 @@ struct LabelOrigin {
 // takes the place of an earlier one.
 void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels);
 
-// The recorded origins of rules of a domain, in no particular order.
-std::vector<RuleOrigin> FindRuleOrigins(const std::string& domain);
+// Gives those of the domain's rules their file and line that have recorded ones.
+void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules);
 
 // A line about a path in the file of a domain. The kernel is told paths without their lines.
 struct PathLine {

@@ -2,7 +2,6 @@
 
 #include "host/linux/operation/rule_origins.h"
 
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "host/linux/state/host_state.h"
@@ -17,16 +16,26 @@ using LinuxHost::HostState;
 using LinuxHost::LabelOrigin;
 using LinuxHost::RecordOrigins;
 using LinuxHost::RuleOrigin;
-using ::testing::IsEmpty;
-using ::testing::UnorderedElementsAre;
+using Policy::Rule;
 
-// "RULE from FILE:LINE" of each rule of the domain.
-std::vector<std::string> OriginsOf(const std::string& domain) {
-  std::vector<std::string> texts;
-  for (const RuleOrigin& origin : FindRuleOrigins(domain)) {
-    texts.push_back(origin.rule + " from " + origin.file + ":" + std::to_string(origin.line));
-  }
-  return texts;
+Rule Call(const std::string& call) {
+  return {.kind = Policy::RuleKind::kSyscall, .words = {call}, .verdict = true};
+}
+
+RuleOrigin OriginOf(const std::string& domain, const std::string& call, const std::string& file,
+                    unsigned int line) {
+  Rule rule = Call(call);
+  rule.origin = {.file = file, .line = line};
+  return {.domain = domain, .rule = rule};
+}
+
+// "FILE:LINE" of the rule of the domain for the system call; ":0" when none is recorded.
+std::string PlaceOf(const std::string& domain, const std::string& call) {
+  std::vector<Rule> rules = {Call("getpid"), Call(call)};
+  FindRuleOrigins(domain, rules);
+  EXPECT_EQ(rules.front().origin.file, "");
+  const Policy::Origin& origin = rules.back().origin;
+  return origin.file + ":" + std::to_string(origin.line);
 }
 
 // The line that labels `path`; 0 when there is none.
@@ -44,19 +53,41 @@ class RuleOriginsTest : public ::testing::Test {
 };
 
 TEST_F(RuleOriginsTest, AreThoseOfOneDomain) {
-  RecordRules({{"sshDom", "-s bind grant", "/p/sshDom", 4},
-               {"appDom", "-s bind grant", "/p/appDom", 9},
-               {"sshDom", "-s listen grant", "/p/sshDom", 5}});
-  EXPECT_THAT(OriginsOf("sshDom"), UnorderedElementsAre("-s bind grant from /p/sshDom:4",
-                                                        "-s listen grant from /p/sshDom:5"));
-  EXPECT_THAT(OriginsOf("otherDom"), IsEmpty());
+  RecordRules({OriginOf("sshDom", "bind", "/p/sshDom", 4),
+               OriginOf("appDom", "bind", "/p/appDom", 9),
+               OriginOf("sshDom", "listen", "/p/sshDom", 5)});
+  EXPECT_EQ(PlaceOf("sshDom", "bind"), "/p/sshDom:4");
+  EXPECT_EQ(PlaceOf("sshDom", "listen"), "/p/sshDom:5");
+  EXPECT_EQ(PlaceOf("appDom", "bind"), "/p/appDom:9");
+  EXPECT_EQ(PlaceOf("appDom", "listen"), ":0");
+  EXPECT_EQ(PlaceOf("otherDom", "bind"), ":0");
+}
+
+TEST_F(RuleOriginsTest, AreOfExactlyTheRule) {
+  RecordRules({OriginOf("sshDom", "bind", "/p/sshDom", 4)});
+  Rule revoked = Call("bind");
+  revoked.verdict = false;
+  Rule capability = Call("bind");
+  capability.kind = Policy::RuleKind::kCapability;
+  std::vector<Rule> others = {revoked, capability};
+  FindRuleOrigins("sshDom", others);
+  for (const Rule& rule : others) EXPECT_EQ(rule.origin.file, "") << rule.Text();
+}
+
+TEST_F(RuleOriginsTest, KeepWhatElseIsKnownOfTheRule) {
+  RecordRules({OriginOf("sshDom", "bind", "/p/sshDom", 4)});
+  std::vector<Rule> rules = {Call("bind")};
+  rules.front().origin.isGone = true;
+  FindRuleOrigins("sshDom", rules);
+  EXPECT_EQ(rules.front().origin.line, 4U);
+  EXPECT_TRUE(rules.front().origin.isGone);
 }
 
 TEST_F(RuleOriginsTest, ALaterOriginOfARuleReplacesTheEarlierOne) {
-  RecordRules({{"sshDom", "-s bind grant", "/p/sshDom", 4}});
+  RecordRules({OriginOf("sshDom", "bind", "/p/sshDom", 4)});
   RecordRules(
-      {{"sshDom", "-s bind grant", "/p/sshDom", 6}, {"sshDom", "-s bind grant", "/p/sshDom", 8}});
-  EXPECT_THAT(OriginsOf("sshDom"), UnorderedElementsAre("-s bind grant from /p/sshDom:8"));
+      {OriginOf("sshDom", "bind", "/p/sshDom", 6), OriginOf("sshDom", "bind", "/p/sshDom", 8)});
+  EXPECT_EQ(PlaceOf("sshDom", "bind"), "/p/sshDom:8");
 }
 
 TEST_F(RuleOriginsTest, TheLatestOfThePathAndTheTreesAroundItLabels) {
@@ -98,10 +129,10 @@ TEST_F(RuleOriginsTest, TellsLabelAndFile) {
 }
 
 TEST_F(RuleOriginsTest, GoWithABoot) {
-  RecordOrigins(std::vector<RuleOrigin>{{"sshDom", "-s bind grant", "/p/sshDom", 4}},
+  RecordOrigins(std::vector<RuleOrigin>{OriginOf("sshDom", "bind", "/p/sshDom", 4)},
                 std::vector<LabelOrigin>{{"/etc", true, "hostConfig", "/l", 1}});
   HostState::Current().Reset();
-  EXPECT_THAT(OriginsOf("sshDom"), IsEmpty());
+  EXPECT_EQ(PlaceOf("sshDom", "bind"), ":0");
   EXPECT_EQ(LineFor("/etc"), 0U);
 }
 

@@ -38,6 +38,13 @@ using SecPolicyTest::MessageOf;
 
 constexpr auto kNoDefaults = TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
 
+Policy::Rule CallFrom(const std::string& file) {
+  return {.kind = RuleKind::kSyscall,
+          .words = {"read"},
+          .verdict = true,
+          .origin = {.file = file, .line = 1}};
+}
+
 class SavedPolicy : public ::testing::Test {
  protected:
   unsigned int Create(const std::string& name) {
@@ -170,17 +177,19 @@ TEST_F(SavedPolicy, GivesLabelsTheirNumbersBackWhenTold) {
 }
 
 TEST_F(SavedPolicy, PutsOriginsOfRulesBackAndThoseOfLabelsWhenTold) {
-  const LinuxHost::RuleOrigin rule{"hostDom", "-s read grant", "/old", 1};
+  const LinuxHost::RuleOrigin rule{"hostDom", CallFrom("/old")};
   const LinuxHost::LabelOrigin label{"/etc", false, "unlabeled", "/old", 1};
   LinuxHost::RecordOrigins({&rule, 1}, {&label, 1});
   const std::string copy = Copy();
   const std::string second = Copy("second.db");
-  const LinuxHost::RuleOrigin newRule{"hostDom", "-s read grant", "/new", 2};
+  const LinuxHost::RuleOrigin newRule{"hostDom", CallFrom("/new")};
   const LinuxHost::LabelOrigin newLabel{"/etc", false, "unlabeled", "/new", 2};
   LinuxHost::RecordOrigins({&newRule, 1}, {&newLabel, 1});
 
   RestorePolicy(copy, LabelNumbers::kNew);
-  EXPECT_EQ(LinuxHost::FindRuleOrigins("hostDom").at(0).file, "/old");
+  Policy::Rule found = CallFrom("");
+  LinuxHost::FindRuleOrigins("hostDom", {&found, 1});
+  EXPECT_EQ(found.origin.file, "/old");
   EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/new");
   RestorePolicy(second, LabelNumbers::kAsSaved);
   EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/old");

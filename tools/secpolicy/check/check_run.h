@@ -8,15 +8,13 @@
 #include <vector>
 
 #include "diagnostic.h"
+#include "policy/rule_kind.h"
 #include "scratch/scratch_state.h"
 #include "secpolicy/secpolicy.h"
 #include "source_file.h"
 #include "text/suggestion.h"
 
 namespace SecPolicyCli {
-
-// What a word of a rule stands for; see rule_form.h.
-enum class WordKind;
 
 // A line of a policy file.
 struct Place {
@@ -40,7 +38,7 @@ struct CheckRun {
   SecPolicy::TeskAccessInterfaceImpl access;
   DiagnosticList diagnostics;
   std::deque<SourceFile> files;
-  std::map<WordKind, Vocabulary> vocabularies;  // for hints; those that were asked
+  std::map<Policy::WordKind, Vocabulary> vocabularies;  // for hints; those that were asked
 
   // What the files say of each other.
   std::map<std::string, Place> objects;                      // where each is declared

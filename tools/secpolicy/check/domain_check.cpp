@@ -21,8 +21,8 @@ using SecPolicy::CapabilityParamRules;
 using SecPolicy::DomainPolicy;
 using Words = SourceFile::Words;
 
-constexpr char kParameterRule[] = "-p";
-constexpr char kPathRule[] = "-r";
+const char* const kParameterRule = FormOf(Policy::RuleKind::kParameterCheck).keyword;
+const char* const kPathRule = FormOf(Policy::RuleKind::kFilePath).keyword;
 
 std::string WithoutPrefix(const std::string& message, const std::string& prefix) {
   return message.starts_with(prefix) ? message.substr(prefix.size()) : message;
@@ -78,13 +78,13 @@ class DomainCheck {
 
   // Also what a bad line names counts as used: its own problem is enough.
   void NoteUse(const Words& words) {
-    const RuleForm* const form = FindRuleForm(words.front());
-    if (form == nullptr) return;
+    const auto form = FindLineForm(words.front());
+    if (!form) return;
     const std::size_t count = std::min(form->words.size(), words.size() - 1);
     for (std::size_t i = 0; i < count; ++i) {
       const std::string& word = words[i + 1];
-      if (form->words[i] == WordKind::kLabel) run.usedLabels.insert(word);
-      if (form->words[i] == WordKind::kDomain && words.back() != "revoke") {
+      if (form->words[i] == Policy::WordKind::kLabel) run.usedLabels.insert(word);
+      if (form->words[i] == Policy::WordKind::kDomain && words.back() != "revoke") {
         run.transitions[policy.name].insert(word);
       }
     }
@@ -223,7 +223,7 @@ std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>
     run.domains[name] = named.file;
     domains.push_back({named.file, name, id});
   }
-  run.vocabularies.erase(WordKind::kDomain);
+  run.vocabularies.erase(Policy::WordKind::kDomain);
   return domains;
 }
 

@@ -1,57 +1,27 @@
 #include "rule_form.h"
 
 #include <algorithm>
+#include <array>
 
 namespace SecPolicyCli {
 namespace {
 
-using enum WordKind;
-using TeskCtl::Security::TeskAccess_KeywordType;
+using Policy::WordKind;
+using enum Policy::WordKind;
 
-const std::vector<RuleForm>& RuleForms() {
-  static const std::vector<RuleForm> forms = {
-      {"-a", "-a LABEL ACCESS grant", {kLabel, kObjectAccess}},
-      {"-c", "-c CAPABILITY grant", {kCapability}},
-      {"-d", "-d LABEL DOMAIN KIND grant", {kLabel, kDomain, kTransition}},
-      {"-f", "-f LABEL NEWLABEL KIND grant", {kLabel, kLabel, kFileKind}},
-      {"-p", "-p CHECK FIRST [SECOND] grant", {kParameterCheck, kFree, kFree}},
-      {"-r", "-r PATH [PERMISSIONS]", {kFree, kFree}},
-      {"-s", "-s SYSCALL grant", {kSystemCall}},
-      {"-u", "-u LABEL KIND grant", {kLabel, kSocketKind}},
-      {"-E", "-E LABEL DOMAIN", {kLabel, kDomain}},
-  };
-  return forms;
-}
-
-TeskAccess_KeywordType TableOf(WordKind kind) {
-  switch (kind) {
-    case kObjectAccess:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS;
-    case kCapability:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY;
-    case kTransition:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS;
-    case kFileKind:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION;
-    case kParameterCheck:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK;
-    case kSystemCall:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL;
-    case kSocketKind:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION;
-    default:
-      return TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
-  }
-}
+// Of the policy of tardisks, which no domain has.
+constexpr char kExceptionKeyword[] = "-E";
+constexpr std::array kExceptionWords = {kLabel, kDomain};
+constexpr LineForm kException = {.usage = "-E LABEL DOMAIN", .words = kExceptionWords};
 
 std::vector<std::string> WordsOf(CheckRun& run, WordKind kind) {
   std::vector<std::string> words;
-  if (kind == kFree) return words;
   if (kind == kDomain) {
     for (const auto& [name, file] : run.domains) words.push_back(name);
-    return words;
   }
-  for (const auto& [word, id] : run.access.GetKeywordsMap(TableOf(kind))) words.push_back(word);
+  const auto& table = Policy::FormOf(kind).table;
+  if (!table) return words;
+  for (const auto& [word, id] : run.access.GetKeywordsMap(*table)) words.push_back(word);
   return words;
 }
 
@@ -82,18 +52,18 @@ std::string SuggestOrList(CheckRun& run, WordKind kind, const std::string& word)
 
 }  // namespace
 
-const RuleForm* FindRuleForm(const std::string& keyword) {
-  for (const RuleForm& form : RuleForms()) {
-    if (form.keyword == keyword) return &form;
-  }
-  return nullptr;
+std::optional<LineForm> FindLineForm(const std::string& keyword) {
+  if (keyword == kExceptionKeyword) return kException;
+  const Policy::RuleForm* const form = Policy::FindRuleForm(keyword);
+  if (form == nullptr) return std::nullopt;
+  return LineForm{.usage = form->usage, .words = form->Words()};
 }
 
 std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
                         std::size_t index) {
   if (&code == &Codes::kRuleType) return "a line begins with one of -a -c -d -f -p -r -s -u";
-  const RuleForm* const form = FindRuleForm(words.front());
-  if (form == nullptr) return "";
+  const auto form = FindLineForm(words.front());
+  if (!form) return "";
   if (&code == &Codes::kArgumentCount) return std::string("write: ") + form->usage;
   if (index == 0 || index >= words.size()) return "";
   if (&code == &Codes::kGrantWord) {

@@ -1,36 +1,22 @@
 #pragma once
 
+#include <optional>
+#include <span>
 #include <string>
-#include <vector>
 
 #include "check_run.h"
 
-// What a rule of each kind looks like, for hints and for who uses what; whether a line is right is
-// the library's to say.
+// What a line of each kind looks like, for hints and for who uses what; whether it is right is the
+// library's to say.
 namespace SecPolicyCli {
 
-// What a word of a rule stands for.
-enum class WordKind {
-  kLabel,
-  kDomain,
-  kObjectAccess,
-  kCapability,
-  kTransition,
-  kFileKind,
-  kParameterCheck,
-  kSystemCall,
-  kSocketKind,
-  kFree,
-};
-
-struct RuleForm {
-  const char* keyword;
+struct LineForm {
   const char* usage;
-  std::vector<WordKind> words;  // behind the keyword, without "grant" or "revoke"
+  std::span<const Policy::WordKind> words;  // behind the keyword, up to what the rule decides
 };
 
-// The form of the rules with this first word; null when there is none.
-const RuleForm* FindRuleForm(const std::string& keyword);
+// The form of the lines with this first word; nothing when there is none.
+std::optional<LineForm> FindLineForm(const std::string& keyword);
 
 // A hint for the word `index` of a line that the library refused with `code`; may be empty.
 std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,

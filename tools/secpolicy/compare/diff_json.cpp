@@ -7,15 +7,27 @@ namespace {
 // Null where there is nothing on that side.
 Json TextOrNull(const std::string& text) { return text.empty() ? Json() : Json(text); }
 
-Json ToJson(const DomainDifference& domain) {
+Json ToJson(const std::optional<Policy::Level>& level) {
+  return level ? Json(TextOf(*level)) : Json();
+}
+
+Json ToJson(const std::vector<Policy::Rule>& rules) {
+  Json list = Json::Array();
+  for (const Policy::Rule& rule : rules) list.Append(rule.Text());
+  return list;
+}
+
+Json ToJson(const Policy::DomainDifference& domain) {
   Json changed = Json::Array();
   for (const auto& [before, after] : domain.changed) {
-    changed.Append({{"before", before}, {"after", after}});
+    changed.Append({{"before", before.Text()}, {"after", after.Text()}});
   }
   return {{"name", domain.name},
-          {"level",
-           {{"before", TextOrNull(domain.levelBefore)}, {"after", TextOrNull(domain.levelAfter)}}},
-          {"rules", {{"removed", domain.removed}, {"added", domain.added}, {"changed", changed}}}};
+          {"level", {{"before", ToJson(domain.levelBefore)}, {"after", ToJson(domain.levelAfter)}}},
+          {"rules",
+           {{"removed", ToJson(domain.removed)},
+            {"added", ToJson(domain.added)},
+            {"changed", changed}}}};
 }
 
 Json ToJson(const std::vector<LabelDifference>& labels) {
@@ -28,9 +40,10 @@ Json ToJson(const std::vector<LabelDifference>& labels) {
 
 }  // namespace
 
-void WriteDiffJson(const PolicyDiff& diff, std::ostream& output) {
+void WriteDiffJson(const Comparison& diff, std::ostream& output) {
   Json domains = Json::Array();
-  for (const DomainDifference& domain : diff.difference.domains) domains.Append(ToJson(domain));
+  for (const Policy::DomainDifference& domain : diff.difference.domains)
+    domains.Append(ToJson(domain));
   const Json document = {
       {"schema", "secpolicy.diff/1"},
       {"before", diff.before},

@@ -6,6 +6,8 @@
 namespace SecPolicyCli {
 namespace {
 
+using Policy::DomainDifference;
+
 // Writes the lines of one heading, which is written before the first of them.
 class Section {
  public:
@@ -33,26 +35,28 @@ class Section {
 using RulePair = std::pair<std::string, std::string>;
 
 // By what they are about, so that a change stands together.
-std::map<std::string, RulePair> PairsOf(const DomainDifference& domain) {
-  std::map<std::string, RulePair> pairs;
-  for (const std::string& rule : domain.removed) pairs[SubjectOf(rule)] = {rule, ""};
-  for (const std::string& rule : domain.added) pairs[SubjectOf(rule)] = {"", rule};
-  for (const auto& [before, after] : domain.changed) pairs[SubjectOf(before)] = {before, after};
+std::map<Policy::Rule, RulePair, Policy::BySubject> PairsOf(const DomainDifference& domain) {
+  std::map<Policy::Rule, RulePair, Policy::BySubject> pairs;
+  for (const Policy::Rule& rule : domain.removed) pairs[rule] = {rule.Text(), ""};
+  for (const Policy::Rule& rule : domain.added) pairs[rule] = {"", rule.Text()};
+  for (const auto& [before, after] : domain.changed) pairs[before] = {before.Text(), after.Text()};
   return pairs;
 }
 
-std::string TitleOf(const DomainDifference& domain, const PolicyDiff& diff) {
+std::string TitleOf(const DomainDifference& domain, const Comparison& diff) {
   const std::string title = "domain " + domain.name;
   if (domain.IsNew()) return title + " (only in " + diff.after + ")";
   return domain.IsGone() ? title + " (only in " + diff.before + ")" : title;
 }
 
-void WriteDomain(const DomainDifference& domain, const PolicyDiff& diff, std::ostream& output) {
+std::string LevelLine(Policy::Level level) { return std::string("level ") + TextOf(level); }
+
+void WriteDomain(const DomainDifference& domain, const Comparison& diff, std::ostream& output) {
   Section section(TitleOf(domain, diff), output);
   section.Heading();
   if (domain.levelBefore != domain.levelAfter) {
-    if (!domain.IsNew()) section.Removed("level " + domain.levelBefore);
-    if (!domain.IsGone()) section.Added("level " + domain.levelAfter);
+    if (!domain.IsNew()) section.Removed(LevelLine(*domain.levelBefore));
+    if (!domain.IsGone()) section.Added(LevelLine(*domain.levelAfter));
   }
   for (const auto& [subject, pair] : PairsOf(domain)) {
     if (!pair.first.empty()) section.Removed(pair.first);
@@ -62,7 +66,7 @@ void WriteDomain(const DomainDifference& domain, const PolicyDiff& diff, std::os
 
 }  // namespace
 
-void WriteDiffText(const PolicyDiff& diff, std::ostream& output) {
+void WriteDiffText(const Comparison& diff, std::ostream& output) {
   if (diff.IsSame()) return;
   output << "--- " << Visible(diff.before) << "\n+++ " << Visible(diff.after) << '\n';
   for (const DomainDifference& domain : diff.difference.domains) WriteDomain(domain, diff, output);

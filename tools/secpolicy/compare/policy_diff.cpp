@@ -36,11 +36,11 @@ void DropTardisksOfBoth(Side& one, Side& other) {
 
 }  // namespace
 
-PolicyDiff Diff(Side before, Side after) {
+Comparison Diff(Side before, Side after) {
   if (before.labels.has_value() != after.labels.has_value()) DropTardisksOfBoth(before, after);
-  PolicyDiff diff{.before = before.name,
+  Comparison diff{.before = before.name,
                   .after = after.name,
-                  .difference = Compare(before.policy, after.policy),
+                  .difference = Policy::Compare(before.policy, after.policy),
                   .labels = std::nullopt};
   if (before.labels && after.labels) diff.labels = CompareLabels(*before.labels, *after.labels);
   return diff;

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "policy_difference.h"
+#include "policy/difference.h"
 #include "side.h"
 
 namespace SecPolicyCli {
@@ -18,23 +18,23 @@ struct LabelDifference {
 };
 
 // How the policy `after` differs from `before`.
-struct PolicyDiff {
+struct Comparison {
   std::string before;  // the names of the two
   std::string after;
-  PolicyDifference difference;
+  Policy::Difference difference;
   std::optional<std::vector<LabelDifference>> labels;  // nothing when they cannot be compared
 
   bool IsSame() const { return difference.IsEmpty() && (!labels || labels->empty()); }
 };
 
 // Compares the two. A directory is compared with a state without the transitions of tardisks.
-PolicyDiff Diff(Side before, Side after);
+Comparison Diff(Side before, Side after);
 
 // For people: `-` and `+` lines under a heading for each domain, for objects and file labels.
 // Nothing when there is no difference.
-void WriteDiffText(const PolicyDiff& diff, std::ostream& output);
+void WriteDiffText(const Comparison& diff, std::ostream& output);
 
 // For programs.
-void WriteDiffJson(const PolicyDiff& diff, std::ostream& output);
+void WriteDiffJson(const Comparison& diff, std::ostream& output);
 
 }  // namespace SecPolicyCli

@@ -9,7 +9,7 @@ namespace SecPolicyCli {
 
 // What the files of a policy directory say.
 struct WrittenPolicy {
-  InstalledPolicy policy;                     // as they would install it on an empty host
+  Policy::InstalledPolicy policy;             // as they would install it on an empty host
   std::map<std::string, std::string> labels;  // by what is labelled: "/etc/fstab", "/srv/*"
   bool isClean = true;                        // false: a line was refused, and left out
 };

@@ -11,7 +11,7 @@ namespace SecPolicyCli {
 // One of two policies that are compared.
 struct Side {
   std::string name;  // as the user gave it
-  InstalledPolicy policy;
+  Policy::InstalledPolicy policy;
 
   // Of a policy directory, what its lines label; nothing for a state, which keeps no such lines.
   std::optional<std::map<std::string, std::string>> labels;

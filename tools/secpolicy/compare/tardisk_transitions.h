@@ -6,6 +6,7 @@ namespace SecPolicyCli {
 
 // Takes the transitions that tardisks are launched by out of `policy`: the host's tardisks bring
 // them, so no policy directory holds them. `access` knows which they are.
-void DropTardiskTransitions(InstalledPolicy& policy, SecPolicy::TeskAccessInterfaceImpl& access);
+void DropTardiskTransitions(Policy::InstalledPolicy& policy,
+                            SecPolicy::TeskAccessInterfaceImpl& access);
 
 }  // namespace SecPolicyCli

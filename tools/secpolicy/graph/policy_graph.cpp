@@ -1,65 +1,49 @@
 #include "policy_graph.h"
 
 #include <algorithm>
-#include <array>
+#include <span>
 #include <string>
-#include <string_view>
 #include <vector>
 
-#include "installed/rule_words.h"
+#include "policy/decision.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Attributes = DotGraph::Attributes;
-
-constexpr char kObjectRule[] = "-a";
-constexpr char kTransitionRule[] = "-d";
-constexpr char kPathRule[] = "-r";
-constexpr char kEnforcing[] = "enforcing";
-constexpr char kPermissive[] = "permissive";
+using Policy::InstalledDomain;
+using Policy::InstalledPolicy;
+using Policy::Level;
+using Policy::Rule;
+using Policy::RuleKind;
 
 // Of a long list, what is shown.
 constexpr std::size_t kShownLines = 12;
 
-// Rules that are summarised in one box.
-struct Summary {
-  const char* keyword;
-  const char* title;
-};
-
-constexpr std::array kSummaries = {
-    Summary{"-c", "capabilities"},     Summary{"-f", "files it may create"},
-    Summary{"-p", "parameter checks"}, Summary{"-s", "system calls"},
-    Summary{"-u", "unix sockets"},
-};
-
-std::string Join(const std::vector<std::string>& words) {
+std::string Join(std::span<const std::string> words) {
   std::string text;
   for (const std::string& word : words) text += text.empty() ? word : " " + word;
   return text;
 }
 
 // The rules of one kind that grant something.
-std::vector<RuleWords> GrantsOf(const InstalledDomain& domain, std::string_view keyword) {
-  std::vector<RuleWords> grants;
-  for (const InstalledRule& rule : domain.rules) {
-    RuleWords words = SplitRule(rule.text);
-    if (words.keyword == keyword && words.grant.value_or(true)) grants.push_back(std::move(words));
-  }
+std::vector<const Rule*> GrantsOf(const InstalledDomain& domain, RuleKind kind) {
+  std::vector<const Rule*> grants = RulesOf(domain, kind);
+  std::erase_if(grants, [](const Rule* rule) { return !rule->Grants(); });
   return grants;
 }
 
 // What is not enforced is not drawn solid.
 Attributes LookOf(const InstalledDomain& domain) {
-  if (domain.level == kEnforcing) return {};
-  return {{"label", domain.name + "\n(" + domain.level + ")"},
-          {"style", domain.level == kPermissive ? "rounded,dashed" : "rounded,dotted"}};
+  if (domain.level == Level::kEnforcing) return {};
+  return {{"label", domain.name + "\n(" + TextOf(domain.level) + ")"},
+          {"style", domain.level == Level::kPermissive ? "rounded,dashed" : "rounded,dotted"}};
 }
 
 void DrawTransitions(const InstalledDomain& domain, DotGraph& graph) {
-  for (const RuleWords& rule : GrantsOf(domain, kTransitionRule)) {
-    graph.AddEdge(domain.name, rule.words.at(1), rule.words.at(0) + ", " + rule.words.at(2));
+  for (const Rule* const rule : GrantsOf(domain, RuleKind::kDomainTransition)) {
+    const auto& [object, target, kind] = rule->words;
+    graph.AddEdge(domain.name, target, object + ", " + kind);
   }
 }
 
@@ -67,27 +51,26 @@ void DrawTransitions(const InstalledDomain& domain, DotGraph& graph) {
 std::string NodeOf(const std::string& kind, const std::string& name) { return kind + " " + name; }
 
 void DrawObjects(const InstalledDomain& domain, DotGraph& graph) {
-  for (const RuleWords& rule : GrantsOf(domain, kObjectRule)) {
-    const std::string& object = rule.words.at(0);
+  for (const Rule* const rule : GrantsOf(domain, RuleKind::kObjectAccess)) {
+    const std::string& object = rule->words[0];
     const std::string node = NodeOf("object", object);
     graph.AddNode(node, {{"label", object}, {"shape", "ellipse"}, {"style", "solid"}});
-    graph.AddEdge(domain.name, node, rule.words.at(1));
+    graph.AddEdge(domain.name, node, rule->words[1]);
   }
 }
 
 void DrawPaths(const InstalledDomain& domain, DotGraph& graph) {
-  for (const RuleWords& rule : GrantsOf(domain, kPathRule)) {
-    const std::string& permissions = rule.words.at(1);
-    if (permissions.empty()) continue;
-    const std::string node = NodeOf("path", rule.words.at(0));
-    graph.AddNode(node, {{"label", rule.words.at(0)}, {"shape", "folder"}, {"style", "solid"}});
-    graph.AddEdge(domain.name, node, permissions);
+  for (const Rule* const rule : GrantsOf(domain, RuleKind::kFilePath)) {
+    const std::string& path = rule->words[0];
+    const std::string node = NodeOf("path", path);
+    graph.AddNode(node, {{"label", path}, {"shape", "folder"}, {"style", "solid"}});
+    graph.AddEdge(domain.name, node, TextOf(rule->verdict));
   }
 }
 
-void DrawSummary(const Summary& summary, const InstalledDomain& domain, DotGraph& graph) {
+void DrawList(const Policy::RuleForm& form, const InstalledDomain& domain, DotGraph& graph) {
   std::vector<std::string> lines;
-  for (const RuleWords& rule : GrantsOf(domain, summary.keyword)) lines.push_back(Join(rule.words));
+  for (const Rule* const rule : GrantsOf(domain, form.kind)) lines.push_back(Join(rule->Words()));
   if (lines.empty()) return;
   std::sort(lines.begin(), lines.end());
   if (lines.size() > kShownLines) {
@@ -95,9 +78,9 @@ void DrawSummary(const Summary& summary, const InstalledDomain& domain, DotGraph
     lines.resize(kShownLines);
     lines.push_back("and " + std::to_string(hidden) + " more");
   }
-  std::string text = summary.title;
+  std::string text = form.listTitle;
   for (const std::string& line : lines) text += "\n" + line;
-  const std::string node = NodeOf("all", summary.title);
+  const std::string node = NodeOf("all", form.listTitle);
   graph.AddNode(node, {{"label", text}, {"shape", "note"}, {"style", "solid"}});
   graph.AddEdge(domain.name, node, "");
 }
@@ -122,7 +105,9 @@ DotGraph DrawDomain(const InstalledDomain& domain, const InstalledPolicy& policy
   }
   DrawObjects(domain, graph);
   DrawPaths(domain, graph);
-  for (const Summary& summary : kSummaries) DrawSummary(summary, domain, graph);
+  for (const Policy::RuleForm& form : Policy::kRuleForms) {
+    if (form.listTitle != nullptr) DrawList(form, domain, graph);
+  }
   return graph;
 }
 

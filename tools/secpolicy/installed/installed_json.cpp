@@ -1,13 +1,14 @@
 #include "installed_json.h"
 
-#include "rule_words.h"
-
 namespace SecPolicyCli {
 
-Json ToJson(const InstalledRule& rule) {
-  const RuleWords words = SplitRule(rule.text);
-  Json json = {{"text", rule.text}, {"keyword", words.keyword}, {"words", words.words}};
-  if (words.grant) json["grant"] = *words.grant;
+Json ToJson(const Policy::Rule& rule) {
+  const auto words = rule.Words();
+  std::vector<std::string> texts(words.begin(), words.end());
+  const bool endsInGrant = FormOf(rule.kind).endsInGrant;
+  if (!endsInGrant) texts.push_back(TextOf(rule.verdict));
+  Json json = {{"text", rule.Text()}, {"keyword", FormOf(rule.kind).keyword}, {"words", texts}};
+  if (endsInGrant) json["grant"] = rule.Grants();
   if (!rule.origin.file.empty()) {
     json["file"] = rule.origin.file;
     json["line"] = rule.origin.line;
@@ -15,12 +16,12 @@ Json ToJson(const InstalledRule& rule) {
   return json;
 }
 
-Json ToJson(const InstalledDomain& domain) {
+Json ToJson(const Policy::InstalledDomain& domain) {
   Json rules = Json::Array();
-  for (const InstalledRule& rule : domain.rules) rules.Append(ToJson(rule));
+  for (const Policy::Rule& rule : domain.rules) rules.Append(ToJson(rule));
   return {{"name", domain.name},
           {"id", domain.id},
-          {"level", domain.level},
+          {"level", TextOf(domain.level)},
           {"state", domain.state},
           {"references", domain.references},
           {"worldReferences", domain.worldReferences},
@@ -38,12 +39,12 @@ Json ToJson(const std::vector<InstalledTardisk>& tardisks) {
   return list;
 }
 
-Json ToJson(const InstalledPolicy& policy) {
+Json ToJson(const Policy::InstalledPolicy& policy) {
   Json domains = Json::Array();
-  for (const InstalledDomain& domain : policy.domains) domains.Append(ToJson(domain));
+  for (const Policy::InstalledDomain& domain : policy.domains) domains.Append(ToJson(domain));
   Json objects = Json::Array();
   for (const auto& [name, id] : policy.objects) objects.Append({{"name", name}, {"id", id}});
-  return {{"domains", domains}, {"objects", objects}, {"tardisks", ToJson(policy.tardisks)}};
+  return {{"domains", domains}, {"objects", objects}};
 }
 
 }  // namespace SecPolicyCli

@@ -7,11 +7,10 @@
 
 namespace SecPolicyCli {
 
-// What docs/json.md calls a rule, a domain, tardisks and a policy; of the policy without its
-// schema.
-Json ToJson(const InstalledRule& rule);
-Json ToJson(const InstalledDomain& domain);
+// What docs/json.md calls a rule, a domain, the domains and objects of a policy, and tardisks.
+Json ToJson(const Policy::Rule& rule);
+Json ToJson(const Policy::InstalledDomain& domain);
+Json ToJson(const Policy::InstalledPolicy& policy);
 Json ToJson(const std::vector<InstalledTardisk>& tardisks);
-Json ToJson(const InstalledPolicy& policy);
 
 }  // namespace SecPolicyCli

@@ -4,8 +4,7 @@
 #include <queue>
 #include <span>
 
-#include "printed_rules.h"
-#include "secpolicy/domain/dom_trans_rules.h"
+#include "policy/rule.h"
 #include "secpolicy/labels/file_label_policy.h"
 #include "secpolicy/tardisk/tardisk_exception_rules.h"
 
@@ -15,8 +14,6 @@ namespace {
 using Braxo::Lib::BraxoException;
 
 constexpr char kExceptionRule[] = "-E";
-constexpr char kPathRule[] = "-r";
-constexpr char kTransitionRule[] = "-d";
 
 using Lines = std::map<unsigned int, std::queue<std::string>>;
 
@@ -49,7 +46,7 @@ void OriginReader::ReadPaths(const std::string& dir, const std::string& prefix,
   for (const auto& [path, name] : FilesOf(dir)) {
     Paths& domain = paths.emplace_back(Paths{.kind = kind, .domain = prefix + name, .lines = {}});
     for (auto& [number, words] : LinesOf(path)) {
-      if (words.front() != kPathRule) continue;
+      if (words.front() != FormOf(Policy::RuleKind::kFilePath).keyword) continue;
       words.pop();
       if (!words.empty()) domain.lines.push_back({.path = words.front(), .line = number});
     }
@@ -78,17 +75,12 @@ void OriginReader::ReadTardisk(const std::string& path) {
 // From each launch domain the execution of what a tardisk brings leads into its domain.
 void OriginReader::AddTransitions(const std::string& label, const std::string& domain,
                                   const std::string& file, unsigned int line) {
-  SecPolicy::DomTransRules transition;
-  transition.keyword = kTransitionRule;
-  TeskCtl::Security::TeskAccess_DomTransRule& rule = transition.rules.emplace_back();
-  rule.label = label;
-  rule.targetDomain = domain;
-  rule.transitionKind = access.GetTardiskExecEventKeyword();
-  rule.grant = true;
+  const Policy::Rule transition = {.kind = Policy::RuleKind::kDomainTransition,
+                                   .words = {label, domain, access.GetTardiskExecEventKeyword()},
+                                   .verdict = true,
+                                   .origin = {.file = file, .line = line}};
   for (const std::string& launchDomain : access.GetTardiskLaunchDomains()) {
-    for (const std::string& text : PrintedRules(transition)) {
-      rules.push_back({.domain = launchDomain, .rule = text, .file = file, .line = line});
-    }
+    rules.push_back({.domain = launchDomain, .rule = transition});
   }
 }
 

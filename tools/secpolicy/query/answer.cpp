@@ -1,20 +1,28 @@
 #include "answer.h"
 
+#include "domain_file.h"
 #include "installed/installed_json.h"
+#include "secpolicy/policy_root.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
+
+using Policy::Decision;
+using Policy::FileQuestion;
+using Policy::InstalledDomain;
+using Policy::Rule;
+using Policy::Vote;
 
 std::string PlaceOf(const std::string& file, unsigned int line) {
   return file + ":" + std::to_string(line) + ": ";
 }
 
 // The rule behind its place, in the form that editors and grep know.
-std::string Cite(const InstalledRule& rule) {
+std::string Cite(const Rule& rule) {
   const std::string place =
       rule.origin.file.empty() ? "(no policy file): " : PlaceOf(rule.origin.file, rule.origin.line);
-  return place + rule.text;
+  return place + rule.Text();
 }
 
 std::string Cite(const LinuxHost::LabelOrigin& origin) {
@@ -30,19 +38,32 @@ std::string AnswerText(const Question& question, const InstalledDomain& domain,
   if (!decision.IsAllowed()) return "no: " + domain.name + " may not " + asked;
   std::string yes = "yes: " + domain.name + " may " + asked;
   if (decision.refuses) return yes;
-  return yes + ": it is " + domain.level + ", so nothing is refused to it" +
+  return yes + ": it is " + TextOf(domain.level) + ", so nothing is refused to it" +
          (decision.granted ? "" : "; its rules would refuse this");
+}
+
+// The policy file in which rules of the domain are written. A domain that the early policy has as
+// well has its full policy in the usual place.
+std::string PolicyFileOf(const InstalledDomain& domain) {
+  std::string file = DomainFile(domain.name, SecPolicy::kPolicyRoot);
+  const std::string name = file.substr(file.rfind('/'));
+  std::string elsewhere;
+  for (const Rule& rule : domain.rules) {
+    if (rule.origin.file == file) return file;
+    if (rule.origin.file.ends_with(name)) elsewhere = rule.origin.file;
+  }
+  return elsewhere.empty() ? file : elsewhere;
 }
 
 void WriteMissing(const InstalledDomain& domain, const Decision& decision, std::ostream& output) {
   if (decision.missing.empty()) return;
   const bool choice = decision.missing.size() > 1;
   WriteLine(output, "missing in " + PolicyFileOf(domain) + (choice ? ", one of:" : ":"));
-  for (const std::string& rule : decision.missing) WriteLine(output, "  " + rule);
+  for (const Rule& rule : decision.missing) WriteLine(output, "  " + rule.Text());
 }
 
-void WriteFile(const AskedFile& file, std::ostream& output) {
-  if (!file.exists) {
+void WriteFile(const FileQuestion& file, const FileFacts& facts, std::ostream& output) {
+  if (!facts.exists) {
     WriteLine(output, "file: there is nothing at " + file.paths.front() + " under this root");
     return;
   }
@@ -51,18 +72,18 @@ void WriteFile(const AskedFile& file, std::ostream& output) {
     WriteLine(output, "label: none");
     return;
   }
-  WriteLine(output, "label: " + file.label + (file.labelIsInherited ? " (inherited)" : ""));
-  if (file.labelOrigin) WriteLine(output, Cite(*file.labelOrigin));
+  WriteLine(output, "label: " + file.label + (facts.labelIsInherited ? " (inherited)" : ""));
+  if (facts.labelOrigin) WriteLine(output, Cite(*facts.labelOrigin));
 }
 
-Json FileToJson(const AskedFile& file) {
+Json FileToJson(const FileQuestion& file, const FileFacts& facts) {
   Json label;
   if (!file.label.empty()) label = file.label;
-  Json json = {{"exists", file.exists}, {"paths", file.paths}, {"label", label}};
-  if (file.labelIsInherited) json["labelInherited"] = true;
-  if (file.labelOrigin) {
-    json["labelFile"] = file.labelOrigin->file;
-    json["labelLine"] = file.labelOrigin->line;
+  Json json = {{"exists", facts.exists}, {"paths", file.paths}, {"label", label}};
+  if (facts.labelIsInherited) json["labelInherited"] = true;
+  if (facts.labelOrigin) {
+    json["labelFile"] = facts.labelOrigin->file;
+    json["labelLine"] = facts.labelOrigin->line;
   }
   return json;
 }
@@ -74,38 +95,45 @@ void WriteAnswer(const Question& question, const InstalledDomain& domain, const 
   WriteLine(output, AnswerText(question, domain, decision));
   for (const Vote& vote : decision.votes) {
     WriteLine(output, Cite(vote.rule));
-    if (!vote.grants) WriteLine(output, "  instead: " + vote.instead);
+    if (vote.instead) WriteLine(output, "  instead: " + vote.instead->Text());
   }
   WriteMissing(domain, decision, output);
-  if (question.file) WriteFile(*question.file, output);
+  if (question.file) {
+    WriteFile(std::get<FileQuestion>(question.asked), *question.file, output);
+  }
 }
 
 void WriteAnswerLine(const InstalledDomain& domain, const Decision& decision,
                      std::ostream& output) {
   WriteLine(output, domain.name + ": " +
                         (decision.granted ? Cite(decision.votes.front().rule)
-                                          : domain.level + ", so nothing is refused to it"));
+                                          : std::string(TextOf(domain.level)) +
+                                                ", so nothing is refused to it"));
 }
 
 Json QuestionToJson(const Question& question) {
   Json json = {{"action", question.form->action}, {"words", question.words}};
-  if (question.file) json["file"] = FileToJson(*question.file);
+  if (question.file) {
+    json["file"] = FileToJson(std::get<FileQuestion>(question.asked), *question.file);
+  }
   return json;
 }
 
 Json AnswerToJson(const InstalledDomain& domain, const Decision& decision) {
   Json rules = Json::Array();
+  Json missing = Json::Array();
+  for (const Rule& rule : decision.missing) missing.Append(rule.Text());
   for (const Vote& vote : decision.votes) {
     Json rule = ToJson(vote.rule);
-    if (!vote.grants) rule["instead"] = vote.instead;
+    if (vote.instead) rule["instead"] = vote.instead->Text();
     rules.Append(rule);
   }
   return {{"domain", domain.name},
-          {"level", domain.level},
+          {"level", TextOf(domain.level)},
           {"allowed", decision.IsAllowed()},
           {"granted", decision.granted},
           {"rules", rules},
-          {"missing", decision.missing},
+          {"missing", missing},
           {"policyFile", PolicyFileOf(domain)}};
 }
 

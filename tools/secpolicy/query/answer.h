@@ -2,23 +2,23 @@
 
 #include <ostream>
 
-#include "decision.h"
-#include "installed/installed_policy.h"
 #include "json.h"
+#include "policy/decision.h"
 #include "question.h"
 
 namespace SecPolicyCli {
 
 // Writes for people whether the domain may do what is asked, and why: first the answer, then the
 // rules behind it, and of a file its label.
-void WriteAnswer(const Question& question, const InstalledDomain& domain, const Decision& decision,
-                 std::ostream& output);
+void WriteAnswer(const Question& question, const Policy::InstalledDomain& domain,
+                 const Policy::Decision& decision, std::ostream& output);
 
 // One line for a domain that may: its name, and the first rule behind it.
-void WriteAnswerLine(const InstalledDomain& domain, const Decision& decision, std::ostream& output);
+void WriteAnswerLine(const Policy::InstalledDomain& domain, const Policy::Decision& decision,
+                     std::ostream& output);
 
 // The same for programs; see docs/json.md.
 Json QuestionToJson(const Question& question);
-Json AnswerToJson(const InstalledDomain& domain, const Decision& decision);
+Json AnswerToJson(const Policy::InstalledDomain& domain, const Policy::Decision& decision);
 
 }  // namespace SecPolicyCli

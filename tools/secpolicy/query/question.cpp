@@ -3,57 +3,47 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <map>
+#include <utility>
 
 #include "host/linux/operation/file_label.h"
-#include "installed/real_path.h"
-#include "policy/parameter_range.h"
 #include "text/suggestion.h"
+#include "zorvan/kernel.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
-using enum QuestionWord;
+using LinuxHost::LabelOrigin;
+using Policy::FileQuestion;
+using enum Policy::WordKind;
+using Policy::Permission;
+using Policy::RuleKind;
+using Policy::WordKind;
 using SecPolicy::TeskAccessInterfaceImpl;
-using TeskCtl::Security::TeskAccess_KeywordType;
 
 // A table that is told as a whole when no word of it is near.
 constexpr std::size_t kShortTable = 10;
 
-struct WordKind {
-  const char* noun;
-  std::optional<TeskAccess_KeywordType> table;
-};
+bool CanBeDomain(WordKind kind) { return kind == kDomain || kind == kLabel; }
 
-const WordKind& KindOf(QuestionWord word) {
-  static const std::map<QuestionWord, WordKind> kinds = {
-      {kPath, {"path", std::nullopt}},
-      {kSyscall, {"system call", TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL}},
-      {kCapability, {"capability", TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY}},
-      {kObject, {"object", TeskCtl::Security::TESKACCESS_KEYWORD_LABEL}},
-      {kObjectAccess, {"kind of access", TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS}},
-      {kDomain, {"domain", std::nullopt}},
-      {kFileKind, {"kind of file", TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION}},
-      {kSocketKind, {"kind of socket", TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION}},
-      {kParameterCheck, {"parameter check", TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK}},
-      {kNumber, {"number", std::nullopt}},
-  };
-  return kinds.at(word);
+bool IsKnown(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
+  unsigned int id = 0;
+  if (CanBeDomain(kind) && access.FindDomain(word, &id)) return true;
+  const auto& table = FormOf(kind).table;
+  return table && access.GetKeywordsMap(*table).contains(word);
 }
 
-std::vector<std::string> DomainNames(const InstalledPolicy& policy) {
+std::vector<std::string> DomainNames(TeskAccessInterfaceImpl& access) {
   std::vector<std::string> names;
-  for (const InstalledDomain& domain : policy.domains) names.push_back(domain.name);
+  for (const auto& domain : Policy::ListDomains(access)) names.push_back(domain.name);
   return names;
 }
 
 // The words that can stand there. The name of a domain is a label, too.
-std::vector<std::string> KnownWords(QuestionWord word, const InstalledPolicy& policy,
-                                    TeskAccessInterfaceImpl& access) {
+std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& access) {
   std::vector<std::string> known;
-  if (word == kDomain || word == kObject) known = DomainNames(policy);
-  if (const auto table = KindOf(word).table) {
+  if (CanBeDomain(kind)) known = DomainNames(access);
+  if (const auto& table = FormOf(kind).table) {
     for (const auto& [name, id] : access.GetKeywordsMap(*table)) known.push_back(name);
   }
   return known;
@@ -87,17 +77,14 @@ void RequireNumber(const std::string& word) {
   }
 }
 
-void RequireWord(QuestionWord kind, const std::string& word, const InstalledPolicy& policy,
-                 TeskAccessInterfaceImpl& access) {
+void RequireWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
   if (kind == kPath) return RequirePath(word);
   if (kind == kNumber) return RequireNumber(word);
-  const std::vector<std::string> known = KnownWords(kind, policy, access);
-  if (std::find(known.begin(), known.end(), word) == known.end()) {
-    RefuseWord(KindOf(kind).noun, word, known);
-  }
+  if (IsKnown(kind, word, access)) return;
+  RefuseWord(FormOf(kind).plainNoun, word, KnownWords(kind, access));
 }
 
-const QuestionForm& FormOf(const std::string& action) {
+const QuestionForm& FindForm(const std::string& action) {
   std::vector<std::string> actions;
   for (const QuestionForm& form : QuestionForms()) {
     if (form.action == action) return form;
@@ -111,8 +98,16 @@ std::string WithoutTrailingSlashes(std::string path) {
   return path;
 }
 
+// The path that it resolves to; empty when it leads nowhere.
+std::string RealPathOf(const std::string& path) {
+  SecPolicy::TeskAccess_FileRule resolved{};
+  const bool found = path.size() < sizeof resolved.path &&
+                     Zorvan::Kernel::RealPath(path.c_str(), resolved.path) == 0;
+  return found ? resolved.path : "";
+}
+
 // The line for the nearest directory that gave the file the label that it inherits.
-std::optional<LinuxHost::LabelOrigin> FindOriginAbove(const AskedFile& file) {
+std::optional<LabelOrigin> FindOriginAbove(const FileQuestion& file) {
   std::string path = file.paths.back();
   while (path.size() > 1) {
     path.resize(std::max<std::size_t>(path.rfind('/'), 1));
@@ -123,48 +118,63 @@ std::optional<LinuxHost::LabelOrigin> FindOriginAbove(const AskedFile& file) {
 }
 
 // The line for one of the paths that gave the label that the file has now.
-std::optional<LinuxHost::LabelOrigin> FindOriginOf(const AskedFile& file) {
+std::optional<LabelOrigin> FindOriginOf(const FileQuestion& file, bool labelIsInherited) {
   for (const std::string& path : file.paths) {
     auto origin = LinuxHost::FindLabelOrigin(path);
     if (origin && origin->label == file.label) return origin;
   }
-  return file.labelIsInherited ? FindOriginAbove(file) : std::nullopt;
+  return labelIsInherited ? FindOriginAbove(file) : std::nullopt;
 }
 
-AskedFile ExamineFile(const std::string& asked, TeskAccessInterfaceImpl& access) {
-  AskedFile file;
-  file.paths.push_back(WithoutTrailingSlashes(asked));
+// Completes a question about a file by what there is to know of it.
+FileFacts ExamineFile(FileQuestion& file, TeskAccessInterfaceImpl& access) {
+  FileFacts facts;
   const std::string resolved = RealPathOf(file.paths.front());
-  if (resolved.empty()) return file;
-  file.exists = true;
+  if (resolved.empty()) return facts;
+  facts.exists = true;
   if (resolved != file.paths.front()) file.paths.push_back(resolved);
   try {
     file.label = SecPolicy::GetFileLabel(resolved, access);
   } catch (const BraxoException&) {
-    return file;
+    return facts;
   }
   const auto label = LinuxHost::ReadLabel(resolved.c_str());
-  file.labelIsInherited = label && label->isInherited;
+  facts.labelIsInherited = label && label->isInherited;
   file.labelIsBuiltIn =
       access.IsPredefinedLabel(file.label, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
-  file.labelOrigin = FindOriginOf(file);
-  return file;
+  facts.labelOrigin = FindOriginOf(file, facts.labelIsInherited);
+  return facts;
+}
+
+// What rules are asked by a question that is about no file.
+Policy::Question AskRules(const Question& question, TeskAccessInterfaceImpl& access) {
+  const std::vector<std::string>& words = question.words;
+  if (question.form->kind == RuleKind::kDomainTransition) {
+    return Policy::EntryQuestion{.domain = words[0],
+                                 .ways = Policy::ReadTransitionsInto(words[0], access)};
+  }
+  if (question.form->kind == RuleKind::kParameterCheck) {
+    return Policy::ParameterQuestion{.check = words[0], .number = words[1]};
+  }
+  Policy::WordsQuestion asked{.kind = question.form->kind, .words = {}};
+  std::copy(words.begin(), words.end(), asked.words.begin());
+  return asked;
 }
 
 }  // namespace
 
 std::span<const QuestionForm> QuestionForms() {
   static const std::vector<QuestionForm> forms = {
-      {"read", "PATH", {kPath}, "-r", 'r', "read"},
-      {"write", "PATH", {kPath}, "-r", 'w', "write"},
-      {"exec", "PATH", {kPath}, "-r", 'x', "execute"},
-      {"call", "SYSCALL", {kSyscall}, "-s"},
-      {"use", "CAPABILITY", {kCapability}, "-c"},
-      {"access", "OBJECT KIND", {kObject, kObjectAccess}, "-a"},
-      {"enter", "DOMAIN", {kDomain}, "-d"},
-      {"create", "OBJECT NEWOBJECT KIND", {kObject, kObject, kFileKind}, "-f"},
-      {"create-socket", "OBJECT KIND", {kObject, kSocketKind}, "-u"},
-      {"pass", "CHECK NUMBER", {kParameterCheck, kNumber}, "-p"},
+      {"read", "PATH", {kPath}, RuleKind::kFilePath, Permission::kRead},
+      {"write", "PATH", {kPath}, RuleKind::kFilePath, Permission::kWrite},
+      {"exec", "PATH", {kPath}, RuleKind::kFilePath, Permission::kExecute},
+      {"call", "SYSCALL", {kSyscall}, RuleKind::kSyscall},
+      {"use", "CAPABILITY", {kCapability}, RuleKind::kCapability},
+      {"access", "OBJECT KIND", {kLabel, kObjectAccess}, RuleKind::kObjectAccess},
+      {"enter", "DOMAIN", {kDomain}, RuleKind::kDomainTransition},
+      {"create", "OBJECT NEWOBJECT KIND", {kLabel, kLabel, kFileKind}, RuleKind::kFileCreation},
+      {"create-socket", "OBJECT KIND", {kLabel, kSocketKind}, RuleKind::kUnixSocketCreation},
+      {"pass", "CHECK NUMBER", {kParameterCheck, kNumber}, RuleKind::kParameterCheck},
   };
   return forms;
 }
@@ -175,9 +185,8 @@ std::string Question::Text() const {
   return text;
 }
 
-Question ReadQuestion(const std::vector<std::string>& words, const InstalledPolicy& policy,
-                      TeskAccessInterfaceImpl& access) {
-  const QuestionForm& form = FormOf(words.front());
+Question ReadQuestion(const std::vector<std::string>& words, TeskAccessInterfaceImpl& access) {
+  const QuestionForm& form = FindForm(words.front());
   if (words.size() != form.words.size() + 1) {
     throw QuestionError(std::string("write: ") + form.action + " " + form.usage);
   }
@@ -185,17 +194,22 @@ Question ReadQuestion(const std::vector<std::string>& words, const InstalledPoli
   question.form = &form;
   question.words.assign(words.begin() + 1, words.end());
   for (std::size_t index = 0; index < form.words.size(); ++index) {
-    RequireWord(form.words[index], question.words[index], policy, access);
+    RequireWord(form.words[index], question.words[index], access);
   }
-  if (form.words.front() == kPath) question.file = ExamineFile(question.words.front(), access);
+  if (form.kind != RuleKind::kFilePath) {
+    question.asked = AskRules(question, access);
+    return question;
+  }
+  FileQuestion file;
+  file.permission = form.permission;
+  file.paths = {WithoutTrailingSlashes(question.words.front())};
+  question.file = ExamineFile(file, access);
+  question.asked = std::move(file);
   return question;
 }
 
-const InstalledDomain& FindAskedDomain(const std::string& name, const InstalledPolicy& policy) {
-  for (const InstalledDomain& domain : policy.domains) {
-    if (domain.name == name) return domain;
-  }
-  RefuseWord("domain", name, DomainNames(policy));
+void RefuseDomain(const std::string& name, TeskAccessInterfaceImpl& access) {
+  RefuseWord(FormOf(kDomain).plainNoun, name, DomainNames(access));
 }
 
 }  // namespace SecPolicyCli

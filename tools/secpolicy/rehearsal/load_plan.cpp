@@ -4,9 +4,8 @@
 #include <map>
 #include <sstream>
 
-#include "compare/policy_directory.h"
-#include "compare/tardisk_transitions.h"
 #include "host/linux/operation/state_use.h"
+#include "installed/installed_policy.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -14,25 +13,25 @@ namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
 
-InstalledPolicy ReadState(const std::string& path) {
+Policy::InstalledPolicy ReadState(const std::string& path) {
   const LinuxHost::UsedState state(path);
   TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }
 
 // What no file has any more, and the load has left.
-void FindStaying(const InstalledPolicy& after, LoadPlan& plan) {
-  for (const InstalledDomain& domain : after.domains) {
-    if (domain.hasNoFile) plan.stayingDomains.push_back(domain.name);
-    for (const InstalledRule& rule : domain.rules) {
-      if (rule.hasNoLine) plan.stayingRules.push_back({domain.name, rule.text});
+void FindStaying(const Policy::InstalledPolicy& after, LoadPlan& plan) {
+  for (const Policy::InstalledDomain& domain : after.domains) {
+    if (domain.isGone) plan.stayingDomains.push_back(domain.name);
+    for (const Policy::Rule& rule : domain.rules) {
+      if (rule.origin.isGone) plan.stayingRules.push_back({domain.name, rule});
     }
   }
 }
 
 using LabelNames = std::map<unsigned int, std::string>;
 
-LabelNames LabelNamesOf(const InstalledPolicy& policy) {
+LabelNames LabelNamesOf(const Policy::InstalledPolicy& policy) {
   LabelNames names;
   for (const auto& [name, id] : policy.objects) names.emplace(id, name);
   return names;
@@ -47,10 +46,10 @@ std::string NameOf(unsigned int id, const LabelNames& names) {
 }  // namespace
 
 LoadPlan MakeLoadPlan(const LoadRehearsal& rehearsal) {
-  const InstalledPolicy before = ReadState(rehearsal.StateBefore());
-  const InstalledPolicy after = ReadState(rehearsal.StateAfter());
+  const Policy::InstalledPolicy before = ReadState(rehearsal.StateBefore());
+  const Policy::InstalledPolicy after = ReadState(rehearsal.StateAfter());
   LoadPlan plan;
-  plan.difference = Compare(before, after);
+  plan.difference = Policy::Compare(before, after);
   const LabelNames oldNames = LabelNamesOf(before);
   const LabelNames newNames = LabelNamesOf(after);
   for (const auto& change : rehearsal.Labels()) {

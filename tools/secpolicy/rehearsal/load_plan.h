@@ -4,15 +4,15 @@
 #include <string>
 #include <vector>
 
-#include "compare/policy_difference.h"
 #include "load_rehearsal.h"
+#include "policy/difference.h"
 
 namespace SecPolicyCli {
 
 // A rule of a domain.
 struct DomainRule {
   std::string domain;
-  std::string rule;
+  Policy::Rule rule;
 };
 
 // A file and its labels by name.
@@ -24,7 +24,7 @@ struct FileLabelChange {
 
 // What a load would change. Everything is in ascending order.
 struct LoadPlan {
-  PolicyDifference difference;
+  Policy::Difference difference;
   std::vector<FileLabelChange> labels;
 
   // What no file has any more, and the load leaves: it is to keep it, or has errors, or worlds run.

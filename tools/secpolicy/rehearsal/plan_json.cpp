@@ -6,28 +6,30 @@
 namespace SecPolicyCli {
 namespace {
 
-Json RulesOf(const PolicyDifference& difference,
-             std::vector<std::string> DomainDifference::*rules) {
+using Policy::Difference;
+using Policy::DomainDifference;
+
+Json RulesOf(const Difference& difference, std::vector<Policy::Rule> DomainDifference::*rules) {
   Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
-    for (const std::string& rule : domain.*rules) {
-      list.Append({{"domain", domain.name}, {"rule", rule}});
+    for (const Policy::Rule& rule : domain.*rules) {
+      list.Append({{"domain", domain.name}, {"rule", rule.Text()}});
     }
   }
   return list;
 }
 
-Json ChangesOf(const PolicyDifference& difference) {
+Json ChangesOf(const Difference& difference) {
   Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
     for (const auto& [before, after] : domain.changed) {
-      list.Append({{"domain", domain.name}, {"before", before}, {"after", after}});
+      list.Append({{"domain", domain.name}, {"before", before.Text()}, {"after", after.Text()}});
     }
   }
   return list;
 }
 
-Json NewDomains(const PolicyDifference& difference) {
+Json NewDomains(const Difference& difference) {
   Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
     if (domain.IsNew()) list.Append(domain.name);
@@ -35,7 +37,7 @@ Json NewDomains(const PolicyDifference& difference) {
   return list;
 }
 
-Json GoneDomains(const PolicyDifference& difference) {
+Json GoneDomains(const Difference& difference) {
   Json list = Json::Array();
   for (const DomainDifference& domain : difference.domains) {
     if (domain.IsGone()) list.Append(domain.name);
@@ -46,7 +48,7 @@ Json GoneDomains(const PolicyDifference& difference) {
 Json StayingRules(const LoadPlan& plan) {
   Json list = Json::Array();
   for (const auto& [domain, rule] : plan.stayingRules) {
-    list.Append({{"domain", domain}, {"rule", rule}});
+    list.Append({{"domain", domain}, {"rule", rule.Text()}});
   }
   return list;
 }
@@ -79,7 +81,7 @@ const char* WordFor(ExitCode ending) {
 
 void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
                    const LoadRehearsal& rehearsal, std::ostream& output) {
-  const PolicyDifference& difference = plan.difference;
+  const Difference& difference = plan.difference;
   const Json document = {
       {"schema", "secpolicy.plan/1"},
       {"directory", policyDir},

@@ -22,18 +22,20 @@ void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& ou
   Lines added;
   Lines changed;
   Lines removed;
-  for (const DomainDifference& domain : plan.difference.domains) {
+  for (const Policy::DomainDifference& domain : plan.difference.domains) {
     if (domain.IsNew()) newDomains.push_back(domain.name);
     if (domain.IsGone()) goneDomains.push_back(domain.name);
     const std::string prefix = domain.name + ": ";
-    for (const std::string& rule : domain.added) added.push_back(prefix + rule);
-    for (const std::string& rule : domain.removed) removed.push_back(prefix + rule);
+    for (const Policy::Rule& rule : domain.added) added.push_back(prefix + rule.Text());
+    for (const Policy::Rule& rule : domain.removed) removed.push_back(prefix + rule.Text());
     for (const auto& [before, after] : domain.changed) {
-      changed.push_back(prefix + Arrow(before, DecisionOf(after)));
+      changed.push_back(prefix + Arrow(before.Text(), TextOf(after.verdict)));
     }
   }
   Lines stayingRules;
-  for (const auto& [domain, rule] : plan.stayingRules) stayingRules.push_back(domain + ": " + rule);
+  for (const auto& [domain, rule] : plan.stayingRules) {
+    stayingRules.push_back(domain + ": " + rule.Text());
+  }
   Lines labels;
   for (const auto& [path, before, after] : plan.labels) {
     labels.push_back(path + ": " + Arrow(before, after));

@@ -17,7 +17,7 @@ std::string About(const std::string& path, const std::string& copy, std::string 
 
 }  // namespace
 
-InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
+Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("host.db");
   LinuxHost::CopyDatabase(path, what, copy);

@@ -10,6 +10,6 @@ namespace SecPolicyCli {
 // Reads the state at `path` from a copy, since even reading leaves traces beside a state. Throws
 // what the host throws when it cannot be copied, and std::runtime_error when the copy cannot be
 // used.
-InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
+Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
 
 }  // namespace SecPolicyCli
