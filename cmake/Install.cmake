@@ -25,12 +25,12 @@ install(EXPORT secpolicyTargets NAMESPACE secpolicy:: DESTINATION "${SECPOLICY_C
 configure_package_config_file(cmake/secpolicyConfig.cmake.in secpolicyConfig.cmake
   INSTALL_DESTINATION "${SECPOLICY_CMAKE}")
 write_basic_package_version_file(secpolicyConfigVersion.cmake COMPATIBILITY SameMajorVersion)
-install(FILES "${CMAKE_BINARY_DIR}/secpolicyConfig.cmake"
-  "${CMAKE_BINARY_DIR}/secpolicyConfigVersion.cmake" DESTINATION "${SECPOLICY_CMAKE}")
+install(FILES "${PROJECT_BINARY_DIR}/secpolicyConfig.cmake"
+  "${PROJECT_BINARY_DIR}/secpolicyConfigVersion.cmake" DESTINATION "${SECPOLICY_CMAKE}")
 file(RELATIVE_PATH SECPOLICY_PC_TO_PREFIX
   "${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig" "${CMAKE_INSTALL_PREFIX}")
 configure_file(packaging/secpolicy.pc.in secpolicy.pc @ONLY)
-install(FILES "${CMAKE_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+install(FILES "${PROJECT_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 
 # The command.
 install(TARGETS secpolicy_cli)
@@ -42,7 +42,7 @@ install(FILES completions/_secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
 foreach(unit boot restore load)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
-  install(FILES "${CMAKE_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
+  install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
 install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md docs/diagnostics.md
   docs/json.md docs/queries.md docs/graph.svg

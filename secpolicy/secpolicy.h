@@ -20,6 +20,14 @@
 // no thread is started: one process at a time loads a policy.
 //
 // `access` is the caller's connection to the access-control module; it is only borrowed.
+//
+//   SecPolicy::LoadPolicy("/etc/zorvan/secpolicy");
+//
+//   const unsigned int job =
+//       SecPolicy::CreateDomain("job7", TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE);
+//
+//   TeskCtl::Security::TeskAccessInterfaceImpl access;
+//   SecPolicy::SetFileLabel("/etc/job7.conf", "jobConfig", access);
 namespace SecPolicy {
 
 using TeskCtl::Security::TeskAccess_Capability;
@@ -257,7 +265,8 @@ SECPOLICY_EXPORT void DestroyDomain(unsigned int id);
 SECPOLICY_EXPORT void AddGcomService(unsigned int id, const std::string& service);
 
 // Finds the domains that nothing references any more. `capacity` is the room in `ids`, counted in
-// identifiers; the kernel stores how many there are in `*count` and fills `ids`.
+// identifiers; the kernel stores how many there are in `*count`, which is not null, and fills
+// `ids`, which may be null when `capacity` is 0.
 SECPOLICY_EXPORT void RetrieveLeakedDomains(unsigned long capacity, unsigned int* count,
                                             unsigned int* ids);
 
@@ -270,7 +279,7 @@ SECPOLICY_EXPORT std::string GetDomainNameForID(unsigned int id);
 // ---- Runtime interface: file policies ---------------------------------------------------------
 
 // Adds the `count` rules at `rules` to the domain `domainId`, for `world` or, with 0, for all its
-// worlds. The kernel may store a result word in `*result`.
+// worlds. The kernel stores a result word in `*result`, which is not null.
 SECPOLICY_EXPORT void AddFilePolicyBatch(int world, unsigned int domainId,
                                          TeskAccess_FileRule* rules, unsigned int count,
                                          unsigned int* result);

@@ -9,7 +9,9 @@
 
 namespace SecPolicy {
 
-// The rules of one kind of one domain. Filled from policy lines or from the kernel.
+// The rules of one kind of one domain. A set lives one of two lives: it is filled from policy
+// lines, checked and set (AddRule for each line, CheckConstraints, Set), or it is filled from the
+// kernel and shown (ReadSystemRules, PrintRules).
 class PolicyRules {
  public:
   PolicyRules() = default;

@@ -32,13 +32,35 @@ runs_as_service() {
   cat >"$BATS_TEST_TMPDIR/CMakeLists.txt" <<EOF
 cmake_minimum_required(VERSION 3.25)
 project(service LANGUAGES CXX)
-set(CMAKE_CXX_STANDARD 20)
 find_package(secpolicy 1 REQUIRED)
 add_executable(runtime "$SOURCE/examples/runtime.cpp")
 target_link_libraries(runtime PRIVATE secpolicy::secpolicy)
 EOF
   CXXFLAGS=$SANITIZER cmake -G Ninja -S "$BATS_TEST_TMPDIR" -B "$BATS_TEST_TMPDIR/build" \
     -DCMAKE_PREFIX_PATH="$PREFIX"
+  cmake --build "$BATS_TEST_TMPDIR/build"
+  runs_as_service "$BATS_TEST_TMPDIR/build/runtime"
+}
+
+# All of it takes a minute.
+@test "a program builds with this project as a part of its own" {
+  cat >"$BATS_TEST_TMPDIR/CMakeLists.txt" <<EOF
+cmake_minimum_required(VERSION 3.25)
+project(service LANGUAGES CXX)
+include(FetchContent)
+FetchContent_Declare(secpolicy SOURCE_DIR "$SOURCE")
+FetchContent_MakeAvailable(secpolicy)
+add_executable(runtime "$SOURCE/examples/runtime.cpp")
+target_link_libraries(runtime PRIVATE secpolicy::secpolicy)
+EOF
+  CXXFLAGS=$SANITIZER cmake -G Ninja -S "$BATS_TEST_TMPDIR" -B "$BATS_TEST_TMPDIR/build"
+  local targets
+  targets=$(cmake --build "$BATS_TEST_TMPDIR/build" --target help)
+  [[ $targets != *test* && $targets != *secpolicy_cli* && $targets != *CLI11* ]]
+  if [[ -z ${SECPOLICY_LONG_TESTS-} ]]; then
+    cmake --build "$BATS_TEST_TMPDIR/build" --target CMakeFiles/runtime.dir/"${SOURCE#/}"/examples/runtime.cpp.o
+    return
+  fi
   cmake --build "$BATS_TEST_TMPDIR/build"
   runs_as_service "$BATS_TEST_TMPDIR/build/runtime"
 }

@@ -120,9 +120,10 @@ struct TeskAccess_UnixSockCreationRule {
   bool grant = false;
 };
 
-// A caller's connection to the access-control module. Construction and destruction leave errno as
-// it was. Every member but the destructor may throw Braxo::Lib::BraxoException, and does so for a
-// domain, label or word that it needs and the kernel does not know.
+// A caller's connection to the access-control module. One thread at a time uses a connection; each
+// may have its own. Processes need not care for each other. Construction and destruction leave
+// errno as it was. Every member but the destructor may throw Braxo::Lib::BraxoException, and does
+// so for a domain, label or word that it needs and the kernel does not know.
 class __attribute__((visibility("default"))) TeskAccessInterfaceImpl {
  public:
   TeskAccessInterfaceImpl();

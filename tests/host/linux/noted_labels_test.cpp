@@ -204,7 +204,7 @@ TEST_P(NotedLabelsTest, PassesOverADirectory) {
 
 TEST_P(NotedLabelsTest, FailsOnAFileThatCannotBeChanged) {
   const std::string path = scratch.Root() / "labelled";
-  for (const unsigned int flag : {FS_IMMUTABLE_FL, FS_APPEND_FL}) {
+  for (const unsigned int flag : {unsigned{FS_IMMUTABLE_FL}, unsigned{FS_APPEND_FL}}) {
     if (!SetFlag(path, flag, true)) GTEST_SKIP() << "this file system makes no file immutable";
     const std::string really = Run([] { return Give("labelled", 8); });
     const std::string noted =

@@ -503,7 +503,7 @@ std::string Compressed(const std::string& program, const std::string& bytes) {
 
 struct Compression {
   const char* program;
-  std::ptrdiff_t checkedByte;  // from the end: part of a check sum or a length
+  std::size_t checkedByte;  // from the end: part of a check sum or a length
 };
 
 class UnpackCompressed : public UnpackTardisks,
