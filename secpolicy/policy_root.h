@@ -17,6 +17,11 @@ inline constexpr char kDomainsDir[] = "domains";
 inline constexpr char kTardisksDir[] = "tardisks";
 inline constexpr char kFileLabelsDir[] = "fileLabels";
 
+// The directories of the fixed root that have a part of its policy to themselves: partner domains,
+// under its domains, and the early policy.
+inline constexpr char kPartnersDir[] = "plugins";
+inline constexpr char kEarlyDir[] = "early";
+
 // Where the tardisks themselves lie.
 inline constexpr char kTardiskImagesDir[] = "/tardisks/";
 

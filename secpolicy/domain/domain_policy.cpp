@@ -56,18 +56,18 @@ void DomainPolicy::ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
                                            std::map<unsigned int, std::queue<std::string>>& parsed,
                                            PolicyObserver& observer) {
   Problem problem{.file = policyFile};
-  for (auto& [line, words] : parsed) {
-    if (words.empty()) continue;
+  for (auto& [line, tokens] : parsed) {
+    if (tokens.empty()) continue;
     problem.line = line;
     TellRefusal(problem, observer,
-                [&, &lineWords = words] { ParseLine(lineWords, access, problem); });
+                [&, &lineTokens = tokens] { ParseLine(lineTokens, access, problem); });
   }
 }
 
-void DomainPolicy::ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access,
+void DomainPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
                              Problem& problem) {
-  const std::string keyword = std::move(words.front());
-  words.pop();
+  const std::string keyword = std::move(tokens.front());
+  tokens.pop();
   const auto rules = ruleSets.find(keyword);
   if (rules == ruleSets.end()) {
     problem.fault = Fault::kRuleType;
@@ -75,7 +75,7 @@ void DomainPolicy::ParseLine(std::queue<std::string>& words, TeskAccessInterface
     problem.reason = "invalid policy rule type (" + keyword + ")";
     RaisePolicyParseError(problem.line, name, problem.reason);
   }
-  RuleLine line(problem.line, name, id, words, problem);
+  RuleLine line(problem.line, name, id, tokens, problem);
   rules->second->AddLine(line, access);
 }
 

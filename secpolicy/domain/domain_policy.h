@@ -28,9 +28,10 @@ class DomainPolicy {
                                std::map<unsigned int, std::queue<std::string>>& parsed,
                                PolicyObserver& observer);
 
-  // The same for the line `problem.line`, which has words. Before it throws, `problem` says what is
-  // wrong with the line.
-  void ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access, Problem& problem);
+  // The same for the line `problem.line`, which has tokens. Before it throws, `problem` says what
+  // is wrong with the line.
+  void ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
+                 Problem& problem);
 
   // Checks the rules of each set against each other. Throws at the first set that fails.
   void CheckPolicyConstraints(TeskAccessInterfaceImpl& access);

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/observed/policy_lines.h"
 #include "secpolicy/parse/directory.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
@@ -42,8 +43,8 @@ struct LabelledDirectory {
 };
 
 LabelledDirectory LabelAndOpen(const std::string& dir, const std::string& label,
-                               TeskAccessInterfaceImpl& access) {
-  SetFileLabel(dir, label, access);
+                               TeskAccessInterfaceImpl& access, int& error) {
+  SetFileLabel(dir, label, access, error);
   Directory entries(dir);
   if (!entries.IsOpen()) RaiseError("Unable to open directory " + dir);
   return {dir, std::move(entries)};
@@ -53,13 +54,19 @@ LabelledDirectory LabelAndOpen(const std::string& dir, const std::string& label,
 
 void SetFileLabel(const std::string& path, const std::string& label,
                   TeskAccessInterfaceImpl& access) {
+  int unheard = 0;
+  SetFileLabel(path, label, access, unheard);
+}
+
+void SetFileLabel(const std::string& path, const std::string& label,
+                  TeskAccessInterfaceImpl& access, int& error) {
   const std::uint32_t id = access.LookupLabel(label, TESKACCESS_LABEL_OBJECT);
   if (id == kNoSuchLabel) RaiseError(StrCat("Invalid label (", label, ") for file ", path));
 
   errno = 0;
   // Replace-only: a file that never carried the attribute is not ours to label.
   if (Zorvan::Kernel::SetXattr(path.c_str(), kAttribute, &id, sizeof id, XATTR_REPLACE) != 0) {
-    const int error = errno;
+    error = errno;
     RaiseError(StrCat("Unable to set file label (", label, ") for file ", path, ": ",
                       std::strerror(error)));
   }
@@ -67,9 +74,15 @@ void SetFileLabel(const std::string& path, const std::string& label,
 
 void SetDirLabelRecursive(const std::string& dir, const std::string& label,
                           TeskAccessInterfaceImpl& access) {
+  int unheard = 0;
+  SetDirLabelRecursive(dir, label, access, unheard);
+}
+
+void SetDirLabelRecursive(const std::string& dir, const std::string& label,
+                          TeskAccessInterfaceImpl& access, int& error) {
   // Not by calling itself: how deep a tree is is not ours to say, and a full stack ends a process.
   std::stack<LabelledDirectory> open;
-  open.push(LabelAndOpen(dir, label, access));
+  open.push(LabelAndOpen(dir, label, access, error));
   while (!open.empty()) {
     LabelledDirectory& current = open.top();
     const dirent* const entry = current.entries.Next();
@@ -79,8 +92,8 @@ void SetDirLabelRecursive(const std::string& dir, const std::string& label,
     }
     if (!IsLabelled(entry->d_type)) continue;
     const std::string child = current.path + "/" + entry->d_name;
-    SetFileLabel(child, label, access);
-    if (entry->d_type == DT_DIR) open.push(LabelAndOpen(child, label, access));
+    SetFileLabel(child, label, access, error);
+    if (entry->d_type == DT_DIR) open.push(LabelAndOpen(child, label, access, error));
   }
 }
 

@@ -27,7 +27,7 @@ std::string LineMessage(const std::string& file, unsigned int line, const std::s
   RaiseError(LineMessage(problem.file, problem.line, problem.reason));
 }
 
-// An unknown label is told in the kernel's own words.
+// An unknown label is told in the kernel's own tokens.
 void ValidateLabel(const std::string& label, TeskAccessInterfaceImpl& access, Problem& problem) {
   try {
     access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
@@ -59,22 +59,22 @@ void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceIm
   std::map<unsigned int, std::queue<std::string>> parsed;
   TellFailure(file, observer, [&] { ParseFile(file, parsed); });
   Problem problem{.file = file};
-  for (auto& [line, words] : parsed) {
-    if (words.empty()) continue;
+  for (auto& [line, tokens] : parsed) {
+    if (tokens.empty()) continue;
     problem.line = line;
     TellRefusal(problem, observer,
-                [&, &lineWords = words] { ParseLine(lineWords, access, problem); });
+                [&, &lineTokens = tokens] { ParseLine(lineTokens, access, problem); });
     observer.OnFileLabel(fileLabels.back());
   }
 }
 
-void FileLabelPolicy::ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access,
+void FileLabelPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
                                 Problem& problem) {
-  if (words.size() != 2) {
+  if (tokens.size() != 2) {
     Refuse(problem, Fault::kArgumentCount, Problem::kWholeLine, "incorrect no of parameters");
   }
-  const std::string& pattern = words.front();
-  const std::string& label = words.back();
+  const std::string& pattern = tokens.front();
+  const std::string& label = tokens.back();
   // Before the pattern is looked at.
   ValidateLabel(label, access, problem);
 

@@ -21,7 +21,8 @@ class FileLabelPolicy {
 
   // Appends the label of the line `problem.line` of the file `problem.file`. Before it throws,
   // `problem` says what is wrong with the line.
-  void ParseLine(std::queue<std::string>& words, TeskAccessInterfaceImpl& access, Problem& problem);
+  void ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
+                 Problem& problem);
 
   // Applies and drops all labels, in order. One that fails is reported; throws BraxoException at
   // the end when one did.

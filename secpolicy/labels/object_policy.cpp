@@ -15,20 +15,20 @@ void ObjectPolicy::ParsePolicy(const std::string& path, PolicyObserver& observer
   std::map<unsigned int, std::queue<std::string>> parsed;
   TellFailure(path, observer, [&] { ParseFile(path, parsed); });
   Problem problem{.file = path};
-  for (auto& [line, words] : parsed) {
+  for (auto& [line, tokens] : parsed) {
     problem.line = line;
-    TellRefusal(problem, observer, [&, &lineWords = words] { ParseLine(lineWords, problem); });
+    TellRefusal(problem, observer, [&, &lineTokens = tokens] { ParseLine(lineTokens, problem); });
   }
 }
 
-void ObjectPolicy::ParseLine(std::queue<std::string>& words, Problem& problem) {
-  if (words.size() != 1) {
+void ObjectPolicy::ParseLine(std::queue<std::string>& tokens, Problem& problem) {
+  if (tokens.size() != 1) {
     problem.fault = Fault::kArgumentCount;
     problem.word = Problem::kWholeLine;
     problem.reason = "cannot define more than one object per line";
     RaiseError(Braxo::Misc::StrCat(problem.file, ":", problem.line, " : ", problem.reason));
   }
-  names.push_back(std::move(words.front()));
+  names.push_back(std::move(tokens.front()));
 }
 
 void ObjectPolicy::SetObjects(TeskAccessInterfaceImpl& access) {

@@ -18,7 +18,7 @@ class ObjectPolicy {
 
   // Appends the name in the line `problem.line` of the file `problem.file`. Before it throws,
   // `problem` says what is wrong with the line.
-  void ParseLine(std::queue<std::string>& words, Problem& problem);
+  void ParseLine(std::queue<std::string>& tokens, Problem& problem);
 
   // Makes the kernel's object labels equal to the names. Throws what the kernel throws.
   void SetObjects(TeskAccessInterfaceImpl& access);

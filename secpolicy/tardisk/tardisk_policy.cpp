@@ -100,18 +100,18 @@ void TardiskPolicySteps::ParsePolicy(TeskAccessInterfaceImpl& access) {
   std::map<unsigned int, std::queue<std::string>> parsed;
   TellFailure(file, observer, [&] { ParseFile(file, parsed); });
   Problem problem{.file = file};
-  for (auto& [line, words] : parsed) {
-    if (words.empty()) continue;
+  for (auto& [line, tokens] : parsed) {
+    if (tokens.empty()) continue;
     problem.line = line;
     TellRefusal(problem, observer,
-                [&, &lineWords = words] { ParseLine(tardisk, lineWords, access, problem); });
+                [&, &lineTokens = tokens] { ParseLine(tardisk, lineTokens, access, problem); });
   }
 }
 
-void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::string>& words,
+void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::string>& tokens,
                                    TeskAccessInterfaceImpl& access, Problem& problem) {
-  const std::string type = std::move(words.front());
-  words.pop();
+  const std::string type = std::move(tokens.front());
+  tokens.pop();
   const auto rules = policy.ruleSets.find(type);
   if (rules == policy.ruleSets.end()) {
     problem.fault = Fault::kRuleType;
@@ -119,7 +119,7 @@ void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::s
     problem.reason = "invalid tardisk policy rule type (" + type + ")";
     RaiseTardiskParseError(problem.file, problem.line, problem.reason);
   }
-  rules->second->AddLine(tardisk, words, access, problem);
+  rules->second->AddLine(tardisk, tokens, access, problem);
 }
 
 void TardiskPolicySteps::SetPolicy(TeskAccessInterfaceImpl& access) {

@@ -22,7 +22,7 @@ class TardiskPolicySteps {
 
   // Reads the line `problem.line` of the policy file; `tardisk` is the tardisk that it came from.
   // Throws BraxoException for a bad line, after `problem` says what is wrong with it.
-  void ParseLine(const std::string& tardisk, std::queue<std::string>& words,
+  void ParseLine(const std::string& tardisk, std::queue<std::string>& tokens,
                  TeskAccessInterfaceImpl& access, Problem& problem);
 
  private:

@@ -12,8 +12,8 @@
 #include "library_call.h"
 #include "load/load_run.h"
 #include "policy_dir.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
-#include "secpolicy/secpolicy.h"
 #include "summary.h"
 #include "text/section.h"
 #include "verb.h"
@@ -22,8 +22,8 @@ namespace SecPolicyCli {
 namespace {
 
 // A root whose services all start after the full load needs no early policy.
-void LoadEarly(const std::string& directory) {
-  if (File_IsDirectory(directory.c_str())) return SecPolicy::LoadPolicyEarly(directory);
+void LoadEarly(const std::string& directory, SecPolicy::PolicyObserver& observer) {
+  if (File_IsDirectory(directory.c_str())) return SecPolicy::LoadPolicyEarly(directory, observer);
   SecPolicy::SecpolicyInfo(std::string("No early policy: there is no directory ") +
                            SecPolicy::kEarlyPolicyRoot);
 }
@@ -64,7 +64,8 @@ ExitCode BootNow(const Options& options) {
        .mend = Mend,
        .prepare =
            [&](LoadTiming& phases) {
-             root = LinuxHost::AssembleRoot(RulesOf(options));
+             root =
+                 LinuxHost::AssembleRoot(RulesOf(options), [&] { phases.EndPhase("unpacking"); });
              WriteSection("edited files that were replaced", root.editedFiles, MostShown(options),
                           std::cerr);
              phases.EndPhase("first labels");

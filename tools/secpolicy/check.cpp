@@ -19,8 +19,6 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr char kPartnerDir[] = "plugins";
-
 using Write = void (*)(const DiagnosticList& diagnostics, std::ostream& output);
 
 const std::map<std::string, Write> kFormats = {
@@ -46,7 +44,7 @@ void HideOldDomains(LinuxHost::PolicyTransaction& load, const std::string& root)
   const std::string domains = root + "/" + SecPolicy::kDomainsDir;
   std::vector<std::string> names;
   AddNames(domains, "", names);
-  AddNames(domains + "/" + kPartnerDir, SecPolicy::kPartnerPrefix, names);
+  AddNames(domains + "/" + SecPolicy::kPartnersDir, SecPolicy::kPartnerPrefix, names);
   load.BeginLoad({.kind = LinuxHost::LoadKind::kFull, .directory = root, .domains = names});
 }
 
@@ -54,12 +52,12 @@ void HideOldDomains(LinuxHost::PolicyTransaction& load, const std::string& root)
 // tardisks may be missing.
 void CheckPolicy(CheckRun& run, const std::string& root) {
   const std::string domains = root + "/" + SecPolicy::kDomainsDir;
-  const std::string earlyDomains = root + "/early/" + SecPolicy::kDomainsDir;
-  const std::string partners = domains + "/" + kPartnerDir;
+  const std::string earlyDomains = root + "/" + SecPolicy::kEarlyDir + "/" + SecPolicy::kDomainsDir;
+  const std::string partners = domains + "/" + SecPolicy::kPartnersDir;
   const std::string tardisks = root + "/" + SecPolicy::kTardisksDir;
   CheckObjects(run, root + "/" + SecPolicy::kObjectsDir);
   if (File_IsDirectory(earlyDomains.c_str())) CheckDomains(run, earlyDomains, "");
-  CheckDomains(run, domains, "", kPartnerDir);
+  CheckDomains(run, domains, "", SecPolicy::kPartnersDir);
   if (File_IsDirectory(partners.c_str())) CheckDomains(run, partners, SecPolicy::kPartnerPrefix);
   if (File_IsDirectory(tardisks.c_str())) CheckTardisks(run, tardisks);
   CheckFileLabels(run, root + "/" + SecPolicy::kFileLabelsDir);

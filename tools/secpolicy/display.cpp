@@ -3,14 +3,15 @@
 #include <list>
 
 #include "command_line.h"
+#include "error_list.h"
 #include "host/linux/operation/stable_view.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
 #include "library_call.h"
 #include "root.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
-#include "secpolicy/secpolicy.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -34,13 +35,14 @@ std::string Advise() {
 }
 
 // Throws the library's own failure where there is no directory of tardisks: nothing was booted.
-void RequireTardisks() {
+void RequireTardisks(SecPolicy::PolicyObserver& observer) {
   std::list<std::string> tardisks;
-  if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) SecPolicy::GetAllTardisks(tardisks);
+  if (!File_IsDirectory(SecPolicy::kTardiskImagesDir))
+    SecPolicy::GetAllTardisks(tardisks, observer);
 }
 
-void WriteJson(const std::string& domainId) {
-  RequireTardisks();
+void WriteJson(const std::string& domainId, SecPolicy::PolicyObserver& observer) {
+  RequireTardisks(observer);
   SecPolicy::TeskAccessInterfaceImpl access;
   Policy::InstalledPolicy policy = ReadInstalledPolicy(access);
   if (!domainId.empty()) {
@@ -61,13 +63,14 @@ Action Define(Syntax& syntax) {
       .Check(CheckDomainId);
   syntax.AddFormat(*format, "it", {"text", "json"});
   return [domain, format] {
-    const auto show = *format == "json" ? WriteJson : SecPolicy::DisplayPolicy;
+    void (*show)(const std::string&, SecPolicy::PolicyObserver&) = SecPolicy::DisplayPolicy;
+    if (*format == "json") show = WriteJson;
     return CallLibrary(
         "display",
-        [&] {
+        [&](ErrorList& errors) {
           // A load may end meanwhile.
           const LinuxHost::StableView view;
-          show(*domain);
+          show(*domain, errors);
         },
         Advise);
   };

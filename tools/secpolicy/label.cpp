@@ -123,8 +123,8 @@ ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   std::string ending;
   return CallLibrary(
       verb,
-      [&] {
-        LabelRun run;
+      [&](ErrorList& errors) {
+        LabelRun run(errors);
         ending = kind.run(run, arguments);
       },
       AdviseOnPrivilege, [&] { return ending; });

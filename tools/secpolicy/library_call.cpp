@@ -3,19 +3,19 @@
 #include <exception>
 #include <iostream>
 
-#include "error_watch.h"
+#include "error_list.h"
 #include "summary.h"
 #include "text/count.h"
 
 namespace SecPolicyCli {
 
-ExitCode CallLibrary(const std::string& verb, const std::function<void()>& call,
+ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList& errors)>& call,
                      const std::function<std::string()>& advice,
                      const std::function<std::string()>& ending) {
-  const ErrorWatch errors(std::cerr);
+  ErrorList errors;
   std::string failure;
   try {
-    call();
+    call(errors);
   } catch (const std::exception& raised) {
     failure = raised.what();
     if (failure.empty()) failure = "failed";

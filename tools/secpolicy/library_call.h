@@ -7,11 +7,13 @@
 
 namespace SecPolicyCli {
 
+class ErrorList;
+
 // Makes the call `call` for the verb `verb`, which is no load, and ends it with one summary line on
-// standard error. An error that the library reports counts as a failure even when the call returns
+// standard error. An error that is added to `errors` counts as a failure even when the call returns
 // normally. `advice` is asked after a failure for what the user can do about it; it may return
 // nothing. `ending` is asked after a success for what the summary says; without it, that is "done".
-ExitCode CallLibrary(const std::string& verb, const std::function<void()>& call,
+ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList& errors)>& call,
                      const std::function<std::string()>& advice,
                      const std::function<std::string()>& ending = {});
 

@@ -2,8 +2,8 @@
 #include "load/load_run.h"
 #include "policy_dir.h"
 #include "rehearsal/planned_load.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
-#include "secpolicy/secpolicy.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -1,7 +1,7 @@
 #include "load/load_run.h"
 #include "policy_dir.h"
+#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
-#include "secpolicy/secpolicy.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -1,6 +1,7 @@
+#include "error_list.h"
 #include "library_call.h"
 #include "root.h"
-#include "secpolicy/secpolicy.h"
+#include "secpolicy/observed/loading.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -9,7 +10,8 @@ namespace {
 Action Define(Syntax&) {
   return [] {
     return CallLibrary(
-        "restore", [] { SecPolicy::RestoreDomainEnforcement(); }, AdviseOnPrivilege);
+        "restore", [](ErrorList& errors) { SecPolicy::RestoreDomainEnforcement(errors); },
+        AdviseOnPrivilege);
   };
 }
 

@@ -34,7 +34,7 @@ ExitCode RollBack(const std::string& name) {
                                   "'. 'secpolicy history' lists what is saved.");
   }
   return CallLibrary(
-      "rollback", [&] { PutBack(name); }, AdviseOnPrivilege,
+      "rollback", [&](ErrorList&) { PutBack(name); }, AdviseOnPrivilege,
       [] {
         return "done; files keep the labels that they have, and 'secpolicy label verify' compares "
                "them with the policy";

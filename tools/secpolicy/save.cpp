@@ -19,7 +19,10 @@ ExitCode Save(const std::string& name, bool force) {
                               "' already. Give --force to replace it, or choose another name.");
   }
   return CallLibrary(
-      "save", [&] { LinuxHost::SaveState(LinuxHost::StatePath(), SavedStatePath(name), force); },
+      "save",
+      [&](ErrorList&) {
+        LinuxHost::SaveState(LinuxHost::StatePath(), SavedStatePath(name), force);
+      },
       AdviseOnPrivilege);
 }
 

@@ -51,12 +51,12 @@ ExitCode Show(const Setting& setting, const std::string& key) {
                                   " " + key + " " + setting.value + "'.");
   }
   return CallLibrary(
-      "settings", [&] { std::cout << *value << std::endl; }, AdviseOnPrivilege);
+      "settings", [&](ErrorList&) { std::cout << *value << std::endl; }, AdviseOnPrivilege);
 }
 
 ExitCode Store(const Setting& setting, const std::string& key, const std::string& value) {
   return CallLibrary(
-      "settings", [&] { setting.store(key, value); }, AdviseOnPrivilege);
+      "settings", [&](ErrorList&) { setting.store(key, value); }, AdviseOnPrivilege);
 }
 
 Action DefineSetting(const Setting& setting, Syntax& syntax) {

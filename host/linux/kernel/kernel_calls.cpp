@@ -141,7 +141,8 @@ std::vector<FilePolicy> ReadFilePolicies(std::uint64_t address, std::uint32_t co
 std::uint32_t AddFilePolicies(HostState& state, Args args) {
   const std::uint32_t count = Unsigned(args[3]);
   if (count == 0 || count > kMaxBatch) throw HostError(EINVAL, "bad number of file policies");
-  const auto policies = ReadFilePolicies(args[2], count, Unsigned(args[1]), Signed(args[0]));
+  auto policies = ReadFilePolicies(args[2], count, Unsigned(args[1]), Signed(args[0]));
+  for (FilePolicy& policy : policies) policy.line = state.CurrentLine();
   Store(args[4], std::uint32_t{0});
   state.FilePolicies().Install(policies);
   Store(args[4], count);

@@ -194,14 +194,16 @@ void UnpackTardisks(const std::vector<std::string>& images, const TardiskRules& 
   for (const std::string& image : images) Unpack(image, rules, root);
 }
 
-AssembledRoot AssembleRoot(const TardiskRules& rules) {
+AssembledRoot AssembleRoot(const TardiskRules& rules, const std::function<void()>& unpacked) {
   const AtRoot atRoot;
   // A root that has never run has no place for what runs.
   mkdir("/run", 0755);
   // A state that cannot be used is told before a file is changed.
   AssembledRoot root;
   root.labelAttribute = UsableLabelAttribute(HostState::Current().Directory());
-  UnpackTardisks(ListImages(rules), rules, root);
+  const std::vector<std::string> images = ListImages(rules);
+  UnpackTardisks(images, rules, root);
+  if (!images.empty()) unpacked();
   GiveFirstLabels(root.labelAttribute);
   return root;
 }

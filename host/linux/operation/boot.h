@@ -3,6 +3,7 @@
 #include <sys/types.h>
 
 #include <cstddef>
+#include <functional>
 #include <map>
 #include <string>
 #include <vector>
@@ -38,11 +39,13 @@ struct BootPlan {
 // in /tardisks is checked to its last byte; then all are unpacked into the root, in byte order of
 // name; a file that several bring is the last one's. Every file of the root file system, the images
 // included, gets its first label, "unlabeled". What belongs to the running system (/dev, /proc,
-// /run, /sys) is left alone. Changes the working directory while it runs.
+// /run, /sys) is left alone. Changes the working directory while it runs. `unpacked` is told when
+// all is unpacked, if there was anything.
 // Throws Braxo::Lib::BraxoException for a state that cannot be used and for the first archive that
 // is damaged or refused, and has changed no file then; or when an entry cannot be written; or,
 // after all others were labelled, for files that could not be; what was done until then stays.
-AssembledRoot AssembleRoot(const TardiskRules& rules);
+AssembledRoot AssembleRoot(
+    const TardiskRules& rules, const std::function<void()>& unpacked = [] {});
 
 // The part of a boot that acts on the state: it goes back to the built-in contents with the label
 // attribute and the origins of `root`, and no wanted setting counts as applied.

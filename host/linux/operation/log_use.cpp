@@ -14,8 +14,4 @@ DroppedLog::DroppedLog() : before(std::exchange(CurrentLogUse().dropsLines, true
 
 DroppedLog::~DroppedLog() { CurrentLogUse().dropsLines = before; }
 
-void WatchLog(const std::function<void(const std::string& message)>& watcher) {
-  CurrentLogUse().watcher = watcher;
-}
-
 }  // namespace LinuxHost

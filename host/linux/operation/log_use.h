@@ -1,8 +1,5 @@
 #pragma once
 
-#include <functional>
-#include <string>
-
 // What the command asks of the host's log. Each lasts as long as its object, and what was before
 // comes back.
 namespace LinuxHost {
@@ -30,9 +27,5 @@ class DroppedLog {
  private:
   const bool before;
 };
-
-// From now on hands every line, errors included, to `watcher` before it goes to its log; an empty
-// function ends that.
-void WatchLog(const std::function<void(const std::string& message)>& watcher);
 
 }  // namespace LinuxHost

@@ -179,11 +179,14 @@ void PolicyTransaction::BeginLoad(const LoadSource& source) {
   state->SetCurrentLoad(static_cast<std::int64_t>(number));
 }
 
+void PolicyTransaction::SetLine(unsigned int line) { state->SetCurrentLine(line); }
+
 LoadEnding PolicyTransaction::EndLoad(bool remove) {
   Store& store = state->Database();
   const int kindNumber = static_cast<int>(kind);
   const std::int64_t number = state->CurrentLoad();
   state->SetCurrentLoad(0);
+  state->SetCurrentLine(0);
   state->Domains().Hide({});
   for (const TableStatements& table : kTables) store.Run(table.dropUncovered);
 
@@ -217,6 +220,7 @@ void PolicyTransaction::Undo() {
   if (transaction == nullptr) return;
   transaction.reset();
   state->SetCurrentLoad(0);
+  state->SetCurrentLine(0);
   state->Domains().Hide({});
   state->Forget();
 }

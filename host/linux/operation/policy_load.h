@@ -51,6 +51,10 @@ class PolicyTransaction {
   // have defined and that no file defines any more cannot be named in rules.
   void BeginLoad(const LoadSource& source);
 
+  // The rules about paths that are installed from now on are in this line of the file of their
+  // domain: the kernel is told paths without their lines.
+  void SetLine(unsigned int line);
+
   // The files have been read. With `remove`, what earlier loads of the kind have installed and this
   // one has not is removed, and what it had replaced is back; domains in which worlds run stay.
   LoadEnding EndLoad(bool remove);

@@ -1,6 +1,5 @@
 #include "host/linux/operation/rule_origins.h"
 
-#include <unordered_map>
 #include <utility>
 
 #include "host/linux/state/host_state.h"
@@ -39,32 +38,6 @@ std::vector<RuleSource> ReadSources(Rows rows) {
 }
 
 }  // namespace
-
-void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines) {
-  std::unordered_map<std::string_view, unsigned int> lineOf;
-  for (const PathLine& line : lines) lineOf[line.path] = line.line;
-  Store& store = HostState::Current().Database();
-  Transaction transaction(store);
-  std::vector<std::pair<std::int64_t, unsigned int>> found;
-  {
-    Rows rows = store.Select(
-        "SELECT f.id, f.path FROM file_policy AS f JOIN domain AS d ON d.id = f.domain_id "
-        "WHERE d.name = ?1 AND f.world = 0 AND "
-        "f.load = (SELECT max(number) FROM policy_load WHERE kind = ?2) ORDER BY f.id",
-        domain, static_cast<int>(kind));
-    unsigned int line = 0;
-    while (rows.Next()) {
-      const auto written = lineOf.find(rows.Text(1));
-      // Else it is what the path before it resolves to: they are installed together.
-      if (written != lineOf.end()) line = written->second;
-      found.emplace_back(rows.Integer(0), line);
-    }
-  }
-  for (const auto& [id, line] : found) {
-    store.Run("UPDATE file_policy SET line = ?2 WHERE id = ?1", id, line);
-  }
-  transaction.Commit();
-}
 
 std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind) {
   Store& store = HostState::Current().Database();

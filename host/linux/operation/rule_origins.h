@@ -41,17 +41,6 @@ void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigi
 // Gives those of the domain's rules their file and line that have recorded ones.
 void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules);
 
-// A line about a path in the file of a domain. The kernel is told paths without their lines.
-struct PathLine {
-  std::string path;
-  unsigned int line = 0;
-};
-
-// Records the lines of the path rules that the latest load of the kind has installed for the
-// domain; `lines` are those of its file, in order. A rule for what a path resolves to is of the
-// same line.
-void RecordPathLines(LoadKind kind, const std::string& domain, std::span<const PathLine> lines);
-
 // The sources of all rules of the kind that the domain `id` has, in the order in which the rules
 // are read.
 std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind);

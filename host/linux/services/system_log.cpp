@@ -29,9 +29,6 @@ constexpr char kInformationTag[] = "[INFO]";
 // The kernel refuses a record of more than about 976 bytes.
 constexpr std::size_t kMaxRecordText = 900;
 
-// Where the library must not go to the system log past the host.
-bool TakesEveryLine(const LogUse& use) { return use.showsInformation || use.watcher; }
-
 // Never waits: a daemon with a full queue does not take messages.
 bool AcceptsConnection(const char* path, int type) {
   sockaddr_un address{};
@@ -143,17 +140,16 @@ namespace TeskCtl::System {
 
 bool SyslogIsRunning() {
   const LinuxHost::LogUse& use = LinuxHost::CurrentLogUse();
-  return !use.dropsLines && !LinuxHost::TakesEveryLine(use) && LinuxHost::SyslogDaemonListens();
+  return !use.dropsLines && !use.showsInformation && LinuxHost::SyslogDaemonListens();
 }
 
 void WriteToKlog(const std::string& message, const std::string& tag) {
   const LinuxHost::LogUse& use = LinuxHost::CurrentLogUse();
-  if (use.watcher) use.watcher(message);
   if (use.dropsLines) return;
   if (use.showsInformation && tag == LinuxHost::kInformationTag) {
     std::cerr << message << std::endl;
   }
-  if (LinuxHost::TakesEveryLine(use) && LinuxHost::SyslogDaemonListens()) {
+  if (use.showsInformation && LinuxHost::SyslogDaemonListens()) {
     return LinuxHost::WriteToSyslog(message, tag);
   }
   LinuxHost::WriteToKernelLog(message, tag);

@@ -1,20 +1,18 @@
 #pragma once
 
-#include <functional>
 #include <string>
 #include <vector>
 
 // Where this host's log lines go.
 namespace LinuxHost {
 
-// What becomes of lines beside, or in place of, going to their log. While they are shown or watched
-// the host takes every line itself: SyslogIsRunning() answers false, and WriteToKlog() hands the
+// What becomes of lines beside, or in place of, going to their log. While they are shown the
+// host takes every line itself: SyslogIsRunning() answers false, and WriteToKlog() hands the
 // line on to a running system log daemon in the form that the library would have given it, else to
 // the kernel log. So each line still reaches the log it belongs to.
 struct LogUse {
-  bool showsInformation = false;                            // on standard error too, one a line
-  bool dropsLines = false;                                  // those that are shown included
-  std::function<void(const std::string& message)> watcher;  // handed every line; may be empty
+  bool showsInformation = false;  // on standard error too, one a line
+  bool dropsLines = false;        // those that are shown included
 };
 
 // That of this process: the functions of the contract take no parameter for it. Only

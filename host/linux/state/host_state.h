@@ -81,6 +81,10 @@ class HostState : public std::enable_shared_from_this<HostState> {
   std::int64_t CurrentLoad() const { return currentLoad; }
   void SetCurrentLoad(std::int64_t number) { currentLoad = number; }
 
+  // The line of the policy that is installed now, for what is installed without one; 0 for none.
+  unsigned int CurrentLine() const { return currentLine; }
+  void SetCurrentLine(unsigned int line) { currentLine = line; }
+
  private:
   Store store;
   std::unique_ptr<DomainTable> domains;
@@ -93,6 +97,7 @@ class HostState : public std::enable_shared_from_this<HostState> {
   Store::CommitMark seen{};
   std::string labelAttribute;
   std::int64_t currentLoad = 0;
+  unsigned int currentLine = 0;
 };
 
 }  // namespace LinuxHost

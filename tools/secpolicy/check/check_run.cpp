@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <fstream>
 #include <iterator>
 #include <string_view>
 
@@ -48,20 +47,6 @@ void CheckName(CheckRun& run, const SourceFile& file, const std::string& name) {
   run.diagnostics.Add(file.About(
       Codes::kEditorCopy, "this looks like a copy that was left behind: a load reads it as policy",
       "move it out of the directory"));
-}
-
-void WriteLines(const std::string& path, const SourceFile& file,
-                const std::vector<unsigned int>& numbers, std::size_t begin, std::size_t size) {
-  std::ofstream output(path, std::ios::binary | std::ios::trunc);
-  for (std::size_t i = begin; i < begin + size; ++i) output << file.Text(numbers[i]) << '\n';
-}
-
-// Drops "PATH:LINE : " from the beginning of a message.
-std::string WithoutPlace(const std::string& message, const std::string& path) {
-  constexpr std::string_view kEnd = " : ";
-  if (!message.starts_with(path + ":")) return message;
-  const std::size_t end = message.find(kEnd, path.size());
-  return end == std::string::npos ? message : message.substr(end + kEnd.size());
 }
 
 }  // namespace
@@ -129,38 +114,12 @@ void CheckIsAbsolute(CheckRun& run, const SourceFile& file, unsigned int line, s
                                   "a path begins with a slash"));
 }
 
-std::vector<unsigned int> ParseEveryLine(
-    const SourceFile& file, const std::string& scratchFile,
-    const std::function<void(const std::string& path)>& parse,
-    const std::function<std::size_t()>& count,
-    const std::function<void(unsigned int line, const std::string& message)>& refused) {
-  std::vector<unsigned int> numbers;
-  for (const auto& [number, words] : file.Lines()) numbers.push_back(number);
-
-  std::vector<unsigned int> accepted;
-  std::string path = file.Path();
-  std::size_t begin = 0;
-  std::size_t size = numbers.size();
-  while (begin < numbers.size()) {
-    const std::size_t before = count();
-    std::string refusal;
-    try {
-      parse(path);
-    } catch (const BraxoException& failure) {
-      refusal = WithoutPlace(failure.what(), path);
-    }
-    const std::size_t end = std::min(begin + count() - before, numbers.size());
-    for (; begin < end; ++begin) accepted.push_back(numbers[begin]);
-    if (begin == numbers.size()) break;
-    // After a refusal the next piece is one line, and then twice as much each time, so that a file
-    // of nothing but bad lines is not read over and over.
-    size = refusal.empty() ? size * 2 : 1;
-    if (!refusal.empty()) refused(numbers[begin++], refusal);
-    size = std::min(size, numbers.size() - begin);
-    WriteLines(scratchFile, file, numbers, begin, size);
-    path = scratchFile;
-  }
-  return accepted;
+void AddRefusal(CheckRun& run, const SourceFile& file, const SecPolicy::Problem& problem,
+                const std::string& hint) {
+  const std::size_t size = file.Lines().at(problem.line).size();
+  const bool isWhole = problem.word >= size;
+  run.diagnostics.Add(file.AtWords(CodeOf(*problem.fault), problem.line, isWhole ? 0 : problem.word,
+                                   isWhole ? size - 1 : problem.word, problem.reason, hint));
 }
 
 }  // namespace SecPolicyCli

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <deque>
-#include <functional>
 #include <map>
 #include <set>
 #include <string>
@@ -65,15 +64,9 @@ bool IsMissing(const std::string& path);
 // Tells when the word `word` of a line is a path that means another file in every directory.
 void CheckIsAbsolute(CheckRun& run, const SourceFile& file, unsigned int line, std::size_t word);
 
-// Hands all lines of `file` to `parse`, which reads the policy file that it is given and throws at
-// a bad line, after it has made `count` grow by one for each line above. Where it throws, it is
-// called again with the lines below, in the file `scratchFile`; `refused` is told the line and the
-// message without its place. Returns the numbers of the lines that were accepted, in order.
-std::vector<unsigned int> ParseEveryLine(
-    const SourceFile& file, const std::string& scratchFile,
-    const std::function<void(const std::string& path)>& parse,
-    const std::function<std::size_t()>& count,
-    const std::function<void(unsigned int line, const std::string& message)>& refused);
+// Adds the problem of a line of `file` that a load does not take.
+void AddRefusal(CheckRun& run, const SourceFile& file, const SecPolicy::Problem& problem,
+                const std::string& hint);
 
 // The parts of a check, in the order in which a load comes to them. `dir` is that of the files.
 void CheckObjects(CheckRun& run, const std::string& dir);

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <string_view>
 #include <tuple>
 #include <utility>
 
@@ -78,32 +77,26 @@ constexpr std::array<const Code*, 34> kAll = {
     &Codes::kUnusedObject,
 };
 
-struct Refusal {
-  std::string_view beginning;
-  const Code* code;
-};
-
-// What the library says itself; every other text is the host's, about a word that it does not know.
-constexpr Refusal kRefusals[] = {
-    {"invalid policy rule type ", &Codes::kRuleType},
-    {"invalid tardisk policy rule type ", &Codes::kRuleType},
-    {"incorrect number of arguments", &Codes::kArgumentCount},
-    {"cannot define more than one object", &Codes::kArgumentCount},
-    {"incorrect no of parameters", &Codes::kArgumentCount},
-    {"invalid keyword ", &Codes::kGrantWord},
-    {"Failed to fetch domain id ", &Codes::kUnknownDomain},
-    {"Unrecognized format for file/dir", &Codes::kTreeMarker},
-    {"Only one rule of this type", &Codes::kSecondRule},
-    {"Unable to open policy ", &Codes::kUnreadable},
-};
-
 }  // namespace
 
 std::span<const Code* const> AllCodes() { return kAll; }
 
-const Code& CodeOfRefusal(const std::string& message) {
-  for (const Refusal& refusal : kRefusals) {
-    if (message.starts_with(refusal.beginning)) return *refusal.code;
+const Code& CodeOf(SecPolicy::Fault fault) {
+  switch (fault) {
+    case SecPolicy::Fault::kRuleType:
+      return Codes::kRuleType;
+    case SecPolicy::Fault::kArgumentCount:
+      return Codes::kArgumentCount;
+    case SecPolicy::Fault::kGrantWord:
+      return Codes::kGrantWord;
+    case SecPolicy::Fault::kUnknownDomain:
+      return Codes::kUnknownDomain;
+    case SecPolicy::Fault::kTreeMarker:
+      return Codes::kTreeMarker;
+    case SecPolicy::Fault::kSecondRule:
+      return Codes::kSecondRule;
+    case SecPolicy::Fault::kUnknownWord:
+      break;
   }
   return Codes::kUnknownWord;
 }

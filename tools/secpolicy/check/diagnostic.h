@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "secpolicy/observed/policy_observer.h"
+
 namespace SecPolicyCli {
 
 enum class Severity { kError, kWarning };
@@ -62,8 +64,8 @@ extern const Code kUnusedObject;
 // All codes: the errors and then the warnings, each in order of name.
 std::span<const Code* const> AllCodes();
 
-// The code of a line that the library refuses, by the library's own text for it.
-const Code& CodeOfRefusal(const std::string& message);
+// The code of a line that the library refuses.
+const Code& CodeOf(SecPolicy::Fault fault);
 
 // "error" or "warning".
 const char* SeverityName(Severity severity);

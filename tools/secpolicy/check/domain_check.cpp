@@ -2,38 +2,41 @@
 #include <cerrno>
 #include <cstddef>
 #include <iterator>
-#include <queue>
+#include <list>
 #include <unordered_map>
 
 #include "check_run.h"
 #include "host/linux/common/host_error.h"
+#include "policy/parameter_range.h"
 #include "rule_form.h"
-#include "secpolicy/domain/capability_param_rules.h"
-#include "secpolicy/domain/domain_policy.h"
-#include "secpolicy/domain/file_path_access_rules.h"
+#include "secpolicy/observed/policy_lines.h"
 #include "text/count.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
-using SecPolicy::CapabilityParamRules;
-using SecPolicy::DomainPolicy;
+using ParameterRules = std::list<TeskCtl::Security::TeskAccess_CapabilityParamRule>;
 using Words = SourceFile::Words;
 
 const char* const kParameterRule = FormOf(Policy::RuleKind::kParameterCheck).keyword;
 const char* const kPathRule = FormOf(Policy::RuleKind::kFilePath).keyword;
 
-std::string WithoutPrefix(const std::string& message, const std::string& prefix) {
-  return message.starts_with(prefix) ? message.substr(prefix.size()) : message;
+bool IsNumber(const std::string& word) {
+  try {
+    Policy::ParseParameterRange(word, "");
+    return true;
+  } catch (const BraxoException&) {
+    return false;
+  }
 }
 
 // The check of one domain's file.
 class DomainCheck {
  public:
-  DomainCheck(CheckRun& checkRun, const SourceFile& policyFile, const std::string& name,
+  DomainCheck(CheckRun& checkRun, const SourceFile& policyFile, const std::string& domainName,
               unsigned int id)
-      : run(checkRun), file(policyFile), policy(name, id) {}
+      : run(checkRun), file(policyFile), name(domainName), lines(domainName, id) {}
 
   void CheckLines() {
     for (const auto& [line, words] : file.Lines()) {
@@ -53,27 +56,10 @@ class DomainCheck {
 
   bool Accepts(unsigned int line, const Words& words) {
     NoteUse(words);
-    std::map<unsigned int, std::queue<std::string>> parsed;
-    for (const std::string& word : words) parsed[line].push(word);
-    try {
-      policy.ProcessParsedPolicyFile(run.access, parsed);
-      return true;
-    } catch (const BraxoException& failure) {
-      Refuse(line, words, failure.what());
-      return false;
-    }
-  }
-
-  void Refuse(unsigned int line, const Words& words, const std::string& failure) {
-    const std::string message =
-        WithoutPrefix(failure, "Error in parsing policy for domain: " + policy.name + ": " +
-                                   std::to_string(line) + " : ");
-    const Code& code = CodeOfRefusal(message);
-    const std::size_t word = FindBlamedWord(code, message, words);
-    const std::string hint = HintForRule(run, code, words, word);
-    const bool wholeLine = word == words.size();
-    run.diagnostics.Add(file.AtWords(code, line, wholeLine ? 0 : word,
-                                     wholeLine ? words.size() - 1 : word, message, hint));
+    SecPolicy::Problem problem{.file = file.Path(), .line = line};
+    if (lines.Read(words, run.access, problem)) return true;
+    AddRefusal(run, file, problem, HintForRule(run, CodeOf(*problem.fault), words, problem.word));
+    return false;
   }
 
   // Also what a bad line names counts as used: its own problem is enough.
@@ -85,7 +71,7 @@ class DomainCheck {
       const std::string& word = words[i + 1];
       if (form->words[i] == Policy::WordKind::kLabel) run.usedLabels.insert(word);
       if (form->words[i] == Policy::WordKind::kDomain && words.back() != "revoke") {
-        run.transitions[policy.name].insert(word);
+        run.transitions[name].insert(word);
       }
     }
   }
@@ -122,7 +108,7 @@ class DomainCheck {
     }
     if (words.size() < 3) return;
     try {
-      SecPolicy::FilePathAccessRules().GetPermission(words[2]);
+      SecPolicy::CheckPermissions(words[2]);
     } catch (const BraxoException& failure) {
       run.diagnostics.Add(file.AtWord(Codes::kBadPermissions, line, 2, failure.what(),
                                       "letters out of r, w and x, each at most once"));
@@ -132,50 +118,50 @@ class DomainCheck {
   // Adds the rules to those that do not contradict each other, twice as many each time; where the
   // host refuses them, half as many, down to the one rule to blame.
   void CheckParameterRules() {
-    auto& rules = dynamic_cast<CapabilityParamRules&>(*policy.ruleSets.at(kParameterRule));
+    ParameterRules& rules = lines.ParameterRules();
     if (Conflict(rules).empty()) return;
-    CapabilityParamRules sound;
+    ParameterRules sound;
     std::size_t size = 1;
-    while (!rules.rules.empty()) {
-      size = std::min(size, rules.rules.size());
-      const auto end = std::next(rules.rules.begin(), static_cast<std::ptrdiff_t>(size));
-      const auto added = rules.rules.begin();
-      sound.rules.splice(sound.rules.end(), rules.rules, added, end);
+    while (!rules.empty()) {
+      size = std::min(size, rules.size());
+      const auto end = std::next(rules.begin(), static_cast<std::ptrdiff_t>(size));
+      const auto added = rules.begin();
+      sound.splice(sound.end(), rules, added, end);
       const std::string refusal = Conflict(sound);
       if (refusal.empty()) {
         size *= 2;
         continue;
       }
       if (size == 1) {
-        RefuseParameterRule(added->line, refusal);
-        sound.rules.erase(added);
+        RefuseParameterRule(*added, refusal);
+        sound.erase(added);
         continue;
       }
-      rules.rules.splice(rules.rules.begin(), sound.rules, added, sound.rules.end());
+      rules.splice(rules.begin(), sound, added, sound.end());
       size /= 2;
     }
   }
 
   // A number that is none is to blame itself, else the rule is.
-  void RefuseParameterRule(unsigned int line, const std::string& refusal) {
+  void RefuseParameterRule(const ParameterRules::value_type& rule, const std::string& refusal) {
     constexpr std::size_t kFirstNumber = 2;
-    const Words& words = file.Lines().at(line);
-    const std::size_t word = FindBlamedWord(Codes::kParameterConflict, refusal, words);
-    if (word < kFirstNumber || word == words.size()) {
-      Add(Codes::kParameterConflict, line, words, refusal);
+    const auto& [line, domainId, domainName, check, first, second, grant] = rule;
+    if (!IsNumber(first)) {
+      run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, kFirstNumber, refusal));
+    } else if (!second.empty() && !IsNumber(second)) {
+      run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, kFirstNumber + 1, refusal));
     } else {
-      run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, word, refusal));
+      Add(Codes::kParameterConflict, line, file.Lines().at(line), refusal);
     }
   }
 
   // Why the host refuses the rules; empty when it does not.
-  std::string Conflict(CapabilityParamRules& rules) {
+  std::string Conflict(ParameterRules& rules) {
     try {
-      rules.CheckConstraints(policy.name, run.access);
+      run.access.CheckCapabilityParamRuleConstraints(name, rules);
       return "";
     } catch (const BraxoException& failure) {
-      return WithoutPrefix(failure.what(),
-                           "Policy constraint error for domain: " + policy.name + " : ");
+      return failure.what();
     }
   }
 
@@ -185,7 +171,8 @@ class DomainCheck {
 
   CheckRun& run;
   const SourceFile& file;
-  DomainPolicy policy;
+  std::string name;
+  SecPolicy::DomainLines lines;
   std::unordered_map<std::string, Saying> sayings;  // the latest of each thing
 };
 

@@ -1,20 +1,22 @@
 #include <sys/stat.h>
 
+#include <deque>
 #include <filesystem>
 #include <optional>
 #include <tuple>
+#include <utility>
 
 #include "check_run.h"
 #include "host/linux/operation/noted_labels.h"
 #include "root.h"
 #include "rule_form.h"
-#include "secpolicy/labels/file_label_policy.h"
+#include "secpolicy/observed/policy_lines.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
-using SecPolicy::FileLabelPolicy;
+using SecPolicy::FileLabel;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
 constexpr std::uint32_t kNoSuchLabel = 1;
@@ -22,32 +24,31 @@ constexpr std::uint32_t kNoSuchLabel = 1;
 struct LabelLine {
   const SourceFile* file;
   unsigned int line;
-  FileLabelPolicy::FileLabel label;
+  FileLabel label;
 };
 
 std::string Describe(const LabelLine& line) {
   return "line " + std::to_string(line.line) + " of " + line.file->Path();
 }
 
+std::string HintFor(CheckRun& run, const SecPolicy::Problem& problem,
+                    const SourceFile::Words& words) {
+  if (problem.fault == SecPolicy::Fault::kTreeMarker) {
+    return "there are no patterns but /* at the end";
+  }
+  if (problem.fault == SecPolicy::Fault::kUnknownWord) return HintForLabel(run, words.at(1));
+  return "write: PATH LABEL";
+}
+
 void ReadLabels(CheckRun& run, const SourceFile& file, std::vector<LabelLine>& labels) {
-  FileLabelPolicy policy;
-  const std::vector<unsigned int> lines = ParseEveryLine(
-      file, run.scratch.ScratchFile(),
-      [&](const std::string& path) { policy.ParsePolicy(path, run.access); },
-      [&] { return policy.fileLabels.size(); },
-      [&](unsigned int line, const std::string& message) {
-        const SourceFile::Words& words = file.Lines().at(line);
-        const Code& code = CodeOfRefusal(message);
-        const std::size_t word = FindBlamedWord(code, message, words);
-        const bool wholeLine = word == words.size();
-        std::string hint = "write: PATH LABEL";
-        if (&code == &Codes::kTreeMarker) hint = "there are no patterns but /* at the end";
-        if (!wholeLine && &code == &Codes::kUnknownWord) hint = HintForLabel(run, words[word]);
-        run.diagnostics.Add(file.AtWords(code, line, wholeLine ? 0 : word,
-                                         wholeLine ? words.size() - 1 : word, message, hint));
-      });
-  for (std::size_t i = 0; i < lines.size(); ++i) {
-    labels.push_back({&file, lines[i], policy.fileLabels[i]});
+  for (const auto& [line, words] : file.Lines()) {
+    std::deque<FileLabel> label;
+    SecPolicy::Problem problem{.file = file.Path(), .line = line};
+    if (SecPolicy::ReadFileLabelLine(words, run.access, label, problem)) {
+      labels.push_back({&file, line, std::move(label.front())});
+    } else {
+      AddRefusal(run, file, problem, HintFor(run, problem, words));
+    }
   }
 }
 
@@ -68,7 +69,7 @@ struct PathProblem {
   std::string message;
 };
 
-PathProblem FindPathProblem(const FileLabelPolicy::FileLabel& label) {
+PathProblem FindPathProblem(const FileLabel& label) {
   const std::string& path = label.path;
   std::error_code ignored;
   if (label.recursive && path.empty()) {
@@ -87,7 +88,7 @@ PathProblem FindPathProblem(const FileLabelPolicy::FileLabel& label) {
 }
 
 // Why a load cannot give the label; empty when it can.
-std::string Rehearse(CheckRun& run, const FileLabelPolicy::FileLabel& label) {
+std::string Rehearse(CheckRun& run, const FileLabel& label) {
   try {
     if (label.recursive) {
       SecPolicy::SetDirLabelRecursive(label.path, label.label, run.access);

@@ -1,5 +1,5 @@
 #include "check_run.h"
-#include "secpolicy/labels/object_policy.h"
+#include "secpolicy/observed/policy_lines.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -8,25 +8,25 @@ using Braxo::Lib::BraxoException;
 using TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
-void ReadObjects(CheckRun& run, const SourceFile& file, SecPolicy::ObjectPolicy& policy) {
-  const std::size_t first = policy.names.size();
-  const std::vector<unsigned int> lines = ParseEveryLine(
-      file, run.scratch.ScratchFile(), [&](const std::string& path) { policy.ParsePolicy(path); },
-      [&] { return policy.names.size(); },
-      [&](unsigned int line, const std::string& message) {
-        const std::size_t last = file.Lines().at(line).size() - 1;
-        run.diagnostics.Add(file.AtWords(CodeOfRefusal(message), line, 1, last, message,
-                                         "write each name on a line of its own"));
-      });
-  for (std::size_t i = 0; i < lines.size(); ++i) {
-    const auto [object, isNew] =
-        run.objects.emplace(policy.names[first + i], Place{&file, lines[i]});
-    if (isNew) continue;
-    const auto& [declaredIn, declaredAt] = object->second;
-    run.diagnostics.Add(file.AtWord(Codes::kDuplicateObject, lines[i], 0,
-                                    "'" + object->first + "' is declared in line " +
-                                        std::to_string(declaredAt) + " of " + declaredIn->Path() +
-                                        " already"));
+void Declare(CheckRun& run, const SourceFile& file, unsigned int line, const std::string& name) {
+  const auto [object, isNew] = run.objects.emplace(name, Place{&file, line});
+  if (isNew) return;
+  const auto& [declaredIn, declaredAt] = object->second;
+  run.diagnostics.Add(file.AtWord(Codes::kDuplicateObject, line, 0,
+                                  "'" + name + "' is declared in line " +
+                                      std::to_string(declaredAt) + " of " + declaredIn->Path() +
+                                      " already"));
+}
+
+void ReadObjects(CheckRun& run, const SourceFile& file, std::vector<std::string>& names) {
+  for (const auto& [line, words] : file.Lines()) {
+    SecPolicy::Problem problem{.file = file.Path(), .line = line};
+    if (SecPolicy::ReadObjectLine(words, names, problem)) {
+      Declare(run, file, line, names.back());
+    } else {
+      run.diagnostics.Add(file.AtWords(CodeOf(*problem.fault), line, 1, words.size() - 1,
+                                       problem.reason, "write each name on a line of its own"));
+    }
   }
 }
 
@@ -49,14 +49,14 @@ void AddNames(CheckRun& run, const std::vector<std::string>& names) {
 }  // namespace
 
 void CheckObjects(CheckRun& run, const std::string& dir) {
-  SecPolicy::ObjectPolicy policy;
-  for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadObjects(run, *named.file, policy);
+  std::vector<std::string> objects;
+  for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadObjects(run, *named.file, objects);
   // As a load brings the kernel's objects into line with the policy's, but without a report.
-  run.access.RemoveLabels(SecPolicy::GetObsoleteLabels(
-                              policy.names, run.access.GetKeywordsMap(TESKACCESS_KEYWORD_LABEL),
-                              TESKACCESS_LABEL_OBJECT, run.access),
-                          TESKACCESS_LABEL_OBJECT);
-  AddNames(run, policy.names);
+  run.access.RemoveLabels(
+      SecPolicy::GetObsoleteLabels(objects, run.access.GetKeywordsMap(TESKACCESS_KEYWORD_LABEL),
+                                   TESKACCESS_LABEL_OBJECT, run.access),
+      TESKACCESS_LABEL_OBJECT);
+  AddNames(run, objects);
 }
 
 }  // namespace SecPolicyCli

@@ -81,16 +81,4 @@ std::string HintForLabel(CheckRun& run, const std::string& word) {
   return suggestion.empty() ? "labels are declared in objects/" : suggestion;
 }
 
-std::size_t FindBlamedWord(const Code& code, const std::string& message,
-                           const SourceFile::Words& words) {
-  if (&code == &Codes::kArgumentCount || &code == &Codes::kSecondRule) return words.size();
-  if (&code == &Codes::kRuleType || &code == &Codes::kTreeMarker) return 0;
-  if (&code == &Codes::kGrantWord) return words.size() - 1;
-  if (&code == &Codes::kUnknownDomain) return std::min<std::size_t>(2, words.size() - 1);
-  for (std::size_t i = 0; i < words.size(); ++i) {
-    if (message.find("'" + words[i] + "'") != std::string::npos) return i;
-  }
-  return words.size();
-}
-
 }  // namespace SecPolicyCli

@@ -25,9 +25,4 @@ std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words
 // "did you mean 'WORD'?" for the label that is nearest to `word`, or nothing.
 std::string HintForLabel(CheckRun& run, const std::string& word);
 
-// The word of a refused line that the message is about, counted from 0; `words.size()` when it is
-// about the whole line.
-std::size_t FindBlamedWord(const Code& code, const std::string& message,
-                           const SourceFile::Words& words);
-
 }  // namespace SecPolicyCli

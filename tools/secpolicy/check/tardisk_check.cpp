@@ -1,33 +1,15 @@
-#include <queue>
-
 #include "check_run.h"
 #include "rule_form.h"
+#include "secpolicy/observed/policy_lines.h"
 #include "secpolicy/policy_root.h"
-#include "secpolicy/tardisk/tardisk_exception_rules.h"
 
 namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
-using Words = SourceFile::Words;
 
-constexpr char kExceptionRule[] = "-E";
 constexpr std::uint32_t kNoSuchLabel = 1;
-
-void Refuse(CheckRun& run, const SourceFile& file, unsigned int line, const Words& words,
-            const std::string& failure) {
-  const std::string prefix =
-      "Error in parsing policy for domain: " + file.Path() + ": " + std::to_string(line) + " : ";
-  const std::string message = failure.starts_with(prefix) ? failure.substr(prefix.size()) : failure;
-  const Code& code = CodeOfRefusal(message);
-  const std::size_t word = FindBlamedWord(code, message, words);
-  const bool wholeLine = word == words.size();
-  const std::string hint =
-      &code == &Codes::kRuleType ? "write: -E LABEL DOMAIN" : HintForRule(run, code, words, word);
-  run.diagnostics.Add(file.AtWords(code, line, wholeLine ? 0 : word,
-                                   wholeLine ? words.size() - 1 : word, message, hint));
-}
 
 // An exception names a label only to set it: what the host thinks of it shows no earlier.
 void CheckLabel(CheckRun& run, const SourceFile& file, unsigned int line,
@@ -39,18 +21,14 @@ void CheckLabel(CheckRun& run, const SourceFile& file, unsigned int line,
 }
 
 void CheckLines(CheckRun& run, const SourceFile& file, const std::string& tardisk) {
-  SecPolicy::TardiskExceptionRules rules;
+  SecPolicy::TardiskLines lines(file.Path(), tardisk);
   for (const auto& [line, words] : file.Lines()) {
-    try {
-      if (words.front() != kExceptionRule) {
-        SecPolicy::RaiseTardiskParseError(
-            file.Path(), line, "invalid tardisk policy rule type (" + words.front() + ")");
-      }
-      std::queue<std::string> arguments;
-      for (std::size_t i = 1; i < words.size(); ++i) arguments.push(words[i]);
-      rules.AddRule(line, tardisk, file.Path(), arguments, run.access);
-    } catch (const BraxoException& failure) {
-      Refuse(run, file, line, words, failure.what());
+    SecPolicy::Problem problem{.file = file.Path(), .line = line};
+    if (!lines.Read(words, run.access, problem)) {
+      const bool isNoRule = problem.fault == SecPolicy::Fault::kRuleType;
+      AddRefusal(run, file, problem,
+                 isNoRule ? "write: -E LABEL DOMAIN"
+                          : HintForRule(run, CodeOf(*problem.fault), words, problem.word));
       continue;
     }
     run.usedLabels.insert(words[1]);

@@ -1,13 +1,10 @@
 #include "check_run.h"
+#include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
 namespace {
 
 constexpr char kStartDomain[] = "hostDom";
-
-// A load asks for these by name.
-constexpr const char* kNeededDomains[] = {"globalVMDom", "ioFilterDom", "appDom",
-                                          "daemonFrameworkDom"};
 
 void CheckNeededDomain(CheckRun& run, const std::string& dir, const std::string& name) {
   if (run.domains.contains(name)) return;
@@ -41,7 +38,7 @@ void Reach(const CheckRun& run, const std::string& domain, std::set<std::string>
 void CheckReach(CheckRun& run) {
   std::set<std::string> reached;
   Reach(run, kStartDomain, reached);
-  for (const char* domain : kNeededDomains) Reach(run, domain, reached);
+  for (const char* domain : SecPolicy::kNeededDomains) Reach(run, domain, reached);
   for (const std::string& domain : run.enteredDomains) Reach(run, domain, reached);
   for (const auto& [name, file] : run.domains) {
     if (reached.contains(name)) continue;
@@ -62,7 +59,7 @@ void CheckObjectUse(CheckRun& run) {
 }  // namespace
 
 void CheckUse(CheckRun& run, const std::string& dir) {
-  for (const char* name : kNeededDomains) CheckNeededDomain(run, dir, name);
+  for (const char* name : SecPolicy::kNeededDomains) CheckNeededDomain(run, dir, name);
   CheckReach(run);
   CheckObjectUse(run);
 }

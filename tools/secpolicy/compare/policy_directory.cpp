@@ -5,7 +5,7 @@
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "scratch/scratch_directory.h"
-#include "secpolicy/labels/file_label_policy.h"
+#include "secpolicy/observed/policy_lines.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -44,12 +44,12 @@ void InstallPartners(const std::string& dir, const std::string& copies,
 
 std::map<std::string, std::string> ReadLabels(const std::string& dir, bool& isClean,
                                               TeskAccessInterfaceImpl& access) {
-  SecPolicy::FileLabelPolicy policy;
+  std::deque<SecPolicy::FileLabel> lines;
   for (const auto& [path, name] : FilesOf(dir)) {
-    isClean &= Try([&, &file = path] { policy.ParsePolicy(file, access); });
+    isClean &= Try([&, &file = path] { SecPolicy::ReadFileLabels(file, access, lines); });
   }
   std::map<std::string, std::string> labels;
-  for (const auto& line : policy.fileLabels) {
+  for (const SecPolicy::FileLabel& line : lines) {
     labels[line.path + (line.recursive ? "/*" : "")] = line.label;
   }
   return labels;
@@ -58,7 +58,7 @@ std::map<std::string, std::string> ReadLabels(const std::string& dir, bool& isCl
 }  // namespace
 
 std::string PartnerDirOf(const std::string& dir) {
-  return dir + "/" + SecPolicy::kDomainsDir + "/plugins";
+  return dir + "/" + SecPolicy::kDomainsDir + "/" + SecPolicy::kPartnersDir;
 }
 
 WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir) {
@@ -68,7 +68,7 @@ WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& par
   WrittenPolicy written;
   const auto step = [&](auto part) { written.isClean &= Try(part); };
 
-  const std::string earlyDomains = dir + "/early/" + SecPolicy::kDomainsDir;
+  const std::string earlyDomains = dir + "/" + SecPolicy::kEarlyDir + "/" + SecPolicy::kDomainsDir;
   step([&] { SecPolicy::LoadPolicyObjects(dir + "/" + SecPolicy::kObjectsDir, access); });
   if (File_IsDirectory(earlyDomains.c_str())) {
     step([&] { SecPolicy::LoadPolicyDomains(earlyDomains, access); });

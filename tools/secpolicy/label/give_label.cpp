@@ -1,9 +1,9 @@
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
 
 #include "label_actions.h"
+#include "secpolicy/observed/policy_lines.h"
 #include "text/suggestion.h"
 
 namespace SecPolicyCli {
@@ -31,16 +31,16 @@ using Braxo::Lib::BraxoException;
 void GiveLabelTo(LabelRun& run, const std::string& label, const std::string& path,
                  bool wholeTrees) {
   std::error_code ignored;
+  int error = 0;
   try {
     if (wholeTrees && std::filesystem::is_directory(path, ignored)) {
-      SecPolicy::SetDirLabelRecursive(path, label, run.access);
+      SecPolicy::SetDirLabelRecursive(path, label, run.access, error);
     } else {
-      SecPolicy::SetFileLabel(path, label, run.access);
+      SecPolicy::SetFileLabel(path, label, run.access, error);
     }
   } catch (const BraxoException& failure) {
-    const std::string message = failure.what();
-    const bool hasNone = message.ends_with(std::strerror(ENODATA));
-    run.Error(message + (hasNone ? ": it " + WhyNoLabel(ENODATA) : ""));
+    const bool hasNone = error == ENODATA;
+    run.Error(failure.what() + (hasNone ? ": it " + WhyNoLabel(error) : ""));
   }
 }
 

@@ -8,6 +8,7 @@
 #include <map>
 
 #include "braxo/misc/strcat.h"
+#include "secpolicy/observed/policy_lines.h"
 
 namespace SecPolicyCli {
 
@@ -24,14 +25,14 @@ LabelPlan::LabelPlan(LabelRun& labelRun, const std::string& dir) : run(labelRun)
 
 // What was read before a bad line counts, as in a load.
 void LabelPlan::ReadFile(const std::string& path) {
-  SecPolicy::FileLabelPolicy policy;
+  std::deque<SecPolicy::FileLabel> labels;
   try {
-    policy.ParsePolicy(path, run.access);
+    SecPolicy::ReadFileLabels(path, run.access, labels);
   } catch (const BraxoException& failure) {
     run.Error("Error parsing file " + path);
     run.Error(failure.what());
   }
-  for (auto& label : policy.fileLabels) {
+  for (auto& label : labels) {
     LabelLine line{std::move(label), 0};
     line.id = run.FindLabel(line.label.label);
     if (line.id == kNoSuchLabel) {

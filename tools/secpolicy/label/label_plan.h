@@ -12,13 +12,13 @@
 
 #include "file_walk.h"
 #include "label_run.h"
-#include "secpolicy/labels/file_label_policy.h"
+#include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicyCli {
 
 // A line of the file label policy, as the library read it.
 struct LabelLine {
-  SecPolicy::FileLabelPolicy::FileLabel label;
+  SecPolicy::FileLabel label;
   std::uint32_t id = 0;
 
   // "FILE:LINE".

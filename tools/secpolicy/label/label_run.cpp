@@ -17,6 +17,7 @@ void LabelRun::Print(const std::string& line) {
 }
 
 void LabelRun::Error(const std::string& message) {
+  errors.OnError(message);
   progress.Clear();
   // What was printed before it stands before it.
   std::cout.flush();

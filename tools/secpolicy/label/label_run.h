@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <string>
 
+#include "error_list.h"
 #include "progress_line.h"
 #include "secpolicy/secpolicy.h"
 
@@ -15,6 +16,9 @@ constexpr std::uint32_t kNoSuchLabel = 1;
 // One use of the verb: the connection to the host, and the way to the terminal. Throws what the
 // host throws.
 struct LabelRun {
+  // `errorList` gets every error that is written.
+  explicit LabelRun(ErrorList& errorList) : errors(errorList) {}
+
   // Writes a line to standard output, control characters as ^I and the like.
   void Print(const std::string& line);
 
@@ -29,6 +33,7 @@ struct LabelRun {
 
   SecPolicy::TeskAccessInterfaceImpl access;
   ProgressLine progress;
+  ErrorList& errors;
 };
 
 // Why a file has no label, for the error number `error` of reading it.

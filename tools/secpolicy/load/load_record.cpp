@@ -5,44 +5,11 @@
 #include <filesystem>
 
 #include "host/linux/operation/load_record.h"
-#include "installed/origin_reader.h"
-#include "secpolicy/policy_root.h"
 #include "summary.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 namespace {
-
-std::string Join(const std::string& root, const char* directory) { return root + "/" + directory; }
-
-void ReadEarlyPolicy(const std::string& earlyDir, OriginReader& origins) {
-  origins.ReadPaths(Join(earlyDir, SecPolicy::kDomainsDir), "", LinuxHost::LoadKind::kEarly);
-  origins.ReadFileLabels(Join(SecPolicy::kPolicyRoot, SecPolicy::kFileLabelsDir));
-}
-
-void ReadPolicy(const std::string& dir, OriginReader& origins) {
-  origins.ReadPaths(Join(dir, SecPolicy::kDomainsDir), "", LinuxHost::LoadKind::kFull);
-  origins.ReadPaths(SecPolicy::kPartnerDomainsDir, SecPolicy::kPartnerPrefix,
-                    LinuxHost::LoadKind::kFull);
-  origins.ReadTardisks(Join(SecPolicy::kPolicyRoot, SecPolicy::kTardisksDir));
-  origins.ReadFileLabels(Join(dir, SecPolicy::kFileLabelsDir));
-}
-
-// Reads the files that the verb loads, in its order.
-void RecordOrigins(const std::string& verb, const std::string& dir) {
-  SecPolicy::TeskAccessInterfaceImpl access;
-  OriginReader origins(access);
-  if (verb == kBoot.name) ReadEarlyPolicy(SecPolicy::kEarlyPolicyRoot, origins);
-  if (verb == kLoadEarly.name) {
-    ReadEarlyPolicy(dir, origins);
-  } else {
-    ReadPolicy(dir, origins);
-  }
-  for (const auto& [kind, domain, lines] : origins.AllPaths()) {
-    LinuxHost::RecordPathLines(kind, domain, lines);
-  }
-  LinuxHost::RecordOrigins(origins.Rules(), origins.Labels());
-}
 
 void Record(const RecordedLoad& load, const std::string& directory,
             const LinuxHost::LoadRemainder& removed) {
@@ -66,11 +33,12 @@ std::string CanonicalName(const std::string& dir) {
   return std::filesystem::equivalent(name, path, ignored) ? name : path;
 }
 
-void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending) {
+void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
+                const LoadListener& listener) {
   try {
     const std::string directory = CanonicalName(load.policyDir);
     Record(load, directory, ending.removed);
-    RecordOrigins(load.verb, directory);
+    LinuxHost::RecordOrigins(listener.Rules(), listener.Labels());
   } catch (const std::exception& failure) {
     if (load.ending != "done") return;
     Summarize(load.verb,

@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "host/linux/operation/policy_load.h"
+#include "load/load_listener.h"
 
 namespace SecPolicyCli {
 
@@ -23,7 +24,8 @@ std::string CanonicalName(const std::string& dir);
 // ended, and where those rules and file labels are written that are in no file of a domain. That it
 // cannot be kept, for whatever reason, is said on standard error, unless the load did not end well
 // either; nothing is thrown.
-void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending);
+void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
+                const LoadListener& listener);
 
 // Keeps how a load ended that installed nothing. Throws what the host throws.
 void RecordEnding(const RecordedLoad& load);

@@ -10,12 +10,11 @@
 #include <iostream>
 #include <map>
 #include <optional>
-#include <string_view>
 
-#include "error_watch.h"
 #include "host/linux/operation/label_journal.h"
 #include "host/linux/operation/noted_labels.h"
 #include "host/linux/operation/state_use.h"
+#include "load/load_listener.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
 #include "root.h"
@@ -31,19 +30,6 @@ namespace {
 using LinuxHost::LoadEnding;
 using LinuxHost::LoadKind;
 using LinuxHost::NotedLabels;
-
-// The library's last words before it stops a load, and the domain that each is about.
-struct WellKnownDomain {
-  std::string_view message;
-  std::string_view name;
-};
-
-constexpr WellKnownDomain kWellKnownDomains[] = {
-    {"Failed to fetch domainID for global VM Domain", "globalVMDom"},
-    {"Failed to fetch domainID for IOFilter domain", "ioFilterDom"},
-    {"Failed to fetch domainID for default tar disk domain", "appDom"},
-    {"Failed to fetch domainID for daemon framework domain", "daemonFrameworkDom"},
-};
 
 // Takes a step that only explains the summary after it, which is written whatever happens.
 template <class Step>
@@ -99,6 +85,7 @@ class LoadRun {
  public:
   explicit LoadRun(const LoadRequest& wanted)
       : request(wanted), otherwise(std::set_terminate(OnTerminate)) {
+    listener.forward = request.onError;
     running = this;
   }
   LoadRun(const LoadRun&) = delete;
@@ -115,6 +102,7 @@ class LoadRun {
       transaction.reset();
       Fail(raised);
     }
+    if (request.timing) std::cout << Describe(listener.timing.Phases());
     std::cout.flush();
     return WentWell() ? ReportDone() : ReportFailure();
   }
@@ -123,12 +111,8 @@ class LoadRun {
   // The library stops a load by rethrowing while no exception is being handled. Whatever else ends
   // the process keeps its usual way, core dump included.
   static void OnTerminate() {
-    const std::vector<std::string>& messages = running->errors.Messages();
-    if (!std::current_exception() && !messages.empty()) {
-      for (const WellKnownDomain& domain : kWellKnownDomains) {
-        if (messages.back() == domain.message) running->ReportStop(domain.name);
-      }
-    }
+    const std::string& missing = running->listener.MissingDomain();
+    if (!std::current_exception() && !missing.empty()) running->ReportStop(missing);
     running->otherwise();
     std::abort();
   }
@@ -138,32 +122,31 @@ class LoadRun {
     if (failure.empty()) failure = "failed";
   }
 
-  bool WentWell() const { return failure.empty() && errors.Count() == 0; }
+  bool WentWell() const { return failure.empty() && listener.Count() == 0; }
 
   void Install() {
-    LoadTiming timing(request.timing);
     if (request.mend) request.mend();
     if (!request.dryRun) PutBackLeftOver();
-    if (request.prepare) request.prepare(timing);
+    if (request.prepare) request.prepare(listener.timing);
     stateIsNew = LinuxHost::IsStateMissing();
-    transaction.emplace();
+    listener.Follow(transaction.emplace());
     hasBegun = true;
     if (request.begin) request.begin();
     // A number on a file is to be one that the state knows.
     std::optional<NotedLabels> labels;
     if (!request.dryRun) labels.emplace(LinuxHost::LabelNotes::kForLater);
-    for (const LoadStep& step : request.steps) Take(step, timing);
+    for (const LoadStep& step : request.steps) Take(step);
     if (request.allOrNothing && labels) {
       InstallAllOrNothing(*labels);
     } else {
       Commit();
       if (labels) GiveLabels(*labels);
     }
-    timing.EndPhase("file labels");
+    listener.timing.EndPhase("file labels");
   }
 
   // A load that was killed while it gave labels, all of them or none, has left them half done.
-  static void PutBackLeftOver() {
+  void PutBackLeftOver() {
     if (LinuxHost::IsStateMissing()) return;
     const auto back = LinuxHost::LabelJournal::PutBackLeftOver(LinuxHost::StatePath());
     if (!back) return;
@@ -177,11 +160,11 @@ class LoadRun {
     const std::vector<LinuxHost::LabelFailure> failures = labels.Apply();
     if (failures.empty()) return;
     ReportUnlabelled(failures);
-    RecordLoad(Ending(), ending);
+    RecordLoad(Ending(), ending, listener);
   }
 
   void Commit() {
-    RecordLoad(Ending(), ending);
+    RecordLoad(Ending(), ending, listener);
     transaction->Commit();
     isInstalled = true;
   }
@@ -213,34 +196,35 @@ class LoadRun {
     }
   }
 
-  static void ReportUnlabelled(const std::vector<LinuxHost::LabelFailure>& failures) {
+  void ReportUnlabelled(const std::vector<LinuxHost::LabelFailure>& failures) {
     ReportFailures("Unable to label ", failures);
   }
 
-  static void ReportPutBack(const LinuxHost::LabelsPutBack& back) {
+  void ReportPutBack(const LinuxHost::LabelsPutBack& back) {
     ReportFailures("Unable to put the label back of ", back.failures);
   }
 
-  static void ReportFailures(const std::string& what,
-                             const std::vector<LinuxHost::LabelFailure>& failures) {
+  void ReportFailures(const std::string& what,
+                      const std::vector<LinuxHost::LabelFailure>& failures) {
     for (const auto& [path, error] : failures) {
-      SecPolicy::SecpolicyError(what + path + ": " + std::strerror(error));
+      const std::string message = what + path + ": " + std::strerror(error);
+      listener.OnError(message);
+      SecPolicy::SecpolicyError(message);
     }
   }
 
-  void Take(const LoadStep& step, LoadTiming& timing) {
+  void Take(const LoadStep& step) {
     const bool isEarlyPart = step.kind == LoadKind::kEarly && request.steps.size() > 1;
-    timing.BeginPart(isEarlyPart ? "early " : "");
+    listener.timing.BeginPart(isEarlyPart ? "early " : "");
     transaction->BeginLoad({.kind = step.kind,
                             .directory = CanonicalName(step.directory),
                             .domains = DefinedDomains(step)});
     try {
-      step.load(step.directory);
+      step.load(step.directory, listener);
     } catch (const Braxo::Lib::BraxoException& problem) {
       Fail(problem);
     }
     Add(transaction->EndLoad(WentWell() && !request.keep));
-    if (isEarlyPart) earlyErrors = errors.Count();
   }
 
   void Add(LoadEnding part) {
@@ -253,11 +237,11 @@ class LoadRun {
   }
 
   RecordedLoad Ending() const {
-    const bool onlyThrown = errors.Count() == 0 && !failure.empty();
+    const bool onlyThrown = listener.Count() == 0 && !failure.empty();
     return {.verb = request.verb,
             .policyDir = request.policyDir,
             .ending = WentWell() ? "done" : "failed",
-            .errors = onlyThrown ? std::vector<std::string>{failure} : errors.Messages()};
+            .errors = onlyThrown ? std::vector<std::string>{failure} : listener.Messages()};
   }
 
   // A domain without a file is named only where all else was removed: worlds run in it.
@@ -268,6 +252,12 @@ class LoadRun {
     }
   }
 
+  void WriteProblems() const {
+    Attempt([&] {
+      std::cerr << DescribeProblems(listener.Problems(), request.policyDir) << std::flush;
+    });
+  }
+
   ExitCode ReportDone() {
     if (!request.keep) WriteStayingDomains();
     Summarize(request.verb, DescribeDone(request.verb) + DescribeRemainder(ending, request.keep));
@@ -276,9 +266,9 @@ class LoadRun {
 
   ExitCode ReportFailure() {
     if (!isInstalled) Attempt([&] { RecordUndone(Ending()); });
-    Attempt([&] { WriteErrorsByFile(errors.Messages(), earlyErrors, request.policyDir); });
+    WriteProblems();
     std::string summary = failure.empty() ? "failed" : failure;
-    if (errors.Count() > 0) summary += " (" + CountOf(errors.Count(), "error") + " above)";
+    if (listener.Count() > 0) summary += " (" + CountOf(listener.Count(), "error") + " above)";
     if (isInstalled) {
       if (!request.dryRun) {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });
@@ -293,7 +283,7 @@ class LoadRun {
   }
 
   // An exception that left the terminate handler would be an abort without a summary.
-  [[noreturn]] void ReportStop(std::string_view missing) {
+  [[noreturn]] void ReportStop(const std::string& missing) {
     std::cout.flush();
     RecordedLoad record = Ending();
     record.ending = "stopped";
@@ -301,19 +291,17 @@ class LoadRun {
       transaction->Undo();
       RecordUndone(record);
     });
-    Attempt([&] { WriteErrorsByFile(errors.Messages(), earlyErrors, request.policyDir); });
-    const std::string name(missing);
-    Summarize(request.verb, "stopped: there is no domain " + name +
-                                ", so nothing was installed. Put a policy file named " + name +
+    WriteProblems();
+    Summarize(request.verb, "stopped: there is no domain " + missing +
+                                ", so nothing was installed. Put a policy file named " + missing +
                                 " into " + request.policyDir + "/domains and run it again.");
     _exit(kStopped);
   }
 
   const LoadRequest& request;
   const std::terminate_handler otherwise;
-  ErrorWatch errors{std::cerr};
+  LoadListener listener;
   std::optional<LinuxHost::PolicyTransaction> transaction;
-  std::size_t earlyErrors = 0;
   std::string failure;
   LoadEnding ending;
   bool stateIsNew = false;

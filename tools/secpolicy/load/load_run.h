@@ -6,6 +6,7 @@
 
 #include "host/linux/operation/policy_load.h"
 #include "load/load_timing.h"
+#include "secpolicy/observed/policy_observer.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -14,7 +15,7 @@ namespace SecPolicyCli {
 struct LoadStep {
   LinuxHost::LoadKind kind;
   std::string directory;
-  void (*load)(const std::string& directory);
+  void (*load)(const std::string& directory, SecPolicy::PolicyObserver& observer);
 };
 
 struct LoadRequest {
@@ -25,6 +26,9 @@ struct LoadRequest {
   bool allOrNothing = false;  // installs nothing after an error
   bool timing = false;        // prints the time of each phase
   bool dryRun = false;        // who asks has put copies in place of all that a load changes
+
+  // Gets every error as it happens, if set.
+  std::function<void(const std::string& message)> onError = {};
 
   // What makes a state usable that is not, if anything can.
   std::function<void()> mend;

@@ -1,18 +1,17 @@
 #pragma once
 
 #include <cstddef>
+#include <map>
 #include <string>
-#include <vector>
 
 #include "host/linux/operation/policy_load.h"
 
 namespace SecPolicyCli {
 
-// Writes "FILE: N errors" to standard error for each policy file and directory that `messages`, the
-// errors of a load of `policyDir`, are about, and how to see the lines; nothing for those that only
-// sum up. The first `earlyErrors` of them are those of the early policy.
-void WriteErrorsByFile(const std::vector<std::string>& messages, std::size_t earlyErrors,
-                       const std::string& policyDir);
+// "FILE: N errors", a line for each policy file and directory of a load of `policyDir`, and how to
+// see the lines; nothing when there are none.
+std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
+                             const std::string& policyDir);
 
 // How much is installed now: "9 domains, 137 rules, 17 objects". Throws what the host throws.
 std::string CountInstalled();

@@ -7,35 +7,31 @@
 
 namespace SecPolicyCli {
 
-// Measures the phases of a load: each ends where the library or the host logs that it has. A phase
-// that fails half-way counts for the next one.
+// Measures the phases of a load: each begins where the one before it ended.
 class LoadTiming {
  public:
-  // Does nothing unless `wanted`.
-  explicit LoadTiming(bool wanted);
-  LoadTiming(const LoadTiming&) = delete;
-  LoadTiming& operator=(const LoadTiming&) = delete;
+  using Clock = std::chrono::steady_clock;
+  using Phase = std::pair<std::string, Clock::duration>;
 
-  // Writes the phases and their sum to standard output.
-  ~LoadTiming();
+  // The first phase begins at `start`.
+  explicit LoadTiming(Clock::time_point start = Clock::now()) : lastEnd(start) {}
 
-  // A phase that nothing is logged of has ended.
-  void EndPhase(const std::string& name);
+  // The phase `name` has ended `now`. One that ends again has gone on.
+  void EndPhase(const std::string& name, Clock::time_point now = Clock::now());
 
   // The names of the phases from now on begin with `prefix`.
-  void BeginPart(const std::string& prefix);
+  void BeginPart(const std::string& prefix) { part = prefix; }
+
+  // In the order in which they ended for the first time.
+  const std::vector<Phase>& Phases() const { return phases; }
 
  private:
-  using Clock = std::chrono::steady_clock;
-
-  void Note(const std::string& message);
-  bool Has(const std::string& name) const;
-
-  const bool isWanted;
-  bool isFullLoad = false;
   std::string part;
   Clock::time_point lastEnd;
-  std::vector<std::pair<std::string, Clock::duration>> phases;
+  std::vector<Phase> phases;
 };
+
+// A line for each phase and one for their sum.
+std::string Describe(const std::vector<LoadTiming::Phase>& phases);
 
 }  // namespace SecPolicyCli

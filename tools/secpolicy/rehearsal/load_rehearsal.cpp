@@ -56,6 +56,13 @@ std::vector<LinuxHost::LabelChange> ReadLabels(const std::string& path) {
   return changes;
 }
 
+std::vector<std::string> ReadErrors(const std::string& path) {
+  std::vector<std::string> errors;
+  std::ifstream file(path, std::ios::binary);
+  for (std::string error; std::getline(file, error, '\0');) errors.push_back(error);
+  return errors;
+}
+
 std::string ReadAll(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
   return {std::istreambuf_iterator<char>(file), {}};
@@ -80,6 +87,11 @@ LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
     const LinuxHost::UsedState state(StateAfter());
     LoadRequest dryRun = load;
     dryRun.dryRun = true;
+    std::ofstream errorFile(scratch.File("errors"), std::ios::binary);
+    // The load may end the process.
+    dryRun.onError = [&](const std::string& message) {
+      errorFile << message << '\0' << std::flush;
+    };
     const ExitCode code = RunLoad(dryRun);
     WriteLabels(notes, labelFile);
     return code;
@@ -89,6 +101,7 @@ LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
     throw std::runtime_error("the rehearsal of the load died: " + end.death + "\n" + messages);
   }
   ending = end.code;
+  errors = ReadErrors(scratch.File("errors"));
   labels = ReadLabels(labelFile);
 }
 

@@ -25,6 +25,9 @@ class LoadRehearsal {
   // What it would write to standard error, its summary line included.
   const std::string& Messages() const { return messages; }
 
+  // The errors that it would report.
+  const std::vector<std::string>& Errors() const { return errors; }
+
   // The files that it would label, by path. Not all of them would have another label in the end.
   const std::vector<LinuxHost::LabelChange>& Labels() const { return labels; }
 
@@ -37,6 +40,7 @@ class LoadRehearsal {
   ScratchDirectory scratch;
   ExitCode ending = kFailed;
   std::string messages;
+  std::vector<std::string> errors;
   std::vector<LinuxHost::LabelChange> labels;
 };
 

@@ -1,5 +1,3 @@
-#include <sstream>
-
 #include "json.h"
 #include "load_plan.h"
 
@@ -61,17 +59,6 @@ Json Labels(const LoadPlan& plan) {
   return list;
 }
 
-// The errors among the lines that a load writes to standard error.
-Json Errors(const std::string& messages) {
-  constexpr std::string_view kPrefix = "Error: ";
-  Json list = Json::Array();
-  std::istringstream lines(messages);
-  for (std::string line; std::getline(lines, line);) {
-    if (line.starts_with(kPrefix)) list.Append(line.substr(kPrefix.size()));
-  }
-  return list;
-}
-
 const char* WordFor(ExitCode ending) {
   if (ending == kWell) return "done";
   return ending == kStopped ? "stopped" : "failed";
@@ -86,7 +73,7 @@ void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
       {"schema", "secpolicy.plan/1"},
       {"directory", policyDir},
       {"ending", WordFor(rehearsal.Ending())},
-      {"errors", Errors(rehearsal.Messages())},
+      {"errors", rehearsal.Errors()},
       {"changesNothing", plan.ChangesNothing()},
       {"domains",
        {{"create", NewDomains(difference)},

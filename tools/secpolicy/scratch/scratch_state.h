@@ -25,9 +25,6 @@ class ScratchState {
   // The directory that the state is in.
   const std::string& DirectoryPath() const { return directory.Path(); }
 
-  // A file beside the state, for what has to be read from a file.
-  std::string ScratchFile() const { return directory.File("policy"); }
-
  private:
   ScratchDirectory directory;
   std::optional<LinuxHost::StateCopy> copy;
