@@ -1,0 +1,81 @@
+// Hunts what a load tells and the command drops or mixes up.
+
+#include "load/load_listener.h"
+
+#include <gmock/gmock.h>
+
+namespace {
+
+using SecPolicyCli::LoadListener;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Pair;
+
+TEST(LoadListener, KeepsErrorsInOrderAndHandsThemOn) {
+  std::vector<std::string> handed;
+  LoadListener listener;
+  listener.forward = [&](const std::string& message) { handed.push_back(message); };
+  listener.OnError("first");
+  listener.OnError("second");
+  EXPECT_EQ(listener.Count(), 2u);
+  EXPECT_THAT(listener.Messages(), ElementsAre("first", "second"));
+  EXPECT_THAT(handed, ElementsAre("first", "second"));
+}
+
+TEST(LoadListener, CountsProblemsByFile) {
+  LoadListener listener;
+  EXPECT_THAT(listener.Problems(), IsEmpty());
+  for (const char* file : {"/b", "/a", "/b"}) listener.OnProblem({.file = file});
+  EXPECT_THAT(listener.Problems(), ElementsAre(Pair("/a", 1), Pair("/b", 2)));
+}
+
+TEST(LoadListener, NamesThePhases) {
+  LoadListener listener;
+  using enum SecPolicy::LoadPhase;
+  for (const auto phase : {kObjects, kDomains, kPartnerDomains, kTardisks, kFileLabels}) {
+    listener.OnBegin(phase);
+    listener.OnEnd(phase);
+  }
+  std::vector<std::string> names;
+  for (const auto& [name, time] : listener.timing.Phases()) names.push_back(name);
+  EXPECT_THAT(names,
+              ElementsAre("objects", "domains", "partner domains", "tardisks", "file labels"));
+}
+
+TEST(LoadListener, KeepsWhereLabelsAndTransitionsAreWritten) {
+  LoadListener listener;
+  listener.OnFileLabel({.path = "/opt",
+                        .label = "tool",
+                        .recursive = true,
+                        .policyFile = "/p/fileLabels/a",
+                        .lineNumber = 3});
+  listener.OnTardiskTransition({.line = 2,
+                                .domainId = 1,
+                                .domainName = "hostDom",
+                                .label = "tool",
+                                .targetDomain = "toolDom",
+                                .targetDomainId = 7,
+                                .transitionKind = "tardisk_exec",
+                                .grant = true},
+                               "/p/tardisks/a");
+  ASSERT_EQ(listener.Labels().size(), 1u);
+  const auto& [path, isTree, label, labelFile, labelLine] = listener.Labels().front();
+  EXPECT_EQ(std::tie(path, label, labelFile), std::tuple("/opt", "tool", "/p/fileLabels/a"));
+  EXPECT_TRUE(isTree);
+  EXPECT_EQ(labelLine, 3u);
+  ASSERT_EQ(listener.Rules().size(), 1u);
+  const auto& [domain, rule] = listener.Rules().front();
+  EXPECT_EQ(domain, "hostDom");
+  EXPECT_EQ(rule.Text(), "-d tool toolDom tardisk_exec grant");
+  EXPECT_EQ(rule.origin.file, "/p/tardisks/a");
+  EXPECT_EQ(rule.origin.line, 2u);
+}
+
+TEST(LoadListener, RemembersTheMissingDomain) {
+  LoadListener listener;
+  EXPECT_EQ(listener.MissingDomain(), "");
+  listener.OnMissingDomain("appDom");
+  EXPECT_EQ(listener.MissingDomain(), "appDom");
+}
+
+}  // namespace
