@@ -78,7 +78,7 @@ TEST_F(HostilePolicyFile, OfLinesWithWordsTakesMemoryForEach) {
 }
 
 TEST_F(HostilePolicyFile, ThatDoesNotFitIntoMemoryEndsInBadAlloc) {
-#if defined(__SANITIZE_ADDRESS__)
+#ifdef SECPOLICY_SANITIZE
   GTEST_SKIP() << "the address space cannot be limited under AddressSanitizer";
 #endif
   const unsigned long lines = LongRun() ? 50'000'000 : 1'000'000;

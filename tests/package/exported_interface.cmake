@@ -4,13 +4,16 @@ target_include_directories(package_consumer PRIVATE "${PROJECT_SOURCE_DIR}/tests
 target_link_libraries(package_consumer PRIVATE secpolicy GTest::gtest GTest::gtest_main)
 gtest_discover_tests(package_consumer DISCOVERY_MODE PRE_TEST)
 
-# What the dynamic linker shows: one line more or less is a changed promise.
-add_test(NAME package.exported_symbols
-  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-exported-symbols"
-    "$<TARGET_FILE:secpolicy>" "${CMAKE_CURRENT_LIST_DIR}/exported_symbols.txt")
+# What the dynamic linker shows: one line more or less is a changed promise. Unoptimised, clang shows
+# instances of templates as well.
+if(NOT SECPOLICY_SANITIZE)
+  add_test(NAME package.exported_symbols
+    COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-exported-symbols"
+      "$<TARGET_FILE:secpolicy>" "${CMAKE_CURRENT_LIST_DIR}/exported_symbols.txt")
 
-add_test(NAME package.host_symbols
-  COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-host-symbols" "$<TARGET_FILE:secpolicyhost>")
+  add_test(NAME package.host_symbols
+    COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-host-symbols" "$<TARGET_FILE:secpolicyhost>")
+endif()
 
 # What it needs at run time: the host, the C++ runtime and the C library.
 add_test(NAME package.needed_libraries

@@ -16,7 +16,7 @@ void OverwriteErrno() {
 }  // namespace
 }  // namespace SecPolicyTest
 
-#ifdef __SANITIZE_ADDRESS__
+#ifdef SECPOLICY_SANITIZE
 
 // The sanitizer's own allocation functions stay, for what they find.
 extern "C" __attribute__((visibility("default"))) void __sanitizer_malloc_hook(const volatile void*,

@@ -214,7 +214,10 @@ TEST_F(StoreFile, RefusesAFileThatWasCutOff) {
 
 TEST_F(StoreFile, TellsDamageWhereItIsMet) {
   constexpr std::streamoff kBehindTheSchema = 4096;
-  Store(path, kLayout).Run("INSERT INTO item VALUES ('milk', 2)");
+  {
+    Store written(path, kLayout);
+    written.Run("INSERT INTO item VALUES ('milk', 2)");
+  }
   std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
   file.seekp(kBehindTheSchema);
   file << std::string(std::filesystem::file_size(path) - kBehindTheSchema, '\xff') << std::flush;
