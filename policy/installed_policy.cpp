@@ -21,7 +21,7 @@ void Append(Access& access, unsigned int id, Getter<Record> get, std::vector<Rul
   std::list<Record> records;
   (access.*get)(id, records);
   rules.reserve(rules.size() + records.size());
-  for (Record& record : records) rules.push_back(ToRule(std::move(record)));
+  for (Record& record : records) rules.push_back(TakeRule(record));
 }
 
 std::vector<Rule> ReadRules(Access& access, unsigned int id) {

@@ -95,7 +95,7 @@ std::string Rule::Text() const {
 }
 
 template <class Record>
-Rule ToRule(Record record) {
+Rule TakeRule(Record& record) {
   constexpr auto& form = kFormOf<Record>;
   Rule rule;
   rule.kind = form.kind;
@@ -125,14 +125,14 @@ void MoveInto(Record& record, Rule& rule) {
   }
 }
 
-template Rule ToRule(TeskAccess_ObjectAccessRule);
-template Rule ToRule(TeskAccess_CapabilityRule);
-template Rule ToRule(TeskAccess_DomTransRule);
-template Rule ToRule(TeskAccess_FileCreationRule);
-template Rule ToRule(TeskAccess_CapabilityParamRule);
-template Rule ToRule(TeskAccess_FilePathAccessRule);
-template Rule ToRule(TeskAccess_SyscallRule);
-template Rule ToRule(TeskAccess_UnixSockCreationRule);
+template Rule TakeRule(TeskAccess_ObjectAccessRule&);
+template Rule TakeRule(TeskAccess_CapabilityRule&);
+template Rule TakeRule(TeskAccess_DomTransRule&);
+template Rule TakeRule(TeskAccess_FileCreationRule&);
+template Rule TakeRule(TeskAccess_CapabilityParamRule&);
+template Rule TakeRule(TeskAccess_FilePathAccessRule&);
+template Rule TakeRule(TeskAccess_SyscallRule&);
+template Rule TakeRule(TeskAccess_UnixSockCreationRule&);
 
 template void MoveInto(TeskAccess_ObjectAccessRule&, Rule&);
 template void MoveInto(TeskAccess_CapabilityRule&, Rule&);

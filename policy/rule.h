@@ -60,10 +60,10 @@ struct BySubject {
   }
 };
 
-// The rule of a record, which is one of the contract's eight. Throws BraxoException for letters
-// that are no permissions.
+// The rule of a record, which is one of the contract's eight; its words are moved out of it. Throws
+// BraxoException for letters that are no permissions.
 template <class Record>
-Rule ToRule(Record record);
+Rule TakeRule(Record& record);
 
 // Moves a rule into a record of its kind. The domain of the record stays as it is, and so does the
 // identifier of the domain that a transition leads to.

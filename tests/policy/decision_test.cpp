@@ -6,7 +6,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "braxo/lib/exception.h"
+#include "support/message_of.h"
 
 namespace PolicyTest {
 namespace {
@@ -222,7 +222,10 @@ TEST(Decide, ComparesNumbersWithRanges) {
 TEST(Decide, RefusesANumberThatIsNone) {
   InstalledDomain domain;
   domain.rules = {Parameter({"bind_port", "80"})};
-  EXPECT_THROW(Decide(ParameterQuestion{"bind_port", "many"}, domain), Braxo::Lib::BraxoException);
+  EXPECT_EQ(SecPolicyTest::MessageOf([&] {
+              Decide(ParameterQuestion{"bind_port", "many"}, domain);
+            }),
+            "parameter 'many' is not an unsigned number");
 }
 
 TEST(Decide, TakesRulesOfExactlyTheWords) {

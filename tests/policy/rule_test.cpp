@@ -21,7 +21,7 @@ using SecPolicyTest::InstalledRules;
 template <class Record>
 void Convert(std::list<Record>& records, std::vector<Rule>& rules) {
   for (Record& record : records) {
-    rules.push_back(Policy::ToRule(record));
+    rules.push_back(Policy::TakeRule(record));
     Rule rule = rules.back();
     Policy::MoveInto(record, rule);
   }
@@ -92,9 +92,9 @@ TEST(RuleRecord, TakesTheLineButNoDomain) {
 }
 
 TEST(RuleRecord, HasNoWordForARangeOfOneValue) {
-  const TeskCtl::Security::TeskAccess_CapabilityParamRule record = {
-      7, 42, "appDom", "bind_port", "0x50", "", true};
-  const Rule rule = Policy::ToRule(record);
+  TeskCtl::Security::TeskAccess_CapabilityParamRule record = {7,      42, "appDom", "bind_port",
+                                                              "0x50", "", true};
+  const Rule rule = Policy::TakeRule(record);
   EXPECT_THAT(rule.Words(), testing::ElementsAre("bind_port", "0x50"));
   EXPECT_EQ(rule.Text(), "-p bind_port 0x50 grant");
   EXPECT_EQ(rule.Range().first, 80U);
@@ -102,8 +102,8 @@ TEST(RuleRecord, HasNoWordForARangeOfOneValue) {
 }
 
 TEST(RuleRecord, KeepsEmptyWordsOfOtherKinds) {
-  const TeskCtl::Security::TeskAccess_ObjectAccessRule record = {7, 42, "appDom", "a", "", true};
-  EXPECT_THAT(Policy::ToRule(record).Words(), testing::ElementsAre("a", ""));
+  TeskCtl::Security::TeskAccess_ObjectAccessRule record = {7, 42, "appDom", "a", "", true};
+  EXPECT_THAT(Policy::TakeRule(record).Words(), testing::ElementsAre("a", ""));
 }
 
 TEST(Rule, SaysWhatItDecides) {

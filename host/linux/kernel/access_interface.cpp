@@ -30,10 +30,9 @@ namespace {
 
 // Installs the rule of a record into the table of its kind.
 template <class Table, class Record, class... Target>
-void Install(Table& table, Record record, Target... target) {
-  const std::string domainName = std::move(record.domainName);
-  const LinuxHost::DomainReference domain{record.domainId, domainName};
-  table.Install(domain, Policy::ToRule(std::move(record)), target...);
+void Install(Table& table, Record& record, Target... target) {
+  const LinuxHost::DomainReference domain{record.domainId, record.domainName};
+  table.Install(domain, Policy::TakeRule(record), target...);
 }
 
 // Appends the records of rules of the domain.
@@ -209,32 +208,31 @@ bool TeskAccessInterfaceImpl::RemoveLabels(std::vector<std::string> names,
 }
 
 void TeskAccessInterfaceImpl::SetSyscallRule(TeskAccess_SyscallRule rule) {
-  Install(impl->Any().Rules(), std::move(rule));
+  Install(impl->Any().Rules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetCapabilityRule(TeskAccess_CapabilityRule rule) {
-  Install(impl->Any().Rules(), std::move(rule));
+  Install(impl->Any().Rules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetCapabilityParamRule(TeskAccess_CapabilityParamRule rule) {
-  Install(impl->Any().ParameterRules(), std::move(rule));
+  Install(impl->Any().ParameterRules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetObjectAccessRule(TeskAccess_ObjectAccessRule rule) {
-  Install(impl->Any().Rules(), std::move(rule));
+  Install(impl->Any().Rules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetDomTransRule(TeskAccess_DomTransRule rule) {
-  const unsigned int target = rule.targetDomainId;
-  Install(impl->Any().Rules(), std::move(rule), target);
+  Install(impl->Any().Rules(), rule, rule.targetDomainId);
 }
 
 void TeskAccessInterfaceImpl::SetFileCreationRule(TeskAccess_FileCreationRule rule) {
-  Install(impl->Any().Rules(), std::move(rule));
+  Install(impl->Any().Rules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetUnixSockCreationRule(TeskAccess_UnixSockCreationRule rule) {
-  Install(impl->Any().Rules(), std::move(rule));
+  Install(impl->Any().Rules(), rule);
 }
 
 void TeskAccessInterfaceImpl::SetFilePathAccessRules(

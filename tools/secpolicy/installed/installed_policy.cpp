@@ -36,12 +36,17 @@ Origin OriginOf(const std::string& domain, const Rule& rule, const RuleSource& s
 }
 
 void AddOrigins(InstalledDomain& domain) {
-  std::size_t index = 0;
+  auto rule = domain.rules.begin();
+  const auto isOf = [&](Policy::RuleKind kind) {
+    return rule != domain.rules.end() && rule->kind == kind;
+  };
   for (const Policy::RuleForm& form : Policy::kRuleForms) {
     for (const RuleSource& source : LinuxHost::FindRuleSources(domain.id, form.kind)) {
-      Rule& rule = domain.rules.at(index++);
-      rule.origin = OriginOf(domain.name, rule, source);
+      if (!isOf(form.kind)) break;
+      rule->origin = OriginOf(domain.name, *rule, source);
+      ++rule;
     }
+    while (isOf(form.kind)) ++rule;
   }
   LinuxHost::FindRuleOrigins(domain.name, domain.rules);
 }

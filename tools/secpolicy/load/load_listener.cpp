@@ -46,7 +46,8 @@ void LoadListener::OnFileLabel(const SecPolicy::FileLabel& label) {
 
 void LoadListener::OnTardiskTransition(const TeskCtl::Security::TeskAccess_DomTransRule& rule,
                                        const std::string& policyFile) {
-  LinuxHost::RuleOrigin origin{.domain = rule.domainName, .rule = Policy::ToRule(rule)};
+  auto record = rule;
+  LinuxHost::RuleOrigin origin{.domain = rule.domainName, .rule = Policy::TakeRule(record)};
   origin.rule.origin = {.file = policyFile, .line = rule.line};
   rules.push_back(std::move(origin));
 }
