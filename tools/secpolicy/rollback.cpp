@@ -19,7 +19,7 @@ void PutBack(const std::string& name) {
   const std::string copy = scratch.File("saved.db");
   try {
     LinuxHost::CopyDatabase(SavedStatePath(name), LinuxHost::CopyOf::kSavedState, copy);
-    LinuxHost::RestorePolicy(copy, LinuxHost::LabelNumbers::kNew);
+    LinuxHost::RestorePolicy(copy);
   } catch (const std::exception& reason) {
     throw std::runtime_error("the saved state '" + name +
                              "' cannot be put back, so nothing was changed: " + reason.what());

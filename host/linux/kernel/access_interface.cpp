@@ -6,13 +6,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/file_policy_table.h"
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/keyword_tables.h"
-#include "host/linux/state/label_table.h"
-#include "host/linux/state/parameter_rule_table.h"
-#include "host/linux/state/rule_table.h"
 #include "policy/rule.h"
 #include "teskctl/security.h"
 
@@ -156,12 +150,12 @@ void TeskAccessInterfaceImpl::AddGcomService(unsigned int id, const std::string&
 
 bool TeskAccessInterfaceImpl::ValidateKeyword(TeskAccess_KeywordType type,
                                               const std::string& word) {
-  if (const auto refusal = LinuxHost::KeywordRefusal(impl->Fresh(), type, word)) throw *refusal;
+  if (const auto refusal = impl->Fresh().Keywords().Refusal(type, word)) throw *refusal;
   return true;
 }
 
 std::map<std::string, long> TeskAccessInterfaceImpl::GetKeywordsMap(TeskAccess_KeywordType type) {
-  return LinuxHost::Keywords(impl->Fresh(), type);
+  return impl->Fresh().Keywords().All(type);
 }
 
 unsigned int TeskAccessInterfaceImpl::LookupLabel(const std::string& name,

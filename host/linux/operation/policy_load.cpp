@@ -4,98 +4,73 @@
 #include <set>
 #include <utility>
 
-#include "host/linux/state/domain_table.h"
+#include "braxo/misc/strcat.h"
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/store.h"
 
 namespace LinuxHost {
 namespace {
 
-// The statements of a load for one of the tables of rules. ?1 is the kind of the load, ?2 its
-// number. A rule that the load covers has got another identifier with its new content.
-struct TableStatements {
-  Sql keepOthers;     // all rules of others, of which the load may cover some
-  Sql dropUncovered;  // those that it did not
-  Sql dropOwn;        // what the kind itself had, and others had covered
-  Sql countStaying;
-  Sql removeStaying;
-  Sql putBack;  // what was covered by what is removed
-  Sql dropPutBack;
+using Braxo::Misc::StrCat;
+
+// A table of rules that a load may cover, which the table covered_... keeps then. A rule that the
+// load covers has got another identifier with its new content.
+struct RuleTableColumns {
+  const char* name;
+  const char* key;      // what a rule is about: no two have the same
+  const char* content;  // all columns but the identifier
+  const char* isOfLoads;
 };
 
-constexpr TableStatements kTables[] = {
-    {
-        "INSERT INTO covered_rule SELECT * FROM rule "
-        "WHERE load NOT IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM covered_rule WHERE EXISTS (SELECT 1 FROM rule AS r "
-        "WHERE r.id = covered_rule.id AND r.load = covered_rule.load)",
-        "DELETE FROM covered_rule WHERE load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "SELECT count(*) FROM rule "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM rule "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "INSERT INTO rule (domain_id, kind, word1, word2, word3, granted, line, load) "
-        "SELECT domain_id, kind, word1, word2, word3, granted, line, load FROM "
-        "(SELECT *, max(id) FROM covered_rule GROUP BY domain_id, kind, word1, word2, word3) AS c "
-        "WHERE NOT EXISTS (SELECT 1 FROM rule AS r WHERE r.domain_id = c.domain_id AND "
-        "r.kind = c.kind AND r.word1 = c.word1 AND r.word2 = c.word2 AND r.word3 = c.word3) "
-        "ORDER BY id",
-        "DELETE FROM covered_rule WHERE EXISTS (SELECT 1 FROM rule AS r "
-        "WHERE r.domain_id = covered_rule.domain_id AND r.kind = covered_rule.kind AND "
-        "r.word1 = covered_rule.word1 AND r.word2 = covered_rule.word2 AND "
-        "r.word3 = covered_rule.word3 AND r.load = covered_rule.load)",
-    },
-    {
-        "INSERT INTO covered_parameter_rule SELECT * FROM parameter_rule "
-        "WHERE load NOT IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM covered_parameter_rule WHERE EXISTS (SELECT 1 FROM parameter_rule AS r "
-        "WHERE r.id = covered_parameter_rule.id AND r.load = covered_parameter_rule.load)",
-        "DELETE FROM covered_parameter_rule "
-        "WHERE load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "SELECT count(*) FROM parameter_rule "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM parameter_rule "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "INSERT INTO parameter_rule (domain_id, parameter_check, first_value, last_value, "
-        "first_word, last_word, granted, line, load) "
-        "SELECT domain_id, parameter_check, first_value, last_value, first_word, last_word, "
-        "granted, line, load FROM (SELECT *, max(id) FROM covered_parameter_rule "
-        "GROUP BY domain_id, parameter_check, first_value, last_value) AS c "
-        "WHERE NOT EXISTS (SELECT 1 FROM parameter_rule AS r WHERE r.domain_id = c.domain_id AND "
-        "r.parameter_check = c.parameter_check AND r.first_value = c.first_value AND "
-        "r.last_value = c.last_value) ORDER BY id",
-        "DELETE FROM covered_parameter_rule WHERE EXISTS (SELECT 1 FROM parameter_rule AS r "
-        "WHERE r.domain_id = covered_parameter_rule.domain_id AND "
-        "r.parameter_check = covered_parameter_rule.parameter_check AND "
-        "r.first_value = covered_parameter_rule.first_value AND "
-        "r.last_value = covered_parameter_rule.last_value AND "
-        "r.load = covered_parameter_rule.load)",
-    },
-    {
-        "INSERT INTO covered_file_policy SELECT * FROM file_policy "
-        "WHERE world = 0 AND load NOT IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM covered_file_policy WHERE EXISTS (SELECT 1 FROM file_policy AS r "
-        "WHERE r.id = covered_file_policy.id AND r.load = covered_file_policy.load)",
-        "DELETE FROM covered_file_policy "
-        "WHERE load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "SELECT count(*) FROM file_policy "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "DELETE FROM file_policy "
-        "WHERE load <> ?2 AND load IN (SELECT number FROM policy_load WHERE kind = ?1)",
-        "INSERT INTO file_policy (domain_id, world, path, permission, line, load) "
-        "SELECT domain_id, world, path, permission, line, load FROM "
-        "(SELECT *, max(id) FROM covered_file_policy GROUP BY domain_id, world, path) AS c "
-        "WHERE NOT EXISTS (SELECT 1 FROM file_policy AS r WHERE r.domain_id = c.domain_id AND "
-        "r.world = c.world AND r.path = c.path) ORDER BY id",
-        "DELETE FROM covered_file_policy WHERE EXISTS (SELECT 1 FROM file_policy AS r "
-        "WHERE r.domain_id = covered_file_policy.domain_id AND "
-        "r.world = covered_file_policy.world AND r.path = covered_file_policy.path AND "
-        "r.load = covered_file_policy.load)",
-    },
+constexpr RuleTableColumns kRuleTables[] = {
+    {.name = "rule",
+     .key = "domain_id, kind, word1, word2, word3",
+     .content = "domain_id, kind, word1, word2, word3, granted, line, load",
+     .isOfLoads = "true"},
+    {.name = "parameter_rule",
+     .key = "domain_id, parameter_check, first_value, last_value",
+     .content = "domain_id, parameter_check, first_value, last_value, first_word, last_word, "
+                "granted, line, load",
+     .isOfLoads = "true"},
+    {.name = "file_policy",
+     .key = "domain_id, world, path",
+     .content = "domain_id, world, path, permission, line, load",
+     .isOfLoads = "world = 0"},
 };
 
-std::uint64_t Number(Rows rows) {
-  return rows.Next() ? static_cast<std::uint64_t>(rows.Integer(0)) : 0;
+std::string LoadsOf(int kind) {
+  return StrCat("(SELECT number FROM policy_load WHERE kind = ", kind, ")");
+}
+
+// Keeps all rules of others, of which the load may cover some.
+void KeepOthers(Store& store, const RuleTableColumns& table, int kind) {
+  store.RunScript(StrCat("INSERT INTO covered_", table.name, " SELECT * FROM ", table.name,
+                         " WHERE ", table.isOfLoads, " AND load NOT IN ", LoadsOf(kind)));
+}
+
+// Forgets the kept rules that have one with the same `columns` in the table itself.
+void DropKept(Store& store, const RuleTableColumns& table, const std::string& columns) {
+  // In the order that uses the index of the second.
+  store.RunScript(StrCat("DELETE FROM covered_", table.name,
+                         " WHERE rowid IN (SELECT kept.rowid FROM covered_", table.name,
+                         " AS kept CROSS JOIN ", table.name, " USING (", columns, "))"));
+}
+
+// The rules of the load's own kind that it has not installed.
+std::string StayingRules(const RuleTableColumns& table, int kind, std::int64_t load) {
+  return StrCat(" FROM ", table.name, " WHERE load <> ", load, " AND load IN ", LoadsOf(kind));
+}
+
+// Removes them, and puts back what is not covered any more. Returns how many are gone then.
+int RemoveStaying(Store& store, const RuleTableColumns& table, int kind, std::int64_t load) {
+  // What the kind itself had, and others had covered.
+  store.RunScript(StrCat("DELETE FROM covered_", table.name, " WHERE load IN ", LoadsOf(kind)));
+  const int gone = store.RunScript("DELETE" + StayingRules(table, kind, load));
+  const int back =
+      store.RunScript(StrCat("INSERT OR IGNORE INTO ", table.name, " (", table.content, ") SELECT ",
+                             table.content, " FROM (SELECT *, max(id) FROM covered_", table.name,
+                             " GROUP BY ", table.key, ") ORDER BY id"));
+  DropKept(store, table, StrCat(table.key, ", load"));
+  return gone - back;
 }
 
 // The domains that files of the kind have brought and, going by `defined`, bring no more; those of
@@ -117,26 +92,21 @@ std::vector<std::string> DomainsWithoutFile(HostState& state, int kind,
   return names;
 }
 
-// Removes the rules of the load's own kind that it has not installed, and returns how many of them
-// are gone: some uncover what an early load, or a service, wants.
+// Some of those that go uncover what an early load, or a service, wants.
 std::uint64_t RemoveStayingRules(Store& store, int kind, std::int64_t load) {
   std::uint64_t removed = 0;
-  for (const TableStatements& table : kTables) {
-    store.Run(table.dropOwn, kind);
-    const int gone = store.Run(table.removeStaying, kind, load);
-    const int back = store.Run(table.putBack);
-    store.Run(table.dropPutBack);
-    removed += static_cast<std::uint64_t>(std::max(gone - back, 0));
+  for (const RuleTableColumns& table : kRuleTables) {
+    removed += static_cast<std::uint64_t>(std::max(RemoveStaying(store, table, kind, load), 0));
   }
   return removed;
 }
 
 std::uint64_t CountStayingRules(Store& store, int kind, std::int64_t load) {
-  std::uint64_t staying = 0;
-  for (const TableStatements& table : kTables) {
-    staying += Number(store.Select(table.countStaying, kind, load));
+  std::int64_t staying = 0;
+  for (const RuleTableColumns& table : kRuleTables) {
+    staying += store.ReadInteger("SELECT count(*)" + StayingRules(table, kind, load));
   }
-  return staying;
+  return static_cast<std::uint64_t>(staying);
 }
 
 void DestroyUnused(HostState& state, const std::vector<std::string>& names, LoadEnding& ending) {
@@ -167,16 +137,16 @@ void PolicyTransaction::BeginLoad(const LoadSource& source) {
   kind = source.kind;
   defined = source.domains;
   const int kindNumber = static_cast<int>(kind);
-  const std::uint64_t number =
-      1 + Number(store.Select("SELECT coalesce(max(number), 0) FROM policy_load"));
+  const std::int64_t number =
+      1 + store.ReadInteger("SELECT coalesce(max(number), 0) FROM policy_load");
   store.Run("INSERT INTO policy_load VALUES (?1, ?2, ?3)", number, kindNumber, source.directory);
-  for (const TableStatements& table : kTables) store.Run(table.keepOthers, kindNumber);
+  for (const RuleTableColumns& table : kRuleTables) KeepOthers(store, table, kindNumber);
   std::set<std::string, std::less<>> hidden;
   for (std::string& name : DomainsWithoutFile(*state, kindNumber, defined)) {
     hidden.insert(std::move(name));
   }
   state->Domains().Hide(std::move(hidden));
-  state->SetCurrentLoad(static_cast<std::int64_t>(number));
+  state->SetCurrentLoad(number);
 }
 
 void PolicyTransaction::SetLine(unsigned int line) { state->SetCurrentLine(line); }
@@ -188,7 +158,8 @@ LoadEnding PolicyTransaction::EndLoad(bool remove) {
   state->SetCurrentLoad(0);
   state->SetCurrentLine(0);
   state->Domains().Hide({});
-  for (const TableStatements& table : kTables) store.Run(table.dropUncovered);
+  // What is still there was not covered.
+  for (const RuleTableColumns& table : kRuleTables) DropKept(store, table, "id, load");
 
   LoadEnding ending;
   std::vector<std::string> leaving = DomainsWithoutFile(*state, kindNumber, defined);

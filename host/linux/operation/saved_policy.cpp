@@ -17,7 +17,7 @@
 #include "host/linux/operation/store_copy.h"
 #include "host/linux/operation/store_seal.h"
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/world_table.h"
+#include "host/linux/state/schema.h"
 
 using Braxo::Misc::StrCat;
 
@@ -166,49 +166,20 @@ constexpr Sql kMoveWorlds[] = {
        ORDER BY id)",
 };
 
-// The tables that come back as they were. Their rows are read in the order of their numbers.
-constexpr Sql kReplaceTables[] = {
-    "DELETE FROM main.domain",
-    "INSERT INTO main.domain SELECT * FROM saved.domain",
-    "DELETE FROM main.role",
-    "INSERT INTO main.role SELECT * FROM saved.role",
-    "DELETE FROM main.guest_service",
-    "INSERT INTO main.guest_service SELECT * FROM saved.guest_service",
-    "DELETE FROM main.rule",
-    "INSERT INTO main.rule SELECT * FROM saved.rule",
-    "DELETE FROM main.parameter_rule",
-    "INSERT INTO main.parameter_rule SELECT * FROM saved.parameter_rule",
-    "DELETE FROM main.policy_load",
-    "INSERT INTO main.policy_load SELECT * FROM saved.policy_load",
-    "DELETE FROM main.policy_domain",
-    "INSERT INTO main.policy_domain SELECT * FROM saved.policy_domain",
-    "DELETE FROM main.covered_rule",
-    "INSERT INTO main.covered_rule SELECT * FROM saved.covered_rule",
-    "DELETE FROM main.covered_parameter_rule",
-    "INSERT INTO main.covered_parameter_rule SELECT * FROM saved.covered_parameter_rule",
-    "DELETE FROM main.covered_file_policy",
-    "INSERT INTO main.covered_file_policy SELECT * FROM saved.covered_file_policy",
-    "DELETE FROM main.rule_origin",
-    "INSERT INTO main.rule_origin SELECT * FROM saved.rule_origin",
-};
-
-constexpr Sql kReplaceLabelOrigins[] = {
-    "DELETE FROM main.label_origin",
-    "INSERT INTO main.label_origin SELECT * FROM saved.label_origin",
-};
-
-constexpr Sql kDropLabels =
-    "DELETE FROM main.label WHERE name NOT IN (SELECT name FROM saved.label)";
-constexpr Sql kAddLabels =
+// Files may carry the number of a label that is gone: it gets a new one.
+constexpr Sql kRenewLabels[] = {
+    "DELETE FROM main.label WHERE name NOT IN (SELECT name FROM saved.label)",
     "INSERT INTO main.label (name) SELECT name FROM saved.label "
-    "WHERE name NOT IN (SELECT name FROM main.label) ORDER BY id";
-constexpr Sql kAddLabelsAsSaved =
-    "INSERT INTO main.label (id, name) SELECT id, name FROM saved.label "
-    "WHERE name NOT IN (SELECT name FROM main.label)";
+    "WHERE name NOT IN (SELECT name FROM main.label) ORDER BY id",
+};
 
-template <std::size_t count>
-void RunAll(Store& store, const Sql (&statements)[count]) {
-  for (const Sql& statement : statements) store.Run(statement);
+// The tables that come back as they were. Their rows are read in the order of their numbers.
+void PutTablesBack(Store& store) {
+  for (const StateTable& table : kStateTables) {
+    if (!table.isPutBack) continue;
+    store.RunScript(StrCat("DELETE FROM main.", table.name, "; INSERT INTO main.", table.name,
+                           " SELECT * FROM saved.", table.name));
+  }
 }
 
 }  // namespace
@@ -224,7 +195,7 @@ void SaveState(const std::string& from, const std::string& to, bool replace) {
   file.TakeName(replace);
 }
 
-void RestorePolicy(const std::string& copy, LabelNumbers numbers) {
+void RestorePolicy(const std::string& copy) {
   HostState& state = HostState::Current();
   Store& store = state.Database();
   AttachedCopy attached(store, copy);
@@ -232,15 +203,9 @@ void RestorePolicy(const std::string& copy, LabelNumbers numbers) {
 
   Transaction transaction(store);
   RefuseHomelessWorlds(state);
-  RunAll(store, kMoveWorlds);
-  RunAll(store, kReplaceTables);
-  store.Run(kDropLabels);
-  if (numbers == LabelNumbers::kAsSaved) {
-    store.Run(kAddLabelsAsSaved);
-    RunAll(store, kReplaceLabelOrigins);
-  } else {
-    store.Run(kAddLabels);
-  }
+  for (const Sql& statement : kMoveWorlds) store.Run(statement);
+  PutTablesBack(store);
+  for (const Sql& statement : kRenewLabels) store.Run(statement);
   // Every process notices.
   store.Run(
       "UPDATE main.state SET domain_version = domain_version + 1, label_version = label_version + "

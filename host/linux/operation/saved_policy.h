@@ -11,21 +11,15 @@ namespace LinuxHost {
 // already, unless `replace` is set.
 void SaveState(const std::string& from, const std::string& to, bool replace);
 
-// The numbers that labels get which the copy has and the state has no longer.
-enum class LabelNumbers {
-  kNew,     // files that carry the old number have another label since, or none
-  kAsSaved  // for a copy of the same boot: the files are as they were when it was made
-};
-
 // Puts the domains, their parts, services and rules, the file policies, the labels, and the origins
 // of rules back as they are in `copy`, in one step: whoever dies on the way leaves the old or the
 // new. Worlds stay in the domains that they are in, by name, and keep their own file policies;
-// labels that are still there keep their numbers, since files carry them; where inodes came from
-// stays. With kAsSaved the origins of labels come back too.
+// labels that are still there keep their numbers, since files carry them, and those that are gone
+// come back with new ones; where inodes came from stays.
 //
 // `copy` is a copy for this alone, made by CopyDatabase. Changes nothing and throws, with a reason
 // that goes on a sentence about the copy, when it cannot be used, and when worlds run in a domain
 // that it does not have.
-void RestorePolicy(const std::string& copy, LabelNumbers numbers);
+void RestorePolicy(const std::string& copy);
 
 }  // namespace LinuxHost

@@ -1,7 +1,6 @@
 #include "host/linux/operation/stable_view.h"
 
 #include "host/linux/state/host_state.h"
-#include "host/linux/state/store.h"
 
 namespace LinuxHost {
 

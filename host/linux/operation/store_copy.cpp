@@ -14,8 +14,7 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
 #include "host/linux/operation/store_seal.h"
-#include "host/linux/state/host_state.h"
-#include "host/linux/state/store.h"
+#include "host/linux/state/schema.h"
 
 namespace LinuxHost {
 namespace {
@@ -157,7 +156,7 @@ std::string ReasonOf(int result, int sourceError, int targetError) {
 // Makes the copy of a saved state a state again. Returns what is wrong with it; what is of another
 // version tells so itself when it is used.
 std::string Unseal(const std::string& copy) {
-  if (StoredVersion(copy) != kStateVersion) return FindDamage(copy);
+  if (StoredVersion(copy) != kStateLayout.version) return FindDamage(copy);
   std::string damage = FindBrokenSeal(copy);
   if (damage.empty()) RemoveSeal(copy);
   return damage;

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "host/linux/state/host_state.h"
+#include "host/linux/state/state_base.h"
 
 namespace LinuxHost {
 
@@ -9,18 +9,18 @@ namespace LinuxHost {
 // changes nothing, and returns false, once what is known no longer holds. Throws the refusal, and a
 // HostError for a state that contradicts itself.
 template <class Refuse, class Install>
-void InstallChecked(HostState& state, const Refuse& refuse, const Install& install) {
+void InstallChecked(StateBase& base, const Refuse& refuse, const Install& install) {
   // The common way makes one statement: what was known last is good enough to check against, since
   // the installation itself proves that it still holds.
   if (!refuse() && install()) return;
   // What is known is anew with each turn, so that only a state that contradicts itself needs many.
   constexpr int kTurns = 1000;
   for (int turn = 0; turn < kTurns; ++turn) {
-    state.Refresh();
+    base.Refresh();
     if (const auto refusal = refuse()) throw *refusal;
     if (install()) return;
   }
-  state.Database().TellDamage("its tables contradict each other");
+  base.Database().TellDamage("its tables contradict each other");
 }
 
 }  // namespace LinuxHost

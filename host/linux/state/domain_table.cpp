@@ -8,10 +8,8 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/require_text.h"
-#include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
-#include "host/linux/state/rule_table.h"
-#include "host/linux/state/world_table.h"
+#include "host/linux/state/removal.h"
 #include "policy/level.h"
 
 using Braxo::Misc::StrCat;
@@ -60,19 +58,19 @@ Domain ReadDomain(const Rows& rows) {
 // dropped when the transaction is undone.
 class DomainTable::Change {
  public:
-  explicit Change(DomainTable& changed) : table(changed), transaction(changed.state.Database()) {
-    table.state.Refresh();
+  explicit Change(DomainTable& changed) : table(changed), transaction(changed.base.Database()) {
+    table.base.Refresh();
   }
   Change(const Change&) = delete;
   Change& operator=(const Change&) = delete;
   ~Change() {
-    if (!committed) table.loaded = false;
+    if (!committed) table.loadedVersion.reset();
   }
 
   void Commit() {
-    table.state.Database().Run("UPDATE state SET domain_version = domain_version + 1");
-    transaction.Commit();
-    ++table.version;
+    const bool isCurrent = table.loadedVersion == table.base.DomainVersion();
+    table.base.CommitDomains(transaction);
+    if (isCurrent) table.loadedVersion = table.base.DomainVersion();
     committed = true;
   }
 
@@ -82,25 +80,12 @@ class DomainTable::Change {
   bool committed = false;
 };
 
-DomainTable::DomainTable(HostState& owner) : state(owner) {}
-
-void DomainTable::Notice(std::int64_t currentVersion) {
-  if (currentVersion == version) return;
-  version = currentVersion;
-  loaded = false;
-}
-
-void DomainTable::Forget() {
-  version = 0;
-  loaded = false;
-}
-
 void DomainTable::Load() {
-  if (loaded) return;
+  if (loadedVersion == base.DomainVersion()) return;
   slots.clear();
   slots.resize(kDomainSlots);
   identifiers.clear();
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain");
   while (rows.Next()) {
     auto domain = std::make_unique<Domain>(ReadDomain(rows));
@@ -111,7 +96,7 @@ void DomainTable::Load() {
     identifiers.emplace(domain->name, id);
     slots[id] = std::move(domain);
   }
-  loaded = true;
+  loadedVersion = base.DomainVersion();
 }
 
 const Domain* DomainTable::Find(std::string_view name) {
@@ -136,6 +121,14 @@ const Domain& DomainTable::Get(unsigned int id) {
   const Domain* domain = Find(id);
   if (domain == nullptr) throw HostError(ENOENT, StrCat("unknown domain ", id));
   return *domain;
+}
+
+std::optional<HostError> DomainTable::Refusal(const DomainReference& reference) {
+  const Domain* domain = Find(reference.id);
+  if (domain == nullptr) return HostError(ENOENT, StrCat("unknown domain ", reference.id));
+  if (reference.name.empty() || domain->name == reference.name) return std::nullopt;
+  return HostError(ENOENT, StrCat("domain ", reference.id, " is '", domain->name, "', not '",
+                                  reference.name, "'"));
 }
 
 // A domain's name is also its label, with the same identifier; kNoLabel is therefore no slot.
@@ -174,8 +167,8 @@ unsigned int DomainTable::Insert(const std::string& name, TeskAccessKsi_DefaultD
                                    " domains are in use"));
   }
   const char* const level = Policy::TextOf(Policy::kLevels.front());
-  state.Database().Run("INSERT INTO domain VALUES (?1, ?2, ?3, ?4, ?5)", id, name, level,
-                       static_cast<int>(defaultRules), createdAtRunTime);
+  base.Database().Run("INSERT INTO domain VALUES (?1, ?2, ?3, ?4, ?5)", id, name, level,
+                      static_cast<int>(defaultRules), createdAtRunTime);
   slots[id] = std::make_unique<Domain>(Domain{id, name, level, defaultRules, createdAtRunTime});
   identifiers.emplace(name, id);
   return id;
@@ -196,15 +189,7 @@ void DomainTable::Erase(unsigned int id) {
   if (references.worlds + references.roles != 0) {
     throw HostError(EBUSY, StrCat("domain '", domain.name, "' is in use"));
   }
-  Store& store = state.Database();
-  store.Run("DELETE FROM domain WHERE id = ?1", domain.id);
-  store.Run("DELETE FROM parameter_rule WHERE domain_id = ?1", domain.id);
-  store.Run("DELETE FROM file_policy WHERE domain_id = ?1", domain.id);
-  store.Run("DELETE FROM covered_parameter_rule WHERE domain_id = ?1", domain.id);
-  store.Run("DELETE FROM covered_file_policy WHERE domain_id = ?1", domain.id);
-  store.Run("DELETE FROM guest_service WHERE domain_id = ?1", domain.id);
-  store.Run("DELETE FROM world WHERE domain_id = ?1", domain.id);
-  state.Rules().RemoveDomain(domain);
+  RemoveWithRules(base.Database(), domain);
   identifiers.erase(domain.name);
   slots[domain.id].reset();
 }
@@ -237,16 +222,16 @@ void DomainTable::SetLevel(const std::string& name, const std::string& level) {
   }
   Change change(*this);
   const unsigned int id = Get(name).id;
-  state.Database().Run("UPDATE domain SET level = ?1 WHERE id = ?2", level, id);
+  base.Database().Run("UPDATE domain SET level = ?1 WHERE id = ?2", level, id);
   slots[id]->level = level;
   change.Commit();
 }
 
 void DomainTable::SetRole(DomainRole role, unsigned int id) {
-  Transaction transaction(state.Database());
-  state.Refresh();
+  Transaction transaction(base.Database());
+  base.Refresh();
   Get(id);
-  state.Database().Run("INSERT OR REPLACE INTO role VALUES (?1, ?2)", RowOf(role).name, id);
+  base.Database().Run("INSERT OR REPLACE INTO role VALUES (?1, ?2)", RowOf(role).name, id);
   transaction.Commit();
 }
 
@@ -256,7 +241,7 @@ bool DomainTable::HasRole(DomainRole role, unsigned int id) {
 
 unsigned int DomainTable::RolesOf(unsigned int id) {
   unsigned int roles = 0;
-  Rows rows = state.Database().Select("SELECT name FROM role WHERE domain_id = ?1", id);
+  Rows rows = base.Database().Select("SELECT name FROM role WHERE domain_id = ?1", id);
   while (rows.Next()) {
     const std::string name = rows.Text(0);
     for (const auto& row : kRoles) {
@@ -268,16 +253,16 @@ unsigned int DomainTable::RolesOf(unsigned int id) {
 
 void DomainTable::AddGuestService(unsigned int id, const std::string& service) {
   RequireText(service, kService);
-  Transaction transaction(state.Database());
-  state.Refresh();
+  Transaction transaction(base.Database());
+  base.Refresh();
   Get(id);
-  state.Database().Run("INSERT OR IGNORE INTO guest_service VALUES (?1, ?2)", id, service);
+  base.Database().Run("INSERT OR IGNORE INTO guest_service VALUES (?1, ?2)", id, service);
   transaction.Commit();
 }
 
 std::vector<std::string> DomainTable::GuestServices(unsigned int id) {
   std::vector<std::string> services;
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT service FROM guest_service WHERE domain_id = ?1 ORDER BY service", id);
   while (rows.Next()) services.push_back(rows.Text(0));
   return services;
@@ -285,8 +270,8 @@ std::vector<std::string> DomainTable::GuestServices(unsigned int id) {
 
 DomainReferences DomainTable::CountReferences(const Domain& domain) {
   DomainReferences references;
-  references.worlds = state.Worlds().CountIn(domain.id);
-  Rows rows = state.Database().Select(
+  references.worlds = worlds.CountIn(domain.id);
+  Rows rows = base.Database().Select(
       "SELECT count(*) FROM rule WHERE kind = 'domain transition' AND word2 = ?1 AND granted AND "
       "domain_id <> ?2",
       domain.name, domain.id);
@@ -297,9 +282,9 @@ DomainReferences DomainTable::CountReferences(const Domain& domain) {
 }
 
 std::optional<DomainDescription> DomainTable::Describe(unsigned int id) {
-  const Snapshot snapshot(state.Database());
+  const Snapshot snapshot(base.Database());
   // Not the one in memory, which may be older than what is counted.
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain WHERE id = ?1", id);
   if (!rows.Next()) return std::nullopt;
   DomainDescription description{.domain = ReadDomain(rows), .references = {}};
@@ -312,7 +297,7 @@ unsigned int DomainDescription::StateWord() const {
 }
 
 std::vector<unsigned int> DomainTable::Leaked() {
-  state.Refresh();
+  base.Refresh();
   Load();
   std::vector<unsigned int> leaked;
   for (const auto& slot : slots) {

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <bit>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -10,60 +9,19 @@
 #include <utility>
 #include <vector>
 
+#include "host/linux/common/host_error.h"
 #include "host/linux/common/text_map.h"
-#include "teskctl/security.h"
+#include "host/linux/state/domain.h"
+#include "host/linux/state/state_base.h"
+#include "host/linux/state/world_table.h"
 
 namespace LinuxHost {
 
-class HostState;
-
-// The number of domain slots; identifiers are less than it.
-constexpr unsigned int kDomainSlots = 512;
-
-// The domain that worlds start in. Built in, and never destroyed.
-constexpr unsigned int kStartDomain = 0;
-
-// The longest name of a domain in bytes: with its NUL it fills the 64 bytes that a caller of the
-// kernel has for it.
-constexpr std::size_t kMaxDomainName = 63;
-
-// A part that one domain of the host plays.
-enum class DomainRole : unsigned int { GlobalVm = 1, IoFilter = 2, DaemonFramework = 3 };
-
-struct Domain {
-  unsigned int id = 0;
-  std::string name;
-  std::string level;
-  TeskCtl::Security::TeskAccessKsi_DefaultDom defaultRules =
-      TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
-  bool createdAtRunTime = false;
-};
-
-// What keeps a domain in use.
-struct DomainReferences {
-  unsigned int worlds = 0;       // living worlds that were placed in it
-  unsigned int transitions = 0;  // granted transitions into it from other domains
-  unsigned int roles = 0;        // parts that it plays: bit n - 1 for the one with the number n
-
-  unsigned int Sum() const {
-    return worlds + transitions + static_cast<unsigned int>(std::popcount(roles));
-  }
-};
-
-// A domain as it was at one moment.
-struct DomainDescription {
-  Domain domain;
-  DomainReferences references;
-
-  // The parts that it plays; bit 3 is set when it was created at run time.
-  unsigned int StateWord() const;
-};
-
-// The domains, as of the last HostState::Refresh(); what changes them looks again itself. Failures
+// The domains, as of the last StateBase::Refresh(); what changes them looks again itself. Failures
 // are HostErrors.
 class DomainTable {
  public:
-  explicit DomainTable(HostState& owner);
+  DomainTable(StateBase& stateBase, WorldTable& worldTable) : base(stateBase), worlds(worldTable) {}
 
   // The domain, null when there is none. Holds until the table changes.
   const Domain* Find(std::string_view name);
@@ -72,6 +30,9 @@ class DomainTable {
   // The same, but throws when there is none.
   const Domain& Get(std::string_view name);
   const Domain& Get(unsigned int id);
+
+  // Why the reference is to no domain; empty when it is to one.
+  std::optional<HostError> Refusal(const DomainReference& reference);
 
   // Creates a domain in the lowest free slot and returns its identifier. A policy's domain that
   // exists with the same default rules is returned as it is; any other taken name is refused, and
@@ -107,11 +68,6 @@ class DomainTable {
   // The domains that were created at run time and that nothing refers to now, in ascending order.
   std::vector<unsigned int> Leaked();
 
-  // The version of the table that the state is at now.
-  std::int64_t Version() const { return version; }
-  void Notice(std::int64_t currentVersion);
-  void Forget();
-
   // From now on no domain is found by one of these names, until a domain of the name is wanted
   // anew. Replaces the names that were hidden before.
   void Hide(std::set<std::string, std::less<>> names) { hidden = std::move(names); }
@@ -127,9 +83,9 @@ class DomainTable {
                       bool createdAtRunTime);
   void Erase(unsigned int id);
 
-  HostState& state;
-  std::int64_t version = 0;
-  bool loaded = false;
+  StateBase& base;
+  WorldTable& worlds;
+  std::optional<std::int64_t> loadedVersion;
   std::vector<std::unique_ptr<Domain>> slots;
   TextMap<unsigned int> identifiers;
   std::set<std::string, std::less<>> hidden;

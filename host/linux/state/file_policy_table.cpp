@@ -6,8 +6,6 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/require_text.h"
 #include "host/linux/state/checked_install.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/host_state.h"
 #include "host/linux/state/world_table.h"
 
 using Braxo::Misc::StrCat;
@@ -35,15 +33,13 @@ bool IsForTheSame(const FilePolicy& one, const FilePolicy& other) {
 
 }  // namespace
 
-FilePolicyTable::FilePolicyTable(HostState& owner) : state(owner) {}
-
 void FilePolicyTable::RequireDomain(unsigned int domainId) {
-  state.Refresh();
-  state.Domains().Get(domainId);
+  base.Refresh();
+  domains.Get(domainId);
 }
 
 void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
-  Transaction transaction(state.Database());
+  Transaction transaction(base.Database());
   for (std::size_t index = 0; index < policies.size(); ++index) {
     const FilePolicy& policy = policies[index];
     RequireWorld(policy.world);
@@ -53,36 +49,36 @@ void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
     // replace the first.
     if (index + 1 < policies.size() && IsForTheSame(policy, policies[index + 1])) continue;
     InstallChecked(
-        state, [&] { return DomainRefusal(state, policy.domain); },
+        base, [&] { return domains.Refusal(policy.domain); },
         [&] { return InstallIfUnchanged(policy); });
   }
   transaction.Commit();
 }
 
 bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
-  if (state.CurrentLoad() != 0) {
-    state.Database().Run(
+  if (base.CurrentLoad() != 0) {
+    base.Database().Run(
         "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
         "VALUES (?1, ?2, ?3, ?4, ?5, ?6)",
         policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
-        state.CurrentLoad());
+        base.CurrentLoad());
     return true;
   }
-  return state.Database().Run(
+  return base.Database().Run(
              "INSERT OR REPLACE INTO file_policy (domain_id, world, path, permission, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6 FROM state WHERE domain_version = ?7",
              policy.domain.id, policy.world, policy.path, policy.permission, policy.line,
-             state.CurrentLoad(), state.Domains().Version()) != 0;
+             base.CurrentLoad(), base.DomainVersion()) != 0;
 }
 
 void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string& path) {
-  Transaction transaction(state.Database());
+  Transaction transaction(base.Database());
   RequireDomain(domainId);
-  const int removed = state.Database().Run(
+  const int removed = base.Database().Run(
       "DELETE FROM file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId, world,
       path);
   if (removed == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
-  state.Database().Run(
+  base.Database().Run(
       "DELETE FROM covered_file_policy WHERE domain_id = ?1 AND world = ?2 AND path = ?3", domainId,
       world, path);
   transaction.Commit();
@@ -90,10 +86,10 @@ void FilePolicyTable::Remove(unsigned int domainId, int world, const std::string
 
 void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
                              unsigned int permission) {
-  Transaction transaction(state.Database());
+  Transaction transaction(base.Database());
   RequireDomain(domainId);
   RequirePermission(permission);
-  const int updated = state.Database().Run(
+  const int updated = base.Database().Run(
       "UPDATE file_policy SET permission = ?3 WHERE domain_id = ?1 AND path = ?2", domainId, path,
       permission);
   if (updated == 0) throw HostError(ENOENT, StrCat("no file policy for '", path, "'"));
@@ -102,26 +98,26 @@ void FilePolicyTable::Update(unsigned int domainId, const std::string& path,
 
 void FilePolicyTable::RePoint(const std::string& oldPath, const std::string& newPath) {
   RequireText(newPath, kPath);
-  const int moved = state.Database().Run(
+  const int moved = base.Database().Run(
       "UPDATE OR REPLACE file_policy SET path = ?2 WHERE path = ?1 AND world <> 0", oldPath,
       newPath);
   if (moved == 0) throw HostError(ENOENT, StrCat("no world has a file policy for '", oldPath, "'"));
 }
 
 unsigned int FilePolicyTable::Count(unsigned int domainId) {
-  const Transaction transaction(state.Database());
+  const Transaction transaction(base.Database());
   RequireDomain(domainId);
   Rows rows =
-      state.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
+      base.Database().Select("SELECT count(*) FROM file_policy WHERE domain_id = ?1", domainId);
   rows.Next();
   return static_cast<unsigned int>(rows.Integer(0));
 }
 
 std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
-  const Transaction transaction(state.Database());
+  const Transaction transaction(base.Database());
   RequireDomain(domainId);
   std::vector<FilePolicy> policies;
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT world, path, permission, line FROM file_policy WHERE domain_id = ?1 ORDER BY id",
       domainId);
   while (rows.Next()) {
@@ -135,7 +131,7 @@ std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
 }
 
 std::vector<Policy::Rule> FilePolicyTable::Read(unsigned int domainId) {
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
       "ORDER BY id",
       domainId);

@@ -4,12 +4,10 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/rule_table.h"
+#include "host/linux/state/domain_table.h"
 #include "policy/rule.h"
 
 namespace LinuxHost {
-
-class HostState;
 
 // The longest path of a file policy in bytes.
 constexpr std::size_t kMaxPolicyPath = 1983;
@@ -27,7 +25,8 @@ struct FilePolicy {
 // Failures are HostErrors.
 class FilePolicyTable {
  public:
-  explicit FilePolicyTable(HostState& owner);
+  FilePolicyTable(StateBase& stateBase, DomainTable& domainTable)
+      : base(stateBase), domains(domainTable) {}
 
   // Installs policies behind all others, all or none; one for the same domain, world and path goes.
   void Install(std::span<const FilePolicy> policies);
@@ -54,7 +53,8 @@ class FilePolicyTable {
   void RequireDomain(unsigned int domainId);
   bool InstallIfUnchanged(const FilePolicy& policy);
 
-  HostState& state;
+  StateBase& base;
+  DomainTable& domains;
 };
 
 }  // namespace LinuxHost

@@ -10,7 +10,6 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/state/domain_table.h"
-#include "host/linux/state/host_state.h"
 #include "host/linux/state/label_table.h"
 #include "policy/rule_kind.h"
 
@@ -105,7 +104,9 @@ void AddSystemCalls(int first, int last, std::map<std::string, long>& calls) {
 // All system calls of Linux. One that this machine's architecture does not have is known by the
 // negative number that libseccomp gives it.
 std::map<std::string, long> SystemCalls() {
+  // Some 470 are in use; the numbers grow by a few a year, and are the same on all newer machines.
   constexpr int kLastNumber = 1023;
+  // The library counts those of other machines down from -10001, some 200 by now.
   constexpr int kFirstForeign = -10'999;
   constexpr int kLastForeign = -10'001;
   std::map<std::string, long> calls;
@@ -119,15 +120,6 @@ bool IsSystemCall(std::string_view word) {
          seccomp_syscall_resolve_name(std::string(word).c_str()) != __NR_SCMP_ERROR;
 }
 
-bool IsKeyword(HostState& state, TeskAccess_KeywordType type, std::string_view word) {
-  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) {
-    return state.Labels().Lookup(word) != kNoLabel || state.Domains().Find(word) != nullptr;
-  }
-  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return IsSystemCall(word);
-  const Words words = ShortList(type);
-  return std::find(words.begin(), words.end(), word) != words.end();
-}
-
 std::string WordAt(TeskAccess_KeywordType type, std::uint64_t id) {
   const Words words = ShortList(type);
   if (id >= words.size()) throw HostError(EINVAL, StrCat("unknown ", NounOf(type), " ", id));
@@ -136,9 +128,9 @@ std::string WordAt(TeskAccess_KeywordType type, std::uint64_t id) {
 
 }  // namespace
 
-std::map<std::string, long> Keywords(HostState& state, TeskAccess_KeywordType type) {
+std::map<std::string, long> KeywordTables::All(TeskAccess_KeywordType type) {
   NounOf(type);
-  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) return state.Labels().All();
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) return labels.All();
   if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return SystemCalls();
   std::map<std::string, long> keywords;
   for (const auto& word : ShortList(type)) {
@@ -147,10 +139,19 @@ std::map<std::string, long> Keywords(HostState& state, TeskAccess_KeywordType ty
   return keywords;
 }
 
-std::optional<HostError> KeywordRefusal(HostState& state, TeskAccess_KeywordType type,
-                                        std::string_view word) {
+bool KeywordTables::Has(TeskAccess_KeywordType type, std::string_view word) {
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) {
+    return labels.Lookup(word) != kNoLabel || domains.Find(word) != nullptr;
+  }
+  if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return IsSystemCall(word);
+  const Words words = ShortList(type);
+  return std::find(words.begin(), words.end(), word) != words.end();
+}
+
+std::optional<HostError> KeywordTables::Refusal(TeskAccess_KeywordType type,
+                                                std::string_view word) {
   const char* noun = NounOf(type);
-  if (IsKeyword(state, type, word)) return std::nullopt;
+  if (Has(type, word)) return std::nullopt;
   return HostError(EINVAL, StrCat("unknown ", noun, " '", word, "'"));
 }
 

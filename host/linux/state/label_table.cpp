@@ -5,8 +5,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/require_text.h"
-#include "host/linux/state/host_state.h"
-#include "host/linux/state/rule_table.h"
+#include "host/linux/state/removal.h"
 
 using Braxo::Misc::StrCat;
 
@@ -17,30 +16,17 @@ constexpr TextLimit kName = {.noun = "label", .whenEmpty = "a label needs a name
 
 }  // namespace
 
-LabelTable::LabelTable(HostState& owner) : state(owner) {}
-
-void LabelTable::Notice(std::int64_t currentVersion) {
-  if (currentVersion == version) return;
-  version = currentVersion;
-  loaded = false;
-}
-
-void LabelTable::Forget() {
-  version = 0;
-  loaded = false;
-}
-
 void LabelTable::Load() {
-  if (loaded) return;
+  if (loadedVersion == base.LabelVersion()) return;
   identifiers.clear();
   names.clear();
-  Rows rows = state.Database().Select("SELECT id, name FROM label");
+  Rows rows = base.Database().Select("SELECT id, name FROM label");
   while (rows.Next()) {
     const auto id = static_cast<unsigned int>(rows.Integer(0));
     identifiers.emplace(rows.Text(1), id);
     names.emplace(id, rows.Text(1));
   }
-  loaded = true;
+  loadedVersion = base.LabelVersion();
 }
 
 unsigned int LabelTable::Lookup(std::string_view name) {
@@ -69,35 +55,28 @@ std::map<std::string, long> LabelTable::All() {
 
 void LabelTable::Add(const std::vector<std::string>& added) {
   for (const auto& name : added) RequireText(name, kName);
-  Transaction transaction(state.Database());
-  state.Refresh();
+  Transaction transaction(base.Database());
+  base.Refresh();
   int changes = 0;
   for (const auto& name : added) {
-    changes += state.Database().Run(
+    changes += base.Database().Run(
         "INSERT INTO label (name) SELECT ?1 WHERE NOT EXISTS (SELECT 1 FROM label WHERE name = ?1)",
         name);
   }
-  Commit(transaction, changes);
+  if (changes != 0) base.CommitLabels(transaction);
 }
 
 void LabelTable::Remove(const std::vector<std::string>& removed) {
-  Transaction transaction(state.Database());
-  state.Refresh();
+  Transaction transaction(base.Database());
+  base.Refresh();
   int changes = 0;
   for (const auto& name : removed) {
     if (IsPredefined(name)) continue;
-    changes += state.Database().Run("DELETE FROM label WHERE name = ?1", name);
+    changes += base.Database().Run("DELETE FROM label WHERE name = ?1", name);
   }
-  if (changes != 0) state.Rules().RemoveUnnamed();
-  Commit(transaction, changes);
-}
-
-void LabelTable::Commit(Transaction& transaction, int changes) {
   if (changes == 0) return;
-  state.Database().Run("UPDATE state SET label_version = label_version + 1");
-  transaction.Commit();
-  // Within a load nothing tells of it before its end.
-  Notice(version + 1);
+  RemoveUnnamedRules(base.Database());
+  base.CommitLabels(transaction);
 }
 
 }  // namespace LinuxHost

@@ -2,17 +2,16 @@
 
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
 #include <vector>
 
 #include "host/linux/common/text_map.h"
+#include "host/linux/state/state_base.h"
 
 namespace LinuxHost {
-
-class HostState;
-class Transaction;
 
 // The identifier that no label ever has; what a lookup of an unknown label answers.
 constexpr unsigned int kNoLabel = 1;
@@ -22,10 +21,10 @@ constexpr char kUnlabeled[] = "unlabeled";
 constexpr unsigned int kUnlabeledId = 2;
 constexpr char kDefaultTardiskLabel[] = "tardiskDefault";
 
-// The object labels, as of the last HostState::Refresh(). Failures are HostErrors.
+// The object labels, as of the last StateBase::Refresh(). Failures are HostErrors.
 class LabelTable {
  public:
-  explicit LabelTable(HostState& owner);
+  explicit LabelTable(StateBase& stateBase) : base(stateBase) {}
 
   // The identifier of the label `name`, kNoLabel when there is none.
   unsigned int Lookup(std::string_view name);
@@ -46,18 +45,11 @@ class LabelTable {
   // Removes labels, and the rules that name them; unknown and predefined ones are left out.
   void Remove(const std::vector<std::string>& removed);
 
-  // The version of the table that the state is at now.
-  std::int64_t Version() const { return version; }
-  void Notice(std::int64_t currentVersion);
-  void Forget();
-
  private:
   void Load();
-  void Commit(Transaction& transaction, int changes);
 
-  HostState& state;
-  std::int64_t version = 0;
-  bool loaded = false;
+  StateBase& base;
+  std::optional<std::int64_t> loadedVersion;
   TextMap<unsigned int> identifiers;
   std::unordered_map<unsigned int, std::string> names;
 };

@@ -8,9 +8,6 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/state/checked_install.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/host_state.h"
-#include "host/linux/state/keyword_tables.h"
 
 using Braxo::Misc::StrCat;
 using Policy::ParameterRange;
@@ -66,53 +63,50 @@ void RequireNoConflict(const std::list<TeskAccess_CapabilityParamRule>& rules) {
   for (auto& [check, ranges] : checks) RequireNoConflict(ranges);
 }
 
-ParameterRuleTable::ParameterRuleTable(HostState& owner) : state(owner) {}
-
 std::optional<HostError> ParameterRuleTable::Refusal(const DomainReference& domain,
                                                      const Policy::Rule& rule) {
-  if (auto refusal = DomainRefusal(state, domain)) return refusal;
-  return KeywordRefusal(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK,
-                        rule.words.front());
+  if (auto refusal = domains.Refusal(domain)) return refusal;
+  return keywords.Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, rule.words.front());
 }
 
 bool ParameterRuleTable::InstallIfUnchanged(unsigned int domainId, const Policy::Rule& rule,
                                             const ParameterRange& range) {
   const auto& [check, firstWord, lastWord] = rule.words;
-  if (state.CurrentLoad() != 0) {
-    state.Database().Run(
+  if (base.CurrentLoad() != 0) {
+    base.Database().Run(
         "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
         "last_value, first_word, last_word, granted, line, load) "
         "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)",
         domainId, check, range.first, range.last, firstWord, lastWord, rule.Grants(), rule.line,
-        state.CurrentLoad());
+        base.CurrentLoad());
     return true;
   }
-  return state.Database().Run(
+  return base.Database().Run(
              "INSERT OR REPLACE INTO parameter_rule (domain_id, parameter_check, first_value, "
              "last_value, first_word, last_word, granted, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9 FROM state WHERE domain_version = ?10",
              domainId, check, range.first, range.last, firstWord, lastWord, rule.Grants(),
-             rule.line, state.CurrentLoad(), state.Domains().Version()) != 0;
+             rule.line, base.CurrentLoad(), base.DomainVersion()) != 0;
 }
 
 void ParameterRuleTable::Install(const DomainReference& domain, const Policy::Rule& rule) {
   const ParameterRange range = rule.Range();
   InstallChecked(
-      state, [&] { return Refusal(domain, rule); },
+      base, [&] { return Refusal(domain, rule); },
       [&] { return InstallIfUnchanged(domain.id, rule, range); });
 }
 
 void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
                                 const ParameterRange& range) {
-  Transaction transaction(state.Database());
-  state.Refresh();
-  state.Domains().Get(domainId);
-  const int removed = state.Database().Run(
+  Transaction transaction(base.Database());
+  base.Refresh();
+  domains.Get(domainId);
+  const int removed = base.Database().Run(
       "DELETE FROM parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "
       "first_value = ?3 AND last_value = ?4",
       domainId, check, range.first, range.last);
   if (removed == 0) throw HostError(ENOENT, StrCat("no rule for parameter check '", check, "'"));
-  state.Database().Run(
+  base.Database().Run(
       "DELETE FROM covered_parameter_rule WHERE domain_id = ?1 AND parameter_check = ?2 AND "
       "first_value = ?3 AND last_value = ?4",
       domainId, check, range.first, range.last);
@@ -120,7 +114,7 @@ void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
 }
 
 std::vector<Policy::Rule> ParameterRuleTable::Read(unsigned int domainId) {
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT parameter_check, first_word, last_word, granted, line FROM parameter_rule "
       "WHERE domain_id = ?1 ORDER BY id",
       domainId);

@@ -5,18 +5,18 @@
 #include <string>
 #include <vector>
 
-#include "host/linux/state/rule_table.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/keyword_tables.h"
 #include "policy/rule.h"
 #include "teskctl/security.h"
 
 namespace LinuxHost {
 
-class HostState;
-
 // The parameter-check rules. Failures are HostErrors.
 class ParameterRuleTable {
  public:
-  explicit ParameterRuleTable(HostState& owner);
+  ParameterRuleTable(StateBase& stateBase, DomainTable& domainTable, KeywordTables& keywordTables)
+      : base(stateBase), domains(domainTable), keywords(keywordTables) {}
 
   // Installs a rule behind all others of its domain; one for the same check and range goes, however
   // it was written. Throws for a domain or a check that does not exist, and for words that are no
@@ -34,7 +34,9 @@ class ParameterRuleTable {
   bool InstallIfUnchanged(unsigned int domainId, const Policy::Rule& rule,
                           const Policy::ParameterRange& range);
 
-  HostState& state;
+  StateBase& base;
+  DomainTable& domains;
+  KeywordTables& keywords;
 };
 
 // Throws BraxoException when a range of the rules cannot be read, and HostError when two of them

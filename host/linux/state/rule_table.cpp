@@ -1,40 +1,23 @@
 #include "host/linux/state/rule_table.h"
 
-#include <cerrno>
-
-#include "braxo/misc/strcat.h"
 #include "host/linux/state/checked_install.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/host_state.h"
-#include "host/linux/state/keyword_tables.h"
-#include "host/linux/state/label_table.h"
 
-using Braxo::Misc::StrCat;
 using Policy::FormOf;
 using Policy::RuleKind;
 
 namespace LinuxHost {
-std::optional<HostError> DomainRefusal(HostState& state, const DomainReference& reference) {
-  const Domain* domain = state.Domains().Find(reference.id);
-  if (domain == nullptr) return HostError(ENOENT, StrCat("unknown domain ", reference.id));
-  if (reference.name.empty() || domain->name == reference.name) return std::nullopt;
-  return HostError(ENOENT, StrCat("domain ", reference.id, " is '", domain->name, "', not '",
-                                  reference.name, "'"));
-}
-
-RuleTable::RuleTable(HostState& owner) : state(owner) {}
 
 std::optional<HostError> RuleTable::Refusal(const DomainReference& domain, const Policy::Rule& rule,
                                             unsigned int targetId) {
-  if (auto refusal = DomainRefusal(state, domain)) return refusal;
+  if (auto refusal = domains.Refusal(domain)) return refusal;
   if (rule.kind == RuleKind::kDomainTransition) {
-    if (auto refusal = DomainRefusal(state, {targetId, rule.words[1]})) return refusal;
+    if (auto refusal = domains.Refusal({targetId, rule.words[1]})) return refusal;
   }
   const auto words = FormOf(rule.kind).Words();
   for (std::size_t index = 0; index < words.size(); ++index) {
     const auto& table = FormOf(words[index]).table;
     if (!table) continue;
-    if (auto refusal = KeywordRefusal(state, *table, rule.words[index])) return refusal;
+    if (auto refusal = keywords.Refusal(*table, rule.words[index])) return refusal;
   }
   return std::nullopt;
 }
@@ -43,34 +26,34 @@ std::optional<HostError> RuleTable::Refusal(const DomainReference& domain, const
 // since they were read, which nobody can do while a load lasts.
 bool RuleTable::InstallIfUnchanged(unsigned int domainId, const Policy::Rule& rule) {
   const char* const kind = FormOf(rule.kind).name;
-  if (state.CurrentLoad() != 0) {
-    state.Database().Run(
+  if (base.CurrentLoad() != 0) {
+    base.Database().Run(
         "INSERT OR REPLACE INTO rule (domain_id, kind, word1, word2, word3, granted, line, load) "
         "VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)",
         domainId, kind, rule.words[0], rule.words[1], rule.words[2], rule.Grants(), rule.line,
-        state.CurrentLoad());
+        base.CurrentLoad());
     return true;
   }
-  return state.Database().Run(
+  return base.Database().Run(
              "INSERT OR REPLACE INTO rule "
              "(domain_id, kind, word1, word2, word3, granted, line, load) "
              "SELECT ?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8 FROM state "
              "WHERE domain_version = ?9 AND label_version = ?10",
              domainId, kind, rule.words[0], rule.words[1], rule.words[2], rule.Grants(), rule.line,
-             state.CurrentLoad(), state.Domains().Version(), state.Labels().Version()) != 0;
+             base.CurrentLoad(), base.DomainVersion(), base.LabelVersion()) != 0;
 }
 
 void RuleTable::Install(const DomainReference& domain, const Policy::Rule& rule,
                         unsigned int targetId) {
   InstallChecked(
-      state, [&] { return Refusal(domain, rule, targetId); },
+      base, [&] { return Refusal(domain, rule, targetId); },
       [&] { return InstallIfUnchanged(domain.id, rule); });
 }
 
 std::vector<Policy::Rule> RuleTable::Read(unsigned int domainId, RuleKind kind) {
   // Of a bare ?2 the engine would look whether it fits the condition of transition_target, and
   // prepare the statement again for each other kind.
-  Rows rows = state.Database().Select(
+  Rows rows = base.Database().Select(
       "SELECT granted, line, word1, word2, word3 FROM rule WHERE domain_id = ?1 AND kind = +?2 "
       "ORDER BY id",
       domainId, FormOf(kind).name);
@@ -89,28 +72,6 @@ std::vector<Policy::Rule> RuleTable::Read(unsigned int domainId, RuleKind kind) 
     }
   }
   return rules;
-}
-
-void RuleTable::RemoveDomain(const Domain& domain) {
-  state.Database().Run("DELETE FROM rule WHERE domain_id = ?1", domain.id);
-  state.Database().Run("DELETE FROM covered_rule WHERE domain_id = ?1", domain.id);
-  state.Database().Run("DELETE FROM rule WHERE kind = 'domain transition' AND word2 = ?1",
-                       domain.name);
-  RemoveUnnamed();
-}
-
-void RuleTable::RemoveUnnamed() {
-  state.Database().Run(
-      "DELETE FROM rule WHERE kind NOT IN ('system call', 'capability') AND ("
-      "word1 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
-      "kind = 'file creation' AND "
-      "word2 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain))");
-  state.Database().Run(
-      "DELETE FROM covered_rule WHERE kind NOT IN ('system call', 'capability') AND ("
-      "word1 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
-      "kind = 'file creation' AND "
-      "word2 NOT IN (SELECT name FROM label UNION ALL SELECT name FROM domain) OR "
-      "kind = 'domain transition' AND word2 NOT IN (SELECT name FROM domain))");
 }
 
 }  // namespace LinuxHost

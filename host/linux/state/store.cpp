@@ -230,8 +230,8 @@ void Store::Create() {
   if (IsReady()) return;
   SwitchToWriteAheadLog();
   Transaction transaction(*this);
-  RunScript(StrCat(layout.schema, ";PRAGMA application_id = ", layout.applicationId,
-                   ";PRAGMA user_version = ", layout.version));
+  RunScript(StrCat(layout.schema, layout.firstRows, ";PRAGMA application_id = ",
+                   layout.applicationId, ";PRAGMA user_version = ", layout.version));
   transaction.Commit();
 }
 
@@ -286,11 +286,7 @@ bool Store::IsAt(const CommitMark& mark) const {
 }
 
 sqlite3_stmt* Store::Prepared(Sql sql) {
-  if (WasForked()) {
-    throw HostError(EBADF, StrCat("The ", layout.purpose,
-                                  " was opened before this process was forked: open it again"));
-  }
-  RequireWholeTransaction();
+  RequireUsable();
   auto& statement = statements[sql.Text()];
   if (statement != nullptr) return statement;
   const int result =
@@ -301,7 +297,11 @@ sqlite3_stmt* Store::Prepared(Sql sql) {
 
 // After some failures, a full disk for one, the engine undoes a transaction by itself. What
 // followed would then be installed without what came before.
-void Store::RequireWholeTransaction() const {
+void Store::RequireUsable() const {
+  if (WasForked()) {
+    throw HostError(EBADF, StrCat("The ", layout.purpose,
+                                  " was opened before this process was forked: open it again"));
+  }
   if (openTransactions == 0 || sqlite3_get_autocommit(database) == 0) return;
   throw HostError(EIO,
                   StrCat("Unable to use the ", layout.purpose, " ", file,
@@ -336,14 +336,18 @@ int Store::Execute(sqlite3_stmt* statement) {
   return sqlite3_total_changes(database) - before;
 }
 
-void Store::RunScript(const std::string& script) {
+int Store::RunScript(const std::string& script) {
+  RequireUsable();
+  const int before = sqlite3_total_changes(database);
   const int result = sqlite3_exec(database, script.c_str(), nullptr, nullptr, nullptr);
   if (result != SQLITE_OK) Fail(result);
+  return sqlite3_total_changes(database) - before;
 }
 
-std::int64_t Store::ReadInteger(const char* query) {
+std::int64_t Store::ReadInteger(const std::string& query) {
+  RequireUsable();
   sqlite3_stmt* statement = nullptr;
-  int result = sqlite3_prepare_v2(database, query, -1, &statement, nullptr);
+  int result = sqlite3_prepare_v2(database, query.c_str(), -1, &statement, nullptr);
   if (result == SQLITE_OK) result = sqlite3_step(statement);
   const std::int64_t value = result == SQLITE_ROW ? sqlite3_column_int64(statement, 0) : 0;
   sqlite3_finalize(statement);

@@ -31,6 +31,7 @@ struct StoreLayout {
   std::int32_t applicationId;  // marks the file as ours; not 0
   std::int32_t version;        // of the schema; a file of any other one is refused; not 0
   const char* schema;          // SQL statements that fill an empty database
+  const char* firstRows = "";  // and those for the rows that it begins with
   bool survivesPowerLoss;      // false: survives any death of its users, not of the machine
 };
 
@@ -116,6 +117,12 @@ class Store {
     return Rows(*this, statement);
   }
 
+  // Runs statements that are needed once only, and returns the number of rows changed.
+  int RunScript(const std::string& script);
+
+  // The first column of the first row, for a query that is needed once only.
+  std::int64_t ReadInteger(const std::string& query);
+
   // Writes the current mark to `*mark` and returns true; false while it cannot be told. Makes no
   // system call. Two equal marks mean that nothing was committed between them.
   bool ReadCommitMark(CommitMark* mark) const;
@@ -145,9 +152,7 @@ class Store {
 
   sqlite3_stmt* Prepared(Sql sql);
   int Execute(sqlite3_stmt* statement);
-  void RunScript(const std::string& script);
-  std::int64_t ReadInteger(const char* query);
-  void RequireWholeTransaction() const;
+  void RequireUsable() const;
   [[noreturn]] void Fail(int result) const;
   [[noreturn]] void Refuse(int code, const std::string& reason) const;
 

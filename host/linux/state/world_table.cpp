@@ -9,8 +9,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/host_state.h"
+#include "host/linux/state/domain.h"
 
 using Braxo::Misc::StrCat;
 
@@ -43,33 +42,28 @@ bool IsStill(int world, std::int64_t started) {
 
 }  // namespace
 
-WorldTable::WorldTable(HostState& owner) : state(owner) {}
-
 void WorldTable::RequireAlive(int world) {
   if (!IsAlive(world)) throw HostError(ESRCH, StrCat("no world has the identifier ", world));
 }
 
 void WorldTable::Place(int world, unsigned int domainId) {
-  Transaction transaction(state.Database());
-  state.Refresh();
-  state.Domains().Get(domainId);
   RequireAlive(world);
-  state.Database().Run("INSERT OR REPLACE INTO world VALUES (?1, ?2, ?3)", world, StartOf(world),
-                       domainId);
-  transaction.Commit();
+  const int placed =
+      store.Run("INSERT OR REPLACE INTO world SELECT ?1, ?2, id FROM domain WHERE id = ?3", world,
+                StartOf(world), domainId);
+  if (placed == 0) throw HostError(ENOENT, StrCat("unknown domain ", domainId));
 }
 
 unsigned int WorldTable::DomainOf(int world) {
   RequireAlive(world);
-  Rows rows = state.Database().Select("SELECT started, domain_id FROM world WHERE id = ?1", world);
+  Rows rows = store.Select("SELECT started, domain_id FROM world WHERE id = ?1", world);
   if (!rows.Next() || !IsStill(world, rows.Integer(0))) return kStartDomain;
   return static_cast<unsigned int>(rows.Integer(1));
 }
 
 unsigned int WorldTable::CountIn(unsigned int domainId) {
   unsigned int count = 0;
-  Rows rows =
-      state.Database().Select("SELECT id, started FROM world WHERE domain_id = ?1", domainId);
+  Rows rows = store.Select("SELECT id, started FROM world WHERE domain_id = ?1", domainId);
   while (rows.Next()) {
     if (IsStill(static_cast<int>(rows.Integer(0)), rows.Integer(1))) ++count;
   }

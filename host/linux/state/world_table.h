@@ -1,16 +1,14 @@
 #pragma once
 
-#include <cstdint>
+#include "host/linux/state/store.h"
 
 namespace LinuxHost {
-
-class HostState;
 
 // The worlds, which are processes, and the domains that they were placed in. A world runs in the
 // start domain until it is placed elsewhere. Failures are HostErrors.
 class WorldTable {
  public:
-  explicit WorldTable(HostState& owner);
+  explicit WorldTable(Store& database) : store(database) {}
 
   // Throws with ESRCH when no such process lives.
   static void RequireAlive(int world);
@@ -25,7 +23,7 @@ class WorldTable {
   unsigned int CountIn(unsigned int domainId);
 
  private:
-  HostState& state;
+  Store& store;
 };
 
 }  // namespace LinuxHost

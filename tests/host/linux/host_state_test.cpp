@@ -14,12 +14,7 @@
 
 #include "child_process.h"
 #include "host/linux/common/inode_origin.h"
-#include "host/linux/state/domain_table.h"
-#include "host/linux/state/file_policy_table.h"
-#include "host/linux/state/label_table.h"
-#include "host/linux/state/parameter_rule_table.h"
-#include "host/linux/state/rule_table.h"
-#include "host/linux/state/world_table.h"
+#include "host/linux/state/schema.h"
 #include "state_directory.h"
 #include "support/message_of.h"
 
@@ -150,6 +145,28 @@ TEST_F(HostStateFile, GoesBackToTheBuiltInContents) {
   state.Labels().Add({"first"});
   state.Refresh();
   EXPECT_EQ(state.Labels().Lookup("first"), 4U);
+}
+
+// What is not listed would outlive a boot.
+TEST_F(HostStateFile, ListsEveryTableThatItHas) {
+  std::vector<std::string> listed = {"sqlite_sequence", "state"};
+  for (const auto& table : LinuxHost::kStateTables) listed.emplace_back(table.name);
+  std::vector<std::string> there;
+  auto rows =
+      HostState::Current().Database().Select("SELECT name FROM sqlite_schema WHERE type = 'table'");
+  while (rows.Next()) there.push_back(rows.Text(0));
+  EXPECT_THAT(there, ::testing::UnorderedElementsAreArray(listed));
+}
+
+// What is of a domain and not marked so would be the next one's in its slot.
+TEST_F(HostStateFile, KnowsWhatIsOfDomains) {
+  for (const auto& table : LinuxHost::kStateTables) {
+    const bool hasDomain = HostState::Current().Database().ReadInteger(
+                               std::string("SELECT count(*) FROM pragma_table_info('") +
+                               table.name + "') WHERE name = 'domain_id'") != 0;
+    // No domain that plays a part can go.
+    EXPECT_EQ(table.isOfDomains, hasDomain && std::string(table.name) != "role") << table.name;
+  }
 }
 
 TEST_F(HostStateFile, ResetsForOtherProcessesToo) {

@@ -16,8 +16,6 @@ namespace LinuxHostTest {
 namespace {
 
 using LinuxHost::HostState;
-using LinuxHost::KeywordRefusal;
-using LinuxHost::Keywords;
 using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_KeywordType;
 using ::testing::ElementsAre;
@@ -27,7 +25,7 @@ using ::testing::UnorderedElementsAre;
 class KeywordTables : public ::testing::Test {
  protected:
   std::string Refusal(TeskAccess_KeywordType type, const std::string& word) {
-    const auto refusal = KeywordRefusal(state, type, word);
+    const auto refusal = state.Keywords().Refusal(type, word);
     return refusal ? refusal->what() : "";
   }
 
@@ -48,14 +46,14 @@ TEST_F(KeywordTables, NumberTheCapabilities) {
                          "cap_sys_boot"};
   std::map<std::string, long> expected;
   for (const char* word : words) expected.emplace(word, static_cast<long>(expected.size()));
-  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
+  EXPECT_EQ(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
   EXPECT_EQ(LinuxHost::CapabilityWord(18), "cap_sys_boot");
   EXPECT_EQ(MessageOf([] { LinuxHost::CapabilityWord(19); }), "unknown capability 19");
 }
 
 TEST_F(KeywordTables, NameTheCapabilitiesAsLinuxDoes) {
   for (const auto& [word, number] :
-       Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY)) {
+       state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY)) {
     cap_value_t capability = 0;
     EXPECT_EQ(cap_from_name(word.c_str(), &capability), 0) << word;
   }
@@ -63,7 +61,7 @@ TEST_F(KeywordTables, NameTheCapabilitiesAsLinuxDoes) {
 
 TEST_F(KeywordTables, NumberTheParameterChecks) {
   EXPECT_THAT(
-      Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK),
+      state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK),
       UnorderedElementsAre(Pair("socket_family", 0), Pair("socket_type", 1), Pair("bind_port", 2),
                            Pair("connect_port", 3), Pair("ioctl_request", 4),
                            Pair("prctl_option", 5), Pair("clone_flags", 6), Pair("kill_signal", 7),
@@ -94,7 +92,7 @@ TEST_F(KeywordTables, NumberCapabilitiesAsTheInstalledHeaderDoes) {
       {"cap_sys_admin", LinuxHost::kCapSysAdmin},
       {"cap_sys_boot", LinuxHost::kCapSysBoot},
   };
-  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
+  EXPECT_EQ(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY), expected);
 }
 
 TEST_F(KeywordTables, NumberParameterChecksAsTheInstalledHeaderDoes) {
@@ -110,24 +108,24 @@ TEST_F(KeywordTables, NumberParameterChecksAsTheInstalledHeaderDoes) {
       {"set_uid", LinuxHost::kCheckSetUid},
       {"set_gid", LinuxHost::kCheckSetGid},
   };
-  EXPECT_EQ(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK), expected);
+  EXPECT_EQ(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK), expected);
 }
 
 TEST_F(KeywordTables, NumberTheKinds) {
-  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS),
+  EXPECT_THAT(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS),
               ElementsAre(Pair("execute", 2), Pair("list", 3), Pair("read", 0), Pair("remove", 4),
                           Pair("truncate", 5), Pair("write", 1)));
-  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS),
+  EXPECT_THAT(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS),
               ElementsAre(Pair("enter", 2), Pair("exec", 0), Pair("tardisk_exec", 1)));
-  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION),
+  EXPECT_THAT(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_FILE_CREATION),
               ElementsAre(Pair("block_device", 5), Pair("char_device", 4), Pair("directory", 1),
                           Pair("fifo", 3), Pair("regular", 0), Pair("symlink", 2)));
-  EXPECT_THAT(Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION),
+  EXPECT_THAT(state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION),
               ElementsAre(Pair("dgram", 1), Pair("seqpacket", 2), Pair("stream", 0)));
 }
 
 TEST_F(KeywordTables, KnowEverySystemCallThatTheyList) {
-  const auto calls = Keywords(state, TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL);
+  const auto calls = state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL);
   EXPECT_GT(calls.size(), 300U);
   for (const auto& [word, number] : calls) {
     EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, word), "");
@@ -165,8 +163,8 @@ TEST_F(KeywordTables, AreEight) {
   for (const int type : {0, 9, -1}) {
     const auto noTable = static_cast<TeskAccess_KeywordType>(type);
     const std::string message = "unknown keyword table " + std::to_string(type);
-    EXPECT_EQ(MessageOf([&] { Keywords(state, noTable); }), message);
-    EXPECT_EQ(MessageOf([&] { KeywordRefusal(state, noTable, "x"); }), message);
+    EXPECT_EQ(MessageOf([&] { state.Keywords().All(noTable); }), message);
+    EXPECT_EQ(MessageOf([&] { state.Keywords().Refusal(noTable, "x"); }), message);
   }
 }
 

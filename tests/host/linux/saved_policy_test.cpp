@@ -30,7 +30,6 @@ namespace {
 using LinuxHost::CopyDatabase;
 using LinuxHost::CopyOf;
 using LinuxHost::HostState;
-using LinuxHost::LabelNumbers;
 using LinuxHost::RestorePolicy;
 using LinuxHost::SaveState;
 using Policy::RuleKind;
@@ -135,7 +134,7 @@ TEST_F(SavedPolicy, PutsDomainsRulesAndPartsBack) {
   Grant(two, "write");
   Grant(two, "open");
   AddPolicy(two, 0, "/etc");
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
 
   EXPECT_EQ(Domains(), domains);
   EXPECT_EQ(Rules(), rules);
@@ -154,7 +153,7 @@ TEST_F(SavedPolicy, KeepsTheNumbersOfLabelsThatAreStillThere) {
   state.Labels().Add({"newLabel"});
   const unsigned int latest = Label("newLabel");
 
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
 
   EXPECT_EQ(Label("keptLabel"), kept);
   EXPECT_EQ(Label("newLabel"), LinuxHost::kNoLabel);
@@ -162,37 +161,20 @@ TEST_F(SavedPolicy, KeepsTheNumbersOfLabelsThatAreStillThere) {
   EXPECT_NE(Label("goneLabel"), gone);
 }
 
-TEST_F(SavedPolicy, GivesLabelsTheirNumbersBackWhenTold) {
-  state.Labels().Add({"goneLabel"});
-  const unsigned int gone = Label("goneLabel");
-  const std::string copy = Copy();
-  state.Labels().Remove({"goneLabel"});
-  state.Labels().Add({"newLabel"});
-  const unsigned int latest = Label("newLabel");
-
-  RestorePolicy(copy, LabelNumbers::kAsSaved);
-  EXPECT_EQ(Label("goneLabel"), gone);
-  state.Labels().Add({"another"});
-  EXPECT_EQ(Label("another"), latest + 1);
-}
-
-TEST_F(SavedPolicy, PutsOriginsOfRulesBackAndThoseOfLabelsWhenTold) {
+TEST_F(SavedPolicy, PutsOriginsOfRulesBackAndKeepsThoseOfLabels) {
   const LinuxHost::RuleOrigin rule{"hostDom", CallFrom("/old")};
   const LinuxHost::LabelOrigin label{"/etc", false, "unlabeled", "/old", 1};
   LinuxHost::RecordOrigins({&rule, 1}, {&label, 1});
   const std::string copy = Copy();
-  const std::string second = Copy("second.db");
   const LinuxHost::RuleOrigin newRule{"hostDom", CallFrom("/new")};
   const LinuxHost::LabelOrigin newLabel{"/etc", false, "unlabeled", "/new", 2};
   LinuxHost::RecordOrigins({&newRule, 1}, {&newLabel, 1});
 
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   Policy::Rule found = CallFrom("");
   LinuxHost::FindRuleOrigins("hostDom", {&found, 1});
   EXPECT_EQ(found.origin.file, "/old");
   EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/new");
-  RestorePolicy(second, LabelNumbers::kAsSaved);
-  EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/old");
 }
 
 TEST_F(SavedPolicy, KeepsWhereInodesCameFromAndTheAttribute) {
@@ -200,7 +182,7 @@ TEST_F(SavedPolicy, KeepsWhereInodesCameFromAndTheAttribute) {
   const LinuxHost::InodeOrigin origin{1, 2, "base.tgz", "/etc", 3};
   state.RecordOrigins({&origin, 1});
   state.ChooseLabelAttribute("user.zorvan.security");
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   EXPECT_EQ(state.FindOrigin(1, 2)->tardisk, "base.tgz");
   EXPECT_EQ(state.LabelAttribute(), "user.zorvan.security");
 }
@@ -215,7 +197,7 @@ TEST_F(SavedPolicy, IsSeenByOtherConnections) {
   other.Refresh();
   ASSERT_NE(other.Labels().Lookup("lateLabel"), LinuxHost::kNoLabel);
 
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
 
   EXPECT_EQ(MessageOf([&] {
               other.Rules().Install(
@@ -251,7 +233,7 @@ TEST_F(SwappedDomains, KeepTheirWorlds) {
   const unsigned int before = Id("oneDom");
   state.Worlds().Place(getpid(), Id("oneDom"));
   state.Worlds().Place(world.Id(), Id("twoDom"));
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   ASSERT_NE(Id("oneDom"), before);
   EXPECT_EQ(state.Worlds().DomainOf(getpid()), Id("oneDom"));
   EXPECT_EQ(state.Worlds().DomainOf(world.Id()), Id("twoDom"));
@@ -262,7 +244,7 @@ TEST_F(SwappedDomains, KeepTheFilePoliciesOfTheirWorlds) {
   AddPolicy(Id("oneDom"), getpid(), "/one");
   AddPolicy(Id("oneDom"), getpid(), "/same");
   AddPolicy(Id("twoDom"), getpid(), "/same");
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   const std::string world = " " + std::to_string(getpid()) + " ";
   const std::string one = std::to_string(Id("oneDom")) + world;
   const std::string two = std::to_string(Id("twoDom")) + world;
@@ -277,7 +259,7 @@ TEST_F(SavedPolicy, IsRefusedWhileWorldsRunInADomainThatWouldGo) {
   state.Worlds().Place(world.Id(), late);
   const std::string rules = Rules();
 
-  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }),
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy); }),
             "worlds run in the domain 'lateDom', which it does not have. End them, and run it "
             "again");
   EXPECT_EQ(Rules(), rules);
@@ -285,7 +267,7 @@ TEST_F(SavedPolicy, IsRefusedWhileWorldsRunInADomainThatWouldGo) {
 
   world.Kill();
   world.Wait();
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   EXPECT_EQ(state.Domains().Find("lateDom"), nullptr);
   EXPECT_EQ(Table("SELECT id FROM world"), "");
 }
@@ -295,7 +277,7 @@ TEST_F(SavedPolicy, DropsTheFilePoliciesOfWorldsInADomainThatGoes) {
   const std::string copy = Copy();
   state.FilePolicies().Remove(LinuxHost::kStartDomain, getpid(), "/of-then");
   AddPolicy(Create("lateDom"), getpid(), "/late");
-  RestorePolicy(copy, LabelNumbers::kNew);
+  RestorePolicy(copy);
   EXPECT_EQ(FilePolicies(), "");
 }
 
@@ -308,7 +290,7 @@ TEST_F(SavedPolicy, IsRefusedWhenItIsOfAnotherSchema) {
     HostState edited(copy);
     edited.Database().Run("PRAGMA user_version = 1");
   }
-  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }),
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy); }),
             "it has schema 1, this program works with schema 3: it was saved by another version");
   EXPECT_EQ(Domains(), domains);
 }
@@ -319,12 +301,11 @@ TEST_F(SavedPolicy, IsRefusedWhenItIsSomethingElse) {
     HostState edited(copy);
     edited.Database().Run("PRAGMA application_id = 1");
   }
-  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }), "it is no saved state");
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy); }), "it is no saved state");
   directory.Write("text",
                   "this is a text of more than one hundred bytes, which no database begins "
                   "with, and it goes on and on and on");
-  EXPECT_EQ(MessageOf([&] { RestorePolicy(directory.Path() + "/text", LabelNumbers::kNew); }),
-            "it is damaged");
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(directory.Path() + "/text"); }), "it is damaged");
 }
 
 TEST_F(SavedPolicy, IsRefusedWhenItIsDamaged) {
@@ -336,10 +317,10 @@ TEST_F(SavedPolicy, IsRefusedWhenItIsDamaged) {
     file.seekp(4096 * 2);
     file << std::string(4096 * 4, '\x55');
   }
-  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy, LabelNumbers::kNew); }), "it is damaged");
+  EXPECT_EQ(MessageOf([&] { RestorePolicy(copy); }), "it is damaged");
   EXPECT_EQ(Domains(), domains);
   // The connection is none the worse for it.
-  RestorePolicy(Copy(), LabelNumbers::kNew);
+  RestorePolicy(Copy());
   EXPECT_EQ(Domains(), domains);
 }
 
@@ -361,7 +342,7 @@ TEST_F(SavedPolicy, IsWholeWheneverItIsKilled) {
   fill("one");
   const std::string one = contents();
   const std::string copyOfOne = Copy("one.db");
-  RestorePolicy(empty, LabelNumbers::kNew);
+  RestorePolicy(empty);
   fill("two");
   const std::string two = contents();
   const std::string copyOfTwo = Copy("two.db");
@@ -369,8 +350,8 @@ TEST_F(SavedPolicy, IsWholeWheneverItIsKilled) {
   for (useconds_t delay = 0; delay < 20'000; delay += 1'000) {
     ChildProcess restorer([&] {
       for (;;) {
-        RestorePolicy(copyOfOne, LabelNumbers::kNew);
-        RestorePolicy(copyOfTwo, LabelNumbers::kNew);
+        RestorePolicy(copyOfOne);
+        RestorePolicy(copyOfTwo);
       }
     });
     usleep(delay);

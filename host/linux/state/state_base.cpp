@@ -1,0 +1,52 @@
+#include "host/linux/state/state_base.h"
+
+#include "host/linux/state/schema.h"
+
+namespace LinuxHost {
+
+StateBase::StateBase(const std::string& path) : database(path, kStateLayout) { Refresh(); }
+
+void StateBase::Refresh() {
+  if (marked && database.IsAt(seen)) return;
+  // The mark is taken first: what is then read is at least as new.
+  Store::CommitMark now{};
+  const bool told = database.ReadCommitMark(&now);
+  Rows rows = database.Select("SELECT domain_version, label_version, label_attribute FROM state");
+  if (!rows.Next()) database.TellDamage("the table state is empty");
+  domainVersion = rows.Integer(0);
+  labelVersion = rows.Integer(1);
+  labelAttribute = rows.Text(2);
+  marked = told;
+  seen = now;
+}
+
+void StateBase::Forget() {
+  domainVersion = labelVersion = --unknownVersion;
+  marked = false;
+}
+
+void StateBase::CommitDomains(Transaction& transaction) {
+  database.Run("UPDATE state SET domain_version = domain_version + 1");
+  transaction.Commit();
+  // Within a load nothing tells of it before its end.
+  ++domainVersion;
+}
+
+void StateBase::CommitLabels(Transaction& transaction) {
+  database.Run("UPDATE state SET label_version = label_version + 1");
+  transaction.Commit();
+  ++labelVersion;
+}
+
+const std::string& StateBase::LabelAttribute() {
+  Refresh();
+  return labelAttribute;
+}
+
+const std::string& StateBase::ChooseLabelAttribute(const std::string& name) {
+  database.Run("UPDATE state SET label_attribute = ?1 WHERE label_attribute = ''", name);
+  Forget();
+  return LabelAttribute();
+}
+
+}  // namespace LinuxHost
