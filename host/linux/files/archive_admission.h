@@ -10,7 +10,7 @@
 #include <utility>
 #include <vector>
 
-#include "host/linux/files/tardisk_archive.h"
+#include "host/linux/files/tardisk_rules.h"
 
 struct archive_entry;
 

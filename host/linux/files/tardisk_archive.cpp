@@ -1,3 +1,7 @@
+// Archives come from outside and are read by the superuser. So each is read twice: once to its last
+// byte while nothing is written, when every entry is judged by what all the entries before it will
+// have made of the root; and once to unpack it, when it is judged again, since it may have been
+// changed in between.
 #include "host/linux/files/tardisk_archive.h"
 
 #include <archive.h>

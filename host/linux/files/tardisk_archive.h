@@ -3,17 +3,12 @@
 #include <sys/stat.h>
 
 #include <functional>
-#include <set>
 #include <string>
 #include <vector>
 
-namespace LinuxHost {
+#include "host/linux/files/tardisk_rules.h"
 
-// What tardisks may bring beside files of their own.
-struct TardiskRules {
-  std::string policyRoot;  // the policy of the host: no tardisk's but for its tardisks/
-  std::set<std::string> policyTardisks;  // the names of those that may bring it all the same
-};
+namespace LinuxHost {
 
 // What an archive brings to one path.
 struct ArchiveFinding {

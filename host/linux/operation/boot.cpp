@@ -1,6 +1,8 @@
+// A boot in two parts, for they fail differently: what acts on files can only be done again, so
+// everything that can be refused is refused before the first file is written; what acts on the
+// state is part of the load that follows it, and is undone with that.
 #include "host/linux/operation/boot.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -12,8 +14,8 @@
 #include <system_error>
 
 #include "braxo/misc/strcat.h"
-#include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/files/directory_entry.h"
 #include "host/linux/files/first_labels.h"
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/services/config_database.h"
@@ -30,17 +32,12 @@ constexpr char kTardiskDirectory[] = "/tardisks";
 // Makes the root the working directory until it is destroyed.
 class AtRoot {
  public:
-  AtRoot() : before(open(".", O_PATH | O_DIRECTORY | O_CLOEXEC)) {
-    if (chdir("/") == 0) return;
-    ThrowErrno("Unable to enter the root");
+  AtRoot() {
+    if (chdir("/") != 0) ThrowErrno("Unable to enter the root");
   }
-  AtRoot(const AtRoot&) = delete;
-  AtRoot& operator=(const AtRoot&) = delete;
-  // Who came from a directory that is gone stays at the root.
-  ~AtRoot() { [[maybe_unused]] const int result = fchdir(before.Number()); }
 
  private:
-  const Descriptor before;
+  const DirectoryVisit visit;
 };
 
 // In byte order of name, which is that of the paths, as they share the directory.

@@ -53,7 +53,7 @@ void LabelPlan::ForEachFile(const std::vector<std::string>& paths, const std::st
   for (auto next = lines.crbegin(); next != lines.crend(); ++next) {
     const LabelLine& line = *next;
     ForEachBelow(line.label.path, line.label.recursive, line.Place() + " : ",
-                 [&](const WalkedFile& file, const FileId& id) {
+                 [&](const LinuxHost::WalkedFile& file, const FileId& id) {
                    const bool isChosen = paths.empty() || chosen.contains(id);
                    if (isChosen && decided.insert(id).second) visit(file, line);
                    run.progress.Step();
@@ -65,9 +65,9 @@ void LabelPlan::ForEachFile(const std::vector<std::string>& paths, const std::st
 // Errors are reported behind `place`.
 void LabelPlan::ForEachBelow(const std::string& path, bool wholeTree, const std::string& place,
                              const OnIdentified& visit) {
-  WalkFiles(
+  WalkLabelledFiles(
       path, wholeTree,
-      [&](const WalkedFile& file) {
+      [&](const LinuxHost::WalkedFile& file) {
         struct stat status {};
         if (lstat(file.name, &status) == 0) {
           visit(file, {status.st_dev, status.st_ino});
@@ -85,7 +85,7 @@ LabelPlan::FileIds LabelPlan::FilesBelow(const std::vector<std::string>& paths) 
   for (const std::string& path : paths) {
     std::error_code ignored;
     ForEachBelow(path, std::filesystem::is_directory(path, ignored), "",
-                 [&](const WalkedFile&, const FileId& id) { files.insert(id); });
+                 [&](const LinuxHost::WalkedFile&, const FileId& id) { files.insert(id); });
   }
   return files;
 }
@@ -95,9 +95,9 @@ std::size_t LabelPlan::CountVisits() {
   std::size_t count = 0;
   run.progress.Begin("counting", 0);
   for (const LabelLine& line : lines) {
-    WalkFiles(
+    WalkLabelledFiles(
         line.label.path, line.label.recursive,
-        [&](const WalkedFile&) {
+        [&](const LinuxHost::WalkedFile&) {
           ++count;
           run.progress.Step();
         },

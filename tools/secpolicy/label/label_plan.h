@@ -10,8 +10,8 @@
 #include <utility>
 #include <vector>
 
-#include "file_walk.h"
 #include "label_run.h"
+#include "labelled_files.h"
 #include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicyCli {
@@ -34,7 +34,8 @@ class LabelPlan {
 
   // Hands every file that the policy names to `visit`, once, with the line that decides, and shows
   // the progress of `job`: all files or, unless `paths` is empty, those at or below one of them.
-  using OnPlannedFile = std::function<void(const WalkedFile& file, const LabelLine& line)>;
+  using OnPlannedFile =
+      std::function<void(const LinuxHost::WalkedFile& file, const LabelLine& line)>;
   void ForEachFile(const std::vector<std::string>& paths, const std::string& job,
                    const OnPlannedFile& visit);
 
@@ -45,7 +46,7 @@ class LabelPlan {
     std::size_t operator()(const FileId& file) const { return file.first * 31 + file.second; }
   };
   using FileIds = std::unordered_set<FileId, HashFileId>;
-  using OnIdentified = std::function<void(const WalkedFile& file, const FileId& id)>;
+  using OnIdentified = std::function<void(const LinuxHost::WalkedFile& file, const FileId& id)>;
 
   void ReadFile(const std::string& path);
   void ForEachBelow(const std::string& path, bool wholeTree, const std::string& place,

@@ -22,7 +22,7 @@ class Relabelling {
  public:
   Relabelling(LabelRun& labelRun, bool onlyTry) : run(labelRun), dryRun(onlyTry) {}
 
-  void Visit(const WalkedFile& file, const LabelLine& line) {
+  void Visit(const LinuxHost::WalkedFile& file, const LabelLine& line) {
     Count& count = counts[line.label.label];
     ++count.files;
     // Reading is much cheaper than writing, and most files have their label already.
@@ -63,9 +63,10 @@ class Relabelling {
 std::string Relabel(LabelRun& run, const std::string& dir, const std::vector<std::string>& paths,
                     bool dryRun) {
   Relabelling relabelling(run, dryRun);
-  LabelPlan(run, dir).ForEachFile(
-      paths, dryRun ? "comparing" : "relabelling",
-      [&](const WalkedFile& file, const LabelLine& line) { relabelling.Visit(file, line); });
+  LabelPlan(run, dir).ForEachFile(paths, dryRun ? "comparing" : "relabelling",
+                                  [&](const LinuxHost::WalkedFile& file, const LabelLine& line) {
+                                    relabelling.Visit(file, line);
+                                  });
   return relabelling.Summarize();
 }
 

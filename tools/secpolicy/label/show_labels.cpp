@@ -2,14 +2,14 @@
 #include <cstring>
 #include <filesystem>
 
-#include "file_walk.h"
 #include "host/linux/operation/file_label.h"
 #include "label_actions.h"
+#include "labelled_files.h"
 
 namespace SecPolicyCli {
 namespace {
 
-void ShowLabel(LabelRun& run, const WalkedFile& file) {
+void ShowLabel(LabelRun& run, const LinuxHost::WalkedFile& file) {
   const auto label = LinuxHost::ReadLabel(file.name);
   if (!label) return run.Error(file.path + ": " + WhyNoLabel(errno));
   const std::string inherited = label->isInherited ? " (inherited)" : "";
@@ -27,9 +27,9 @@ void ShowLabel(LabelRun& run, const WalkedFile& file) {
 std::string ShowLabels(LabelRun& run, const std::vector<std::string>& paths, bool wholeTrees) {
   for (const std::string& path : paths) {
     std::error_code ignored;
-    WalkFiles(
+    WalkLabelledFiles(
         path, wholeTrees && std::filesystem::is_directory(path, ignored),
-        [&](const WalkedFile& file) { ShowLabel(run, file); },
+        [&](const LinuxHost::WalkedFile& file) { ShowLabel(run, file); },
         [&](const std::string& failed, const std::string& why) { run.Error(failed + ": " + why); });
   }
   return "done";

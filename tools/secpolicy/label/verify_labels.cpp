@@ -16,7 +16,7 @@ std::string VerifyLabels(LabelRun& run, const std::string& dir,
   std::size_t different = 0;
   std::size_t withoutLabel = 0;
   LabelPlan(run, dir).ForEachFile(
-      paths, "verifying", [&](const WalkedFile& file, const LabelLine& line) {
+      paths, "verifying", [&](const LinuxHost::WalkedFile& file, const LabelLine& line) {
         ++files;
         const auto label = LinuxHost::ReadLabel(file.name);
         if (label && label->id == line.id) return;
