@@ -23,6 +23,7 @@
 #include <vector>
 
 #include "host/linux/operation/policy_load.h"
+#include "host/linux/operation/state_use.h"
 #include "secpolicy/domain/domain_policy.h"
 #include "secpolicy/secpolicy.h"
 
@@ -65,8 +66,7 @@ class ScratchDir {
 // A new host state, with the labels that the rules use, in memory as /run is.
 class FreshState {
  public:
-  FreshState() : dir(BenchDirs().front()) {
-    setenv("SECPOLICY_HOST_STATE", Path().c_str(), 1);
+  FreshState() : dir(BenchDirs().front()), used(Path()) {
     std::vector<std::string> labels;
     for (int i = 0; i < kLabels; ++i) labels.push_back(Label(i));
     TeskAccessInterfaceImpl access;
@@ -77,6 +77,7 @@ class FreshState {
 
  private:
   ScratchDir dir;
+  LinuxHost::UsedState used;
 };
 
 // ---- Labelling a tree -------------------------------------------------------------------------

@@ -23,19 +23,26 @@ std::string PathIn(const char* variable, const char* otherwise) {
   return path != nullptr && *path != '\0' ? path : otherwise;
 }
 
-}  // namespace
-
 // A relative path would be looked up in a directory that nobody has chosen, and show no state
 // there.
-std::string StatePath() {
-  if (usedState) return *usedState;
-  const std::string path = PathIn(kStateVariable, kState);
+std::string StatePathOfHost() {
+  std::string path = PathIn(kStateVariable, kState);
   RequireFilePath(path, "host state");
   return path;
 }
 
-std::string SettingsPath() {
-  return usedSettings ? *usedSettings : PathIn(kSettingsVariable, kSettings);
+}  // namespace
+
+const std::string& StatePath() {
+  if (usedState) return *usedState;
+  static const std::string path = StatePathOfHost();
+  return path;
+}
+
+const std::string& SettingsPath() {
+  if (usedSettings) return *usedSettings;
+  static const std::string path = PathIn(kSettingsVariable, kSettings);
+  return path;
 }
 
 UsedState::UsedState(const std::string& path) : before(std::exchange(usedState, path)) {}

@@ -3,16 +3,17 @@
 #include <optional>
 #include <string>
 
-// Where this process finds the files of the host.
+// Where this process finds the files of the host: the one place for that. The environment is read
+// once, at the first use; a reference holds as long as what is used stays the same.
 namespace LinuxHost {
 
 // The host's state: /run/secpolicy/host.db, unless SECPOLICY_HOST_STATE names another file. Throws
 // HostError when it names none by an absolute path.
-std::string StatePath();
+const std::string& StatePath();
 
 // The wanted settings: /var/lib/secpolicy/config.db, unless SECPOLICY_HOST_CONFIG names another
 // absolute path. Programs that run with more rights than their user ignore both variables.
-std::string SettingsPath();
+const std::string& SettingsPath();
 
 // As long as it lives, this process works with the state at `path`, and not with that of the host;
 // no variable can change that. The latest one counts. Not while other threads use the host.

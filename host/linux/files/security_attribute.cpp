@@ -34,31 +34,28 @@ bool MayWritePrivileged(const char* directory) {
 }
 
 std::string RecordedOrChosen(HostState& state) {
-  if (!state.LabelAttribute().empty()) return state.LabelAttribute();
+  const std::string& recorded = state.LabelAttribute();
+  if (!recorded.empty()) return recorded;
   return state.ChooseLabelAttribute(UsableLabelAttribute(state.Directory()));
 }
 
-// The real name for `name`, or null with errno set as for a name that no file system knows.
-const char* RealName(const char* name) {
+// The real name for `name`, or nothing with errno set as for a name that no file system knows.
+std::optional<std::string> RealName(const char* name) {
   if (name == nullptr || std::strcmp(name, kContractName) != 0) {
     errno = name == nullptr ? EFAULT : EOPNOTSUPP;
-    return nullptr;
+    return std::nullopt;
   }
   try {
-    return LabelAttribute().c_str();
+    return LabelAttribute();
   } catch (const HostError& error) {
     errno = error.Code();
-    return nullptr;
+    return std::nullopt;
   }
 }
 
 }  // namespace
 
-const std::string& LabelAttribute() {
-  // Asked for each labelled file, so answered without a look at the state.
-  static const std::string name = RecordedOrChosen(HostState::Current());
-  return name;
-}
+std::string LabelAttribute() { return RecordedOrChosen(HostState::Known()); }
 
 // Labels are put on the root file system; any other tells at least what the process may do.
 std::string UsableLabelAttribute(const std::string& otherDirectory) {
@@ -97,8 +94,9 @@ AttributeStandIn::~AttributeStandIn() { standIn = nullptr; }
 namespace Zorvan::Kernel {
 
 int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
-  const char* realName = LinuxHost::RealName(name);
-  if (realName == nullptr) return -1;
+  const std::optional<std::string> found = LinuxHost::RealName(name);
+  if (!found) return -1;
+  const char* const realName = found->c_str();
   if (auto* standIn = LinuxHost::standIn) {
     return standIn->Set(path, realName, value, size, flags);
   }
@@ -108,8 +106,9 @@ int SetXattr(const char* path, const char* name, const void* value, std::size_t 
 }
 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {
-  const char* realName = LinuxHost::RealName(name);
-  if (realName == nullptr) return -1;
+  const std::optional<std::string> found = LinuxHost::RealName(name);
+  if (!found) return -1;
+  const char* const realName = found->c_str();
   if (auto* standIn = LinuxHost::standIn) {
     return standIn->Get(path, realName, value, size);
   }

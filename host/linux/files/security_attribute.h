@@ -10,9 +10,9 @@
 namespace LinuxHost {
 
 // The name of the real attribute: "security.zorvan" where this process may write it, else
-// "user.zorvan.security". Chosen at the first call for the life of the host state and recorded
-// there; a process keeps the answer. Throws HostError when the state cannot be used.
-const std::string& LabelAttribute();
+// "user.zorvan.security". Chosen at the first call for the life of the state in use and recorded
+// there. Throws HostError when the state cannot be used.
+std::string LabelAttribute();
 
 // The name that a choice would fall on now, whatever the state has recorded; tried out on the root
 // file system or, where that takes no new files, in `otherDirectory`.

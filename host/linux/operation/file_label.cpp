@@ -3,6 +3,7 @@
 #include <sys/xattr.h>
 
 #include <cerrno>
+#include <string>
 
 #include "host/linux/files/inherited_label.h"
 #include "host/linux/files/security_attribute.h"
@@ -10,7 +11,8 @@
 namespace LinuxHost {
 
 std::optional<FileLabel> ReadLabel(const char* path) {
-  const char* name = LabelAttribute().c_str();
+  const std::string attribute = LabelAttribute();
+  const char* const name = attribute.c_str();
   FileLabel label;
   if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
   if (errno != ENODATA) return std::nullopt;
@@ -20,7 +22,8 @@ std::optional<FileLabel> ReadLabel(const char* path) {
 }
 
 int ReplaceLabel(const char* path, std::uint32_t id) {
-  const char* name = LabelAttribute().c_str();
+  const std::string attribute = LabelAttribute();
+  const char* const name = attribute.c_str();
   const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
   if (result == 0 || errno != ENODATA) return result;
   return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);

@@ -1,3 +1,8 @@
+// What files carried before a load labelled them, so that a load that was killed can be undone by
+// whoever comes next. It is written before the first label is given, and read up to its end or to
+// where its writer died; a lock on it tells whether that still lives. Files are reached through
+// their directories, known by device and inode, so that nothing is put back on what has taken a
+// place meanwhile.
 #include "host/linux/operation/label_journal.h"
 
 #include <fcntl.h>
@@ -190,7 +195,7 @@ LabelJournal::~LabelJournal() {
 }
 
 void LabelJournal::Keep(const NotedLabels& labels) {
-  const std::string& attribute = LabelAttribute();
+  const std::string attribute = LabelAttribute();
   std::string text = kAttribute + attribute + '\0';
   const DirectoryPlace* entered = nullptr;
   labels.ForEach([&](const DirectoryPlace& directory, const char* name, std::uint32_t) {

@@ -5,10 +5,14 @@
 
 #include <cerrno>
 
+#include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/operation/store_copy.h"
+#include "host/linux/state/host_state.h"
 
 namespace LinuxHost {
+
+using Braxo::Misc::StrCat;
 
 bool IsStateMissing() {
   return faccessat(AT_FDCWD, StatePath().c_str(), F_OK, AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
@@ -24,6 +28,11 @@ StateCopy CopyUsedState(const std::string& to) {
   }
   CopyDatabase(used, CopyOf::kState, to);
   return StateCopy::kMade;
+}
+
+UsedCopy::UsedCopy(const std::string& path) : used(path) {
+  const std::string& opened = HostState::Current().Database().Path();
+  if (opened != path) throw HostError(EBUSY, StrCat("A load is installing its policy in ", opened));
 }
 
 CopiedSettings::CopiedSettings(const std::string& to) {

@@ -20,6 +20,17 @@ enum class StateCopy { kMade, kMissing, kForbidden };
 // cannot be trusted or is damaged; leaves no file unless the copy was made.
 StateCopy CopyUsedState(const std::string& to);
 
+// As long as it lives, this process works with the state at `path`, which is its own, and surely
+// with no other: throws HostError when that cannot be used, or while a load runs, which keeps to
+// the state that it began with.
+class UsedCopy {
+ public:
+  explicit UsedCopy(const std::string& path);
+
+ private:
+  const UsedState used;
+};
+
 // As long as it lives, this process works with a copy of the wanted settings, which becomes the new
 // file `to`: even reading leaves traces beside the real ones. Settings that cannot be copied stay
 // in use, for the host to say what is wrong with them.

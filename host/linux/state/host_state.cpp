@@ -1,3 +1,7 @@
+// Which connection a thread has to the state in use. Most functions of the contract are handed no
+// state, so there is one connection for each thread, opened when it is first needed and replaced
+// when it no longer fits: after a fork, when another state is used, and when another file lies in
+// the place of the one that is open, as after a boot that has moved a damaged one aside.
 #include "host/linux/state/host_state.h"
 
 #include <sys/stat.h>
@@ -11,18 +15,36 @@
 
 namespace LinuxHost {
 
-HostState& HostState::Current() {
-  thread_local std::shared_ptr<HostState> current;
+namespace {
+
+// Of the calling thread.
+std::shared_ptr<HostState>& Connection() {
+  thread_local std::shared_ptr<HostState> connection;
+  return connection;
+}
+
+bool IsOfUsedState(HostState* connection) {
+  if (connection == nullptr || connection->Database().WasForked()) return false;
   // A load keeps to the state that it began with.
-  if (current != nullptr && current->CurrentLoad() != 0 && !current->Database().WasForked())
-    return *current;
-  const std::string path = StatePath();
-  if (current == nullptr || current->Database().Path() != path ||
-      !current->Database().IsCurrent()) {
-    current.reset();
-    current = std::make_shared<HostState>(path);
+  return connection->CurrentLoad() != 0 || connection->Database().Path() == StatePath();
+}
+
+}  // namespace
+
+HostState& HostState::Current() {
+  HostState& known = Known();
+  if (known.CurrentLoad() != 0 || known.Database().IsCurrent()) return known;
+  Connection().reset();
+  return Known();
+}
+
+HostState& HostState::Known() {
+  std::shared_ptr<HostState>& connection = Connection();
+  if (!IsOfUsedState(connection.get())) {
+    connection.reset();
+    connection = std::make_shared<HostState>(StatePath());
   }
-  return *current;
+  return *connection;
 }
 
 HostState* HostState::Find() {

@@ -32,6 +32,10 @@ class HostState : public StateBase, public std::enable_shared_from_this<HostStat
   // The same, but null where there is no state.
   static HostState* Find();
 
+  // The connection of the latest Current(), if that was of the state that is used now, without a
+  // look at the file system: for what is asked for each of many files.
+  static HostState& Known();
+
   explicit HostState(const std::string& path);
 
   // The directory that the state lies in.

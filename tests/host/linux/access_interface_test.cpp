@@ -47,14 +47,14 @@ class AccessInterface : public ::testing::Test {
 TEST_F(AccessInterface, CannotBeMadeOnAForeignState) {
   const std::string other = directory.Path() + "/other.db";
   std::filesystem::create_directory(other);
-  setenv("SECPOLICY_HOST_STATE", other.c_str(), 1);
+  const LinuxHost::UsedState used(other);
   EXPECT_EQ(MessageOf([] { const TeskAccessInterfaceImpl refused; }),
             "Refusing the host state: " + other +
                 " is not a regular file. Remove it, or choose another place");
 }
 
-TEST_F(AccessInterface, KeepsItsStateWhenTheEnvironmentChanges) {
-  setenv("SECPOLICY_HOST_STATE", (directory.Path() + "/other.db").c_str(), 1);
+TEST_F(AccessInterface, KeepsItsStateWhenAnotherIsUsed) {
+  const LinuxHost::UsedState used(directory.Path() + "/other.db");
   TeskAccessInterfaceImpl other;
   other.CreateDomain("elsewhere", TESKACCESS_DEFAULT_DOM_NONE);
   unsigned int id = 0;

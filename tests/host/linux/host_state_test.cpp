@@ -47,9 +47,34 @@ class HostStateFile : public ::testing::Test {
   StateDirectory directory;
 };
 
-TEST_F(HostStateFile, LiesWhereTheEnvironmentSays) {
+TEST_F(HostStateFile, LiesWhereItIsUsed) {
   EXPECT_EQ(HostState::Current().Database().Path(), directory.Database());
   EXPECT_TRUE(std::filesystem::exists(directory.Database()));
+}
+
+// In a child without a state of the test's own, which tells what it finds as its failure.
+TEST(HostStatePath, IsThatOfTheEnvironmentAtTheFirstUse) {
+  EXPECT_EQ(RunInChild([] {
+              setenv("SECPOLICY_HOST_STATE", "/first/host.db", 1);
+              const std::string first = LinuxHost::StatePath();
+              setenv("SECPOLICY_HOST_STATE", "/second/host.db", 1);
+              throw std::runtime_error(first + " " + LinuxHost::StatePath());
+            }),
+            "/first/host.db /first/host.db");
+}
+
+TEST(HostStatePath, IsThatOfTheLatestUse) {
+  EXPECT_EQ(RunInChild([] {
+              setenv("SECPOLICY_HOST_STATE", "/given/host.db", 1);
+              const LinuxHost::UsedState outer("/outer/host.db");
+              std::string paths;
+              {
+                const LinuxHost::UsedState inner("/inner/host.db");
+                paths = LinuxHost::StatePath() + " ";
+              }
+              throw std::runtime_error(paths + LinuxHost::StatePath());
+            }),
+            "/inner/host.db /outer/host.db");
 }
 
 TEST_F(HostStateFile, StartsWithTheBuiltInContents) {
@@ -65,12 +90,15 @@ TEST_F(HostStateFile, StaysOpenFromCallToCall) {
   EXPECT_EQ(&HostState::Current(), first);
 }
 
-TEST_F(HostStateFile, FollowsTheEnvironmentToAnotherPlace) {
+TEST_F(HostStateFile, FollowsItsUseToAnotherPlace) {
   HostState::Current().Domains().Create("tool", TESKACCESS_DEFAULT_DOM_NONE, false);
   const std::string other = directory.Path() + "/other.db";
-  setenv("SECPOLICY_HOST_STATE", other.c_str(), 1);
-  EXPECT_EQ(HostState::Current().Domains().Find("tool"), nullptr);
-  EXPECT_EQ(HostState::Current().Database().Path(), other);
+  {
+    const LinuxHost::UsedState used(other);
+    EXPECT_EQ(HostState::Current().Domains().Find("tool"), nullptr);
+    EXPECT_EQ(HostState::Current().Database().Path(), other);
+  }
+  EXPECT_NE(HostState::Current().Domains().Find("tool"), nullptr);
 }
 
 TEST_F(HostStateFile, StartsAnewWhenTheFileIsGone) {

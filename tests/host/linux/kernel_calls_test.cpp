@@ -131,9 +131,9 @@ TEST_F(KernelCalls, LeaveErrnoAlone) {
 TEST_F(KernelCalls, AnswerAnErrorWhenTheStateCannotBeUsed) {
   const std::string other = directory.Path() + "/other.db";
   std::filesystem::create_directory(other);
-  setenv("SECPOLICY_HOST_STATE", other.c_str(), 1);
+  const LinuxHost::UsedState used(other);
   EXPECT_EQ(ErrorOf(kDestroyDomain, {5}), EINVAL);
-  setenv("SECPOLICY_HOST_STATE", (directory.Path() + "/missing/too/host.db").c_str(), 1);
+  const LinuxHost::UsedState missing(directory.Path() + "/missing/too/host.db");
   EXPECT_EQ(ErrorOf(kDestroyDomain, {5}), ENOENT);
 }
 

@@ -2,18 +2,18 @@
 
 #include <string>
 
+#include "host/linux/common/used_paths.h"
 #include "support/temporary_directory.h"
 
 namespace LinuxHostTest {
 
-// A host state of a test's own: SECPOLICY_HOST_STATE names a file in a directory that only this
-// user may write, and that is removed with the object.
+// A host state of a test's own, which this process uses as long as the object lives, in a directory
+// that only this user may write, and that is removed with the object.
 class StateDirectory {
  public:
   StateDirectory();
   StateDirectory(const StateDirectory&) = delete;
   StateDirectory& operator=(const StateDirectory&) = delete;
-  ~StateDirectory();
 
   // The directory, and the database in it, which is not there before its first use.
   const std::string& Path() const { return directory.Path(); }
@@ -23,7 +23,8 @@ class StateDirectory {
   void Write(const std::string& name, const std::string& content) const;
 
  private:
-  SecPolicyTest::TemporaryDirectory directory;
+  const SecPolicyTest::TemporaryDirectory directory;
+  const LinuxHost::UsedState used;
 };
 
 }  // namespace LinuxHostTest

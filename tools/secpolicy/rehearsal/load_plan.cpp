@@ -14,7 +14,7 @@ namespace {
 using SecPolicy::TeskAccessInterfaceImpl;
 
 Policy::InstalledPolicy ReadState(const std::string& path) {
-  const LinuxHost::UsedState state(path);
+  const LinuxHost::UsedCopy state(path);
   TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }

@@ -28,7 +28,7 @@ class ScratchState {
  private:
   ScratchDirectory directory;
   std::optional<LinuxHost::StateCopy> copy;
-  LinuxHost::UsedState used;
+  LinuxHost::UsedCopy used;
 };
 
 }  // namespace SecPolicyCli

@@ -21,8 +21,8 @@ Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf w
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("host.db");
   LinuxHost::CopyDatabase(path, what, copy);
-  const LinuxHost::UsedState state(copy);
   try {
+    const LinuxHost::UsedCopy used(copy);
     SecPolicy::TeskAccessInterfaceImpl access;
     return ReadInstalledPolicy(access);
   } catch (const Braxo::Lib::BraxoException& problem) {
