@@ -1,3 +1,8 @@
+// The access-control module as the contract shows it: takes its records apart, and leaves the rest
+// to the tables. Each interface object keeps the state that was in use when it was made. What only
+// looks begins with Fresh(), so that it sees what others have just done; what changes something
+// uses Any(), since the tables look for themselves within their transaction. No constructor or
+// destructor changes errno: callers read it after calls that made an interface on the way.
 #include <cerrno>
 #include <string>
 #include <utility>

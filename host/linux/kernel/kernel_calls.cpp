@@ -1,3 +1,7 @@
+// The numbered calls as a kernel answers them: a status, an error number, and never an exception or
+// a crash. Arguments are bare numbers, so each is checked for its range and each address is only a
+// claim; what is to be written to the caller is tried before anything is changed, so that a call
+// that fails has done nothing.
 #include <algorithm>
 #include <array>
 #include <cerrno>
@@ -33,8 +37,9 @@ constexpr std::uint32_t kFailure = 0xbad0001;
 // The caller's buffer holds fewer policies than there are now; a larger one may do.
 constexpr std::uint32_t kBufferTooSmall = 0xbad011f;
 
-// Policies are copied from and to the caller in pieces of so many.
+// Policies are copied from the caller in pieces of so many, 16 KiB, which fit on any stack.
 constexpr std::size_t kPiece = 8;
+// 130 MB of the caller's records: a wild number is refused before any of them is read.
 constexpr std::uint32_t kMaxBatch = 65'536;
 
 std::uint32_t Unsigned(std::uint64_t argument) {
@@ -200,28 +205,45 @@ std::uint32_t RePointFilePolicies(HostState& state, Args args) {
   return 0;
 }
 
+enum CallNumber : std::uint32_t {
+  kCreateDomain = 0x4059,
+  kDestroyDomain = 0x405a,
+  kUpdateFilePolicy = 0x405b,
+  kRemoveFilePolicy = 0x405c,
+  kRetrieveFilePolicies = 0x405d,
+  kCountFilePolicies = 0x405e,
+  kAddFilePolicies = 0x405f,
+  kSetCapability = 0x4061,
+  kSetParameterCheck = 0x4062,
+  kRetrieveLeakedDomains = 0x4064,
+  kDomainOfWorld = 0x4065,
+  kDomainName = 0x4066,
+  kRePointFilePolicies = 0x4067,
+  kRemoveParameterCheck = 0x413e,
+};
+
 // One numbered call: what it answers is its status; it throws HostError for an error.
 struct NumberedCall {
-  std::uint32_t number;
+  CallNumber number;
   std::size_t argCount;
   std::uint32_t (*run)(HostState& state, Args args);
 };
 
 constexpr std::array<NumberedCall, 14> kCalls = {{
-    {0x4059, 3, CreateDomain},           // name, default rules, &id
-    {0x405a, 1, DestroyDomain},          // id
-    {0x405b, 3, UpdateFilePolicy},       // domain, path, permission
-    {0x405c, 3, RemoveFilePolicy},       // world, domain, path
-    {0x405d, 3, RetrieveFilePolicies},   // domain, policies, capacity
-    {0x405e, 2, CountFilePolicies},      // domain, &count
-    {0x405f, 5, AddFilePolicies},        // world, domain, policies, count, &installed
-    {0x4061, 3, SetCapability},          // domain, capability, grant
-    {0x4062, 4, SetParameterCheck},      // domain, check, &range, grant
-    {0x4064, 3, RetrieveLeakedDomains},  // ids, &count, capacity
-    {0x4065, 2, DomainOfWorld},          // world, &domain
-    {0x4066, 3, DomainName},             // domain, name, capacity
-    {0x4067, 2, RePointFilePolicies},    // old path, new path
-    {0x413e, 3, RemoveParameterCheck},   // domain, check, &range
+    {kCreateDomain, 3, CreateDomain},                  // name, default rules, &id
+    {kDestroyDomain, 1, DestroyDomain},                // id
+    {kUpdateFilePolicy, 3, UpdateFilePolicy},          // domain, path, permission
+    {kRemoveFilePolicy, 3, RemoveFilePolicy},          // world, domain, path
+    {kRetrieveFilePolicies, 3, RetrieveFilePolicies},  // domain, policies, capacity
+    {kCountFilePolicies, 2, CountFilePolicies},        // domain, &count
+    {kAddFilePolicies, 5, AddFilePolicies},            // world, domain, policies, count, &installed
+    {kSetCapability, 3, SetCapability},                // domain, capability, grant
+    {kSetParameterCheck, 4, SetParameterCheck},        // domain, check, &range, grant
+    {kRetrieveLeakedDomains, 3, RetrieveLeakedDomains},  // ids, &count, capacity
+    {kDomainOfWorld, 2, DomainOfWorld},                  // world, &domain
+    {kDomainName, 3, DomainName},                        // domain, name, capacity
+    {kRePointFilePolicies, 2, RePointFilePolicies},      // old path, new path
+    {kRemoveParameterCheck, 3, RemoveParameterCheck},    // domain, check, &range
 }};
 
 CallResult Run(std::uint32_t number, Args args) {

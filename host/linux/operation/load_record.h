@@ -20,6 +20,7 @@ struct LoadRecord {
   std::uint64_t removedDomains = 0;
 };
 
+// More than anyone reads; a load may report one for each line.
 constexpr std::size_t kKeptErrors = 100;
 
 // Takes the place of the earlier record.

@@ -1,3 +1,7 @@
+// Labels that are taken down instead of given. A load must not label files before its rules are in
+// force, and must know before whether it could, so each label is refused here as it would be there,
+// without a trace on the file. Notes are many, one a file, so a note is an entry in two growing
+// lists, a directory is kept once, and names lie one behind the other in one text.
 #include "host/linux/operation/noted_labels.h"
 
 #include <fcntl.h>

@@ -1,3 +1,9 @@
+// A load is one transaction: it can be undone until its end, and others see nothing of it before.
+//
+// To know what no file has any more without comparing rules, each rule keeps the number of the load
+// that installed it: what a load finds again gets its number, and of its own kind the rest is to
+// go. What belonged to others, an early load or a service, and is covered by a rule of the load is
+// kept aside (covered_...), and comes back when a later load of the kind leaves it uncovered.
 #include "host/linux/operation/policy_load.h"
 
 #include <algorithm>

@@ -1,3 +1,7 @@
+// Saving is a copy of the whole state, with a digest, that takes its name when it is complete.
+// Putting it back is no copy: the state goes on, with the worlds that run, the labels that files
+// carry and the inodes that tardisks brought, so policy tables are replaced one by one in one
+// transaction, and what refers to them follows by name.
 #include "host/linux/operation/saved_policy.h"
 
 #include <fcntl.h>

@@ -1,3 +1,9 @@
+// One database that many processes use at the same time, some of them services that must not wait.
+// So it has a write-ahead log: who reads never waits, and who writes waits for other writers alone.
+// What one call does is one statement or one transaction; statements are prepared once and kept,
+// since a load runs the same one a hundred thousand times. A connection belongs to the process that
+// opened it: in a forked child it is neither used nor closed, for that would act on the parent's
+// files.
 #include "host/linux/state/store.h"
 
 #include <fcntl.h>
