@@ -264,6 +264,10 @@ void Store::SwitchToWriteAheadLog() {
 // The log's index is a file that every user of the database maps. It begins with two copies of a
 // header that each commit rewrites, and by which the engine itself tells whether its cache is
 // valid; the format is part of the engine's published file formats.
+//
+// PRAGMA data_version tells the same, but of the commits of others alone, and at a price: 1.6
+// microseconds and two system calls beside 7 nanoseconds and none, measured by 200,000 calls of
+// each in a row. Each check of a word asks.
 void Store::FindCommitHeader() {
   sqlite3_file* main = nullptr;
   if (sqlite3_file_control(database, "main", SQLITE_FCNTL_FILE_POINTER, &main) != SQLITE_OK) return;
