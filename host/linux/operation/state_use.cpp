@@ -20,7 +20,7 @@ bool IsStateMissing() {
 }
 
 StateCopy CopyUsedState(const std::string& to) {
-  const std::string used = StatePath();
+  const std::string& used = StatePath();
   const int flags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;
   if (faccessat(AT_FDCWD, used.c_str(), R_OK, flags) != 0) {
     if (errno == ENOENT || errno == ENOTDIR) return StateCopy::kMissing;
