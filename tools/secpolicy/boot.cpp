@@ -6,16 +6,15 @@
 #include "boot/boot_plan.h"
 #include "braxo/lib/exception.h"
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/archive_library.h"
 #include "host/linux/operation/mend_state.h"
 #include "kitlibs/file.h"
-#include "library_call.h"
 #include "load/load_run.h"
 #include "policy_dir.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
-#include "summary.h"
-#include "text/section.h"
+#include "text/format.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

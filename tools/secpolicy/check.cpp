@@ -7,13 +7,12 @@
 #include "check/check_run.h"
 #include "check/report_format.h"
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/policy_load.h"
 #include "kitlibs/file.h"
-#include "library_call.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
-#include "summary.h"
-#include "text/count.h"
+#include "text/format.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

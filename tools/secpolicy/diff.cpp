@@ -3,8 +3,8 @@
 
 #include "command_line.h"
 #include "compare/policy_diff.h"
+#include "ending.h"
 #include "host/linux/operation/log_use.h"
-#include "summary.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -3,12 +3,12 @@
 #include <list>
 
 #include "command_line.h"
+#include "ending.h"
 #include "error_list.h"
 #include "host/linux/operation/stable_view.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
-#include "library_call.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"

@@ -4,10 +4,10 @@
 #include <string>
 
 #include "command_line.h"
+#include "ending.h"
 #include "graph/graphviz.h"
 #include "graph/policy_graph.h"
 #include "installed/installed_policy.h"
-#include "library_call.h"
 #include "query/ask.h"
 #include "query/question.h"
 #include "verb.h"

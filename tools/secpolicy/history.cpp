@@ -3,13 +3,10 @@
 #include <iomanip>
 #include <iostream>
 
-#include "library_call.h"
-#include "saved/saved_name.h"
+#include "ending.h"
 #include "saved/saved_state.h"
-#include "scratch/state_reader.h"
-#include "summary.h"
-#include "text/count.h"
-#include "text/utc_time.h"
+#include "scratch/scratch_state.h"
+#include "text/format.h"
 #include "text/visible.h"
 #include "verb.h"
 

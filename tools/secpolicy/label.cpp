@@ -2,9 +2,9 @@
 #include <vector>
 
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/state_use.h"
 #include "label/label_actions.h"
-#include "library_call.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "verb.h"

@@ -1,7 +1,7 @@
 #include "command_line.h"
+#include "dry_run/planned_load.h"
 #include "load/load_run.h"
 #include "policy_dir.h"
-#include "rehearsal/planned_load.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
 #include "verb.h"

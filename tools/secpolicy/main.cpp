@@ -1,3 +1,4 @@
+#include <fcntl.h>
 #include <unistd.h>
 
 #include <exception>
@@ -8,7 +9,6 @@
 #include "command_line.h"
 #include "host/linux/operation/log_use.h"
 #include "root.h"
-#include "standard_descriptors.h"
 #include "text/terminal_guard.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -76,6 +76,15 @@ int Run(int argc, char** argv) {
               << advice << std::endl;
     return kFailed;
   }
+}
+
+// Puts something that can be neither read nor written in place of the standard descriptors that the
+// caller has closed: a file that is opened next would be taken for one of them. Not /dev/null,
+// which a root may lack and which would let output vanish unseen.
+void TakeClosedDescriptors() {
+  int lowest = STDIN_FILENO;
+  while (lowest >= 0 && lowest <= STDERR_FILENO) lowest = open("/", O_PATH | O_CLOEXEC);
+  if (lowest >= 0) close(lowest);
 }
 
 }  // namespace

@@ -1,7 +1,8 @@
 #include "policy_dir.h"
 
+#include "ending.h"
 #include "kitlibs/file.h"
-#include "library_call.h"
+#include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
 
@@ -26,6 +27,15 @@ std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::str
   return Refuse(verb, "there is no directory " + dir +
                           " below this root, so nothing was changed. Name the directory of the "
                           "policy, or the root that it is in (--root DIR).");
+}
+
+std::string DomainFile(std::string_view domain, const std::string& policyDir) {
+  constexpr std::string_view kPrefix = SecPolicy::kPartnerPrefix;
+  if (domain.starts_with(kPrefix)) {
+    domain.remove_prefix(kPrefix.size());
+    return SecPolicy::kPartnerDomainsDir + ("/" + std::string(domain));
+  }
+  return policyDir + "/" + SecPolicy::kDomainsDir + "/" + std::string(domain);
 }
 
 }  // namespace SecPolicyCli

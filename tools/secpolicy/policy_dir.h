@@ -3,6 +3,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "command_line.h"
 
@@ -20,5 +21,8 @@ Option AddTiming(Syntax& syntax, bool& timing);
 
 // Refuses a policy directory that is not there; nothing for one that is.
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);
+
+// The file that a load of the policy directory `policyDir` takes the domain's policy from.
+std::string DomainFile(std::string_view domain, const std::string& policyDir);
 
 }  // namespace SecPolicyCli

@@ -1,5 +1,5 @@
+#include "ending.h"
 #include "error_list.h"
-#include "library_call.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
 #include "verb.h"

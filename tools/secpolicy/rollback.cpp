@@ -1,14 +1,13 @@
 #include <stdexcept>
 
+#include "ending.h"
 #include "host/linux/operation/saved_policy.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/store_copy.h"
-#include "library_call.h"
 #include "load/load_record.h"
 #include "root.h"
-#include "saved/saved_name.h"
 #include "saved/saved_state.h"
-#include "scratch/scratch_directory.h"
+#include "scratch/scratch_state.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

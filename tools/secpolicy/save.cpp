@@ -1,11 +1,10 @@
 #include <memory>
 
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/saved_policy.h"
 #include "host/linux/operation/state_use.h"
-#include "library_call.h"
 #include "root.h"
-#include "saved/saved_name.h"
 #include "saved/saved_state.h"
 #include "verb.h"
 

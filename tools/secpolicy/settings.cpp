@@ -4,7 +4,7 @@
 #include <variant>
 
 #include "command_line.h"
-#include "library_call.h"
+#include "ending.h"
 #include "root.h"
 #include "verb.h"
 

@@ -7,13 +7,12 @@
 #include <vector>
 
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/load_record.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "scratch/scratch_state.h"
-#include "summary.h"
-#include "text/count.h"
-#include "text/utc_time.h"
+#include "text/format.h"
 #include "text/visible.h"
 #include "verb.h"
 

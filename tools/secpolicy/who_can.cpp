@@ -4,13 +4,13 @@
 #include <vector>
 
 #include "command_line.h"
+#include "ending.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "query/answer.h"
 #include "query/ask.h"
 #include "query/question.h"
-#include "summary.h"
-#include "text/count.h"
+#include "text/format.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

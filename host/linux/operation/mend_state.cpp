@@ -10,7 +10,7 @@
 namespace LinuxHost {
 
 std::string MendState() {
-  const std::string path = StatePath();
+  const std::string& path = StatePath();
   struct stat status {};
   if (lstat(path.c_str(), &status) != 0) return "";
   try {

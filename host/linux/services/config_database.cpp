@@ -48,7 +48,7 @@ bool IsMissing(const std::string& path) {
 
 ConfigDatabase& ConfigDatabase::Current() {
   static thread_local std::unique_ptr<ConfigDatabase> current;
-  const std::string path = SettingsPath();
+  const std::string& path = SettingsPath();
   if (!current || current->store.Path() != path || !current->store.IsCurrent()) {
     current.reset();
     // A root that has never run lacks even /var; what cannot be made, the store reports.

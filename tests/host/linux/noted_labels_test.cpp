@@ -228,7 +228,7 @@ TEST_P(NotedLabelsTest, FailsOnAReadOnlyFileSystem) {
 }
 
 // There, a try to write copies the file.
-TEST_P(NotedLabelsTest, RehearsesWithoutTraceOnAnOverlay) {
+TEST_P(NotedLabelsTest, DryRunsWithoutTraceOnAnOverlay) {
   if (geteuid() != 0) GTEST_SKIP() << "only the superuser mounts";
   for (const char* directory : {"/upper", "/work", "/merged"}) {
     std::filesystem::create_directory(scratch.Directory().string() + directory);

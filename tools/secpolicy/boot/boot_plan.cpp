@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "json.h"
-#include "text/section.h"
+#include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {

@@ -10,7 +10,7 @@
 #include "policy/parameter_range.h"
 #include "rule_form.h"
 #include "secpolicy/observed/policy_lines.h"
-#include "text/count.h"
+#include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {

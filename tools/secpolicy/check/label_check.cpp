@@ -88,7 +88,7 @@ PathProblem FindPathProblem(const FileLabel& label) {
 }
 
 // Why a load cannot give the label; empty when it can.
-std::string Rehearse(CheckRun& run, const FileLabel& label) {
+std::string DryRun(CheckRun& run, const FileLabel& label) {
   try {
     if (label.recursive) {
       SecPolicy::SetDirLabelRecursive(label.path, label.label, run.access);
@@ -101,10 +101,10 @@ std::string Rehearse(CheckRun& run, const FileLabel& label) {
   }
 }
 
-void CheckPath(CheckRun& run, const LabelLine& line, bool isRehearsed) {
+void CheckPath(CheckRun& run, const LabelLine& line, bool isDryRun) {
   CheckIsAbsolute(run, *line.file, line.line, 0);
   const PathProblem problem = FindPathProblem(line.label);
-  const std::string failure = isRehearsed ? Rehearse(run, line.label) : "";
+  const std::string failure = isDryRun ? DryRun(run, line.label) : "";
   if (!failure.empty()) {
     run.diagnostics.Add(
         line.file->AtWord(Codes::kCannotLabel, line.line, 0, failure, problem.message));
@@ -180,9 +180,7 @@ class LabelMap {
 };
 
 // What a boot will unpack and label is not there yet, and who may not load may not see everything.
-bool CanRehearse(const CheckRun& run) {
-  return run.scratch.IsCopy() && AdviseOnPrivilege().empty();
-}
+bool CanDryRun(const CheckRun& run) { return run.scratch.IsCopy() && AdviseOnPrivilege().empty(); }
 
 }  // namespace
 
@@ -190,7 +188,7 @@ void CheckFileLabels(CheckRun& run, const std::string& dir) {
   std::vector<LabelLine> labels;
   for (const NamedFile& named : OpenPolicyFiles(run, dir)) ReadLabels(run, *named.file, labels);
   std::optional<LinuxHost::NotedLabels> notes;
-  if (CanRehearse(run)) {
+  if (CanDryRun(run)) {
     notes.emplace(LinuxHost::LabelNotes::kDryRun, run.scratch.DirectoryPath());
   }
   for (const LabelLine& line : labels) {

@@ -1,9 +1,9 @@
 #include "policy_diff.h"
 
+#include <algorithm>
 #include <set>
 
 #include "scratch/scratch_state.h"
-#include "tardisk_transitions.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -25,6 +25,20 @@ std::vector<LabelDifference> CompareLabels(const Labels& before, const Labels& a
     if (difference.before != difference.after) differences.push_back(std::move(difference));
   }
   return differences;
+}
+
+// Takes the transitions that tardisks are launched by out of `policy`: the host's tardisks bring
+// them, so no policy directory holds them. `access` knows which they are.
+void DropTardiskTransitions(Policy::InstalledPolicy& policy,
+                            SecPolicy::TeskAccessInterfaceImpl& access) {
+  const std::vector<std::string> launchDomains = access.GetTardiskLaunchDomains();
+  const std::string kind = access.GetTardiskExecEventKeyword();
+  for (Policy::InstalledDomain& domain : policy.domains) {
+    if (std::ranges::find(launchDomains, domain.name) == launchDomains.end()) continue;
+    std::erase_if(domain.rules, [&](const Policy::Rule& rule) {
+      return rule.kind == Policy::RuleKind::kDomainTransition && rule.words[2] == kind;
+    });
+  }
 }
 
 void DropTardisksOfBoth(Side& one, Side& other) {

@@ -4,7 +4,7 @@
 
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
-#include "scratch/scratch_directory.h"
+#include "scratch/scratch_state.h"
 #include "secpolicy/observed/policy_lines.h"
 #include "secpolicy/policy_root.h"
 

@@ -6,7 +6,7 @@
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "saved/saved_state.h"
-#include "scratch/state_reader.h"
+#include "scratch/scratch_state.h"
 
 namespace SecPolicyCli {
 namespace {

@@ -3,10 +3,10 @@
 #include <algorithm>
 #include <list>
 
-#include "domain_file.h"
 #include "host/linux/operation/rule_origins.h"
 #include "host/linux/operation/stable_view.h"
 #include "kitlibs/file.h"
+#include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {

@@ -6,7 +6,7 @@
 #include "host/linux/operation/file_label.h"
 #include "label_actions.h"
 #include "label_plan.h"
-#include "text/count.h"
+#include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {

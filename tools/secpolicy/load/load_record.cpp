@@ -4,8 +4,8 @@
 #include <exception>
 #include <filesystem>
 
+#include "ending.h"
 #include "host/linux/operation/load_record.h"
-#include "summary.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -11,6 +11,7 @@
 #include <map>
 #include <optional>
 
+#include "ending.h"
 #include "host/linux/operation/label_journal.h"
 #include "host/linux/operation/noted_labels.h"
 #include "host/linux/operation/state_use.h"
@@ -20,8 +21,7 @@
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
-#include "summary.h"
-#include "text/count.h"
+#include "text/format.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {

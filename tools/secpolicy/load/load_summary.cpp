@@ -2,10 +2,10 @@
 
 #include <exception>
 
+#include "ending.h"
 #include "host/linux/operation/policy_count.h"
 #include "secpolicy/policy_root.h"
-#include "summary.h"
-#include "text/count.h"
+#include "text/format.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {

@@ -1,7 +1,7 @@
 #include "answer.h"
 
-#include "domain_file.h"
 #include "installed/installed_json.h"
+#include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 #include "text/visible.h"
 

@@ -3,8 +3,8 @@
 #include <iostream>
 
 #include "command_line.h"
+#include "ending.h"
 #include "host/linux/operation/state_use.h"
-#include "library_call.h"
 #include "question.h"
 #include "text/visible.h"
 

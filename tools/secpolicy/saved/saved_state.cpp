@@ -4,12 +4,15 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <exception>
 #include <filesystem>
 #include <optional>
 #include <stdexcept>
 #include <system_error>
 #include <tuple>
 
+#include "command_line.h"
+#include "ending.h"
 #include "root.h"
 
 namespace SecPolicyCli {
@@ -87,6 +90,20 @@ std::vector<SavedState> ListSavedStates() {
   std::ranges::sort(states, {},
                     [](const SavedState& state) { return std::tie(state.time, state.name); });
   return states;
+}
+
+std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning) {
+  const auto name = std::make_shared<std::string>();
+  syntax.AddOption("NAME", *name, meaning).Require().Check(WhyNoSavedName);
+  return name;
+}
+
+ExitCode RunOrRefuse(const std::string& verb, const Action& action) {
+  try {
+    return action();
+  } catch (const std::exception& failure) {
+    return Refuse(verb, failure.what());
+  }
 }
 
 }  // namespace SecPolicyCli

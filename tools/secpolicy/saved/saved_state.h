@@ -1,8 +1,11 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <string>
 #include <vector>
+
+#include "verb.h"
 
 namespace SecPolicyCli {
 
@@ -26,5 +29,11 @@ bool IsSaved(const std::string& name);
 // The saved states, the oldest first. Throws std::runtime_error, with what to do about it, when
 // they cannot be listed.
 std::vector<SavedState> ListSavedStates();
+
+// Adds the required argument NAME, the name of a saved state, to `syntax`.
+std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning);
+
+// Does what `action` does, and ends `verb` with the message of what it throws.
+ExitCode RunOrRefuse(const std::string& verb, const Action& action);
 
 }  // namespace SecPolicyCli

@@ -1,7 +1,29 @@
 #include "scratch_state.h"
 
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <stdexcept>
+#include <system_error>
+#include <vector>
+
+#include "braxo/lib/exception.h"
+#include "host/linux/common/host_error.h"
+
 namespace SecPolicyCli {
 namespace {
+
+// A root that was never booted has none of the usual places, so that only the root itself is left.
+std::string MakePrivateDirectory() {
+  std::vector<std::string> places = {"/tmp", "/var/tmp", "/run", ""};
+  const char* const wanted = secure_getenv("TMPDIR");
+  if (wanted != nullptr && *wanted != '\0') places.emplace(places.begin(), wanted);
+  for (const std::string& place : places) {
+    std::string directory = place + "/secpolicy.XXXXXX";
+    if (mkdtemp(directory.data()) != nullptr) return directory;
+  }
+  LinuxHost::ThrowErrno("cannot make a directory for the scratch state; TMPDIR can name a place");
+}
 
 constexpr char kState[] = "host.db";
 
@@ -10,7 +32,20 @@ std::optional<LinuxHost::StateCopy> CopyUnless(bool fresh, const std::string& to
   return LinuxHost::CopyUsedState(to);
 }
 
+// The message as it is about the original.
+std::string About(const std::string& path, const std::string& copy, std::string message) {
+  const std::size_t found = message.find(copy);
+  return found == std::string::npos ? message : message.replace(found, copy.size(), path);
+}
+
 }  // namespace
+
+ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory()) {}
+
+ScratchDirectory::~ScratchDirectory() {
+  std::error_code ignored;
+  std::filesystem::remove_all(path, ignored);
+}
 
 ScratchState::ScratchState(bool fresh)
     : copy(CopyUnless(fresh, directory.File(kState))), used(directory.File(kState)) {}
@@ -19,6 +54,19 @@ std::string ScratchState::WhyNoCopy() const {
   if (copy == LinuxHost::StateCopy::kMissing) return "nothing is installed";
   if (copy == LinuxHost::StateCopy::kForbidden) return "this user may not read the installed state";
   return "";
+}
+
+Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
+  const ScratchDirectory scratch;
+  const std::string copy = scratch.File("host.db");
+  LinuxHost::CopyDatabase(path, what, copy);
+  try {
+    const LinuxHost::UsedCopy used(copy);
+    SecPolicy::TeskAccessInterfaceImpl access;
+    return ReadInstalledPolicy(access);
+  } catch (const Braxo::Lib::BraxoException& problem) {
+    throw std::runtime_error(About(path, copy, problem.what()));
+  }
 }
 
 }  // namespace SecPolicyCli

@@ -1,11 +1,31 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "host/linux/operation/state_use.h"
-#include "scratch_directory.h"
+#include "host/linux/operation/store_copy.h"
+#include "installed/installed_policy.h"
 
 namespace SecPolicyCli {
+
+// A directory that only this user may use; removed, with all that is in it, with this object.
+class ScratchDirectory {
+ public:
+  // Throws Braxo::Lib::BraxoException when there is no place for it.
+  ScratchDirectory();
+  ScratchDirectory(const ScratchDirectory&) = delete;
+  ScratchDirectory& operator=(const ScratchDirectory&) = delete;
+  ~ScratchDirectory();
+
+  const std::string& Path() const { return path; }
+
+  // The path of the file `name` in it.
+  std::string File(const std::string& name) const { return path + "/" + name; }
+
+ private:
+  std::string path;
+};
 
 // A private copy of the host's state, which takes the place of the installed one as long as this
 // object lives. The installed state is never written.
@@ -30,5 +50,10 @@ class ScratchState {
   std::optional<LinuxHost::StateCopy> copy;
   LinuxHost::UsedCopy used;
 };
+
+// Reads the state at `path` from a copy, since even reading leaves traces beside a state. Throws
+// what the host throws when it cannot be copied, and std::runtime_error when the copy cannot be
+// used.
+Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
 
 }  // namespace SecPolicyCli

@@ -66,14 +66,14 @@ const char* WordFor(ExitCode ending) {
 
 }  // namespace
 
-void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
-                   const LoadRehearsal& rehearsal, std::ostream& output) {
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const LoadDryRun& dryRun,
+                   std::ostream& output) {
   const Difference& difference = plan.difference;
   const Json document = {
       {"schema", "secpolicy.plan/1"},
       {"directory", policyDir},
-      {"ending", WordFor(rehearsal.Ending())},
-      {"errors", rehearsal.Errors()},
+      {"ending", WordFor(dryRun.Ending())},
+      {"errors", dryRun.Errors()},
       {"changesNothing", plan.ChangesNothing()},
       {"domains",
        {{"create", NewDomains(difference)},

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "load_rehearsal.h"
+#include "load_dry_run.h"
 #include "policy/difference.h"
 
 namespace SecPolicyCli {
@@ -34,15 +34,15 @@ struct LoadPlan {
   bool ChangesNothing() const { return difference.IsEmpty() && labels.empty(); }
 };
 
-// The plan of the load that was rehearsed. Throws what the host throws.
-LoadPlan MakeLoadPlan(const LoadRehearsal& rehearsal);
+// The plan of the load that was run dry. Throws what the host throws.
+LoadPlan MakeLoadPlan(const LoadDryRun& dryRun);
 
 // Writes the plan for people: one thing a line under a heading for each kind of change. At most
 // `maxLabels` files are shown.
 void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& output);
 
 // Writes the plan for programs, with how the load of `policyDir` would end.
-void WritePlanJson(const LoadPlan& plan, const std::string& policyDir,
-                   const LoadRehearsal& rehearsal, std::ostream& output);
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const LoadDryRun& dryRun,
+                   std::ostream& output);
 
 }  // namespace SecPolicyCli

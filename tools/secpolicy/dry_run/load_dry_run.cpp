@@ -1,4 +1,4 @@
-#include "load_rehearsal.h"
+#include "load_dry_run.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -70,7 +70,7 @@ std::string ReadAll(const std::string& path) {
 
 }  // namespace
 
-LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
+LoadDryRun::LoadDryRun(const LoadRequest& load) {
   if (LinuxHost::CopyUsedState(StateBefore()) == LinuxHost::StateCopy::kForbidden) ThrowForbidden();
   // Both are of the same moment.
   if (std::filesystem::exists(StateBefore())) {
@@ -98,7 +98,7 @@ LoadRehearsal::LoadRehearsal(const LoadRequest& load) {
   });
   messages = ReadAll(messageFile);
   if (!end.death.empty()) {
-    throw std::runtime_error("the rehearsal of the load died: " + end.death + "\n" + messages);
+    throw std::runtime_error("the dry run of the load died: " + end.death + "\n" + messages);
   }
   ending = end.code;
   errors = ReadErrors(scratch.File("errors"));

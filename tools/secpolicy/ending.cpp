@@ -1,13 +1,18 @@
-#include "library_call.h"
+#include "ending.h"
 
 #include <exception>
 #include <iostream>
 
 #include "error_list.h"
-#include "summary.h"
-#include "text/count.h"
+#include "text/format.h"
+#include "text/visible.h"
 
 namespace SecPolicyCli {
+
+void Summarize(const std::string& verb, const std::string& text) {
+  std::cout.flush();
+  std::cerr << "secpolicy: " << verb << ": " << Visible(text) << std::endl;
+}
 
 ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList& errors)>& call,
                      const std::function<std::string()>& advice,

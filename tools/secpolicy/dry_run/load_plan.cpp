@@ -45,14 +45,14 @@ std::string NameOf(unsigned int id, const LabelNames& names) {
 
 }  // namespace
 
-LoadPlan MakeLoadPlan(const LoadRehearsal& rehearsal) {
-  const Policy::InstalledPolicy before = ReadState(rehearsal.StateBefore());
-  const Policy::InstalledPolicy after = ReadState(rehearsal.StateAfter());
+LoadPlan MakeLoadPlan(const LoadDryRun& dryRun) {
+  const Policy::InstalledPolicy before = ReadState(dryRun.StateBefore());
+  const Policy::InstalledPolicy after = ReadState(dryRun.StateAfter());
   LoadPlan plan;
   plan.difference = Policy::Compare(before, after);
   const LabelNames oldNames = LabelNamesOf(before);
   const LabelNames newNames = LabelNamesOf(after);
-  for (const auto& change : rehearsal.Labels()) {
+  for (const auto& change : dryRun.Labels()) {
     if (!change.IsLasting()) continue;
     plan.labels.push_back(
         {change.path, NameOf(change.before, oldNames), NameOf(change.after, newNames)});

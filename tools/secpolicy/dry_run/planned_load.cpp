@@ -3,10 +3,10 @@
 #include <iostream>
 #include <limits>
 
+#include "ending.h"
 #include "host/linux/operation/log_use.h"
 #include "load_plan.h"
 #include "policy_dir.h"
-#include "summary.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -17,19 +17,19 @@ constexpr std::size_t kShownLabels = 20;
 }  // namespace
 
 ExitCode PlanLoad(const LoadRequest& load, const PlanOptions& options) {
-  const LoadRehearsal rehearsal(load);
-  if (rehearsal.Ending() != kWell) std::cerr << rehearsal.Messages() << std::flush;
+  const LoadDryRun dryRun(load);
+  if (dryRun.Ending() != kWell) std::cerr << dryRun.Messages() << std::flush;
   const LinuxHost::DroppedLog dropped;
-  const LoadPlan plan = MakeLoadPlan(rehearsal);
+  const LoadPlan plan = MakeLoadPlan(dryRun);
   if (options.format == "json") {
-    WritePlanJson(plan, load.policyDir, rehearsal, std::cout);
+    WritePlanJson(plan, load.policyDir, dryRun, std::cout);
   } else {
     const auto all = std::numeric_limits<std::size_t>::max();
     WritePlanText(plan, options.showAll ? all : kShownLabels, std::cout);
   }
   Summarize("load", plan.ChangesNothing() ? "nothing would change"
                                           : "this was a plan: nothing was changed");
-  return rehearsal.Ending();
+  return dryRun.Ending();
 }
 
 }  // namespace SecPolicyCli

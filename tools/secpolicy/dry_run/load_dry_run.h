@@ -6,18 +6,18 @@
 
 #include "host/linux/operation/noted_labels.h"
 #include "load/load_run.h"
-#include "scratch/scratch_directory.h"
+#include "scratch/scratch_state.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 
 // A whole load of a policy directory on a copy of the host's state. Neither the installed state nor
 // a file is changed, and nothing is logged.
-class LoadRehearsal {
+class LoadDryRun {
  public:
-  // Rehearses the load. Nothing of the host may be in use in this process. Throws
+  // Runs the load dry. Nothing of the host may be in use in this process. Throws
   // std::runtime_error when it cannot be done.
-  explicit LoadRehearsal(const LoadRequest& load);
+  explicit LoadDryRun(const LoadRequest& load);
 
   // How the load would end.
   ExitCode Ending() const { return ending; }

@@ -1,11 +1,21 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <iosfwd>
 #include <string>
 #include <vector>
 
 namespace SecPolicyCli {
+
+// "1 file", "2 files".
+std::string CountOf(std::size_t count, const std::string& noun);
+
+// The time, in seconds since 1970, for people: "2026-11-21 07:00:00 UTC".
+std::string UtcTime(std::int64_t seconds);
+
+// The same for programs, as ISO 8601 has it: "2026-11-21T07:00:00Z".
+std::string IsoTime(std::int64_t seconds);
 
 // Writes a heading with the number of `lines`, and at most `maximum` of them, as they can be shown;
 // nothing when there are none.

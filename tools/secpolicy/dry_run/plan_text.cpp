@@ -1,5 +1,5 @@
 #include "load_plan.h"
-#include "text/section.h"
+#include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {

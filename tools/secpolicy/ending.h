@@ -7,6 +7,10 @@
 
 namespace SecPolicyCli {
 
+// Ends a verb, or a part of it, with a line "secpolicy: VERB: TEXT" on standard error, after what
+// went to standard output.
+void Summarize(const std::string& verb, const std::string& text);
+
 class ErrorList;
 
 // Makes the call `call` for the verb `verb`, which is no load, and ends it with one summary line on
