@@ -1,5 +1,9 @@
 #pragma once
 
+#include <map>
+#include <queue>
+#include <string>
+
 #include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
@@ -41,16 +45,33 @@ void TellFailure(const std::string& file, PolicyObserver& observer, Step step) {
   }
 }
 
-// Runs `readLine` for a line of a policy file; it notes in `problem` what it looks at. The problem
-// of a line that cannot be read is told, and the BraxoException passes on.
+// The lines of a policy file that have words, by number.
+using ParsedLines = std::map<unsigned int, std::queue<std::string>>;
+
+// Runs `readLine` on the words of each line of the policy file `file`, with a problem in which it
+// notes what it looks at. The problem of a line that cannot be read is told, and the BraxoException
+// passes on.
 template <class ReadLine>
-void TellRefusal(const Problem& problem, PolicyObserver& observer, ReadLine readLine) {
-  try {
-    readLine();
-  } catch (const Braxo::Lib::BraxoException&) {
-    observer.OnProblem(problem);
-    throw;
+void ReadLines(const std::string& file, ParsedLines& lines, PolicyObserver& observer,
+               ReadLine readLine) {
+  for (auto& [line, words] : lines) {
+    if (words.empty()) continue;
+    Problem problem{.file = file, .line = line};
+    try {
+      readLine(words, problem);
+    } catch (const Braxo::Lib::BraxoException&) {
+      observer.OnProblem(problem);
+      throw;
+    }
   }
+}
+
+// As above, of a file that is parsed first.
+template <class ReadLine>
+void ReadLines(const std::string& file, PolicyObserver& observer, ReadLine readLine) {
+  ParsedLines lines;
+  TellFailure(file, observer, [&] { ParseFile(file, lines); });
+  ReadLines(file, lines, observer, readLine);
 }
 
 // Tells that a phase of a load begins, and at the end of its life that the phase ends.

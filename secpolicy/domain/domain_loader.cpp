@@ -27,7 +27,9 @@ std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceI
   std::list<DomainPolicy> domains;
   for (const auto& [path, file] : files) {
     const std::string name = prefix + file;
-    domains.emplace_back(name, FindOrCreateDomain(name, access)).policyFile = path;
+    unsigned int id = 0;
+    TellFailure(path, observer, [&] { id = FindOrCreateDomain(name, access); });
+    domains.emplace_back(name, id).policyFile = path;
   }
   SecpolicyInfo("Parsed all domain names");
   return domains;

@@ -55,13 +55,8 @@ void DomainPolicy::ProcessParsedPolicyFile(
 void DomainPolicy::ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
                                            std::map<unsigned int, std::queue<std::string>>& parsed,
                                            PolicyObserver& observer) {
-  Problem problem{.file = policyFile};
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.empty()) continue;
-    problem.line = line;
-    TellRefusal(problem, observer,
-                [&, &lineTokens = tokens] { ParseLine(lineTokens, access, problem); });
-  }
+  ReadLines(policyFile, parsed, observer,
+            [&](auto& tokens, Problem& problem) { ParseLine(tokens, access, problem); });
 }
 
 void DomainPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,

@@ -11,7 +11,6 @@ namespace {
 
 using Braxo::Lib::BraxoException;
 using Braxo::Misc::StrCat;
-using FileLabel = FileLabelPolicy::FileLabel;
 
 constexpr std::string_view kTreeMarker = "/*";
 
@@ -27,7 +26,7 @@ std::string LineMessage(const std::string& file, unsigned int line, const std::s
   RaiseError(LineMessage(problem.file, problem.line, problem.reason));
 }
 
-// An unknown label is told in the kernel's own tokens.
+// An unknown label is told in the kernel's own words.
 void ValidateLabel(const std::string& label, TeskAccessInterfaceImpl& access, Problem& problem) {
   try {
     access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
@@ -56,16 +55,10 @@ void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceIm
 
 void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access,
                                   PolicyObserver& observer) {
-  std::map<unsigned int, std::queue<std::string>> parsed;
-  TellFailure(file, observer, [&] { ParseFile(file, parsed); });
-  Problem problem{.file = file};
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.empty()) continue;
-    problem.line = line;
-    TellRefusal(problem, observer,
-                [&, &lineTokens = tokens] { ParseLine(lineTokens, access, problem); });
+  ReadLines(file, observer, [&](auto& tokens, Problem& problem) {
+    ParseLine(tokens, access, problem);
     observer.OnFileLabel(fileLabels.back());
-  }
+  });
 }
 
 void FileLabelPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
@@ -75,7 +68,7 @@ void FileLabelPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInter
   }
   const std::string& pattern = tokens.front();
   const std::string& label = tokens.back();
-  // Before the pattern is looked at.
+  // An unknown label is told before the pattern is looked at.
   ValidateLabel(label, access, problem);
 
   const std::size_t marker = pattern.find(kTreeMarker);

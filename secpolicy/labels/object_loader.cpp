@@ -39,7 +39,7 @@ void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access,
   // The kernel follows what was read, also where that is only a part: objects that only the broken
   // part of a file defines are removed.
   try {
-    policy.SetObjects(access);
+    TellFailure(dir, observer, [&] { policy.SetObjects(access); });
   } catch (const Braxo::Lib::BraxoException&) {
     ReportError("Error in defining some objects", observer);
     RaiseError(kFailure);

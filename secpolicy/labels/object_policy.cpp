@@ -12,13 +12,7 @@ void ObjectPolicy::ParsePolicy(const std::string& path) {
 }
 
 void ObjectPolicy::ParsePolicy(const std::string& path, PolicyObserver& observer) {
-  std::map<unsigned int, std::queue<std::string>> parsed;
-  TellFailure(path, observer, [&] { ParseFile(path, parsed); });
-  Problem problem{.file = path};
-  for (auto& [line, tokens] : parsed) {
-    problem.line = line;
-    TellRefusal(problem, observer, [&, &lineTokens = tokens] { ParseLine(lineTokens, problem); });
-  }
+  ReadLines(path, observer, [&](auto& tokens, Problem& problem) { ParseLine(tokens, problem); });
 }
 
 void ObjectPolicy::ParseLine(std::queue<std::string>& tokens, Problem& problem) {

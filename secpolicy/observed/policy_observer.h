@@ -15,10 +15,10 @@ enum class Fault {
   kRuleType,       // its first word is no kind of rule
   kArgumentCount,  // it has too many or too few words
   kGrantWord,      // the last word is neither "grant" nor "revoke"
-  kUnknownDomain,
-  kUnknownWord,  // the host does not have it in the table that it has to be in
-  kTreeMarker,   // "/*" stands elsewhere than at the end
-  kSecondRule,   // only one rule of the kind is allowed
+  kUnknownDomain,  // the host does not find it, or fails when it is asked
+  kUnknownWord,    // the same, of the table that it has to be in
+  kTreeMarker,     // "/*" stands elsewhere than at the end
+  kSecondRule,     // only one rule of the kind is allowed
 };
 
 // Why something of a policy cannot be read or installed.
@@ -60,14 +60,16 @@ class PolicyObserver {
   // An error is about to be written to standard error.
   virtual void OnError(const std::string& /*message*/) {}
 
-  // What an error was about, before the error. Errors that only sum up have no problem.
+  // What an error was about, before the error. Errors that only sum up, and those that are about no
+  // policy file, have no problem.
   virtual void OnProblem(const Problem&) {}
 
   // A rule about a path is about to be installed. The host is told the line of every rule but
   // these.
   virtual void OnPathRule(const TeskCtl::Security::TeskAccess_FilePathAccessRule&) {}
 
-  // A line of the file labels was read, or a tardisk has got its label.
+  // A line of the file labels was read, whether or not it can be given; or a tardisk has got the
+  // label of its policy.
   virtual void OnFileLabel(const FileLabel&) {}
 
   // A transition that belongs to a tardisk was installed for the line `rule.line` of `policyFile`.

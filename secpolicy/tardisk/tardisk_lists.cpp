@@ -26,9 +26,10 @@ void ForEachRegularFile(Directory& directory, PolicyObserver& observer, Step ste
   }
 }
 
-bool HasPolicy(const std::string& tardisk, const std::list<TardiskPolicy*>& policies) {
+bool HasPolicy(const std::string& tardisk, const std::list<TardiskPolicy*>& policies,
+               PolicyObserver& observer) {
   return std::any_of(policies.begin(), policies.end(), [&](TardiskPolicy* policy) {
-    return policy->GetBackingTardiskPath() == tardisk;
+    return TardiskPolicySteps(*policy, observer).GetBackingTardiskPath() == tardisk;
   });
 }
 
@@ -39,7 +40,7 @@ void AddPolicy(const std::string& path, std::list<TardiskPolicy*>& policies,
   auto policy = std::make_unique<TardiskPolicy>(path);
   const std::string tardisk = TardiskPolicySteps(*policy, observer).GetBackingTardiskPath();
   if (tardisk.empty()) return ReportWithoutTardisk(path, observer);
-  if (HasPolicy(tardisk, policies)) {
+  if (HasPolicy(tardisk, policies, observer)) {
     const std::string reason = "More than one exception specification for tardisk " + tardisk;
     observer.OnProblem({.file = path, .reason = reason});
     ReportError(reason, observer);

@@ -97,15 +97,8 @@ void TardiskPolicySteps::ParsePolicy(TeskAccessInterfaceImpl& access) {
   const std::string tardisk = GetBackingTardiskPath();
   if (tardisk.empty()) return ReportWithoutTardisk(file, observer);
 
-  std::map<unsigned int, std::queue<std::string>> parsed;
-  TellFailure(file, observer, [&] { ParseFile(file, parsed); });
-  Problem problem{.file = file};
-  for (auto& [line, tokens] : parsed) {
-    if (tokens.empty()) continue;
-    problem.line = line;
-    TellRefusal(problem, observer,
-                [&, &lineTokens = tokens] { ParseLine(tardisk, lineTokens, access, problem); });
-  }
+  ReadLines(file, observer,
+            [&](auto& tokens, Problem& problem) { ParseLine(tardisk, tokens, access, problem); });
 }
 
 void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::string>& tokens,

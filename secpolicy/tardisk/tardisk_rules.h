@@ -2,6 +2,7 @@
 
 #include <queue>
 #include <string>
+#include <utility>
 
 #include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
@@ -30,10 +31,14 @@ class TardiskRules {
   // As AddRule, of the line `problem.line` of the file `problem.file`. Before it throws, `problem`
   // says what is wrong with the line.
   virtual void AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
-                       TeskAccessInterfaceImpl& access, Problem& problem) = 0;
+                       TeskAccessInterfaceImpl& access, Problem& problem) {
+    AddRule(problem.line, tardiskPath, problem.file, std::move(tokens), access);
+  }
 
   // As Set, and tells `observer` what was installed for which line.
-  virtual void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) = 0;
+  virtual void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& /*observer*/) {
+    Set(access);
+  }
 
   std::string ruleType;  // the keyword, such as "-E"
 };

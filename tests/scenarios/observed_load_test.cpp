@@ -1,5 +1,7 @@
 // What an observer is told of whole loads, and that being observed changes nothing of them.
 
+#include <gmock/gmock.h>
+
 #include "observed/observer_log.h"
 #include "scenarios/good_host.h"
 #include "secpolicy/observed/loading.h"
@@ -62,6 +64,23 @@ TEST_F(ObservedWholeLoad, TellsWhichDomainIsMissing) {
   }
   EXPECT_EQ(log.lines.at(log.lines.size() - 2), "missing ioFilterDom");
   EXPECT_EQ(log.lines.back(), "error Failed to fetch domainID for IOFilter domain");
+}
+
+TEST_F(ObservedWholeLoad, TellsWhichFileADomainThatCannotBeMadeIsOf) {
+  GoodHost good;
+  good.roots.Write("/policy/domains/zDom", "");
+  good.host.hiddenDomains = {"zDom"};
+  good.host.Fail("CreateDomain", "no slot is left");
+  Load();
+  EXPECT_THAT(log.Problems(),
+              ::testing::Contains("problem /policy/domains/zDom:0 no slot is left"));
+}
+
+TEST_F(ObservedWholeLoad, TellsWhyObjectsCannotBeDefined) {
+  GoodHost good;
+  good.host.Fail("GetInvalidLabels", Nth(1), "no table");
+  Load();
+  EXPECT_THAT(log.Problems(), ::testing::Contains("problem /policy/objects:0 no table"));
 }
 
 TEST_F(ObservedWholeLoad, TellsEveryErrorThatIsWritten) {

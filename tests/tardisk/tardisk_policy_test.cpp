@@ -50,6 +50,32 @@ TEST(TardiskRulesShape, IsAbstractWithOneField) {
   EXPECT_EQ(sizeof(TardiskRules), sizeof(void*) + sizeof(std::string));
 }
 
+// A kind of rules that has but the operations that every kind must have.
+class CountedRules : public virtual TardiskRules {
+ public:
+  void AddRule(unsigned int lineNumber, const std::string& tardiskPath,
+               const std::string& policyFile, std::queue<std::string> tokens,
+               TeskAccessInterfaceImpl&) override {
+    calls.push_back(policyFile + ":" + std::to_string(lineNumber) + " of " + tardiskPath + " " +
+                    tokens.front());
+  }
+  void Set(TeskAccessInterfaceImpl&) override { calls.push_back("set"); }
+
+  std::vector<std::string> calls;
+};
+
+TEST(TardiskRulesShape, AsksAKindForItsTwoOperationsWhoeverObserves) {
+  ScriptedHost host;
+  TeskAccessInterfaceImpl access;
+  SecPolicy::PolicyObserver observer;
+  SecPolicy::Problem problem{.file = "/policy/base", .line = 3};
+  CountedRules rules;
+  rules.AddLine("/tardisks/base.tgz", Tokens({"label"}), access, problem);
+  rules.SetObserved(access, observer);
+  EXPECT_EQ(rules.calls,
+            (std::vector<std::string>{"/policy/base:3 of /tardisks/base.tgz label", "set"}));
+}
+
 TEST(TardiskExceptionRulesShape, IsAListWithAVirtualBase) {
   // A virtual base cannot be turned back statically.
   const auto canTurnBack = []<class Base>(Base* base) {

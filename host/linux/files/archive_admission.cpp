@@ -9,6 +9,7 @@
 #include <climits>
 #include <cstdint>
 #include <cstring>
+#include <limits>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
@@ -66,7 +67,7 @@ bool OnlyOwnerMayWrite(archive_entry* entry) {
 
 // The system would cut the number to 32 bits, so that 2^32 is the superuser.
 void CheckOwner(const std::string& name, archive_entry* entry) {
-  constexpr std::int64_t kNobody = static_cast<uid_t>(-1);
+  constexpr std::int64_t kNobody = std::numeric_limits<uid_t>::max();
   for (const std::int64_t number : {archive_entry_uid(entry), archive_entry_gid(entry)}) {
     if (number >= 0 && number < kNobody) continue;
     Refuse(name, StrCat("No user and no group can have the number ", number));
