@@ -68,12 +68,11 @@ TEST_F(ObservedWholeLoad, TellsWhichDomainIsMissing) {
 
 TEST_F(ObservedWholeLoad, TellsWhichFileADomainThatCannotBeMadeIsOf) {
   GoodHost good;
-  good.roots.Write("/policy/domains/zDom", "");
-  good.host.hiddenDomains = {"zDom"};
   good.host.Fail("CreateDomain", "no slot is left");
-  Load();
-  EXPECT_THAT(log.Problems(),
-              ::testing::Contains("problem /policy/domains/zDom:0 no slot is left"));
+  TeskAccessInterfaceImpl access;
+  Record([&] { SecPolicy::LoadPolicyDomains("/policy/domains", access, log); });
+  EXPECT_EQ(log.Problems(),
+            std::vector<std::string>{"problem /policy/domains/appDom:0 no slot is left"});
 }
 
 TEST_F(ObservedWholeLoad, TellsWhyObjectsCannotBeDefined) {
