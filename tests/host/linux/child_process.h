@@ -33,4 +33,8 @@ class ChildProcess {
 // Runs `body` in a process of its own and returns what Wait() returns.
 std::string RunInChild(const std::function<void()>& body);
 
+// Leaves this process room for a few more open files, however many the tests were started with.
+// Returns false when that cannot be done.
+bool LimitDescriptors();
+
 }  // namespace LinuxHostTest

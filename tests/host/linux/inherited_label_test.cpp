@@ -8,7 +8,6 @@
 #include <sched.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -18,6 +17,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "child_process.h"
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/operation/file_label.h"
 #include "label_calls.h"
@@ -170,8 +170,7 @@ TEST_F(InheritedLabel, IsCreatedAndSetAsWithoutIt) {
 
 TEST_F(InheritedLabel, IsFoundInAnyDepthWithFewDescriptors) {
   EXPECT_EQ(Run([]() -> std::string {
-              const rlimit limit = {16, 16};
-              if (setrlimit(RLIMIT_NOFILE, &limit) != 0 || chdir("tree") != 0) return "no way";
+              if (!LimitDescriptors() || chdir("tree") != 0) return "no way";
               for (int level = 0; level < 400; ++level) {
                 if (mkdir("d", 0755) != 0 || chdir("d") != 0) return std::strerror(errno);
               }

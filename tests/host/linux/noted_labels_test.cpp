@@ -9,13 +9,13 @@
 #include <sched.h>
 #include <sys/ioctl.h>
 #include <sys/mount.h>
-#include <sys/resource.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 
+#include "child_process.h"
 #include "host/linux/files/security_attribute.h"
 #include "label_calls.h"
 #include "scratch_root.h"
@@ -322,8 +322,7 @@ TEST_P(NotedLabelsTest, AppliesWithFewDescriptors) {
                 const std::string file = "tree/" + std::to_string(i) + "/file";
                 if (Give(file, 8) == "0") ++given;
               }
-              const rlimit limit = {16, 16};
-              if (setrlimit(RLIMIT_NOFILE, &limit) != 0) return "no way";
+              if (!LimitDescriptors()) return "no way";
               return Words({std::to_string(given), Apply(notes), RealLabel("tree/99/file")});
             }),
             "100 all 8");
