@@ -12,9 +12,9 @@ setup() {
 # damage SQL: changes the state behind the back of the host.
 damage() { sqlite3 "$state" "$1"; }
 
-# is_damaged HOW: the latest command ended with this, of the state or of a copy of it.
+# is_damaged HOW: the latest command ended with this, of the state, also where it has worked with a copy.
 is_damaged() {
-  [[ ${stderr##*$'\n'} == "secpolicy: "*"Unable to use the host state /run/secpolicy"*".db: it is damaged or no such thing ($1). Remove the file and run \"secpolicy boot\", which makes a new one" ]] && return
+  [[ ${stderr##*$'\n'} == "secpolicy: "*"Unable to use the host state /run/secpolicy/host.db: it is damaged or no such thing ($1). Remove the file and run \"secpolicy boot\", which makes a new one" ]] && return
   printf 'no damage (%s) in:\n%s\n' "$1" "$stderr"
   return 1
 }

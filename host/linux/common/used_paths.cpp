@@ -13,9 +13,6 @@ constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
 constexpr char kSettings[] = "/var/lib/secpolicy/config.db";
 constexpr char kSettingsVariable[] = "SECPOLICY_HOST_CONFIG";
 
-// What takes the place of the host's own, if anything. Not the environment: a program with more
-// rights than its user may not trust what it reads there, not even what it wrote itself.
-std::optional<std::string> usedState;
 std::optional<std::string> usedSettings;
 
 std::string PathIn(const char* variable, const char* otherwise) {
@@ -33,10 +30,18 @@ std::string StatePathOfHost() {
 
 }  // namespace
 
+// What takes the place of the host's own, if anything. Not the environment: a program with more
+// rights than its user may not trust what it reads there, not even what it wrote itself.
+std::optional<UsedState::Paths> UsedState::used;
+
 const std::string& StatePath() {
-  if (usedState) return *usedState;
+  if (UsedState::used) return UsedState::used->real;
   static const std::string path = StatePathOfHost();
   return path;
+}
+
+const std::string& ShownStatePath() {
+  return UsedState::used ? UsedState::used->shown : StatePath();
 }
 
 const std::string& SettingsPath() {
@@ -45,9 +50,10 @@ const std::string& SettingsPath() {
   return path;
 }
 
-UsedState::UsedState(const std::string& path) : before(std::exchange(usedState, path)) {}
+UsedState::UsedState(const std::string& path, const std::string& shownAs)
+    : before(std::exchange(used, Paths{path, shownAs})) {}
 
-UsedState::~UsedState() { usedState = before; }
+UsedState::~UsedState() { used = before; }
 
 UsedSettings::UsedSettings(const std::string& path) : before(std::exchange(usedSettings, path)) {}
 

@@ -11,6 +11,9 @@ namespace LinuxHost {
 // HostError when it names none by an absolute path.
 const std::string& StatePath();
 
+// How messages call that state: a copy by the name of what it was made of.
+const std::string& ShownStatePath();
+
 // The wanted settings: /var/lib/secpolicy/config.db, unless SECPOLICY_HOST_CONFIG names another
 // absolute path. Programs that run with more rights than their user ignore both variables.
 const std::string& SettingsPath();
@@ -19,13 +22,24 @@ const std::string& SettingsPath();
 // no variable can change that. The latest one counts. Not while other threads use the host.
 class UsedState {
  public:
-  explicit UsedState(const std::string& path);
+  explicit UsedState(const std::string& path) : UsedState(path, path) {}
+
+  // Messages call it `shownAs`.
+  UsedState(const std::string& path, const std::string& shownAs);
   UsedState(const UsedState&) = delete;
   UsedState& operator=(const UsedState&) = delete;
   ~UsedState();
 
  private:
-  const std::optional<std::string> before;
+  struct Paths {
+    std::string real;
+    std::string shown;
+  };
+  static std::optional<Paths> used;
+  friend const std::string& StatePath();
+  friend const std::string& ShownStatePath();
+
+  const std::optional<Paths> before;
 };
 
 // The same for the wanted settings.

@@ -30,7 +30,7 @@ StateCopy CopyUsedState(const std::string& to) {
   return StateCopy::kMade;
 }
 
-UsedCopy::UsedCopy(const std::string& path) : used(path) {
+UsedCopy::UsedCopy(const std::string& path, const std::string& shownAs) : used(path, shownAs) {
   const std::string& opened = HostState::Current().Database().Path();
   if (opened != path) throw HostError(EBUSY, StrCat("A load is installing its policy in ", opened));
 }

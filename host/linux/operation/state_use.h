@@ -20,12 +20,12 @@ enum class StateCopy { kMade, kMissing, kForbidden };
 // cannot be trusted or is damaged; leaves no file unless the copy was made.
 StateCopy CopyUsedState(const std::string& to);
 
-// As long as it lives, this process works with the state at `path`, which is its own, and surely
-// with no other: throws HostError when that cannot be used, or while a load runs, which keeps to
-// the state that it began with.
+// As long as it lives, this process works with the state at `path`, which is its own and which
+// messages call `shownAs`, and surely with no other: throws HostError when that cannot be used, or
+// while a load runs, which keeps to the state that it began with.
 class UsedCopy {
  public:
-  explicit UsedCopy(const std::string& path);
+  UsedCopy(const std::string& path, const std::string& shownAs);
 
  private:
   const UsedState used;

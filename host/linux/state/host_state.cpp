@@ -42,7 +42,7 @@ HostState& HostState::Known() {
   std::shared_ptr<HostState>& connection = Connection();
   if (!IsOfUsedState(connection.get())) {
     connection.reset();
-    connection = std::make_shared<HostState>(StatePath());
+    connection = std::make_shared<HostState>(StatePath(), ShownStatePath());
   }
   return *connection;
 }
@@ -55,8 +55,8 @@ HostState* HostState::Find() {
   return isMissing ? nullptr : &Current();
 }
 
-HostState::HostState(const std::string& path)
-    : StateBase(path),
+HostState::HostState(const std::string& path, const std::string& shownAs)
+    : StateBase(path, shownAs),
       worlds(Database()),
       domains(*this, worlds),
       labels(*this),

@@ -36,7 +36,8 @@ class HostState : public StateBase, public std::enable_shared_from_this<HostStat
   // look at the file system: for what is asked for each of many files.
   static HostState& Known();
 
-  explicit HostState(const std::string& path);
+  HostState(const std::string& path, const std::string& shownAs);
+  explicit HostState(const std::string& path) : HostState(path, path) {}
 
   // The directory that the state lies in.
   std::string Directory();

@@ -4,7 +4,10 @@
 
 namespace LinuxHost {
 
-StateBase::StateBase(const std::string& path) : database(path, kStateLayout) { Refresh(); }
+StateBase::StateBase(const std::string& path, const std::string& shownAs)
+    : database(path, kStateLayout, shownAs) {
+  Refresh();
+}
 
 void StateBase::Refresh() {
   if (marked && database.IsAt(seen)) return;

@@ -12,7 +12,7 @@ namespace LinuxHost {
 class StateBase {
  public:
   // Opens the state at `path`, and creates it with its first rows where there is none.
-  explicit StateBase(const std::string& path);
+  StateBase(const std::string& path, const std::string& shownAs);
   StateBase(const StateBase&) = delete;
   StateBase& operator=(const StateBase&) = delete;
 

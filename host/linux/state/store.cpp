@@ -132,8 +132,8 @@ std::string Rows::Text(int column) const {
           static_cast<std::size_t>(sqlite3_column_bytes(statement, column))};
 }
 
-Store::Store(const std::string& path, const StoreLayout& wanted)
-    : layout(wanted), file(path), forks(ForksUntilNow()) {
+Store::Store(const std::string& path, const StoreLayout& wanted, const std::string& shownAs)
+    : layout(wanted), file(path), shown(shownAs), forks(ForksUntilNow()) {
   PreparePrivateFile(file, layout.purpose);
   const auto slash = file.rfind('/');
   directory = slash == 0 ? "/" : file.substr(0, slash);
@@ -182,7 +182,7 @@ void Store::Open() {
   sqlite3_extended_result_codes(database, 1);
   sqlite3_busy_handler(database, WaitForOthers, nullptr);
   if (sqlite3_db_readonly(database, "main") == 1) {
-    throw HostError(EROFS, StrCat("Unable to use the ", layout.purpose, " ", file,
+    throw HostError(EROFS, StrCat("Unable to use the ", layout.purpose, " ", shown,
                                   ": it cannot be written. Make it writable, or choose another "
                                   "place"));
   }
@@ -257,7 +257,7 @@ void Store::SwitchToWriteAheadLog() {
   if (result != SQLITE_ROW) Fail(result);
   if (switched) return;
   throw HostError(ENOTSUP,
-                  StrCat("Unable to use the ", layout.purpose, " ", file,
+                  StrCat("Unable to use the ", layout.purpose, " ", shown,
                          ": it lies on a file system without shared memory. ", layout.remedy));
 }
 
@@ -314,7 +314,7 @@ void Store::RequireUsable() const {
   }
   if (openTransactions == 0 || sqlite3_get_autocommit(database) == 0) return;
   throw HostError(EIO,
-                  StrCat("Unable to use the ", layout.purpose, " ", file,
+                  StrCat("Unable to use the ", layout.purpose, " ", shown,
                          ": a failure has undone what was to be installed as a whole. Mend its "
                          "cause, and run it again"));
 }
@@ -369,12 +369,12 @@ void Store::Fail(int result) const {
   const char* reason = database != nullptr ? sqlite3_errmsg(database) : sqlite3_errstr(result);
   const int systemError = database != nullptr ? sqlite3_system_errno(database) : 0;
   if (systemError == EMFILE || systemError == ENFILE) {
-    throw HostError(systemError, StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
+    throw HostError(systemError, StrCat("Unable to use the ", layout.purpose, " ", shown, ": ",
                                         std::strerror(systemError)));
   }
   if (IsDamaged(result)) TellDamage(reason);
-  throw HostError(ErrorNumber(result), StrCat("Unable to use the ", layout.purpose, " ", file, ": ",
-                                              reason, RemedyFor(result)));
+  throw HostError(ErrorNumber(result), StrCat("Unable to use the ", layout.purpose, " ", shown,
+                                              ": ", reason, RemedyFor(result)));
 }
 
 void Store::TellDamage(const char* reason) const {
@@ -382,7 +382,7 @@ void Store::TellDamage(const char* reason) const {
 }
 
 void Store::Refuse(int code, const std::string& reason) const {
-  throw UnusableContent(code, StrCat("Unable to use the ", layout.purpose, " ", file, ": it ",
+  throw UnusableContent(code, StrCat("Unable to use the ", layout.purpose, " ", shown, ": it ",
                                      reason, ". ", layout.remedy));
 }
 

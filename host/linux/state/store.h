@@ -76,9 +76,11 @@ class Store {
   // Identifies what has been committed so far, by anyone.
   using CommitMark = std::array<std::uint32_t, 12>;
 
-  // Opens the database at the absolute `path`; creates it (mode 0600) and its directory (0700) as
-  // needed. Refuses what is not `layout`, what another user owns or may write, and links.
-  Store(const std::string& path, const StoreLayout& layout);
+  // Opens the database at the absolute `path`, which messages call `shownAs`; creates it (mode
+  // 0600) and its directory (0700) as needed. Refuses what is not `layout`, what another user owns
+  // or may write, and links.
+  Store(const std::string& path, const StoreLayout& layout, const std::string& shownAs);
+  Store(const std::string& path, const StoreLayout& wanted) : Store(path, wanted, path) {}
   Store(const Store&) = delete;
   Store& operator=(const Store&) = delete;
   ~Store();
@@ -166,6 +168,7 @@ class Store {
 
   const StoreLayout& layout;
   std::string file;
+  std::string shown;  // what messages call it
   std::string directory;
   unsigned int forks;  // when it was opened
   dev_t device = 0;

@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <string>
 
 #include "host/linux/files/security_attribute.h"
@@ -76,7 +77,8 @@ TEST(StateUse, RefusesACopyWhileALoadKeepsToItsState) {
   const StateDirectory directory;
   LinuxHost::PolicyTransaction load;
   load.BeginLoad({.directory = "/policy", .domains = {}});
-  EXPECT_EQ(MessageOf([&] { LinuxHost::UsedCopy copy(directory.Path() + "/copy.db"); }),
+  const std::string copy = directory.Path() + "/copy.db";
+  EXPECT_EQ(MessageOf([&] { LinuxHost::UsedCopy used(copy, copy); }),
             "A load is installing its policy in " + directory.Database());
   EXPECT_EQ(LinuxHost::StatePath(), directory.Database());
 }
@@ -89,8 +91,21 @@ TEST(StateUse, CopiesWhatIsThere) {
   Fill("one", "user.zorvan.security", 0);
   EXPECT_FALSE(LinuxHost::IsStateMissing());
   EXPECT_EQ(LinuxHost::CopyUsedState(copy), LinuxHost::StateCopy::kMade);
-  const LinuxHost::UsedCopy used(copy);
+  const LinuxHost::UsedCopy used(copy, directory.Database());
   EXPECT_NE(HostState::Current().Domains().Find("one"), nullptr);
+}
+
+TEST(StateUse, NamesACopyAsWhatItWasMadeOf) {
+  const StateDirectory directory;
+  const std::string copy = directory.Path() + "/copy.db";
+  Fill("one", "user.zorvan.security", 0);
+  ASSERT_EQ(LinuxHost::CopyUsedState(copy), LinuxHost::StateCopy::kMade);
+  std::filesystem::resize_file(copy, 8192);
+  EXPECT_EQ(LinuxHost::ShownStatePath(), directory.Database());
+  const std::string told = MessageOf([&] { LinuxHost::UsedCopy used(copy, "/the/original.db"); });
+  EXPECT_TRUE(told.starts_with("Unable to use the host state /the/original.db: it is damaged"))
+      << told;
+  EXPECT_EQ(LinuxHost::ShownStatePath(), directory.Database());
 }
 
 }  // namespace

@@ -63,7 +63,7 @@ std::string PartnerDirOf(const std::string& dir) {
 
 WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir) {
   const ScratchDirectory scratch;
-  const LinuxHost::UsedCopy state(scratch.File("host.db"));
+  const LinuxHost::UsedCopy state(scratch.File("host.db"), scratch.File("host.db"));
   TeskAccessInterfaceImpl access;
   WrittenPolicy written;
   const auto step = [&](auto part) { written.isClean &= Try(part); };

@@ -84,7 +84,7 @@ LoadDryRun::LoadDryRun(const LoadRequest& load) {
     const LinuxHost::DroppedLog dropped;
     const LinuxHost::NotedLabels notes(LinuxHost::LabelNotes::kDryRun, scratch.Path());
     const LinuxHost::CopiedSettings settings(scratch.File("config.db"));
-    const LinuxHost::UsedState state(StateAfter());
+    const LinuxHost::UsedState state(StateAfter(), LinuxHost::ShownStatePath());
     LoadRequest dryRun = load;
     dryRun.dryRun = true;
     std::ofstream errorFile(scratch.File("errors"), std::ios::binary);

@@ -14,7 +14,7 @@ namespace {
 using SecPolicy::TeskAccessInterfaceImpl;
 
 Policy::InstalledPolicy ReadState(const std::string& path) {
-  const LinuxHost::UsedCopy state(path);
+  const LinuxHost::UsedCopy state(path, LinuxHost::ShownStatePath());
   TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }

@@ -32,12 +32,6 @@ std::optional<LinuxHost::StateCopy> CopyUnless(bool fresh, const std::string& to
   return LinuxHost::CopyUsedState(to);
 }
 
-// The message as it is about the original.
-std::string About(const std::string& path, const std::string& copy, std::string message) {
-  const std::size_t found = message.find(copy);
-  return found == std::string::npos ? message : message.replace(found, copy.size(), path);
-}
-
 }  // namespace
 
 ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory()) {}
@@ -48,7 +42,9 @@ ScratchDirectory::~ScratchDirectory() {
 }
 
 ScratchState::ScratchState(bool fresh)
-    : copy(CopyUnless(fresh, directory.File(kState))), used(directory.File(kState)) {}
+    : copy(CopyUnless(fresh, directory.File(kState))),
+      used(directory.File(kState),
+           IsCopy() ? LinuxHost::ShownStatePath() : directory.File(kState)) {}
 
 std::string ScratchState::WhyNoCopy() const {
   if (copy == LinuxHost::StateCopy::kMissing) return "nothing is installed";
@@ -60,13 +56,9 @@ Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf w
   const ScratchDirectory scratch;
   const std::string copy = scratch.File("host.db");
   LinuxHost::CopyDatabase(path, what, copy);
-  try {
-    const LinuxHost::UsedCopy used(copy);
-    SecPolicy::TeskAccessInterfaceImpl access;
-    return ReadInstalledPolicy(access);
-  } catch (const Braxo::Lib::BraxoException& problem) {
-    throw std::runtime_error(About(path, copy, problem.what()));
-  }
+  const LinuxHost::UsedCopy used(copy, path);
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return ReadInstalledPolicy(access);
 }
 
 }  // namespace SecPolicyCli

@@ -52,8 +52,7 @@ class ScratchState {
 };
 
 // Reads the state at `path` from a copy, since even reading leaves traces beside a state. Throws
-// what the host throws when it cannot be copied, and std::runtime_error when the copy cannot be
-// used.
+// Braxo::Lib::BraxoException when it cannot be copied or used.
 Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
 
 }  // namespace SecPolicyCli
