@@ -22,20 +22,6 @@ using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 constexpr char kAttribute[] = "zorvan.security";
 constexpr std::uint32_t kNoSuchLabel = 1;
 
-// Links, sockets and entries of unknown type are left alone.
-bool IsLabelled(unsigned char entryType) {
-  switch (entryType) {
-    case DT_FIFO:
-    case DT_CHR:
-    case DT_DIR:
-    case DT_BLK:
-    case DT_REG:
-      return true;
-    default:
-      return false;
-  }
-}
-
 // A directory of a tree of which some entries are labelled.
 struct LabelledDirectory {
   std::string path;
@@ -51,6 +37,19 @@ LabelledDirectory LabelAndOpen(const std::string& dir, const std::string& label,
 }
 
 }  // namespace
+
+bool IsLabelled(unsigned char entryType) {
+  switch (entryType) {
+    case DT_FIFO:
+    case DT_CHR:
+    case DT_DIR:
+    case DT_BLK:
+    case DT_REG:
+      return true;
+    default:
+      return false;
+  }
+}
 
 void SetFileLabel(const std::string& path, const std::string& label,
                   TeskAccessInterfaceImpl& access) {

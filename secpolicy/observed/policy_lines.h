@@ -63,6 +63,10 @@ void ReadFileLabels(const std::string& file, TeskAccessInterfaceImpl& access,
 // Throws BraxoException, as the installing of a "-r" rule does, unless `permissions` are well.
 void CheckPermissions(const std::string& permissions);
 
+// Whether an entry of a labelled directory gets a label: links, sockets and entries of unknown type
+// (DT_UNKNOWN) are left alone.
+bool IsLabelled(unsigned char entryType);
+
 // SetFileLabel and SetDirLabelRecursive. `error` becomes the error number when a file cannot be
 // given the label.
 void SetFileLabel(const std::string& path, const std::string& label,

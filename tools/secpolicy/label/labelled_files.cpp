@@ -4,23 +4,9 @@
 
 #include <cstring>
 
+#include "secpolicy/observed/policy_lines.h"
+
 namespace SecPolicyCli {
-namespace {
-
-bool IsLabelled(unsigned char entryType) {
-  switch (entryType) {
-    case DT_FIFO:
-    case DT_CHR:
-    case DT_DIR:
-    case DT_BLK:
-    case DT_REG:
-      return true;
-    default:
-      return false;
-  }
-}
-
-}  // namespace
 
 void WalkLabelledFiles(const std::string& path, bool wholeTree, const OnLabelledFile& visit,
                        const OnUnreachable& fail) {
@@ -28,7 +14,7 @@ void WalkLabelledFiles(const std::string& path, bool wholeTree, const OnLabelled
       path, path,
       [&](const LinuxHost::WalkedFile& file) {
         const bool isStart = file.depth == 0;
-        if (!isStart && !IsLabelled(file.type)) return false;
+        if (!isStart && !SecPolicy::IsLabelled(file.type)) return false;
         visit(file);
         return isStart ? wholeTree : file.type == DT_DIR;
       },

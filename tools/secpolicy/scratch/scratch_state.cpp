@@ -3,11 +3,9 @@
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
-#include <stdexcept>
 #include <system_error>
 #include <vector>
 
-#include "braxo/lib/exception.h"
 #include "host/linux/common/host_error.h"
 
 namespace SecPolicyCli {
