@@ -137,8 +137,10 @@ void ArchiveAdmission::CheckType(const std::string& name, archive_entry* entry) 
   switch (archive_entry_filetype(entry)) {
     case AE_IFREG:
     case AE_IFDIR:
-    case AE_IFLNK:
     case AE_IFIFO:
+      return;
+    case AE_IFLNK:
+      if (archive_entry_symlink(entry) == nullptr) Refuse(name, "It is a symbolic link to nothing");
       return;
     default:
       Refuse(name, "Devices and sockets are made by the running system");

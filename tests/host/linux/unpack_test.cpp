@@ -302,6 +302,17 @@ TEST_F(UnpackTardisks, WritesNothingThroughHardLinkToLink) {
   EXPECT_EQ(Unpack(image), "unpacked");
 }
 
+// What is there already at its place is compared with it.
+TEST_F(UnpackTardisks, RefusesSymbolicLinkToNothing) {
+  std::filesystem::create_symlink("target", In("there"));
+  for (const char* name : {"missing", "there"}) {
+    TarImage image;
+    image.SymbolicLink(name, "");
+    EXPECT_EQ(Unpack(image), "Unable to unpack tardisk disk.tgz: " + std::string(name) +
+                                 ": It is a symbolic link to nothing");
+  }
+}
+
 TEST_F(UnpackTardisks, RefusesCharacterDevice) {
   TarImage image;
   image.CharacterDevice("memory");
