@@ -18,8 +18,8 @@ _secpolicy_tardisks() {
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display why who-can graph diff save history rollback label settings'
-  local questions='read write exec call use access enter create create-socket pass'
+  local verbs='boot check load load-early restore status display why who-can words graph diff save history rollback label settings'
+  local questions='read write exec list remove truncate make make-socket call use access enter create create-socket pass'
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
@@ -43,14 +43,14 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
-  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff || $verb == load || $verb == boot) && $previous == --format ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == words || $verb == status || $verb == diff || $verb == load || $verb == boot) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
   elif [[ $verb == graph && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'dot svg' -- "$current")
   elif [[ $verb == graph && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--domain --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
-    mapfile -t COMPREPLY < <(compgen -W 'byte-order-mark carriage-return contradicting-rule duplicate-object
+    mapfile -t COMPREPLY < <(compgen -W 'byte-order-mark cannot-start carriage-return contradicting-rule duplicate-object
       duplicate-rule editor-copy installed-only long-line missing-path nul-byte relative-path skipped-entry
       star-in-path tab two-labels unreachable-domain untyped-entries unused-object' -- "$current")
   elif [[ $verb == check && $current == -* ]]; then
@@ -65,7 +65,7 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--keep --timing --root --verbose --help -v -h' -- "$current")
   elif [[ $verb == load && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--keep --timing --plan --all-or-nothing --format --root --verbose --help -v -h' -- "$current")
-  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == status || $verb == diff) && $current == -* ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == words || $verb == status || $verb == diff) && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--format --root --help -h' -- "$current")
   elif [[ $kind == relabel && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--dry-run --policy --root --help -n -h' -- "$current")
@@ -82,12 +82,14 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ ($verb == why && $positional -eq 1) || ($verb == who-can && $positional -eq 0) ]]; then
     mapfile -t COMPREPLY < <(compgen -W "$questions" -- "$current")
-  elif [[ ($verb == why || $verb == who-can) && $previous == @(read|write|exec) ]]; then
+  elif [[ ($verb == why || $verb == who-can) && $previous == @(read|write|exec|list|remove|truncate|make|make-socket) ]]; then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == diff ]] && ((positional < 2)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -W "installed $(_secpolicy_saved "$root")" -- "$current"; compgen -d -- "$current")
+  elif [[ $verb == words ]] && ((positional == 0)); then
+    mapfile -t COMPREPLY < <(compgen -W 'objects accesses capabilities transitions files checks calls sockets' -- "$current")
   elif [[ $verb == rollback ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_saved "$root")" -- "$current")
   elif [[ $verb == label && -z $kind ]]; then

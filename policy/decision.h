@@ -12,12 +12,24 @@
 // there is to know of a file is told with the question.
 namespace Policy {
 
+// What may be done with a file that is there. The first three are each a permission, too.
+enum class FileAccess { kRead, kWrite, kExecute, kList, kRemove, kTruncate };
+
 // Whether something may be done with a file.
 struct FileQuestion {
-  Permission permission = Permission::kRead;
-  std::vector<std::string> paths;  // as it is written and, where that is another, as it resolves
-  std::string label;               // empty when it has none
-  bool labelIsBuiltIn = false;     // such a label says nothing about what the file is for
+  FileAccess access = FileAccess::kRead;
+  std::string path;             // as it resolves; as it is written where there is nothing
+  std::string label;            // empty when it has none
+  bool labelIsBuiltIn = false;  // such a label says nothing about what the file is for
+};
+
+// Whether a file or a socket may be made at a path.
+struct CreationQuestion {
+  RuleKind kind = RuleKind::kFileCreation;  // or kUnixSocketCreation
+  std::string what;                         // "regular", "stream"
+  std::string path;
+  std::string directoryLabel;  // of the directory that it is made in; empty when it has none
+  bool labelIsBuiltIn = false;
 };
 
 // Whether a domain may be entered.
@@ -38,7 +50,8 @@ struct WordsQuestion {
   std::array<std::string, kMaxRuleWords> words = {};
 };
 
-using Question = std::variant<FileQuestion, EntryQuestion, ParameterQuestion, WordsQuestion>;
+using Question =
+    std::variant<FileQuestion, CreationQuestion, EntryQuestion, ParameterQuestion, WordsQuestion>;
 
 // A rule that has a say in a question.
 struct Vote {
@@ -51,14 +64,16 @@ struct Vote {
 struct Decision {
   bool granted = false;       // by the rules alone
   bool refuses = true;        // false where the level lets everything pass
+  bool isOpen = false;        // granted by no rule: none grants a value of the check, or revokes it
   std::vector<Vote> votes;    // those that decided
   std::vector<Rule> missing;  // of which each would grant what no rule speaks of
 
   bool IsAllowed() const { return granted || !refuses; }
 };
 
-// Whether the domain may do what is asked. What no rule speaks of is refused, and of rules that
-// disagree the one that refuses counts. Throws BraxoException for a number that is none.
+// Whether the domain may do what is asked. What no rule speaks of is refused, but for a parameter
+// check of which the domain is granted no value; of rules that disagree the one that refuses
+// counts. Throws BraxoException for a number that is none.
 Decision Decide(const Question& question, const InstalledDomain& domain);
 
 // The rules of one kind.

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 namespace Policy {
 
@@ -14,6 +15,12 @@ struct ParameterRange {
     return first <= other.last && other.first <= last;
   }
 };
+
+// The check whose value is a mask: bits that may be set together. All others are about a number.
+inline constexpr std::string_view kMaskCheck = "clone_flags";
+
+// The bits that it is about; the lowest eight are the signal of a child.
+inline constexpr std::uint64_t kMaskCheckBits = ~std::uint64_t{0xff};
 
 // Reads the range from the words of a rule: unsigned numbers, decimal or hexadecimal with "0x".
 // Without `lastWord` the range is one value. Throws BraxoException for anything else.

@@ -54,7 +54,7 @@ warns() {
 }
 
 @test "a problem is shown with its line, a mark and a hint" {
-  printf '%s\n' '-s read grnt' >"$policy/domains/appDom"
+  printf '%s\n' '-s read grnt' '-s @start grant' >"$policy/domains/appDom"
   secpolicy check
   exits 1
   [[ $output == *"$shown/domains/appDom:1:9: error: invalid keyword grnt [grant-word]
@@ -630,4 +630,16 @@ END
   complete_line secpolicy check --disable ""
   diff <(echo "$warnings") <(printf '%s\n' "${COMPREPLY[@]}")
   diff <(echo "$warnings") <(sed -n 's/.*warning:(\(.*\)).*/\1/p' "$SOURCE/completions/_secpolicy" | tr ' ' '\n')
+}
+
+@test "cannot-start, of a domain with rules that lacks a call of @start" {
+  printf '%s\n' '-s @start grant' '-s mmap revoke' >"$policy/domains/appDom"
+  : >"$policy/domains/ioFilterDom"
+  secpolicy check
+  warns "$shown/domains/appDom: warning: no dynamically linked program can start in the domain 'appDom': it may not make 1 system call of @start [cannot-start]"
+  shows "    hint: write: -s @start grant"
+  [[ $output != *ioFilterDom* ]]
+  sed -i /mmap/d "$policy/domains/appDom"
+  secpolicy check
+  [[ $output != *cannot-start* ]]
 }

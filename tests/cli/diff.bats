@@ -50,8 +50,7 @@ secpolicy: diff: the same" ]]
 - -a filterProgram execute grant
 - -r /usr/lib/io-filters/cache rx
 - -r /var/cache/io-filters rw
-- -s read grant
-- -s write grant
+- -s @start grant
 @@ domain plugin-disk (only in /new)
 + level enforcing
 @@ domain sshDom

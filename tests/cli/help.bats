@@ -5,7 +5,7 @@ load helper
 @test "--help shows every verb and the exit status" {
   run --separate-stderr "$SECPOLICY" --help
   exits 0
-  for verb in boot check load load-early restore status display why who-can graph diff save history rollback label settings; do
+  for verb in boot check load load-early restore status display why who-can words graph diff save history rollback label settings; do
     [[ $output == *"  $verb "* ]]
     [[ $output == *"secpolicy --root ./r $verb"* ]]
   done
@@ -13,7 +13,7 @@ load helper
 }
 
 @test "--help of every verb has an example" {
-  for verb in boot check load load-early restore status display why who-can graph diff save history rollback label settings; do
+  for verb in boot check load load-early restore status display why who-can words graph diff save history rollback label settings; do
     run --separate-stderr "$SECPOLICY" "$verb" --help
     exits 0
     [[ $output == *"Example"*"secpolicy "*"$verb"* ]]
@@ -75,7 +75,9 @@ load helper
   complete_line secpolicy why sshDom c
   [[ ${COMPREPLY[*]} == "call create create-socket" ]]
   complete_line secpolicy who-can r
-  [[ ${COMPREPLY[*]} == read ]]
+  [[ ${COMPREPLY[*]} == "read remove" ]]
+  complete_line secpolicy words ca
+  [[ ${COMPREPLY[*]} == "capabilities calls" ]]
 }
 
 @test "every verb is in the manual page and in both completions" {

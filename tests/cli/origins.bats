@@ -38,7 +38,7 @@ END
 
 @test "a partner domain and an early domain have theirs" {
   boot
-  comes_from plugin-cache "/etc/zorvan/secpolicy/domains/plugins/cache:$(line_of domains/plugins/cache '-s read'): -s read grant"
+  comes_from plugin-cache "/etc/zorvan/secpolicy/domains/plugins/cache:$(line_of domains/plugins/cache '-s @start'): -s @start grant"
   comes_from bootDom "/etc/zorvan/secpolicy/early/domains/bootDom:$(line_of early/domains/bootDom '-s init_module'): -s init_module grant"
 }
 
@@ -66,7 +66,7 @@ END
   rm "$root"/other/fileLabels/*
   "$SECPOLICY" --root "$root" load /other 2>/dev/null
   comes_from sshDom "/other/domains/sshDom:$(line_of domains/sshDom '-s listen'): -s listen grant"
-  comes_from plugin-cache "/etc/zorvan/secpolicy/domains/plugins/cache:$(line_of domains/plugins/cache '-s read'): -s read grant"
+  comes_from plugin-cache "/etc/zorvan/secpolicy/domains/plugins/cache:$(line_of domains/plugins/cache '-s @start'): -s @start grant"
 }
 
 @test "a rule about a link comes from its line under both names" {

@@ -73,7 +73,7 @@ globalVMDom|create vmDisk vmDisk fifo
 appDom|create-socket vmSocket dgram
 appDom|create-socket vmSocket stream
 appDom|pass bind_port 80
-appDom|pass set_uid 0x10
+appDom|pass socket_family 0x10
 END
 }
 
@@ -205,7 +205,7 @@ END
   done <<'END'
 sshdom read /etc|there is no domain 'sshdom'; did you mean 'sshDom'?
 sshDom raed /etc|there is no question 'raed'; did you mean 'read'?
-sshDom fly|there is no question 'fly'; there are read, write, exec, call, use, access, enter, create, create-socket, pass
+sshDom fly|there is no question 'fly'; there are read, write, exec, list, remove, truncate, make, make-socket, call, use, access, enter, create, create-socket, pass
 sshDom read etc|'etc' is no path from the root on: it begins with a slash
 sshDom read /a /b|write: read PATH
 sshDom create vmDisk regular|write: create OBJECT NEWOBJECT KIND
@@ -254,4 +254,66 @@ END
   boot
   secpolicy why appDom create-socket $'tab\tbed' stream
   exits 0
+}
+
+@test "what lies in a directory is made and removed by its own path" {
+  boot
+  secpolicy why sshDom make /etc/ssh/new regular
+  answers 1 "no: sshDom may not make /etc/ssh/new regular" \
+    "$(at domains/sshDom '-r /etc/ssh')-r /etc/ssh r" \
+    "  instead: -r /etc/ssh rw" \
+    "label of the directory: hostConfig" \
+    "$(at fileLabels/base '/etc/[*]')/etc/* hostConfig"
+  secpolicy why globalVMDom make /var/lib/vms/link symlink
+  answers 1 "no: globalVMDom may not make /var/lib/vms/link symlink" \
+    "$(at domains/globalVMDom '-f vmDisk vmDisk symlink')-f vmDisk vmDisk symlink revoke" \
+    "  instead: -f vmDisk vmDisk symlink grant" \
+    "label of the directory: vmDisk" \
+    "$(at fileLabels/base '/var/lib/vms/[*]')/var/lib/vms/* vmDisk"
+  secpolicy why monitorDom make /nowhere/x fifo --format json
+  exits 1
+  fits_schema why
+  [[ $(jq -r '.question.directory.exists' <<<"$output") == false ]]
+  secpolicy why monitorDom make-socket /opt/monitor/spool/s stream
+  exits 0
+  secpolicy why globalVMDom remove /var/lib/vms/demo/disk
+  exits 1
+}
+
+@test "a link's own path has no say" {
+  boot
+  ln -s /var/lib "$root/opt/elsewhere"
+  printf '%s\n' '-r /opt rw' '-r /var/lib r' >>"$policy/domains/appDom"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  secpolicy why appDom write /opt/elsewhere
+  exits 1
+  shows "  instead: -r /var/lib rw"
+  shows "file: leads to /var/lib"
+}
+
+@test "a check of which no value is granted passes what none revokes" {
+  boot
+  secpolicy why appDom pass bind_port 8080
+  answers 0 "yes: appDom may pass bind_port 8080" \
+    "no rule of appDom grants a value of bind_port, so all pass that none revokes"
+  secpolicy why appDom pass bind_port 80
+  exits 1
+  secpolicy why appDom pass set_uid 0 --format json
+  exits 0
+  fits_schema why
+  [[ $(jq .open <<<"$output") == true ]]
+  secpolicy who-can pass bind_port 8080
+  exits 0
+  shows "appDom: no rule refuses it"
+}
+
+@test "a set of system calls speaks for its members" {
+  boot
+  secpolicy why appDom call mmap
+  answers 0 "yes: appDom may call mmap" "$(at domains/appDom '-s @start')-s @start grant"
+  echo "-s mmap revoke" >>"$policy/domains/appDom"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  secpolicy why appDom call mmap
+  exits 1
+  shows "  instead: -s mmap grant"
 }

@@ -40,12 +40,13 @@ ODD_OBJECTS = ["a" * 256, "b\x1b[1m", "c\tc", "\u202ed"]
 DOMAINS = ["hostDom", "oneDom", "twoDom", "d\u00e9j\u00e0Dom", "-r", "x" * 63]
 ODD_DOMAINS = ["y" * 64, "left~", "two words", ".hidden", "esc\x1bDom"]
 CAPABILITIES = ["cap_chown", "cap_net_raw", "cap_sys_boot", "cap_kill"]
-CHECKS = ["bind_port", "set_uid", "kill_signal"]
+CHECKS = ["bind_port", "set_uid", "kill_signal", "clone_flags"]
 ACCESSES = ["read", "write", "execute", "list", "remove", "truncate"]
 TRANSITIONS = ["exec", "tardisk_exec", "enter"]
 FILE_KINDS = ["regular", "directory", "symlink", "fifo", "char_device", "block_device"]
 SOCKET_KINDS = ["stream", "dgram", "seqpacket"]
 CALLS = ["read", "openat", "ptrace", "reboot", "mount"]
+CALL_SETS = {"@start": ["read", "openat"], "@file": ["openat"], "@privileged": ["reboot"]}  # their members in CALLS
 BUILT_IN = ["unlabeled", "tardiskDefault"]
 
 DIRECTORIES = ["srv", "srv/b", "srv/b/deep", "srv/f\u00fcr", "opt", "opt/-x"]
@@ -58,7 +59,7 @@ MALFORMED = ["-x y", "-a", "-a tool read", "-a tool read Grant", "-s read grant 
              "-a nothing read grant", "-c cap_none grant", "-d tool noDom exec grant", "-r", "-r /srv rr",
              "-r /srv rwz", "-r /srv r w", "-s\tread grant", "-p bind_port ten grant", "-p bind_port 9 1 grant",
              "-p bind_port 5000000000 grant", "grant", "\u202e-s read grant", "-s read grant\r", "-E tool appDom",
-             "-p bind_port -1 grant", "-u tool tcp grant", "-f tool data door grant"]
+             "-p bind_port -1 grant", "-p clone_flags 1 2 grant", "-u tool tcp grant", "-f tool data door grant"]
 HARMLESS = ["", "   ", "# a comment", "-s read grant # why", "  -s   read   grant  ", "-s openat revoke"]
 
 
@@ -166,14 +167,16 @@ class Tree:
             words = [self.label(), self.label(), chance.choice(FILE_KINDS)]
         elif kind == "p":
             low, high = sorted([number(chance), number(chance)], key=lambda text: int(text, 0))
-            words = [chance.choice(CHECKS), low] + ([high] if chance.random() < 0.5 else [])
+            words = [chance.choice(CHECKS), low]
+            if words[0] != "clone_flags" and chance.random() < 0.5:
+                words.append(high)
             # What contradicts itself is a mistake; good policies grant.
             return " ".join(["-p"] + words + ["grant" if self.is_good else grant(chance)])
         elif kind == "r":
             letters = "".join(chance.sample("rwx", chance.randint(0, 3)))
             return ("-r " + some_path(chance).replace("\x1b[1m", "") + " " + letters).rstrip()
         elif kind == "s":
-            words = [chance.choice(CALLS)]
+            words = [chance.choice(CALLS + list(CALL_SETS))]
         else:
             words = [self.label(), chance.choice(SOCKET_KINDS)]
         return " ".join(["-" + kind] + words + [grant(chance)])
@@ -313,18 +316,43 @@ def covers(rule_path, path):
     return rule_path in (path, "/") or path.startswith(rule_path.rstrip("/") + "/")
 
 
+PERMISSIONS = {"read": "r", "write": "w", "exec": "x", "list": "r", "remove": "w", "truncate": "w"}
+
+
+def path_votes(domain, letter, path):
+    around = [rule for rule in domain["rules"] if rule["keyword"] == "-r" and covers(rule["words"][0], path)]
+    if not around:
+        return []
+    nearest = max(around, key=lambda rule: len(rule["words"][0].encode()))
+    return [letter in nearest["words"][1]]
+
+
+def creation_votes(host, shown, domain, path, kind, keyword):
+    path = path.rstrip("/") or "/"
+    directory = os.path.dirname(path)
+    real = resolve(host, directory)
+    votes = path_votes(domain, "w", (real or directory).rstrip("/") + "/" + os.path.basename(path))
+    if kind.endswith("_device"):
+        votes = [vote for vote in votes if not vote]
+    if not real:
+        return votes
+    label = label_of(host, shown, real)
+    by_label = [rule["grant"] for rule in domain["rules"]
+                if rule["keyword"] == keyword and rule["words"][0] == label and rule["words"][-1] == kind]
+    return votes + ([any(by_label)] if by_label else [])
+
+
+def label_of(host, shown, real):
+    return label_names(shown).get(host.labels()[os.stat(host.path(real[1:])).st_ino][1])
+
+
 def file_votes(host, shown, domain, action, path):
     path = path.rstrip("/") or "/"
     real = resolve(host, path)
-    votes = []
-    for seen in dict.fromkeys([path] + ([real] if real else [])):
-        around = [rule for rule in domain["rules"] if rule["keyword"] == "-r" and covers(rule["words"][0], seen)]
-        if around:
-            nearest = max(around, key=lambda rule: len(rule["words"][0].encode()))
-            votes.append({"read": "r", "write": "w", "exec": "x"}[action] in nearest["words"][1])
+    votes = path_votes(domain, PERMISSIONS[action], real or path)
     if not real:
         return votes
-    label = label_names(shown).get(host.labels()[os.stat(host.path(real[1:])).st_ino][1])
+    label = label_of(host, shown, real)
     kind = "execute" if action == "exec" else action
     for rule in domain["rules"]:
         if rule["keyword"] == "-a" and rule["words"] == [label, kind]:
@@ -367,8 +395,13 @@ def model(host, shown, domain, question):
     action, words = question[0], list(question[1:])
     keyword = {"call": "-s", "use": "-c", "access": "-a", "create": "-f", "create-socket": "-u"}.get(action)
     rules = domain["rules"]
-    if action in ("read", "write", "exec"):
+    if action in PERMISSIONS:
         votes = file_votes(host, shown, domain, action, words[0])
+    elif action in ("make", "make-socket"):
+        votes = creation_votes(host, shown, domain, *words, {"make": "-f", "make-socket": "-u"}[action])
+    elif action == "call":
+        votes = [rule["grant"] for rule in rules
+                 if rule["keyword"] == "-s" and words[0] in CALL_SETS.get(rule["words"][0], rule["words"])]
     elif action == "enter":
         votes = [rule["grant"] for rule in rules if rule["keyword"] == "-d" and rule["words"][1] == words[0]]
         return any(votes)
@@ -376,7 +409,16 @@ def model(host, shown, domain, question):
         asked = int(words[1], 0)
         ranges = [(rule, [int(word, 0) for word in rule["words"][1:]]) for rule in rules
                   if rule["keyword"] == "-p" and rule["words"][0] == words[0]]
+        if words[0] == "clone_flags":
+            asked &= ~0xff
+            bad = any(ends[0] & asked for rule, ends in ranges if not rule["grant"])
+            union = 0
+            for rule, ends in ranges:
+                union |= ends[0] if rule["grant"] else 0
+            return not bad and (not any(rule["grant"] for rule, _ in ranges) or not asked & ~union)
         votes = [rule["grant"] for rule, ends in ranges if ends[0] <= asked <= ends[-1]]
+        if not votes:
+            return not any(rule["grant"] for rule, _ in ranges)
     else:
         votes = [rule["grant"] for rule in rules if rule["keyword"] == keyword and rule["words"] == words]
     return bool(votes) and all(votes)
@@ -384,11 +426,14 @@ def model(host, shown, domain, question):
 
 def some_question(chance, shown):
     objects = sorted(objects_of(shown))
-    action = chance.choice(["read", "write", "exec"] * 3 + ["call", "use", "access", "enter", "create",
-                                                           "create-socket", "pass"])
-    if action in ("read", "write", "exec"):
-        return action, chance.choice(["/" + path for path in DIRECTORIES + FILES + list(LINKS)] +
-                                     ["/srv/new", "/nope", "/", "/srv/"])
+    action = chance.choice(["read", "write", "exec", "list", "remove", "truncate", "make", "make-socket"] * 2 +
+                           ["call", "use", "access", "enter", "create", "create-socket", "pass"])
+    path = chance.choice(["/" + path for path in DIRECTORIES + FILES + list(LINKS)] +
+                         ["/srv/new", "/nope", "/", "/srv/"])
+    if action in PERMISSIONS:
+        return action, path
+    if action in ("make", "make-socket"):
+        return action, path, chance.choice(FILE_KINDS if action == "make" else SOCKET_KINDS)
     words = {
         "call": [CALLS], "use": [CAPABILITIES], "access": [objects, ACCESSES],
         "enter": [sorted(domains_of(shown))], "create": [objects, objects, FILE_KINDS],

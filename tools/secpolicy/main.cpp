@@ -16,9 +16,9 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,    &kCheck,    &kLoad,   &kLoadEarly, &kRestore, &kStatus,
-                                  &kDisplay, &kWhy,      &kWhoCan, &kGraph,     &kDiff,    &kSave,
-                                  &kHistory, &kRollback, &kLabel,  &kSettings};
+constexpr const Verb* kVerbs[] = {
+    &kBoot,  &kCheck, &kLoad, &kLoadEarly, &kRestore, &kStatus,   &kDisplay, &kWhy,     &kWhoCan,
+    &kWords, &kGraph, &kDiff, &kSave,      &kHistory, &kRollback, &kLabel,   &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -31,6 +31,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r display                     look at what is installed now\n"
     "  secpolicy --root ./r why sshDom read /etc/ssh    may it, and which rule says so?\n"
     "  secpolicy --root ./r who-can use cap_sys_boot    which domains may?\n"
+    "  secpolicy --root ./r words calls                 what can stand behind -s?\n"
     "  secpolicy --root ./r graph --format svg >g.svg   the domains and their transitions\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
     "  secpolicy --root ./r load --plan                 what would a load change?\n"

@@ -46,5 +46,6 @@ extern const Verb kLabel;
 extern const Verb kStatus;
 extern const Verb kWhoCan;
 extern const Verb kWhy;
+extern const Verb kWords;
 
 }  // namespace SecPolicyCli

@@ -11,6 +11,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/label_table.h"
+#include "policy/call_set.h"
 #include "policy/rule_kind.h"
 
 using Braxo::Misc::StrCat;
@@ -22,17 +23,49 @@ namespace {
 // The words of a table in the order of their identifiers, from 0.
 using Words = std::span<const std::string>;
 
+// The first nineteen have numbers in the runtime interface, which is older than the others.
 Words CapabilityWords() {
-  static const std::array<std::string, 19> words = {"cap_chown",           "cap_dac_override",
-                                                    "cap_dac_read_search", "cap_fowner",
-                                                    "cap_fsetid",          "cap_kill",
-                                                    "cap_setgid",          "cap_setuid",
-                                                    "cap_setpcap",         "cap_net_bind_service",
-                                                    "cap_net_admin",       "cap_net_raw",
-                                                    "cap_ipc_lock",        "cap_sys_module",
-                                                    "cap_sys_rawio",       "cap_sys_chroot",
-                                                    "cap_sys_ptrace",      "cap_sys_admin",
-                                                    "cap_sys_boot"};
+  static const std::array<std::string, 41> words = {"cap_chown",
+                                                    "cap_dac_override",
+                                                    "cap_dac_read_search",
+                                                    "cap_fowner",
+                                                    "cap_fsetid",
+                                                    "cap_kill",
+                                                    "cap_setgid",
+                                                    "cap_setuid",
+                                                    "cap_setpcap",
+                                                    "cap_net_bind_service",
+                                                    "cap_net_admin",
+                                                    "cap_net_raw",
+                                                    "cap_ipc_lock",
+                                                    "cap_sys_module",
+                                                    "cap_sys_rawio",
+                                                    "cap_sys_chroot",
+                                                    "cap_sys_ptrace",
+                                                    "cap_sys_admin",
+                                                    "cap_sys_boot",
+                                                    "cap_linux_immutable",
+                                                    "cap_net_broadcast",
+                                                    "cap_ipc_owner",
+                                                    "cap_sys_pacct",
+                                                    "cap_sys_nice",
+                                                    "cap_sys_resource",
+                                                    "cap_sys_time",
+                                                    "cap_sys_tty_config",
+                                                    "cap_mknod",
+                                                    "cap_lease",
+                                                    "cap_audit_write",
+                                                    "cap_audit_control",
+                                                    "cap_setfcap",
+                                                    "cap_mac_override",
+                                                    "cap_mac_admin",
+                                                    "cap_syslog",
+                                                    "cap_wake_alarm",
+                                                    "cap_block_suspend",
+                                                    "cap_audit_read",
+                                                    "cap_perfmon",
+                                                    "cap_bpf",
+                                                    "cap_checkpoint_restore"};
   return words;
 }
 
@@ -101,21 +134,26 @@ void AddSystemCalls(int first, int last, std::map<std::string, long>& calls) {
   }
 }
 
-// All system calls of Linux. One that this machine's architecture does not have is known by the
-// negative number that libseccomp gives it.
+// All system calls of Linux, and the sets of them. One that this machine's architecture does not
+// have is known by the negative number that libseccomp gives it.
 std::map<std::string, long> SystemCalls() {
   // Some 470 are in use; the numbers grow by a few a year, and are the same on all newer machines.
   constexpr int kLastNumber = 1023;
   // The library counts those of other machines down from -10001, some 200 by now.
   constexpr int kFirstForeign = -10'999;
   constexpr int kLastForeign = -10'001;
+  // Beyond every number of a call.
+  constexpr long kFirstCallSet = 100'000;
   std::map<std::string, long> calls;
   AddSystemCalls(0, kLastNumber, calls);
   AddSystemCalls(kFirstForeign, kLastForeign, calls);
+  long set = kFirstCallSet;
+  for (const Policy::CallSet& each : Policy::CallSets()) calls.emplace(each.name, set++);
   return calls;
 }
 
 bool IsSystemCall(std::string_view word) {
+  if (Policy::FindCallSet(word) != nullptr) return true;
   return word.find('\0') == std::string_view::npos &&
          seccomp_syscall_resolve_name(std::string(word).c_str()) != __NR_SCMP_ERROR;
 }

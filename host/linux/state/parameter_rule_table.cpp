@@ -17,6 +17,12 @@ using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 namespace LinuxHost {
 namespace {
 
+void RequireOneMask(const std::string& check, const std::string& secondWord) {
+  if (check != Policy::kMaskCheck || secondWord.empty()) return;
+  throw HostError(EINVAL, StrCat("parameter check '", check,
+                                 "' takes one value, of all bits that it is about"));
+}
+
 struct RangedRule {
   ParameterRange range;
   const TeskAccess_CapabilityParamRule* rule;
@@ -57,6 +63,7 @@ void RequireNoConflict(std::vector<RangedRule>& ranges) {
 void RequireNoConflict(const std::list<TeskAccess_CapabilityParamRule>& rules) {
   std::map<std::string_view, std::vector<RangedRule>> checks;
   for (const auto& rule : rules) {
+    RequireOneMask(rule.paramCheck, rule.secondParam);
     checks[rule.paramCheck].push_back(
         {ParseParameterRange(rule.firstParam, rule.secondParam), &rule});
   }
@@ -91,6 +98,7 @@ bool ParameterRuleTable::InstallIfUnchanged(unsigned int domainId, const Policy:
 
 void ParameterRuleTable::Install(const DomainReference& domain, const Policy::Rule& rule) {
   const ParameterRange range = rule.Range();
+  RequireOneMask(rule.words[0], rule.words[2]);
   InstallChecked(
       base, [&] { return Refusal(domain, rule); },
       [&] { return InstallIfUnchanged(domain.id, rule, range); });

@@ -48,6 +48,13 @@ TEST(ParameterRuleConflict, IsAnOverlapOfGrantAndRevoke) {
       "99 in line 2");
 }
 
+// Two values would be a range, and a mask has none.
+TEST(ParameterRuleConflict, IsASecondValueOfAMask) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "0x100", "0x200", true, "clone_flags")}),
+            "parameter check 'clone_flags' takes one value, of all bits that it is about");
+  EXPECT_EQ(Conflict({ParameterRuleOf(1, "0x300", "", true, "clone_flags")}), "");
+}
+
 TEST(ParameterRuleConflict, IsNoOverlapOfTheSameVerdict) {
   EXPECT_EQ(Conflict({ParameterRuleOf(1, "1", "9", true), ParameterRuleOf(2, "5", "20", true)}),
             "");

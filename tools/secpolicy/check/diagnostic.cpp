@@ -35,6 +35,7 @@ const Code kUnreadable{"unreadable", kError, "A policy file or directory cannot 
 
 const Code kByteOrderMark{"byte-order-mark", kWarning,
                           "A byte order mark is part of the first word"};
+const Code kCannotStart{"cannot-start", kWarning, "No program can start in a domain"};
 const Code kCarriageReturn{"carriage-return", kWarning, "A carriage return is part of a word"};
 const Code kContradictingRule{"contradicting-rule", kWarning,
                               "A later rule replaces an earlier one"};
@@ -62,18 +63,41 @@ const Code kUnusedObject{"unused-object", kWarning, "Nobody uses an object"};
 
 namespace {
 
-constexpr std::array<const Code*, 34> kAll = {
-    &Codes::kArgumentCount,     &Codes::kBadName,           &Codes::kBadPermissions,
-    &Codes::kCannotLabel,       &Codes::kGrantWord,         &Codes::kMissingDomain,
-    &Codes::kNoTardisk,         &Codes::kParameterConflict, &Codes::kRuleType,
-    &Codes::kSecondPolicy,      &Codes::kSecondRule,        &Codes::kTardiskEntry,
-    &Codes::kTreeMarker,        &Codes::kUnknownDomain,     &Codes::kUnknownWord,
-    &Codes::kUnreadable,        &Codes::kByteOrderMark,     &Codes::kCarriageReturn,
-    &Codes::kContradictingRule, &Codes::kDuplicateObject,   &Codes::kDuplicateRule,
-    &Codes::kEditorCopy,        &Codes::kInstalledOnly,     &Codes::kLongLine,
-    &Codes::kMissingPath,       &Codes::kNulByte,           &Codes::kRelativePath,
-    &Codes::kSkippedEntry,      &Codes::kStarInPath,        &Codes::kTab,
-    &Codes::kTwoLabels,         &Codes::kUnreachableDomain, &Codes::kUntypedEntries,
+constexpr std::array<const Code*, 35> kAll = {
+    &Codes::kArgumentCount,
+    &Codes::kBadName,
+    &Codes::kBadPermissions,
+    &Codes::kCannotLabel,
+    &Codes::kGrantWord,
+    &Codes::kMissingDomain,
+    &Codes::kNoTardisk,
+    &Codes::kParameterConflict,
+    &Codes::kRuleType,
+    &Codes::kSecondPolicy,
+    &Codes::kSecondRule,
+    &Codes::kTardiskEntry,
+    &Codes::kTreeMarker,
+    &Codes::kUnknownDomain,
+    &Codes::kUnknownWord,
+    &Codes::kUnreadable,
+    &Codes::kByteOrderMark,
+    &Codes::kCannotStart,
+    &Codes::kCarriageReturn,
+    &Codes::kContradictingRule,
+    &Codes::kDuplicateObject,
+    &Codes::kDuplicateRule,
+    &Codes::kEditorCopy,
+    &Codes::kInstalledOnly,
+    &Codes::kLongLine,
+    &Codes::kMissingPath,
+    &Codes::kNulByte,
+    &Codes::kRelativePath,
+    &Codes::kSkippedEntry,
+    &Codes::kStarInPath,
+    &Codes::kTab,
+    &Codes::kTwoLabels,
+    &Codes::kUnreachableDomain,
+    &Codes::kUntypedEntries,
     &Codes::kUnusedObject,
 };
 

@@ -41,6 +41,7 @@ extern const Code kUnknownWord;
 extern const Code kUnreadable;
 
 extern const Code kByteOrderMark;
+extern const Code kCannotStart;
 extern const Code kCarriageReturn;
 extern const Code kContradictingRule;
 extern const Code kDuplicateObject;

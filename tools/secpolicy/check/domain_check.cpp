@@ -3,10 +3,12 @@
 #include <cstddef>
 #include <iterator>
 #include <list>
+#include <map>
 #include <unordered_map>
 
 #include "check_run.h"
 #include "host/linux/common/host_error.h"
+#include "policy/call_set.h"
 #include "policy/parameter_range.h"
 #include "rule_form.h"
 #include "secpolicy/observed/policy_lines.h"
@@ -20,7 +22,10 @@ using ParameterRules = std::list<TeskCtl::Security::TeskAccess_CapabilityParamRu
 using Words = SourceFile::Words;
 
 const char* const kParameterRule = FormOf(Policy::RuleKind::kParameterCheck).keyword;
+const char* const kCallRule = FormOf(Policy::RuleKind::kSyscall).keyword;
 const char* const kPathRule = FormOf(Policy::RuleKind::kFilePath).keyword;
+
+constexpr char kStartCalls[] = "@start";
 
 bool IsNumber(const std::string& word) {
   try {
@@ -43,8 +48,10 @@ class DomainCheck {
       if (!Accepts(line, words)) continue;
       CheckRepetition(line, words);
       if (words.front() == kPathRule) CheckPathRule(line, words);
+      if (words.front() == kCallRule) calls[words[1]] = words.back() == "grant";
     }
     CheckParameterRules();
+    CheckStart();
   }
 
  private:
@@ -115,6 +122,31 @@ class DomainCheck {
     }
   }
 
+  bool MayCall(std::string_view call) const {
+    bool isGranted = false;
+    for (const auto& [word, grants] : calls) {
+      if (!Policy::SpeaksOfCall(word, call)) continue;
+      if (!grants) return false;
+      isGranted = true;
+    }
+    return isGranted;
+  }
+
+  // A domain without rules is a name that others need.
+  void CheckStart() {
+    if (file.Lines().empty()) return;
+    const auto members = Policy::FindCallSet(kStartCalls)->members;
+    const auto lacking =
+        std::ranges::count_if(members, [&](std::string_view call) { return !MayCall(call); });
+    if (lacking == 0) return;
+    Diagnostic diagnostic = file.About(
+        Codes::kCannotStart,
+        "no dynamically linked program can start in the domain '" + name + "': it may not make " +
+            CountOf(static_cast<std::size_t>(lacking), "system call") + " of " + kStartCalls);
+    diagnostic.hint = std::string("write: -s ") + kStartCalls + " grant";
+    run.diagnostics.Add(std::move(diagnostic));
+  }
+
   // Adds the rules to those that do not contradict each other, twice as many each time; where the
   // host refuses them, half as many, down to the one rule to blame.
   void CheckParameterRules() {
@@ -174,6 +206,7 @@ class DomainCheck {
   std::string name;
   SecPolicy::DomainLines lines;
   std::unordered_map<std::string, Saying> sayings;  // the latest of each thing
+  std::map<std::string, bool> calls;                // the latest word on each name or set
 };
 
 struct NamedDomain {

@@ -9,7 +9,6 @@ namespace SecPolicyCli {
 namespace {
 
 using Policy::Decision;
-using Policy::FileQuestion;
 using Policy::InstalledDomain;
 using Policy::Rule;
 using Policy::Vote;
@@ -62,30 +61,50 @@ void WriteMissing(const InstalledDomain& domain, const Decision& decision, std::
   for (const Rule& rule : decision.missing) WriteLine(output, "  " + rule.Text());
 }
 
-void WriteFile(const FileQuestion& file, const FileFacts& facts, std::ostream& output) {
-  if (!facts.exists) {
-    WriteLine(output, "file: there is nothing at " + file.paths.front() + " under this root");
-    return;
-  }
-  if (file.paths.size() > 1) WriteLine(output, "file: leads to " + file.paths.back());
-  if (file.label.empty()) {
-    WriteLine(output, "label: none");
-    return;
-  }
-  WriteLine(output, "label: " + file.label + (facts.labelIsInherited ? " (inherited)" : ""));
-  if (facts.labelOrigin) WriteLine(output, Cite(*facts.labelOrigin));
+bool IsAboutCreation(const Question& question) {
+  return std::holds_alternative<Policy::CreationQuestion>(question.asked);
 }
 
-Json FileToJson(const FileQuestion& file, const FileFacts& facts) {
+void WriteFile(const Question& question, std::ostream& output) {
+  const FileFacts& file = *question.file;
+  const std::string noun = IsAboutCreation(question) ? "directory: " : "file: ";
+  if (!file.exists) {
+    WriteLine(output, noun + "there is nothing at " + file.paths.front() + " under this root");
+    return;
+  }
+  if (file.paths.size() > 1) WriteLine(output, noun + "leads to " + file.paths.back());
+  const std::string whose = IsAboutCreation(question) ? "label of the directory: " : "label: ";
+  if (file.label.empty()) {
+    WriteLine(output, whose + "none");
+    return;
+  }
+  WriteLine(output, whose + file.label + (file.labelIsInherited ? " (inherited)" : ""));
+  if (file.labelOrigin) WriteLine(output, Cite(*file.labelOrigin));
+}
+
+// Why a check is passed that no rule speaks of.
+void WriteOpen(const Question& question, const InstalledDomain& domain, std::ostream& output) {
+  WriteLine(output, "no rule of " + domain.name + " grants a value of " + question.words.front() +
+                        ", so all pass that none revokes");
+}
+
+Json FileToJson(const FileFacts& file) {
   Json label;
   if (!file.label.empty()) label = file.label;
-  Json json = {{"exists", facts.exists}, {"paths", file.paths}, {"label", label}};
-  if (facts.labelIsInherited) json["labelInherited"] = true;
-  if (facts.labelOrigin) {
-    json["labelFile"] = facts.labelOrigin->file;
-    json["labelLine"] = facts.labelOrigin->line;
+  Json json = {{"exists", file.exists}, {"paths", file.paths}, {"label", label}};
+  if (file.labelIsInherited) json["labelInherited"] = true;
+  if (file.labelOrigin) {
+    json["labelFile"] = file.labelOrigin->file;
+    json["labelLine"] = file.labelOrigin->line;
   }
   return json;
+}
+
+// What a domain may do by: its first rule, its level, or nothing at all.
+std::string ReasonOf(const InstalledDomain& domain, const Decision& decision) {
+  if (!decision.granted) return std::string(TextOf(domain.level)) + ", so nothing is refused to it";
+  if (decision.votes.empty()) return "no rule refuses it";
+  return Cite(decision.votes.front().rule);
 }
 
 }  // namespace
@@ -97,25 +116,20 @@ void WriteAnswer(const Question& question, const InstalledDomain& domain, const 
     WriteLine(output, Cite(vote.rule));
     if (vote.instead) WriteLine(output, "  instead: " + vote.instead->Text());
   }
+  if (decision.isOpen) WriteOpen(question, domain, output);
   WriteMissing(domain, decision, output);
-  if (question.file) {
-    WriteFile(std::get<FileQuestion>(question.asked), *question.file, output);
-  }
+  if (question.file) WriteFile(question, output);
 }
 
 void WriteAnswerLine(const InstalledDomain& domain, const Decision& decision,
                      std::ostream& output) {
-  WriteLine(output, domain.name + ": " +
-                        (decision.granted ? Cite(decision.votes.front().rule)
-                                          : std::string(TextOf(domain.level)) +
-                                                ", so nothing is refused to it"));
+  WriteLine(output, domain.name + ": " + ReasonOf(domain, decision));
 }
 
 Json QuestionToJson(const Question& question) {
   Json json = {{"action", question.form->action}, {"words", question.words}};
-  if (question.file) {
-    json["file"] = FileToJson(std::get<FileQuestion>(question.asked), *question.file);
-  }
+  if (question.file)
+    json[IsAboutCreation(question) ? "directory" : "file"] = FileToJson(*question.file);
   return json;
 }
 
@@ -128,13 +142,13 @@ Json AnswerToJson(const InstalledDomain& domain, const Decision& decision) {
     if (vote.instead) rule["instead"] = vote.instead->Text();
     rules.Append(rule);
   }
-  return {{"domain", domain.name},
-          {"level", TextOf(domain.level)},
-          {"allowed", decision.IsAllowed()},
-          {"granted", decision.granted},
-          {"rules", rules},
-          {"missing", missing},
-          {"policyFile", PolicyFileOf(domain)}};
+  Json json = {{"domain", domain.name},
+               {"level", TextOf(domain.level)},
+               {"allowed", decision.IsAllowed()},
+               {"granted", decision.granted}};
+  if (decision.isOpen) json["open"] = true;
+  json.Add({{"rules", rules}, {"missing", missing}, {"policyFile", PolicyFileOf(domain)}});
+  return json;
 }
 
 }  // namespace SecPolicyCli

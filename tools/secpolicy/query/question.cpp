@@ -14,15 +14,14 @@ namespace {
 
 using Braxo::Lib::BraxoException;
 using LinuxHost::LabelOrigin;
-using Policy::FileQuestion;
+using Policy::FileAccess;
 using enum Policy::WordKind;
-using Policy::Permission;
 using Policy::RuleKind;
 using Policy::WordKind;
 using SecPolicy::TeskAccessInterfaceImpl;
 
 // A table that is told as a whole when no word of it is near.
-constexpr std::size_t kShortTable = 10;
+constexpr std::size_t kShortTable = 16;
 
 bool CanBeDomain(WordKind kind) { return kind == kDomain || kind == kLabel; }
 
@@ -49,8 +48,10 @@ std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& acce
   return known;
 }
 
-[[noreturn]] void RefuseWord(const std::string& noun, const std::string& word,
-                             const std::vector<std::string>& known) {
+}  // namespace
+
+void RefuseWord(const std::string& noun, const std::string& word,
+                const std::vector<std::string>& known) {
   std::string text = "there is no " + noun + " '" + word + "'";
   const std::string nearest = NearestWord(word, known);
   if (!nearest.empty()) throw QuestionError(text + "; did you mean '" + nearest + "'?");
@@ -63,6 +64,8 @@ std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& acce
   }
   throw QuestionError(text);
 }
+
+namespace {
 
 void RequirePath(const std::string& path) {
   if (path.starts_with('/')) return;
@@ -107,7 +110,7 @@ std::string RealPathOf(const std::string& path) {
 }
 
 // The line for the nearest directory that gave the file the label that it inherits.
-std::optional<LabelOrigin> FindOriginAbove(const FileQuestion& file) {
+std::optional<LabelOrigin> FindOriginAbove(const FileFacts& file) {
   std::string path = file.paths.back();
   while (path.size() > 1) {
     path.resize(std::max<std::size_t>(path.rfind('/'), 1));
@@ -118,32 +121,61 @@ std::optional<LabelOrigin> FindOriginAbove(const FileQuestion& file) {
 }
 
 // The line for one of the paths that gave the label that the file has now.
-std::optional<LabelOrigin> FindOriginOf(const FileQuestion& file, bool labelIsInherited) {
+std::optional<LabelOrigin> FindOriginOf(const FileFacts& file) {
   for (const std::string& path : file.paths) {
     auto origin = LinuxHost::FindLabelOrigin(path);
     if (origin && origin->label == file.label) return origin;
   }
-  return labelIsInherited ? FindOriginAbove(file) : std::nullopt;
+  return file.labelIsInherited ? FindOriginAbove(file) : std::nullopt;
 }
 
-// Completes a question about a file by what there is to know of it.
-FileFacts ExamineFile(FileQuestion& file, TeskAccessInterfaceImpl& access) {
-  FileFacts facts;
-  const std::string resolved = RealPathOf(file.paths.front());
-  if (resolved.empty()) return facts;
-  facts.exists = true;
-  if (resolved != file.paths.front()) file.paths.push_back(resolved);
+FileFacts ExamineFile(const std::string& path, TeskAccessInterfaceImpl& access) {
+  FileFacts file;
+  file.paths = {path};
+  const std::string resolved = RealPathOf(path);
+  if (resolved.empty()) return file;
+  file.exists = true;
+  if (resolved != path) file.paths.push_back(resolved);
   try {
     file.label = SecPolicy::GetFileLabel(resolved, access);
   } catch (const BraxoException&) {
-    return facts;
+    return file;
   }
   const auto label = LinuxHost::ReadLabel(resolved.c_str());
-  facts.labelIsInherited = label && label->isInherited;
+  file.labelIsInherited = label && label->isInherited;
   file.labelIsBuiltIn =
       access.IsPredefinedLabel(file.label, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
-  facts.labelOrigin = FindOriginOf(file, facts.labelIsInherited);
-  return facts;
+  file.labelOrigin = FindOriginOf(file);
+  return file;
+}
+
+std::string DirectoryOf(const std::string& path) {
+  return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));
+}
+
+std::string JoinPath(const std::string& directory, const std::string& name) {
+  return (directory == "/" ? "" : directory) + "/" + name;
+}
+
+void AskAboutFile(Question& question, TeskAccessInterfaceImpl& access) {
+  question.file = ExamineFile(WithoutTrailingSlashes(question.words.front()), access);
+  const FileFacts& file = *question.file;
+  question.asked = Policy::FileQuestion{.access = question.form->access,
+                                        .path = file.paths.back(),
+                                        .label = file.label,
+                                        .labelIsBuiltIn = file.labelIsBuiltIn};
+}
+
+void AskAboutCreation(Question& question, TeskAccessInterfaceImpl& access) {
+  const std::string path = WithoutTrailingSlashes(question.words.front());
+  question.file = ExamineFile(DirectoryOf(path), access);
+  const FileFacts& directory = *question.file;
+  question.asked = Policy::CreationQuestion{
+      .kind = question.form->kind,
+      .what = question.words.back(),
+      .path = JoinPath(directory.paths.back(), path.substr(path.rfind('/') + 1)),
+      .directoryLabel = directory.label,
+      .labelIsBuiltIn = directory.labelIsBuiltIn};
 }
 
 // What rules are asked by a question that is about no file.
@@ -165,9 +197,14 @@ Policy::Question AskRules(const Question& question, TeskAccessInterfaceImpl& acc
 
 std::span<const QuestionForm> QuestionForms() {
   static const std::vector<QuestionForm> forms = {
-      {"read", "PATH", {kPath}, RuleKind::kFilePath, Permission::kRead},
-      {"write", "PATH", {kPath}, RuleKind::kFilePath, Permission::kWrite},
-      {"exec", "PATH", {kPath}, RuleKind::kFilePath, Permission::kExecute},
+      {"read", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kRead},
+      {"write", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kWrite},
+      {"exec", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kExecute},
+      {"list", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kList},
+      {"remove", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kRemove},
+      {"truncate", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kTruncate},
+      {"make", "PATH KIND", {kPath, kFileKind}, RuleKind::kFileCreation},
+      {"make-socket", "PATH KIND", {kPath, kSocketKind}, RuleKind::kUnixSocketCreation},
       {"call", "SYSCALL", {kSyscall}, RuleKind::kSyscall},
       {"use", "CAPABILITY", {kCapability}, RuleKind::kCapability},
       {"access", "OBJECT KIND", {kLabel, kObjectAccess}, RuleKind::kObjectAccess},
@@ -196,15 +233,13 @@ Question ReadQuestion(const std::vector<std::string>& words, TeskAccessInterface
   for (std::size_t index = 0; index < form.words.size(); ++index) {
     RequireWord(form.words[index], question.words[index], access);
   }
-  if (form.kind != RuleKind::kFilePath) {
+  if (form.words.front() != kPath) {
     question.asked = AskRules(question, access);
-    return question;
+  } else if (form.kind == RuleKind::kFilePath) {
+    AskAboutFile(question, access);
+  } else {
+    AskAboutCreation(question, access);
   }
-  FileQuestion file;
-  file.permission = form.permission;
-  file.paths = {WithoutTrailingSlashes(question.words.front())};
-  question.file = ExamineFile(file, access);
-  question.asked = std::move(file);
   return question;
 }
 

@@ -23,15 +23,19 @@ struct QuestionForm {
   const char* action;
   const char* usage;
   std::vector<Policy::WordKind> words;
-  Policy::RuleKind kind;            // of the rules that answer it
-  Policy::Permission permission{};  // for a path
+  Policy::RuleKind kind;           // of the rules that answer it
+  Policy::FileAccess access = {};  // to a file
 };
 
 std::span<const QuestionForm> QuestionForms();
 
-// What is known of the file that a question is about, beside what its rules are asked.
+// What is known of the file that a question is about, or of the directory that one is to be made
+// in.
 struct FileFacts {
   bool exists = false;
+  std::vector<std::string> paths;  // as it is written and, where that is another, as it resolves
+  std::string label;               // empty when it has none
+  bool labelIsBuiltIn = false;
   bool labelIsInherited = false;
   std::optional<LinuxHost::LabelOrigin> labelOrigin;  // empty when no policy file gave it
 };
@@ -49,6 +53,10 @@ struct Question {
 // Reads a question: the action and its words. Throws QuestionError for a word that nobody knows.
 Question ReadQuestion(const std::vector<std::string>& words,
                       SecPolicy::TeskAccessInterfaceImpl& access);
+
+// Throws QuestionError: there is no `noun` with the word `word`, but those in `known`.
+[[noreturn]] void RefuseWord(const std::string& noun, const std::string& word,
+                             const std::vector<std::string>& known);
 
 // Throws QuestionError: there is no domain `name`.
 [[noreturn]] void RefuseDomain(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access);
