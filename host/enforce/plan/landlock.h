@@ -44,6 +44,7 @@ constexpr std::uint64_t AllRights(int version) {
 struct PathRight {
   std::string path;
   std::uint64_t rights = 0;
+  bool mayBeMissing = false;  // where nothing is by this path when the domain is entered
 
   bool operator==(const PathRight&) const = default;
 };

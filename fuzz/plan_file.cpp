@@ -1,0 +1,37 @@
+// Plans for the launcher: bytes are a plan exactly when they are what the plan is written as. An
+// input is tried as it is, and with the right checksum in place of its last bytes.
+
+#include "host/enforce/plan_file.h"
+
+#include <cstdint>
+#include <string>
+
+#include "support/require.h"
+
+namespace SecPolicyFuzz {
+namespace {
+
+std::string Sign(std::string body) {
+  std::uint64_t sum = 0xcbf2'9ce4'8422'2325;
+  for (const char byte : body) sum = (sum ^ static_cast<unsigned char>(byte)) * 0x100'0000'01b3;
+  return body.append(reinterpret_cast<const char*>(&sum), sizeof(sum));
+}
+
+void Try(std::string_view bytes) {
+  Enforce::Plan plan;
+  const char* whyNot = nullptr;
+  const bool isPlan = Enforce::Parse(bytes, &plan, &whyNot);
+  Require(isPlan == (whyNot == nullptr), "a reason is given when it is no plan");
+  if (isPlan) Require(Enforce::Serialize(plan) == bytes, "a plan is written in one way");
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  const std::string input(reinterpret_cast<const char*>(data), size);
+  Try(input);
+  if (size >= sizeof(std::uint64_t)) Try(Sign(input.substr(0, size - sizeof(std::uint64_t))));
+  return 0;
+}
+
+}  // namespace SecPolicyFuzz
