@@ -1,0 +1,82 @@
+#include "host/enforce/system_calls.h"
+
+#include <seccomp.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <vector>
+
+namespace Enforce {
+namespace {
+
+// Newer than libseccomp may be. Numbers this high are the same on all architectures.
+struct NewerCall {
+  int number;
+  const char* name;
+};
+constexpr NewerCall kNewerCalls[] = {
+    {451, "cachestat"},         {452, "fchmodat2"},        {453, "map_shadow_stack"},
+    {454, "futex_wake"},        {455, "futex_wait"},       {456, "futex_requeue"},
+    {457, "statmount"},         {458, "listmount"},        {459, "lsm_get_self_attr"},
+    {460, "lsm_set_self_attr"}, {461, "lsm_list_modules"}, {462, "mseal"},
+    {463, "setxattrat"},        {464, "getxattrat"},       {465, "listxattrat"},
+    {466, "removexattrat"},     {467, "open_tree_attr"},   {468, "file_getattr"},
+    {469, "file_setattr"},      {470, "listns"},
+};
+
+constexpr int kLastNumber = 639;  // some 470 are in use, and they grow by a few a year
+
+std::string NewerName(int number) {
+  const auto* const call = std::ranges::find(kNewerCalls, number, &NewerCall::number);
+  return call == std::end(kNewerCalls) ? std::string() : call->name;
+}
+
+std::string ReadName(int number) {
+  char* const known = seccomp_syscall_resolve_num_arch(SCMP_ARCH_NATIVE, number);
+  if (known == nullptr) return NewerName(number);
+  std::string name = known;
+  std::free(known);
+  return name;
+}
+
+std::vector<SystemCall> ReadAll() {
+  std::vector<SystemCall> calls;
+  for (int number = 0; number <= kLastNumber; ++number) {
+    std::string name = ReadName(number);
+    if (!name.empty()) calls.push_back({number, std::move(name)});
+  }
+  return calls;
+}
+
+std::vector<const SystemCall*> SortByName(std::span<const SystemCall> calls) {
+  std::vector<const SystemCall*> byName;
+  for (const SystemCall& call : calls) byName.push_back(&call);
+  std::ranges::sort(byName, {}, &SystemCall::name);
+  return byName;
+}
+
+}  // namespace
+
+std::span<const SystemCall> SystemCalls() {
+  static const std::vector<SystemCall> calls = ReadAll();
+  return calls;
+}
+
+std::optional<int> NumberOf(std::string_view name) {
+  static const std::vector<const SystemCall*> byName = SortByName(SystemCalls());
+  const auto call = std::ranges::lower_bound(
+      byName, name, {}, [](const SystemCall* each) { return std::string_view(each->name); });
+  if (call == byName.end() || (*call)->name != name) return std::nullopt;
+  return (*call)->number;
+}
+
+std::string_view NameOf(int number) {
+  const auto calls = SystemCalls();
+  const auto call = std::ranges::lower_bound(calls, number, {}, &SystemCall::number);
+  if (call == calls.end() || call->number != number) return {};
+  return call->name;
+}
+
+std::uint32_t NativeArchitecture() { return seccomp_arch_native(); }
+
+}  // namespace Enforce
