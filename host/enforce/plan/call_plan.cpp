@@ -1,0 +1,500 @@
+#include "host/enforce/plan/call_plan.h"
+
+#include <fcntl.h>
+#include <linux/prctl.h>
+#include <linux/sched.h>
+#include <linux/sockios.h>
+#include <netinet/in.h>
+#include <netinet/tcp.h>
+#include <sys/ioctl.h>
+#include <sys/socket.h>
+
+#include <algorithm>
+#include <csignal>
+#include <initializer_list>
+#include <set>
+#include <string_view>
+#include <utility>
+
+#include "braxo/misc/strcat.h"
+#include "host/enforce/plan/port_check.h"
+#include "host/enforce/system_calls.h"
+#include "policy/call_set.h"
+
+using Braxo::Misc::StrCat;
+using Policy::Rule;
+using Policy::RuleKind;
+
+namespace Enforce {
+namespace {
+
+using Values = std::vector<ValueRange>;
+
+// ---- What checks look at
+
+constexpr std::uint32_t kWholeWord = 0xffff'ffff;
+constexpr std::uint32_t kSocketTypes = 0xff;  // without SOCK_CLOEXEC and SOCK_NONBLOCK
+
+struct CheckedArgument {
+  const char* check;
+  const char* call;
+  unsigned int argument;
+  std::uint32_t mask = kWholeWord;
+};
+constexpr CheckedArgument kCheckedArguments[] = {
+    {"ioctl_request", "ioctl", 1},
+    {"kill_signal", "kill", 1},
+    {"kill_signal", "pidfd_send_signal", 1},
+    {"kill_signal", "rt_sigqueueinfo", 1},
+    {"kill_signal", "rt_tgsigqueueinfo", 2},
+    {"kill_signal", "tgkill", 2},
+    {"kill_signal", "tkill", 1},
+    {"prctl_option", "prctl", 0},
+    {"set_gid", "setfsgid", 0},
+    {"set_gid", "setgid", 0},
+    {"set_gid", "setregid", 0},
+    {"set_gid", "setregid", 1},
+    {"set_gid", "setresgid", 0},
+    {"set_gid", "setresgid", 1},
+    {"set_gid", "setresgid", 2},
+    {"set_uid", "setfsuid", 0},
+    {"set_uid", "setresuid", 0},
+    {"set_uid", "setresuid", 1},
+    {"set_uid", "setresuid", 2},
+    {"set_uid", "setreuid", 0},
+    {"set_uid", "setreuid", 1},
+    {"set_uid", "setuid", 0},
+    {"socket_family", "socket", 0},
+    {"socket_family", "socketpair", 0},
+    {"socket_type", "socket", 1, kSocketTypes},
+    {"socket_type", "socketpair", 1, kSocketTypes},
+};
+
+// Takes the place of an identity that is to stay as it is.
+constexpr std::uint32_t kUnchanged = 0xffff'ffff;
+
+// Values that reach past the domain. A range that happens to hold them does not grant them.
+struct DangerousValue {
+  const char* check;
+  const char* call;
+  std::uint32_t value;
+  const char* name;
+};
+constexpr DangerousValue kDangerousValues[] = {
+    {"ioctl_request", "ioctl", TIOCSTI, "TIOCSTI"},      // types into the terminal
+    {"ioctl_request", "ioctl", TIOCLINUX, "TIOCLINUX"},  // pastes into the console
+    {"prctl_option", "prctl", PR_SET_MM, "PR_SET_MM"},   // says what program a process runs
+};
+
+// ---- clone_flags
+
+constexpr std::uint32_t kChildSignal = CSIGNAL;
+constexpr std::uint32_t kNamespaces = CLONE_NEWNS | CLONE_NEWCGROUP | CLONE_NEWUTS | CLONE_NEWIPC |
+                                      CLONE_NEWUSER | CLONE_NEWPID | CLONE_NEWNET;
+constexpr std::uint32_t kTimeNamespace =
+    CLONE_NEWTIME;  // only for unshare: to clone it is a signal
+constexpr std::uint32_t kUnshareFlags = kNamespaces | kTimeNamespace | CLONE_FILES | CLONE_FS |
+                                        CLONE_SYSVSEM | CLONE_VM | CLONE_SIGHAND | CLONE_THREAD;
+
+// ---- Signals by way of descriptors
+
+constexpr std::initializer_list<std::uint32_t> kOwnerCommands = {F_SETOWN, F_SETOWN_EX};
+constexpr std::initializer_list<std::uint32_t> kOwnerRequests = {FIOSETOWN, SIOCSPGRP};
+
+// ---- Sockets
+
+// Families that carry packets of the internet past the checks of Landlock, and all that are newer
+// than this.
+ValueSet FamiliesPastPorts() {
+  constexpr std::uint32_t kFirstNewer = 46;
+  return ValueSet({{AF_PACKET, AF_PACKET},
+                   {AF_RDS, AF_RDS},
+                   {AF_PPPOX, AF_PPPOX},
+                   {AF_TIPC, AF_TIPC},
+                   {AF_RXRPC, AF_RXRPC},
+                   {AF_KCM, AF_KCM},
+                   {AF_SMC, AF_SMC},
+                   {AF_XDP, AF_XDP},
+                   {kFirstNewer, kWholeWord}});
+}
+
+// ---- io_uring
+
+constexpr const char* kRingSetup[] = {"io_uring_enter", "io_uring_register", "io_uring_setup"};
+
+// What a ring does for a process without a call of its own.
+constexpr const char* kRingCalls[] = {
+    "accept4",   "bind",       "close",      "connect",         "epoll_ctl", "epoll_wait",
+    "fadvise64", "fallocate",  "fgetxattr",  "fsetxattr",       "fsync",     "ftruncate",
+    "futex",     "getsockopt", "getxattr",   "ioctl",           "linkat",    "listen",
+    "madvise",   "mkdirat",    "openat",     "openat2",         "pipe2",     "poll",
+    "preadv2",   "pwritev2",   "read",       "recvfrom",        "recvmsg",   "renameat2",
+    "sendmsg",   "sendto",     "setsockopt", "setxattr",        "shutdown",  "socket",
+    "splice",    "statx",      "symlinkat",  "sync_file_range", "tee",       "unlinkat",
+    "waitid",    "write"};
+
+// ---- Conditions
+
+ArgumentCheck Among(unsigned int argument, const ValueSet& values,
+                    std::uint32_t mask = kWholeWord) {
+  return {.argument = argument, .mask = mask, .values = values.Ranges()};
+}
+
+ArgumentCheck NoneOf(unsigned int argument, std::uint32_t bits) {
+  return {.argument = argument, .mask = bits, .values = {{0, 0}}};
+}
+
+ValueSet Single(std::uint32_t value) { return ValueSet({{value, value}}); }
+
+ValueSet SetOf(std::initializer_list<std::uint32_t> values) {
+  ValueSet set;
+  for (const std::uint32_t value : values) set = set.With(Single(value));
+  return set;
+}
+
+// ---- What is told of rules
+
+// Why rules are less than they say, each reason once with the calls that it is about.
+class Remarks {
+ public:
+  void Add(const Rule& rule, const std::string& reason, const std::string& call = {}) {
+    auto& reasons = remarks[&rule];
+    auto known = std::ranges::find(reasons, reason, &Remark::reason);
+    if (known == reasons.end()) known = reasons.insert(known, Remark{reason, {}});
+    if (!call.empty()) known->calls.insert(call);
+  }
+
+  RuleFate FateOf(const Rule& rule) const {
+    const auto known = remarks.find(&rule);
+    if (known == remarks.end()) return {rule, Fate::kEnforced, {}};
+    std::string how;
+    for (const Remark& remark : known->second) {
+      how += how.empty() ? "" : "; ";
+      how += TextOf(remark);
+    }
+    return {.rule = rule, .fate = Fate::kNarrowed, .how = std::move(how)};
+  }
+
+ private:
+  struct Remark {
+    std::string reason;
+    std::set<std::string> calls;
+  };
+
+  static std::string TextOf(const Remark& remark) {
+    std::string calls;
+    for (const std::string& call : remark.calls) calls += (calls.empty() ? "" : ", ") + call;
+    return calls.empty() ? remark.reason : StrCat(calls, ": ", remark.reason);
+  }
+
+  std::map<const Rule*, std::vector<Remark>> remarks;
+};
+
+// ---- The plan
+
+struct Check {
+  std::vector<const Rule*> rules;
+  ValueSet passing;
+};
+
+class CallPlanner {
+ public:
+  // Refuses all values of the checks `tooLong`.
+  CallPlanner(const Policy::InstalledDomain& installed, const std::set<std::string>& tooLong)
+      : domain(installed) {
+    for (const Rule& rule : domain.rules) {
+      if (rule.kind == RuleKind::kSyscall) callRules.push_back(&rule);
+    }
+    GrantCalls();
+    for (const auto& checked : kCheckedArguments) ReadCheck(checked.check);
+    for (const std::string& check : tooLong) RefuseAllValues(check);
+  }
+
+  CallPlan Plan() {
+    CloseDangerousValues();
+    CloseClone();
+    CloseSignalsByDescriptors();
+    CloseGroups();
+    ClosePorts();
+    CloseRings();
+    for (const auto& checked : kCheckedArguments) DemandValues(checked);
+    LeaveTheEntry();
+    return Finish();
+  }
+
+  // The check with the most ranges of values.
+  std::string LongestCheck() const {
+    const auto longest = std::ranges::max_element(
+        checks, {}, [](const auto& check) { return check.second.passing.Ranges().size(); });
+    return longest->first;
+  }
+
+ private:
+  // ---- -s
+
+  void GrantCalls() {
+    for (const SystemCall& call : SystemCalls()) verdicts[call.number] = {Answer::kRefused};
+    for (const Rule* const rule : callRules) {
+      if (rule->Grants()) Answers(rule->words[0], Answer::kAllowed);
+    }
+    for (const Rule* const rule : callRules) {
+      if (!rule->Grants()) Answers(rule->words[0], Answer::kRefused);
+      if (rule->Grants() && !Policy::FindCallSet(rule->words[0]) && !NumberOf(rule->words[0])) {
+        remarks.Add(*rule, "this machine has no such call");
+      }
+    }
+  }
+
+  void Answers(const std::string& word, Answer answer) {
+    const Policy::CallSet* const set = Policy::FindCallSet(word);
+    if (set == nullptr) return AnswersCall(word, answer);
+    for (const std::string_view call : set->members) AnswersCall(call, answer);
+  }
+
+  void AnswersCall(std::string_view call, Answer answer) {
+    const std::optional<int> number = NumberOf(call);
+    if (number) verdicts[*number].answer = answer;
+  }
+
+  // Null when the call is refused, or none of this machine.
+  CallVerdict* FindGranted(std::string_view call) {
+    const std::optional<int> number = NumberOf(call);
+    if (!number || verdicts[*number].answer != Answer::kAllowed) return nullptr;
+    return &verdicts[*number];
+  }
+
+  // Tells those who grant the call.
+  void Tell(const std::string& call, const std::string& reason) {
+    for (const Rule* const rule : callRules) {
+      if (rule->Grants() && Policy::SpeaksOfCall(rule->words[0], call)) {
+        remarks.Add(*rule, reason, call);
+      }
+    }
+  }
+
+  void Demand(const std::string& call, Condition condition) {
+    CallVerdict* const verdict = FindGranted(call);
+    if (verdict != nullptr) verdict->conditions.push_back(std::move(condition));
+  }
+
+  // Demands what no rule says.
+  void Close(const std::string& call, Condition condition, const std::string& reason) {
+    if (FindGranted(call) == nullptr) return;
+    Demand(call, std::move(condition));
+    Tell(call, reason);
+  }
+
+  void Withdraw(const std::string& call, Answer answer, const std::string& reason) {
+    CallVerdict* const verdict = FindGranted(call);
+    if (verdict == nullptr) return;
+    *verdict = {answer};
+    Tell(call, reason);
+  }
+
+  // ---- -p
+
+  void ReadCheck(const char* name) {
+    if (checks.contains(name)) return;
+    const std::vector<const Rule*> rules = RulesOfCheck(domain.rules, name);
+    checks[name] = {rules, PassingValues(rules)};
+  }
+
+  // Refuses values of a check that pass by its rules.
+  void TakeValues(const std::string& check, const std::string& call, const ValueSet& values,
+                  const std::string& reason) {
+    Check& taken = checks.at(check);
+    const ValueSet lost = taken.passing.Within(values);
+    taken.passing = taken.passing.Without(values);
+    if (!lost.IsEmpty()) TellOfLoss(taken, call, lost, reason);
+  }
+
+  // Tells those who grant lost values; where none grants any, all pass, and so who grants the call.
+  void TellOfLoss(const Check& check, const std::string& call, const ValueSet& lost,
+                  const std::string& reason) {
+    if (std::ranges::none_of(check.rules, &Rule::Grants)) {
+      if (FindGranted(call) != nullptr) Tell(call, reason);
+      return;
+    }
+    for (const Rule* const rule : check.rules) {
+      const bool hasLost = rule->Grants() && !PassingValues({&rule, 1}).Within(lost).IsEmpty();
+      if (hasLost) remarks.Add(*rule, reason);
+    }
+  }
+
+  void RefuseAllValues(const std::string& name) {
+    Check& check = checks.at(name);
+    for (const auto& checked : kCheckedArguments) {
+      if (checked.check != name) continue;
+      TellOfLoss(check, checked.call, check.passing,
+                 StrCat("refused, as ", name, " has more values than a filter has room for"));
+    }
+    check.passing = ValueSet();
+  }
+
+  bool IsGrantedByItself(const std::string& check, std::uint32_t value) const {
+    return std::ranges::any_of(checks.at(check).rules, [&](const Rule* rule) {
+      return rule->Grants() && PassingValues({&rule, 1}).Count() == 1 &&
+             PassingValues({&rule, 1}).Has(value);
+    });
+  }
+
+  void DemandValues(const CheckedArgument& checked) {
+    ValueSet passing = checks.at(checked.check).passing;
+    if (passing.IsAll()) return;
+    if (IsIdentity(checked.check)) passing = passing.With(Single(kUnchanged));
+    Demand(checked.call, {Among(checked.argument, passing, checked.mask)});
+  }
+
+  static bool IsIdentity(std::string_view check) { return check.starts_with("set_"); }
+
+  // ---- What goes past rules
+
+  void CloseDangerousValues() {
+    for (const auto& [check, call, value, name] : kDangerousValues) {
+      if (IsGrantedByItself(check, value)) continue;
+      TakeValues(check, call, Single(value), StrCat(name, " is refused unless granted by itself"));
+    }
+  }
+
+  void CloseClone() {
+    Withdraw("clone3", Answer::kUnknown, "answered as unknown, so that programs use clone");
+    std::uint32_t allowed = 0;
+    std::uint32_t revoked = 0;
+    bool isGranted = false;
+    for (const Rule* const rule : RulesOfCheck(domain.rules, Policy::kMaskCheck)) {
+      (rule->Grants() ? allowed : revoked) |= static_cast<std::uint32_t>(rule->Range().first);
+      isGranted |= rule->Grants();
+    }
+    if (!isGranted) {
+      allowed = ~(kNamespaces | kTimeNamespace);
+      for (const char* const call : {"clone", "unshare"}) {
+        if (FindGranted(call) == nullptr) continue;
+        Tell(call, "new namespaces are refused unless clone_flags grants them");
+      }
+    }
+    allowed &= ~revoked;
+    if (isGranted && (allowed & kTimeNamespace) == 0 && FindGranted("unshare") != nullptr) {
+      Tell("unshare", "a new time namespace is refused unless clone_flags grants 0x80");
+    }
+    DemandFlags("clone", allowed | kChildSignal);
+    DemandFlags("unshare", allowed & kUnshareFlags);
+    Demand("unshare", {{.argument = 0, .half = Half::kUpper, .values = {{0, 0}}}});
+  }
+
+  void DemandFlags(const char* call, std::uint32_t allowed) {
+    if (~allowed != 0) Demand(call, {NoneOf(0, ~allowed)});
+  }
+
+  // A descriptor that is ready sends a signal to whoever is its owner.
+  void CloseSignalsByDescriptors() {
+    const ValueSet signals = checks.at("kill_signal").passing;
+    if (signals.IsAll()) return;
+    const ValueSet descriptorSignals =
+        signals.Has(SIGIO) ? signals.With(Single(0)) : signals.Without(Single(0));
+    Demand("fcntl", {Among(1, Single(F_SETSIG).Complement()), Among(2, descriptorSignals)});
+    if (signals.Has(SIGIO) && signals.Has(SIGURG)) return;
+    const char* const reason =
+        "an owner of a descriptor is refused beside kill_signal without SIGIO and SIGURG";
+    Close("fcntl", {Among(1, SetOf(kOwnerCommands).Complement())}, reason);
+    TakeValues("ioctl_request", "ioctl", SetOf(kOwnerRequests), reason);
+  }
+
+  void CloseGroups() {
+    if (checks.at("set_gid").passing.IsAll()) return;
+    Withdraw("setgroups", Answer::kRefused, "refused beside set_gid, as no filter sees its groups");
+  }
+
+  // Landlock checks the ports of TCP at bind and connect, and nothing else.
+  void ClosePorts() {
+    const PortCheck bind = ReadPortCheck(domain, kBindPort);
+    const PortCheck connect = ReadPortCheck(domain, kConnectPort);
+    if (bind.IsOpen() && connect.IsOpen()) return;
+    CloseOtherProtocols();
+    if (!connect.IsOpen()) CloseFastOpen();
+    if (bind.IsOpen() || bind.passing.Has(kPortOfKernel)) return;
+    Withdraw("listen", Answer::kRefused,
+             "refused unless bind_port grants 0, as it takes a port for a socket without one");
+  }
+
+  void CloseOtherProtocols() {
+    const ArgumentCheck isElsewhere = Among(0, SetOf({AF_INET, AF_INET6}).Complement());
+    const char* const reason = "only TCP reaches the internet beside rules for ports";
+    Close("socket", {Among(0, FamiliesPastPorts().Complement())}, reason);
+    Demand("socket", {isElsewhere, Among(1, Single(SOCK_STREAM), kSocketTypes)});
+    Demand("socket", {isElsewhere, Among(2, SetOf({IPPROTO_IP, IPPROTO_TCP}))});
+    Close("setsockopt",
+          {Among(1, Single(IPPROTO_TCP).Complement()), Among(2, Single(TCP_ULP).Complement())},
+          "TCP_ULP is refused beside rules for ports, as it changes the protocol of a socket");
+  }
+
+  void CloseFastOpen() {
+    const char* const reason = "MSG_FASTOPEN is refused beside connect_port, as it connects unseen";
+    Close("sendmmsg", {NoneOf(3, MSG_FASTOPEN)}, reason);
+    Close("sendmsg", {NoneOf(2, MSG_FASTOPEN)}, reason);
+    Close("sendto", {NoneOf(3, MSG_FASTOPEN)}, reason);
+  }
+
+  void CloseRings() {
+    const std::string reason = ReasonAgainstRings();
+    if (reason.empty()) return;
+    for (const char* const call : kRingSetup) Withdraw(call, Answer::kRefused, reason);
+  }
+
+  std::string ReasonAgainstRings() {
+    const bool hasChecks = std::ranges::any_of(
+        domain.rules, [](const Rule& rule) { return rule.kind == RuleKind::kParameterCheck; });
+    if (hasChecks) return "refused beside parameter checks, as a ring passes them by";
+    for (const char* const call : kRingCalls) {
+      if (NumberOf(call) && FindGranted(call) == nullptr) {
+        return StrCat("refused, as a ring does without asking what is not granted: ", call);
+      }
+    }
+    return {};
+  }
+
+  // ---- The end
+
+  void LeaveTheEntry() {
+    if (FindGranted("execve") != nullptr) return;
+    for (const char* const call : {"execve", "execveat"}) {
+      if (FindGranted(call) == nullptr) AnswersCall(call, Answer::kAllowedWithSecret);
+    }
+  }
+
+  CallPlan Finish() {
+    CallPlan plan;
+    FilterProgram program = Assemble(verdicts, NativeArchitecture());
+    plan.verdicts = std::move(verdicts);
+    plan.program = std::move(program.instructions);
+    plan.secret = program.secret;
+    for (const Rule& rule : domain.rules) {
+      if (IsOfThePlan(rule)) plan.fates.push_back(remarks.FateOf(rule));
+    }
+    return plan;
+  }
+
+  static bool IsOfThePlan(const Rule& rule) {
+    if (rule.kind == RuleKind::kParameterCheck) return !IsPortCheck(rule.words[0]);
+    return rule.kind == RuleKind::kSyscall;
+  }
+
+  const Policy::InstalledDomain& domain;
+  std::vector<const Rule*> callRules;
+  std::map<int, CallVerdict> verdicts;
+  std::map<std::string, Check> checks;
+  Remarks remarks;
+};
+
+}  // namespace
+
+CallPlan PlanCalls(const Policy::InstalledDomain& domain) {
+  std::set<std::string> tooLong;
+  for (;;) {
+    CallPlanner planner(domain, tooLong);
+    CallPlan plan = planner.Plan();
+    if (plan.program.size() <= kMostInstructions) return plan;
+    tooLong.insert(planner.LongestCheck());
+  }
+}
+
+}  // namespace Enforce

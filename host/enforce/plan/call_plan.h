@@ -1,0 +1,36 @@
+#pragma once
+
+#include <linux/filter.h>
+
+#include <map>
+#include <optional>
+#include <vector>
+
+#include "host/enforce/coverage.h"
+#include "host/enforce/plan/bpf_program.h"
+#include "policy/installed_policy.h"
+
+namespace Enforce {
+
+// What the system calls of a domain are filtered by.
+struct CallPlan {
+  std::map<int, CallVerdict> verdicts;  // on every known call, by its number
+  std::vector<sock_filter> program;     // the same for the kernel
+  std::optional<SecretPlaces> secret;   // of the one execve that enters the domain
+  std::vector<RuleFate> fates;          // of the rules about calls and their arguments, in order
+};
+
+// The plan for a domain's rules about system calls (-s) and about their arguments (-p), except
+// bind_port and connect_port: of these only what goes past a check of ports is closed. The level of
+// the domain has no say.
+//
+// Where execve is not granted, the program lets execve pass with the secret that SetSecret puts in,
+// and execveat too unless it is granted anyhow: so the domain is entered, and whoever was started
+// does not know the secret any more.
+//
+// The program is for the architecture that this is compiled for, and never longer than
+// kMostInstructions: of checks with more values than there is room for, all values are refused.
+// Throws BraxoException for a rule whose words are no range.
+CallPlan PlanCalls(const Policy::InstalledDomain& domain);
+
+}  // namespace Enforce
