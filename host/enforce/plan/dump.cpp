@@ -1,0 +1,108 @@
+#include "host/enforce/plan/dump.h"
+
+#include <algorithm>
+#include <map>
+#include <sstream>
+#include <string_view>
+
+#include "braxo/misc/strcat.h"
+#include "host/enforce/plan/port_check.h"
+#include "host/enforce/system_calls.h"
+
+using Braxo::Misc::StrCat;
+
+namespace Enforce {
+namespace {
+
+// Decimal as far as people count, then as the headers of the kernel write it.
+std::string TextOf(std::uint32_t value) {
+  constexpr std::uint32_t kGreatestDecimal = 0xffff;
+  std::ostringstream text;
+  text << (value > kGreatestDecimal ? "0x" : "");
+  text << (value > kGreatestDecimal ? std::hex : std::dec) << value;
+  return text.str();
+}
+
+std::string TextOf(const ValueRange& range) {
+  if (range.first == range.last) return TextOf(range.first);
+  return StrCat(TextOf(range.first), "-", TextOf(range.last));
+}
+
+template <class Items, class Text>
+std::string Join(const Items& items, const char* separator, Text text) {
+  std::string joined;
+  for (const auto& item : items) joined += (joined.empty() ? "" : separator) + text(item);
+  return joined;
+}
+
+std::string TextOf(const ArgumentCheck& check) {
+  std::string text =
+      StrCat(check.half == Half::kUpper ? "upper half of " : "", "argument ", check.argument + 1);
+  if (check.mask != 0xffff'ffff) text += StrCat(" & ", TextOf(check.mask));
+  if (check.values.empty()) return text + " in nothing";
+  return StrCat(text, " in ",
+                Join(check.values, " ", [](const ValueRange& range) { return TextOf(range); }));
+}
+
+std::string TextOf(const Condition& condition) {
+  return Join(condition, " or ", [](const ArgumentCheck& check) { return TextOf(check); });
+}
+
+std::string TextOf(const CallVerdict& verdict) {
+  if (verdict.answer == Answer::kUnknown) return "answered as unknown";
+  if (verdict.answer == Answer::kRefused) return "refused";
+  if (verdict.answer == Answer::kAllowedWithSecret) return "refused but to enter";
+  if (verdict.conditions.empty()) return "allowed";
+  return StrCat("allowed where ", Join(verdict.conditions, ", and ",
+                                       [](const Condition& each) { return TextOf(each); }));
+}
+
+std::string TextOf(const char* name, const PortPlan& plan) {
+  if (!plan.isHandled) return StrCat(name, ": all ports\n");
+  std::string text = StrCat(name, ": ", plan.ports.empty() ? "no port" : "");
+  const char* separator = "";
+  for (const std::uint16_t port : plan.ports) {
+    text += StrCat(separator, port);
+    separator = ", ";
+  }
+  return text + "\n";
+}
+
+}  // namespace
+
+std::string Dump(const std::vector<RuleFate>& fates) {
+  std::string text;
+  for (const auto& [rule, fate, how] : fates) {
+    text += StrCat(TextOf(fate), ": ", rule.Text());
+    text += how.empty() ? "\n" : StrCat(" (", how, ")\n");
+  }
+  return text;
+}
+
+std::string Dump(const CallPlan& plan) {
+  std::map<CallVerdict, std::vector<std::string_view>> calls;
+  for (const auto& [number, verdict] : plan.verdicts) calls[verdict].push_back(NameOf(number));
+  calls.erase({Answer::kRefused});
+  std::string text;
+  for (auto& [verdict, names] : calls) {
+    std::ranges::sort(names);
+    text += StrCat(TextOf(verdict), ": ",
+                   Join(names, " ", [](std::string_view name) { return std::string(name); }), "\n");
+  }
+  return StrCat(text, "refused: all others\n", Dump(plan.fates));
+}
+
+std::string Dump(const CapabilityPlan& plan) {
+  std::string text = "capabilities:";
+  for (unsigned int number = 0; !CapabilityName(number).empty(); ++number) {
+    if ((plan.kept >> number & 1) != 0) text += StrCat(" ", CapabilityName(number));
+  }
+  if (plan.kept == 0) text += " none";
+  return StrCat(text, "\n", Dump(plan.fates));
+}
+
+std::string Dump(const NetPlan& plan) {
+  return TextOf(kBindPort, plan.bind) + TextOf(kConnectPort, plan.connect) + Dump(plan.fates);
+}
+
+}  // namespace Enforce

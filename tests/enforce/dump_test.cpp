@@ -1,0 +1,97 @@
+// Plans for people: hunts for a plan that is shown otherwise than it is.
+
+#include "host/enforce/plan/dump.h"
+
+#include <gtest/gtest.h>
+#include <linux/capability.h>
+
+#include "enforce/domain_of.h"
+
+namespace EnforceTest {
+namespace {
+
+using Enforce::PlanCalls;
+using Enforce::PlanCapabilities;
+using Enforce::PlanNet;
+
+constexpr unsigned int kLast = CAP_CHECKPOINT_RESTORE;
+constexpr int kAbi = 4;
+
+TEST(Dump, ShowsCalls) {
+  EXPECT_EQ(
+      Dump(PlanCalls(DomainOf(
+          {"-s read grant", "-s write grant", "-s close grant", "-s clone3 grant", "-s ioctl grant",
+           "-s socket grant", "-s tgkill grant", "-s kill grant", "-s write revoke",
+           "-p ioctl_request 0x5401 grant", "-p ioctl_request 0x80045430 grant",
+           "-p kill_signal 1 15 grant", "-p kill_signal 9 revoke", "-p socket_family 1 grant",
+           "-p socket_type 0 2 grant", "-c cap_chown grant"}))),
+      "answered as unknown: clone3\n"
+      "allowed: close read\n"
+      "allowed where argument 1 in 1, and argument 2 & 255 in 0-2: socket\n"
+      "allowed where argument 2 in 1-8 10-15: kill\n"
+      "allowed where argument 2 in 21505 0x80045430: ioctl\n"
+      "allowed where argument 3 in 1-8 10-15: tgkill\n"
+      "refused but to enter: execve execveat\n"
+      "refused: all others\n"
+      "enforced: -s read grant\n"
+      "enforced: -s write grant\n"
+      "enforced: -s close grant\n"
+      "narrowed: -s clone3 grant (clone3: answered as unknown, so that programs use clone)\n"
+      "enforced: -s ioctl grant\n"
+      "enforced: -s socket grant\n"
+      "enforced: -s tgkill grant\n"
+      "enforced: -s kill grant\n"
+      "enforced: -s write revoke\n"
+      "enforced: -p ioctl_request 0x5401 grant\n"
+      "enforced: -p ioctl_request 0x80045430 grant\n"
+      "enforced: -p kill_signal 1 15 grant\n"
+      "enforced: -p kill_signal 9 revoke\n"
+      "enforced: -p socket_family 1 grant\n"
+      "enforced: -p socket_type 0 2 grant\n");
+}
+
+TEST(Dump, ShowsWhatIsClosedBesides) {
+  EXPECT_EQ(
+      Dump(PlanCalls(DomainOf({"-s socket grant", "-s sendto grant", "-s unshare grant",
+                               "-s execve grant", "-p connect_port 443 grant"}))),
+      "allowed: execve\n"
+      "allowed where argument 1 & 0xfffaf0ff in 0, and upper half of argument 1 in 0: unshare\n"
+      "allowed where argument 1 in 0-16 18-20 22-23 25-29 31-32 34-40 42 45, and argument 1 in 0-1 "
+      "3-9 11-0xffffffff or argument 2 & 255 in 1, and argument 1 in 0-1 3-9 11-0xffffffff or "
+      "argument 3 in 0 6: socket\n"
+      "allowed where argument 4 & 0x20000000 in 0: sendto\n"
+      "refused: all others\n"
+      "narrowed: -s socket grant (socket: only TCP reaches the internet beside rules for ports)\n"
+      "narrowed: -s sendto grant (sendto: MSG_FASTOPEN is refused beside connect_port, as it "
+      "connects "
+      "unseen)\n"
+      "narrowed: -s unshare grant (unshare: new namespaces are refused unless clone_flags grants "
+      "them)\n"
+      "enforced: -s execve grant\n");
+}
+
+TEST(Dump, ShowsCapabilities) {
+  EXPECT_EQ(Dump(PlanCapabilities(
+                DomainOf({"-c cap_kill grant", "-c cap_chown grant", "-c cap_syslog grant"}),
+                1U << CAP_KILL | 1U << CAP_CHOWN, kLast)),
+            "capabilities: cap_chown cap_kill\n"
+            "enforced: -c cap_kill grant\n"
+            "enforced: -c cap_chown grant\n"
+            "narrowed: -c cap_syslog grant (this user has not cap_syslog)\n");
+  EXPECT_EQ(Dump(PlanCapabilities(DomainOf({}), 0, kLast)), "capabilities: none\n");
+}
+
+TEST(Dump, ShowsPorts) {
+  EXPECT_EQ(Dump(PlanNet(DomainOf({"-p bind_port 80 grant", "-p bind_port 443 grant"}), kAbi)),
+            "bind_port: 80, 443\n"
+            "connect_port: all ports\n"
+            "narrowed: -p bind_port 80 grant (for TCP only)\n"
+            "narrowed: -p bind_port 443 grant (for TCP only)\n");
+  EXPECT_EQ(Dump(PlanNet(DomainOf({"-p connect_port 0 65535 revoke"}), kAbi)),
+            "bind_port: all ports\n"
+            "connect_port: no port\n"
+            "enforced: -p connect_port 0 65535 revoke\n");
+}
+
+}  // namespace
+}  // namespace EnforceTest
