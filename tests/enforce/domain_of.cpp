@@ -16,6 +16,11 @@ Policy::Rule RuleOf(const std::string& line) {
   while (words >> word) rest.push_back(word);
   Policy::Rule rule;
   rule.kind = form->kind;
+  if (!form->endsInGrant) {
+    rule.words[0] = rest.front();
+    rule.verdict = Policy::Permissions::Parse(rest.size() > 1 ? rest.back() : "");
+    return rule;
+  }
   rule.verdict = rest.back() == "grant";
   if (!rule.Grants() && rest.back() != "revoke") throw std::invalid_argument(line);
   std::copy(rest.begin(), rest.end() - 1, rule.words.begin());

@@ -8,7 +8,7 @@
 
 namespace EnforceTest {
 
-// The rule that a policy line says, which ends in "grant" or "revoke".
+// The rule that a policy line says.
 Policy::Rule RuleOf(const std::string& line);
 
 // A domain with the rules that these lines say.

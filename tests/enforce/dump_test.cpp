@@ -93,5 +93,17 @@ TEST(Dump, ShowsPorts) {
             "enforced: -p connect_port 0 65535 revoke\n");
 }
 
+TEST(Dump, ShowsRightsToPaths) {
+  const Enforce::PathPlan plan = {
+      .rights = {{"/srv", Enforce::Landlock::kReadFile | Enforce::Landlock::kReadDir},
+                 {"/srv/f", Enforce::Landlock::kIoctlDev | Enforce::Landlock::kExecute}},
+      .fates = {{RuleOf("-r /srv r"), Enforce::Fate::kNarrowed, "why"}}};
+  EXPECT_EQ(Dump(plan),
+            "rights to files, each also to everything beneath:\n"
+            "  /srv: read-file read-dir\n"
+            "  /srv/f: execute ioctl-dev\n"
+            "narrowed: -r /srv r (why)\n");
+}
+
 }  // namespace
 }  // namespace EnforceTest

@@ -1,6 +1,7 @@
 #include "host/enforce/plan/dump.h"
 
 #include <algorithm>
+#include <array>
 #include <map>
 #include <sstream>
 #include <string_view>
@@ -13,6 +14,12 @@ using Braxo::Misc::StrCat;
 
 namespace Enforce {
 namespace {
+
+// In the order of their bits.
+constexpr std::array<const char*, 16> kRightNames = {
+    "execute",   "write-file", "read-file", "read-dir",  "remove-dir", "remove-file",
+    "make-char", "make-dir",   "make-reg",  "make-sock", "make-fifo",  "make-block",
+    "make-sym",  "refer",      "truncate",  "ioctl-dev"};
 
 // Decimal as far as people count, then as the headers of the kernel write it.
 std::string TextOf(std::uint32_t value) {
@@ -103,6 +110,18 @@ std::string Dump(const CapabilityPlan& plan) {
 
 std::string Dump(const NetPlan& plan) {
   return TextOf(kBindPort, plan.bind) + TextOf(kConnectPort, plan.connect) + Dump(plan.fates);
+}
+
+std::string Dump(const PathPlan& plan) {
+  std::string text = "rights to files, each also to everything beneath:\n";
+  for (const PathRight& right : plan.rights) {
+    text += "  " + right.path + ":";
+    for (std::size_t bit = 0; bit < kRightNames.size(); ++bit) {
+      if ((right.rights >> bit & 1) != 0) text += std::string(" ") + kRightNames[bit];
+    }
+    text += '\n';
+  }
+  return text + Dump(plan.fates);
 }
 
 }  // namespace Enforce

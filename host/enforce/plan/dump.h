@@ -7,6 +7,7 @@
 #include "host/enforce/plan/call_plan.h"
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/net_plan.h"
+#include "host/enforce/plan/path_plan.h"
 
 // Plans as people read them.
 namespace Enforce {
@@ -19,5 +20,6 @@ std::string Dump(const std::vector<RuleFate>& fates);
 std::string Dump(const CallPlan& plan);
 std::string Dump(const CapabilityPlan& plan);
 std::string Dump(const NetPlan& plan);
+std::string Dump(const PathPlan& plan);
 
 }  // namespace Enforce

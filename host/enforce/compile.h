@@ -1,0 +1,37 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "host/enforce/coverage.h"
+#include "host/enforce/features.h"
+#include "host/enforce/plan/path_plan.h"
+#include "host/enforce/plan/plan.h"
+#include "policy/installed_policy.h"
+
+namespace Enforce {
+
+// What a plan depends on beside the rules of its domain.
+struct Surroundings {
+  const Features& features;
+  const std::vector<LabelledPath>& places;
+  FileTree& files;
+};
+
+struct CompiledPlan {
+  Plan plan;
+  std::vector<RuleFate> fates;  // of all rules of the domain, in order
+};
+
+// The plan that confines a process to the domain by the means of this kernel. What these cannot
+// refuse is told in the fates; it is for the caller to say whether a domain is entered then. Throws
+// BraxoException for a rule whose words are no range.
+CompiledPlan Compile(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
+
+// The rules of a domain that cannot be kept to.
+std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates);
+
+// The same plan for people: what the kernel is told, and what becomes of the rules.
+std::string Explain(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
+
+}  // namespace Enforce

@@ -1,0 +1,62 @@
+#include "host/enforce/real_file_tree.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <linux/openat2.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <memory>
+
+namespace Enforce {
+namespace {
+
+// Opens what is at the path and only there: a link on the way leads nowhere.
+int OpenPlainly(const std::string& path, std::uint64_t flags) {
+  open_how how{};
+  how.flags = flags | O_NOFOLLOW | O_CLOEXEC;
+  how.resolve = RESOLVE_NO_SYMLINKS;
+  return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how));
+}
+
+FileKind KindOfMode(mode_t mode) {
+  if (S_ISDIR(mode)) return FileKind::kDirectory;
+  return S_ISLNK(mode) ? FileKind::kLink : FileKind::kFile;
+}
+
+struct CloseDirectory {
+  void operator()(DIR* directory) const { closedir(directory); }
+};
+
+bool IsEntry(const std::string& name) { return name != "." && name != ".."; }
+
+}  // namespace
+
+FileKind RealFileTree::KindOf(const std::string& path) {
+  const int file = OpenPlainly(path, O_PATH);
+  if (file < 0) return FileKind::kNothing;
+  struct stat status {};
+  const bool isThere = fstat(file, &status) == 0;
+  close(file);
+  return isThere ? KindOfMode(status.st_mode) : FileKind::kNothing;
+}
+
+std::optional<std::vector<std::string>> RealFileTree::List(const std::string& directory,
+                                                           std::size_t most) {
+  const int file = OpenPlainly(directory, O_RDONLY | O_DIRECTORY);
+  if (file < 0) return std::nullopt;
+  const std::unique_ptr<DIR, CloseDirectory> entries(fdopendir(file));
+  if (entries == nullptr) {
+    close(file);
+    return std::nullopt;
+  }
+  std::vector<std::string> names;
+  while (const dirent* const entry = readdir(entries.get())) {
+    if (IsEntry(entry->d_name)) names.emplace_back(entry->d_name);
+    if (names.size() > most) return std::nullopt;
+  }
+  return names;
+}
+
+}  // namespace Enforce

@@ -1,0 +1,111 @@
+// The plan of a whole domain: that every rule has its fate, by what this kernel can do.
+
+#include "host/enforce/compile.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "domain_of.h"
+
+namespace EnforceTest {
+namespace {
+
+using Enforce::Compile;
+using Enforce::CompiledPlan;
+using Enforce::Fate;
+using Enforce::Features;
+using Enforce::FileKind;
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::Field;
+using ::testing::IsEmpty;
+
+// Every path is a directory without entries.
+class EmptyDirectories : public Enforce::FileTree {
+ public:
+  FileKind KindOf(const std::string& /*path*/) override { return FileKind::kDirectory; }
+  std::optional<std::vector<std::string>> List(const std::string& /*directory*/,
+                                               std::size_t /*most*/) override {
+    return std::vector<std::string>();
+  }
+};
+
+Features NewKernel() {
+  return {.landlock = 7,
+          .seccomp = true,
+          .notifies = true,
+          .mounts = Enforce::Namespace::kPrivileged,
+          .capabilities = ~std::uint64_t{0},
+          .lastCapability = 40};
+}
+
+const std::vector<std::string> kOneOfEachKind = {"-a label read grant",
+                                                 "-c cap_kill grant",
+                                                 "-d gate otherDom exec grant",
+                                                 "-f label label regular grant",
+                                                 "-p set_uid 7 grant",
+                                                 "-p bind_port 80 grant",
+                                                 "-s read grant",
+                                                 "-u label stream revoke"};
+
+CompiledPlan CompileOn(const Features& features, const std::vector<std::string>& lines) {
+  EmptyDirectories files;
+  const std::vector<Enforce::LabelledPath> places = {{"/", "label"}};
+  return Compile(DomainOf(lines), {.features = features, .places = places, .files = files});
+}
+
+TEST(Compile, GivesEveryRuleItsFateInOrder) {
+  const CompiledPlan compiled = CompileOn(NewKernel(), kOneOfEachKind);
+  ASSERT_EQ(compiled.fates.size(), kOneOfEachKind.size());
+  for (std::size_t index = 0; index < kOneOfEachKind.size(); ++index) {
+    EXPECT_EQ(compiled.fates[index].rule.Text(), kOneOfEachKind[index]);
+  }
+}
+
+TEST(Compile, TakesWhatEachPartHas) {
+  const CompiledPlan compiled = CompileOn(NewKernel(), kOneOfEachKind);
+  EXPECT_EQ(compiled.plan.handledFiles, Enforce::Landlock::AllRights(7));
+  EXPECT_THAT(compiled.plan.paths, ElementsAre(Field(&Enforce::PathRight::path, "/")));
+  EXPECT_TRUE(compiled.plan.bindsChecked);
+  EXPECT_THAT(compiled.plan.bindPorts, ElementsAre(80));
+  EXPECT_EQ(compiled.plan.capabilities, std::uint64_t{1} << 5);
+  EXPECT_TRUE(compiled.plan.isScoped);
+  EXPECT_FALSE(compiled.plan.filter.empty());
+  EXPECT_TRUE(compiled.plan.secret.has_value());
+}
+
+TEST(Compile, TellsWhatAKernelWithoutLandlockCannotRefuse) {
+  for (const int version : {0, 1, 2}) {
+    Features features = NewKernel();
+    features.landlock = version;
+    const CompiledPlan compiled =
+        CompileOn(features, {"-r /srv r", "-a label read grant", "-c cap_kill grant"});
+    EXPECT_EQ(compiled.plan.handledFiles, 0U);
+    EXPECT_THAT(compiled.plan.paths, IsEmpty());
+    EXPECT_EQ(NotExpressible(compiled.fates).size(), 2U) << version;
+    EXPECT_EQ(compiled.fates[0].how,
+              "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)");
+  }
+}
+
+TEST(Compile, GivesNoRightThatTheKernelDoesNotKnow) {
+  for (int version = 3; version <= 7; ++version) {
+    Features features = NewKernel();
+    features.landlock = version;
+    const CompiledPlan compiled = CompileOn(features, {"-r /srv rw"});
+    const std::uint64_t known = Enforce::Landlock::AllRights(version);
+    EXPECT_EQ(compiled.plan.handledFiles, known);
+    for (const auto& right : compiled.plan.paths) EXPECT_EQ(right.rights & ~known, 0U) << version;
+    EXPECT_EQ(compiled.plan.isScoped, version >= 6);
+  }
+}
+
+TEST(Compile, TellsWhatAKernelWithoutFiltersCannotRefuse) {
+  Features features = NewKernel();
+  features.seccomp = false;
+  const CompiledPlan compiled = CompileOn(features, {"-s read grant", "-p set_uid 7 grant"});
+  EXPECT_THAT(compiled.fates, Each(Field(&Enforce::RuleFate::fate, Fate::kNotExpressible)));
+}
+
+}  // namespace
+}  // namespace EnforceTest

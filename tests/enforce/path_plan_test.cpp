@@ -1,0 +1,416 @@
+// Rights to paths: hunts for a right that no rule gives, on random trees by a model that knows the
+// decision only, and for one that is lost without a word.
+
+#include "host/enforce/plan/path_plan.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <map>
+#include <random>
+
+#include "policy/decision.h"
+
+namespace EnforceTest {
+namespace {
+
+using Enforce::Fate;
+using Enforce::FileKind;
+using Enforce::LabelledPath;
+using Enforce::PathPlan;
+using Enforce::PathRight;
+using Policy::FileAccess;
+using Policy::InstalledDomain;
+using Policy::Rule;
+using Policy::RuleKind;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+namespace Landlock = Enforce::Landlock;
+
+// ---- Files in memory
+
+class MemoryTree : public Enforce::FileTree {
+ public:
+  FileKind KindOf(const std::string& path) override {
+    const auto found = kinds.find(path);
+    return found == kinds.end() ? FileKind::kNothing : found->second;
+  }
+
+  std::optional<std::vector<std::string>> List(const std::string& directory,
+                                               std::size_t most) override {
+    std::vector<std::string> names;
+    for (const auto& [path, kind] : kinds) {
+      if (path != "/" && ParentOf(path) == directory) {
+        names.push_back(path.substr(path.rfind('/') + 1));
+      }
+    }
+    if (names.size() > most) return std::nullopt;
+    return names;
+  }
+
+  static std::string ParentOf(const std::string& path) {
+    return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));
+  }
+
+  std::map<std::string, FileKind> kinds = {{"/", FileKind::kDirectory}};
+};
+
+MemoryTree Files(std::initializer_list<const char*> directories,
+                 std::initializer_list<const char*> files) {
+  MemoryTree tree;
+  for (const char* path : directories) tree.kinds[path] = FileKind::kDirectory;
+  for (const char* path : files) tree.kinds[path] = FileKind::kFile;
+  return tree;
+}
+
+Rule Path(const std::string& path, const char* letters) {
+  return {
+      .kind = RuleKind::kFilePath, .words = {path}, .verdict = Policy::Permissions::Parse(letters)};
+}
+
+Rule RuleOf(RuleKind kind, const decltype(Rule::words)& words, bool grant = true) {
+  return {.kind = kind, .words = words, .verdict = grant};
+}
+
+Rule Object(const char* label, const char* access, bool grant = true) {
+  return RuleOf(RuleKind::kObjectAccess, {label, access}, grant);
+}
+
+InstalledDomain Domain(std::vector<Rule> rules) {
+  InstalledDomain domain;
+  domain.name = "testDom";
+  domain.rules = std::move(rules);
+  return domain;
+}
+
+constexpr std::uint64_t kReading = Landlock::kReadFile | Landlock::kReadDir;
+constexpr std::uint64_t kWriting =
+    Landlock::kWriteFile | Landlock::kTruncate | Landlock::kIoctlDev | Landlock::kRemoveFile |
+    Landlock::kRemoveDir | Landlock::kRefer | Landlock::kMakeReg | Landlock::kMakeDir |
+    Landlock::kMakeSym | Landlock::kMakeFifo | Landlock::kMakeSock;
+
+std::string HowOf(const PathPlan& plan, std::size_t rule) {
+  const auto& fate = plan.fates.at(rule);
+  return std::string(TextOf(fate.fate)) + (fate.how.empty() ? "" : ": " + fate.how);
+}
+
+// ---- One rule at a time
+
+TEST(PlanPaths, GivesADirectoryToEverythingBeneath) {
+  MemoryTree files = Files({"/srv", "/srv/a"}, {"/srv/a/f"});
+  const PathPlan plan = PlanPaths(Domain({Path("/srv", "rw")}), {}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/srv", kReading | kWriting}));
+  EXPECT_EQ(HowOf(plan, 0),
+            "narrowed: removing /srv takes the right to remove from the directory above it");
+}
+
+TEST(PlanPaths, GivesAFileOnlyWhatFitsIt) {
+  MemoryTree files = Files({}, {"/f"});
+  const PathPlan plan = PlanPaths(Domain({Path("/f", "rwx")}), {}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/f", Landlock::kOfFiles}));
+}
+
+TEST(PlanPaths, GivesANarrowerPathMore) {
+  MemoryTree files = Files({"/opt", "/opt/spool"}, {"/opt/f"});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "r"), Path("/opt/spool", "rw")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt/spool", kWriting}));
+  EXPECT_EQ(HowOf(plan, 0), "enforced");
+  EXPECT_EQ(HowOf(plan, 1),
+            "narrowed: removing /opt/spool takes the right to remove from the directory above it");
+}
+
+TEST(PlanPaths, TakesADirectoryApartWhereANarrowerPathHasLess) {
+  MemoryTree files = Files({"/opt", "/opt/bin", "/opt/spool"}, {"/opt/f", "/opt/spool/s"});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "rx"), Path("/opt/spool", "r")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt/bin", Landlock::kExecute},
+                          PathRight{"/opt/f", Landlock::kExecute}));
+  EXPECT_EQ(HowOf(plan, 0),
+            "narrowed: entries of /opt have different rights: those that are there at the start "
+            "have theirs, new ones and the directory itself do not");
+  EXPECT_EQ(HowOf(plan, 1), "enforced");
+}
+
+TEST(PlanPaths, LeavesALargeDirectoryThatItWouldHaveToTakeApart) {
+  MemoryTree files = Files({"/opt", "/opt/spool"}, {});
+  for (std::size_t count = 0; count < Enforce::kMostSiblings; ++count) {
+    files.kinds["/opt/" + std::to_string(count)] = FileKind::kFile;
+  }
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "rx"), Path("/opt/spool", "r")}), {}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", kReading}));
+  EXPECT_EQ(HowOf(plan, 0), "narrowed: /opt has more than 64 entries, and some have other rights");
+}
+
+TEST(PlanPaths, LetsNobodyMakeWhatAMissingPathRefuses) {
+  MemoryTree files = Files({"/srv", "/srv/a"}, {"/srv/f"});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/srv", "rw"), Path("/srv/private", "")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/srv/a", kReading | kWriting},
+                          PathRight{"/srv/f", (kReading | kWriting) & Landlock::kOfFiles}));
+}
+
+TEST(PlanPaths, TellsOfAPathThatIsNotThere) {
+  MemoryTree files;
+  const PathPlan plan = PlanPaths(Domain({Path("/srv", "r")}), {}, files);
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), "narrowed: there is nothing at /srv, or only a link");
+}
+
+TEST(PlanPaths, GivesWhatLabelsHave) {
+  MemoryTree files = Files({"/etc", "/etc/ssh"}, {"/etc/ssh/key", "/etc/hosts"});
+  const std::vector<LabelledPath> places = {
+      {"/", "unlabeled"}, {"/etc", "config"}, {"/etc/ssh/key", "key"}};
+  const PathPlan plan =
+      PlanPaths(Domain({Object("config", "read"), Object("key", "read"), Object("config", "list")}),
+                places, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/etc", kReading}));
+}
+
+TEST(PlanPaths, TakesADirectoryApartAroundALabelThatHasLess) {
+  MemoryTree files = Files({"/etc", "/etc/ssh"}, {"/etc/ssh/key", "/etc/ssh/known", "/etc/hosts"});
+  const std::vector<LabelledPath> places = {{"/etc", "config"}, {"/etc/ssh/key", "key"}};
+  const PathPlan plan = PlanPaths(Domain({Object("config", "read")}), places, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/etc/hosts", Landlock::kReadFile},
+                                       PathRight{"/etc/ssh/known", Landlock::kReadFile}));
+}
+
+TEST(PlanPaths, MakesWhatTheLabelOfADirectoryGrants) {
+  MemoryTree files = Files({"/spool"}, {});
+  const std::vector<LabelledPath> places = {{"/spool", "spool"}};
+  const PathPlan plan =
+      PlanPaths(Domain({RuleOf(RuleKind::kFileCreation, {"spool", "mail", "fifo"}),
+                        RuleOf(RuleKind::kFileCreation, {"spool", "mail", "regular"}),
+                        RuleOf(RuleKind::kFileCreation, {"spool", "spool", "symlink"}, false)}),
+                places, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/spool",
+                                    Landlock::kMakeFifo | Landlock::kMakeReg | Landlock::kRefer}));
+}
+
+TEST(PlanPaths, MakesNoDeviceByAPath) {
+  MemoryTree files = Files({"/dev"}, {});
+  const PathPlan plan = PlanPaths(
+      Domain({Path("/dev", "w"), RuleOf(RuleKind::kFileCreation, {"dev", "dev", "char_device"})}),
+      {{"/dev", "dev"}}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/dev", kWriting | Landlock::kMakeChar}));
+}
+
+TEST(PlanPaths, TellsKindsOfSocketsApartByWhatCanBeMadeAtAll) {
+  MemoryTree files = Files({"/run"}, {});
+  const Rule stream = RuleOf(RuleKind::kUnixSocketCreation, {"run", "stream"});
+  PathPlan plan = PlanPaths(Domain({stream}), {{"/run", "run"}}, files);
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0),
+            "narrowed: kinds of unix sockets are not told apart: it takes socket_type rules that "
+            "grant no other kind");
+  plan = PlanPaths(Domain({stream, RuleOf(RuleKind::kParameterCheck, {"socket_type", "1"})}),
+                   {{"/run", "run"}}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/run", Landlock::kMakeSock}));
+  EXPECT_EQ(HowOf(plan, 0), "enforced");
+}
+
+TEST(PlanPaths, NeedsReadToExecute) {
+  MemoryTree files = Files({"/bin"}, {});
+  const PathPlan plan = PlanPaths(Domain({Path("/bin", "x")}), {}, files);
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0),
+            "notExpressible: the kernel reads a program to execute it, and this one may not be "
+            "read");
+}
+
+TEST(PlanPaths, NeitherReadsNorExecutesWhatEntersAnotherDomain) {
+  MemoryTree files = Files({"/bin"}, {"/bin/other", "/bin/tool"});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/bin", "rx"),
+                        RuleOf(RuleKind::kDomainTransition, {"gate", "otherDom", "exec"})}),
+                {{"/bin/other", "gate"}}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/bin", Landlock::kReadDir},
+                          PathRight{"/bin/tool", Landlock::kReadFile | Landlock::kExecute}));
+  EXPECT_EQ(HowOf(plan, 1), "narrowed: only by \"secpolicy exec\"");
+}
+
+TEST(PlanPaths, EndsAtSomeNumberOfRights) {
+  MemoryTree files;
+  std::vector<Rule> rules;
+  for (std::size_t count = 0; count <= Enforce::kMostPathRights; ++count) {
+    rules.push_back(Path("/" + std::to_string(count), "r"));
+    files.kinds[rules.back().words[0]] = FileKind::kFile;
+  }
+  const PathPlan plan = PlanPaths(Domain(rules), {}, files);
+  EXPECT_EQ(plan.rights.size(), Enforce::kMostPathRights);
+  EXPECT_EQ(std::ranges::count(plan.fates, Fate::kNarrowed, &Enforce::RuleFate::fate), 1);
+}
+
+// ---- Random trees, held against the decision
+
+class Chance {
+ public:
+  explicit Chance(unsigned int seed) : engine(seed) {}
+  std::size_t Below(std::size_t end) { return engine() % end; }
+  template <class List>
+  const auto& Of(const List& list) {
+    return list[Below(list.size())];
+  }
+
+ private:
+  std::mt19937 engine;
+};
+
+struct World {
+  MemoryTree files;
+  std::map<std::string, std::string> labels;  // of every file
+  std::vector<LabelledPath> places;
+  InstalledDomain domain;
+};
+
+const std::vector<std::string> kLabels = {"one", "two", "three"};
+
+void AddEntries(World& world, const std::string& directory, int depth, Chance& chance) {
+  const std::size_t count = 1 + chance.Below(4);
+  for (std::size_t index = 0; index < count; ++index) {
+    const std::string path = (directory == "/" ? "" : directory) + "/" + "abcd"[index];
+    const bool isDirectory = depth < 4 && chance.Below(2) == 0;
+    world.files.kinds[path] = isDirectory ? FileKind::kDirectory : FileKind::kFile;
+    world.labels[path] =
+        chance.Below(4) == 0 ? chance.Of(kLabels) : world.labels[MemoryTree::ParentOf(path)];
+    if (isDirectory) AddEntries(world, path, depth + 1, chance);
+  }
+}
+
+Rule RandomRule(const World& world, Chance& chance) {
+  std::vector<std::string> paths = {"/e", "/a/new", "/a/b/new"};
+  for (const auto& [path, kind] : world.files.kinds) paths.push_back(path);
+  const std::vector<const char*> accesses = {"read", "write",  "execute",
+                                             "list", "remove", "truncate"};
+  const std::vector<const char*> letters = {"", "r", "w", "rw", "rx", "rwx", "rw", "x"};
+  const std::vector<const char*> kinds = {"regular", "directory", "symlink", "fifo", "char_device"};
+  const bool grant = chance.Below(4) != 0;
+  switch (chance.Below(6)) {
+    case 0:
+    case 1:
+      return Path(chance.Of(paths), chance.Of(letters));
+    case 2:
+    case 3:
+      return Object(chance.Of(kLabels).c_str(), chance.Of(accesses), grant);
+    case 4:
+      return RuleOf(RuleKind::kFileCreation,
+                    {chance.Of(kLabels), chance.Of(kLabels), chance.Of(kinds)}, grant);
+    default:
+      return RuleOf(RuleKind::kDomainTransition, {chance.Of(kLabels), "otherDom", "exec"}, grant);
+  }
+}
+
+World RandomWorld(unsigned int seed) {
+  Chance chance(seed);
+  World world;
+  world.labels["/"] = chance.Of(kLabels);
+  AddEntries(world, "/", 0, chance);
+  for (const auto& [path, label] : world.labels) {
+    const bool isPlace = path == "/" || world.labels[MemoryTree::ParentOf(path)] != label;
+    if (isPlace) world.places.push_back({path, label});
+  }
+  std::map<decltype(Rule::words), Rule> rules;
+  for (std::size_t count = chance.Below(8); count > 0; --count) {
+    Rule rule = RandomRule(world, chance);
+    auto subject = rule.words;
+    if (rule.kind == RuleKind::kFilePath) subject[1] = "path";
+    rules[subject] = std::move(rule);
+  }
+  for (auto& [subject, rule] : rules) world.domain.rules.push_back(std::move(rule));
+  world.domain.name = "testDom";
+  return world;
+}
+
+bool IsGiven(const PathPlan& plan, std::string path, std::uint64_t right) {
+  for (;; path = MemoryTree::ParentOf(path)) {
+    for (const PathRight& given : plan.rights) {
+      if (given.path == path && (given.rights & right) != 0) return true;
+    }
+    if (path == "/") return false;
+  }
+}
+
+bool IsTold(const PathPlan& plan, const Policy::Decision& decision) {
+  return std::ranges::any_of(decision.votes, [&](const Policy::Vote& vote) {
+    return std::ranges::any_of(plan.fates, [&](const Enforce::RuleFate& fate) {
+      return fate.rule.Text() == vote.rule.Text() && fate.fate != Fate::kEnforced;
+    });
+  });
+}
+
+class RandomPaths {
+ public:
+  explicit RandomPaths(unsigned int number)
+      : seed(number),
+        world(RandomWorld(number)),
+        plan(PlanPaths(world.domain, world.places, world.files)) {}
+
+  void Check() {
+    for (const auto& [path, label] : world.labels) CheckFile(path, label);
+  }
+
+  std::size_t Kept() const { return kept; }
+
+ private:
+  void CheckFile(const std::string& path, const std::string& label) {
+    const bool isDirectory = world.files.kinds[path] == FileKind::kDirectory;
+    const auto ask = [&](FileAccess access, const std::string& at, std::uint64_t right) {
+      Compare(Policy::FileQuestion{.access = access, .path = path, .label = label}, at, right);
+    };
+    if (path != "/")
+      ask(FileAccess::kRemove, MemoryTree::ParentOf(path),
+          isDirectory ? Landlock::kRemoveDir : Landlock::kRemoveFile);
+    if (!isDirectory) {
+      ask(FileAccess::kRead, path, Landlock::kReadFile);
+      ask(FileAccess::kWrite, path, Landlock::kWriteFile);
+      ask(FileAccess::kExecute, path, Landlock::kExecute);
+      ask(FileAccess::kTruncate, path, Landlock::kTruncate);
+      return;
+    }
+    ask(FileAccess::kList, path, Landlock::kReadDir);
+    for (const char* name : {"new", "e", "z"}) {
+      const std::string made = (path == "/" ? "" : path) + "/" + name;
+      for (const auto& [what, right] :
+           {std::pair("regular", Landlock::kMakeReg), std::pair("directory", Landlock::kMakeDir),
+            std::pair("symlink", Landlock::kMakeSym), std::pair("fifo", Landlock::kMakeFifo),
+            std::pair("char_device", Landlock::kMakeChar)}) {
+        Compare(Policy::CreationQuestion{.what = what, .path = made, .directoryLabel = label}, path,
+                right);
+      }
+    }
+  }
+
+  void Compare(const Policy::Question& question, const std::string& path, std::uint64_t right) {
+    const Policy::Decision decision = Decide(question, world.domain);
+    const bool isGiven = IsGiven(plan, path, right);
+    if (isGiven == decision.granted) {
+      kept += isGiven ? 1 : 0;
+      return;
+    }
+    EXPECT_FALSE(isGiven) << "seed " << seed << ": " << path << " has right " << right
+                          << " that no rule grants";
+    EXPECT_TRUE(IsTold(plan, decision))
+        << "seed " << seed << ": " << path << " lost right " << right;
+  }
+
+  const unsigned int seed;
+  World world;
+  const PathPlan plan;
+  std::size_t kept = 0;
+};
+
+TEST(PlanPaths, GivesNothingThatTheDecisionRefuses) {
+  std::size_t kept = 0;
+  for (unsigned int seed = 0; seed < 2000 && !HasFailure(); ++seed) {
+    RandomPaths paths(seed);
+    paths.Check();
+    kept += paths.Kept();
+  }
+  EXPECT_GT(kept, 20'000U);
+}
+
+}  // namespace
+}  // namespace EnforceTest
