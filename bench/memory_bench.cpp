@@ -1,10 +1,10 @@
 // How much memory a load takes, counted where it is asked for: exact, and the same on every run.
-#include <malloc.h>
-
 #include <algorithm>
+#include <cstddef>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <new>
@@ -19,17 +19,24 @@ std::size_t peak = 0;
 
 }  // namespace
 
+// What was asked for stands before each block. What malloc gives instead depends on which of its
+// blocks are free, and so on all that was done before.
 void* operator new(std::size_t size) {
-  void* block = std::malloc(size);
+  auto* const block = static_cast<std::max_align_t*>(std::malloc(sizeof(std::max_align_t) + size));
   if (block == nullptr) throw std::bad_alloc();
-  live += malloc_usable_size(block);
+  std::memcpy(block, &size, sizeof size);
+  live += size;
   peak = std::max(peak, live);
-  return block;
+  return block + 1;
 }
 
 void operator delete(void* block) noexcept {
-  live -= malloc_usable_size(block);
-  std::free(block);
+  if (block == nullptr) return;
+  auto* const start = static_cast<std::max_align_t*>(block) - 1;
+  std::size_t size = 0;
+  std::memcpy(&size, start, sizeof size);
+  live -= size;
+  std::free(start);
 }
 
 void operator delete(void* block, std::size_t /*size*/) noexcept { operator delete(block); }
