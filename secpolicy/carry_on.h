@@ -39,47 +39,34 @@ template <class Step>
 void TellFailure(const std::string& file, PolicyObserver& observer, Step step) {
   try {
     step();
+  } catch (const LineFailure& failure) {
+    Problem problem = failure.problem;
+    problem.file = file;
+    observer.OnProblem(problem);
+    RaiseError(failure.what());
   } catch (const Braxo::Lib::BraxoException& failure) {
     observer.OnProblem({.file = file, .reason = failure.what()});
     throw;
   }
 }
 
-// The lines of a policy file that have words, by number.
-using ParsedLines = std::map<unsigned int, std::queue<std::string>>;
-
-// Runs `readLine` on the words of each line of the policy file `file`, with a problem in which it
-// notes what it looks at. The problem of a line that cannot be read is told, and the BraxoException
-// passes on.
-template <class ReadLine>
-void ReadLines(const std::string& file, ParsedLines& lines, PolicyObserver& observer,
-               ReadLine readLine) {
-  for (auto& [line, words] : lines) {
-    if (words.empty()) continue;
-    Problem problem{.file = file, .line = line};
-    try {
-      readLine(words, problem);
-    } catch (const Braxo::Lib::BraxoException&) {
-      observer.OnProblem(problem);
-      throw;
-    }
-  }
-}
-
-// As above, of a file that is parsed first.
+// Runs `readLine` on the number and the words of each line of the policy file `file` that has any.
+// A failure is told, and passes on.
 template <class ReadLine>
 void ReadLines(const std::string& file, PolicyObserver& observer, ReadLine readLine) {
-  ParsedLines lines;
-  TellFailure(file, observer, [&] { ParseFile(file, lines); });
-  ReadLines(file, lines, observer, readLine);
+  TellFailure(file, observer, [&] {
+    std::map<unsigned int, std::queue<std::string>> lines;
+    ParseFile(file, lines);
+    for (auto& [line, words] : lines) {
+      if (!words.empty()) readLine(line, words);
+    }
+  });
 }
 
-// Tells that a phase of a load begins, and at the end of its life that the phase ends.
+// Tells at the end of its life that a phase of a load ends.
 class PhaseOfLoad {
  public:
-  PhaseOfLoad(LoadPhase begun, PolicyObserver& told) : phase(begun), observer(told) {
-    observer.OnBegin(phase);
-  }
+  PhaseOfLoad(LoadPhase begun, PolicyObserver& told) : phase(begun), observer(told) {}
   PhaseOfLoad(const PhaseOfLoad&) = delete;
   PhaseOfLoad& operator=(const PhaseOfLoad&) = delete;
   ~PhaseOfLoad() { observer.OnEnd(phase); }

@@ -1,4 +1,5 @@
 #include <array>
+#include <iterator>
 
 #include "secpolicy/cached_domains.h"
 #include "secpolicy/carry_on.h"
@@ -12,52 +13,48 @@
 namespace SecPolicy {
 namespace {
 
+// What becomes of the identifier of a domain that every host needs.
 struct WellKnownDomain {
-  const char* name;
   void (*cache)(unsigned int id);
-  bool (TeskAccessInterfaceImpl::*announce)(unsigned int id);  // null: nobody is told
+  bool (TeskAccessInterfaceImpl::*announce)(unsigned int id);  // null: the kernel is not told
   const char* missing;
 };
 
-constexpr std::array kWellKnownDomains = {
-    WellKnownDomain{kGlobalVmDomain, CacheGlobalVMDomain,
-                    &TeskAccessInterfaceImpl::SetGlobalVMDomain,
-                    "Failed to fetch domainID for global VM Domain"},
-    WellKnownDomain{kIoFilterDomain, CacheIOFilterDomain,
-                    &TeskAccessInterfaceImpl::SetIoFilterDomain,
-                    "Failed to fetch domainID for IOFilter domain"},
-    WellKnownDomain{kDefaultTardiskDomain, CacheDefaultTardiskDomain, nullptr,
-                    "Failed to fetch domainID for default tar disk domain"},
-    WellKnownDomain{kDaemonFrameworkDomain, CacheDaemonFrameworkDomain,
-                    &TeskAccessInterfaceImpl::SetDaemonFrameworkDomain,
-                    "Failed to fetch domainID for daemon framework domain"},
-};
+// In the order of kNeededDomains.
+constexpr std::array<WellKnownDomain, std::size(kNeededDomains)> kWellKnownDomains = {{
+    {CacheGlobalVMDomain, &TeskAccessInterfaceImpl::SetGlobalVMDomain,
+     "Failed to fetch domainID for global VM Domain"},
+    {CacheIOFilterDomain, &TeskAccessInterfaceImpl::SetIoFilterDomain,
+     "Failed to fetch domainID for IOFilter domain"},
+    {CacheDefaultTardiskDomain, nullptr, "Failed to fetch domainID for default tar disk domain"},
+    {CacheDaemonFrameworkDomain, &TeskAccessInterfaceImpl::SetDaemonFrameworkDomain,
+     "Failed to fetch domainID for daemon framework domain"},
+}};
 
 std::string Join(const std::string& root, const char* directory) { return root + "/" + directory; }
 
 // A host must not come up without its well-known domains, so this ends the process: no exception is
 // being handled here. A caller that loads the policy inside a handler gets its own exception back.
-[[noreturn]] void StopWithout(const WellKnownDomain& domain, PolicyObserver& observer) {
-  observer.OnMissingDomain(domain.name);
-  ReportError(domain.missing, observer);
+[[noreturn]] void StopWithout(const char* domain, const char* message, PolicyObserver& observer) {
+  observer.OnMissingDomain(domain);
+  ReportError(message, observer);
   throw;
 }
 
 void ResolveWellKnownDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
-  for (const WellKnownDomain& domain : kWellKnownDomains) {
+  for (std::size_t i = 0; i < kWellKnownDomains.size(); ++i) {
+    const auto& [cache, announce, missing] = kWellKnownDomains[i];
     unsigned int id = 0;
-    if (!access.FindDomain(domain.name, &id)) StopWithout(domain, observer);
-    domain.cache(id);
-    if (domain.announce != nullptr) (access.*domain.announce)(id);
+    if (!access.FindDomain(kNeededDomains[i], &id))
+      StopWithout(kNeededDomains[i], missing, observer);
+    cache(id);
+    if (announce != nullptr) (access.*announce)(id);
   }
 }
 
 }  // namespace
 
-void LoadPolicy(const std::string& policyDir) {
-  PolicyObserver nobody;
-  LoadPolicy(policyDir, nobody);
-}
+void LoadPolicy(const std::string& policyDir) { LoadPolicy(policyDir, Nobody()); }
 
 void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
   TeskAccessInterfaceImpl access;
@@ -81,8 +78,7 @@ void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
 }
 
 void LoadPolicyEarly(const std::string& earlyPolicyDir) {
-  PolicyObserver nobody;
-  LoadPolicyEarly(earlyPolicyDir, nobody);
+  LoadPolicyEarly(earlyPolicyDir, Nobody());
 }
 
 void LoadPolicyEarly(const std::string& earlyPolicyDir, PolicyObserver& observer) {
@@ -95,10 +91,7 @@ void LoadPolicyEarly(const std::string& earlyPolicyDir, PolicyObserver& observer
   });
 }
 
-void RestoreDomainEnforcement() {
-  PolicyObserver nobody;
-  RestoreDomainEnforcement(nobody);
-}
+void RestoreDomainEnforcement() { RestoreDomainEnforcement(Nobody()); }
 
 void RestoreDomainEnforcement(PolicyObserver& observer) {
   CarryOn(observer, [] {
@@ -108,10 +101,7 @@ void RestoreDomainEnforcement(PolicyObserver& observer) {
   });
 }
 
-void DisplayPolicy(const std::string& domainName) {
-  PolicyObserver nobody;
-  DisplayPolicy(domainName, nobody);
-}
+void DisplayPolicy(const std::string& domainName) { DisplayPolicy(domainName, Nobody()); }
 
 void DisplayPolicy(const std::string& domainName, PolicyObserver& observer) {
   TeskAccessInterfaceImpl access;

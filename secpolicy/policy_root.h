@@ -26,11 +26,7 @@ inline constexpr char kEarlyDir[] = "early";
 inline constexpr char kTardiskImagesDir[] = "/tardisks/";
 
 // The domains that every host needs: a load asks for them by name, in this order.
-inline constexpr char kGlobalVmDomain[] = "globalVMDom";
-inline constexpr char kIoFilterDomain[] = "ioFilterDom";
-inline constexpr char kDefaultTardiskDomain[] = "appDom";
-inline constexpr char kDaemonFrameworkDomain[] = "daemonFrameworkDom";
-inline constexpr const char* kNeededDomains[] = {kGlobalVmDomain, kIoFilterDomain,
-                                                 kDefaultTardiskDomain, kDaemonFrameworkDomain};
+inline constexpr const char* kNeededDomains[] = {"globalVMDom", "ioFilterDom", "appDom",
+                                                 "daemonFrameworkDom"};
 
 }  // namespace SecPolicy

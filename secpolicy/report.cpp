@@ -42,6 +42,11 @@ void SecpolicyError(const std::string& message) {
   TeskCtl::System::WriteToKlog(message, "[ERR]");
 }
 
+PolicyObserver& Nobody() {
+  static PolicyObserver nobody;
+  return nobody;
+}
+
 void ReportError(const std::string& message, PolicyObserver& observer) {
   observer.OnError(message);
   SecpolicyError(message);

@@ -6,6 +6,9 @@ namespace SecPolicy {
 
 class PolicyObserver;
 
+// The observer of what nobody observes.
+PolicyObserver& Nobody();
+
 // Throws Braxo::Lib::BraxoException with `message`.
 [[noreturn]] void RaiseError(const std::string& message);
 

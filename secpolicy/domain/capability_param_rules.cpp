@@ -11,21 +11,21 @@ using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 constexpr std::size_t kTokenCount = 4;
 constexpr std::size_t kTokenCountWithoutSecondParam = 3;
 
-void TakeParamCheck(TeskAccess_CapabilityParamRule& rule, RuleLine& line,
-                    TeskAccessInterfaceImpl& access) {
+void TakeParamCheck(TeskAccess_CapabilityParamRule& rule, RuleLine& line) {
   line.RequireCount(kTokenCountWithoutSecondParam, kTokenCount);
   rule.paramCheck = line.Take();
   rule.firstParam = line.Take();
   if (line.Left() > 1) rule.secondParam = line.Take();
   rule.grant = line.TakeGrant();
-  line.Validate(rule.paramCheck, 1, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK, access);
+  line.Validate(rule.paramCheck, 1, TeskCtl::Security::TESKACCESS_KEYWORD_PARAM_CHECK);
 }
 
 }  // namespace
 
-void CapabilityParamRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_CapabilityParamRule& rule) { TakeParamCheck(rule, line, access); });
+void CapabilityParamRules::AddRule(unsigned int line, const std::string& domainName,
+                                   unsigned int domainId, std::queue<std::string> args,
+                                   TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakeParamCheck);
 }
 
 void CapabilityParamRules::Set(TeskAccessInterfaceImpl& access) {

@@ -14,9 +14,10 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void CapabilityRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_CapabilityRule& rule) { TakeTokens(rule, kTokens, line, access); });
+void CapabilityRules::AddRule(unsigned int line, const std::string& domainName,
+                              unsigned int domainId, std::queue<std::string> args,
+                              TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
 }
 
 void CapabilityRules::Set(TeskAccessInterfaceImpl& access) {
@@ -27,12 +28,6 @@ void CapabilityRules::ReadSystemRules(unsigned int domainId, TeskAccessInterface
   access.GetCapabilityRules(domainId, rules);
 }
 
-void CapabilityRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
-
-void CapabilityRules::PrintRules() {
-  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_CapabilityRule& rule) {
-    AppendTokens(text, rule, kTokens);
-  });
-}
+void CapabilityRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
 
 }  // namespace SecPolicy

@@ -11,23 +11,22 @@ constexpr std::size_t kTokenCount = 4;
 
 // The target is looked up before the rest of the line is read: a line that names an unknown domain
 // says so, whatever else is wrong with it.
-void TakeTransition(TeskAccess_DomTransRule& rule, RuleLine& line,
-                    TeskAccessInterfaceImpl& access) {
+void TakeTransition(TeskAccess_DomTransRule& rule, RuleLine& line) {
   line.RequireCount(kTokenCount);
   rule.label = line.Take();
   rule.targetDomain = line.Take();
-  rule.targetDomainId = line.FindDomain(rule.targetDomain, access);
+  rule.targetDomainId = line.FindDomain(rule.targetDomain);
   rule.transitionKind = line.Take();
   rule.grant = line.TakeGrant();
-  line.Validate(rule.label, 1, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, access);
-  line.Validate(rule.transitionKind, 3, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS, access);
+  line.Validate(rule.label, 1, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL);
+  line.Validate(rule.transitionKind, 3, TeskCtl::Security::TESKACCESS_KEYWORD_DOM_TRANS);
 }
 
 }  // namespace
 
-void DomTransRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_DomTransRule& rule) { TakeTransition(rule, line, access); });
+void DomTransRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
+                            std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakeTransition);
 }
 
 void DomTransRules::Set(TeskAccessInterfaceImpl& access) {
@@ -37,8 +36,6 @@ void DomTransRules::Set(TeskAccessInterfaceImpl& access) {
 void DomTransRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImpl& access) {
   access.GetDomTransRules(domainId, rules);
 }
-
-void DomTransRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
 
 void DomTransRules::PrintRules() {
   PrintEach(keyword, rules, [](std::string& text, const TeskAccess_DomTransRule& rule) {

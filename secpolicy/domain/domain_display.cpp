@@ -28,8 +28,7 @@ void DisplayAllDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer
 }  // namespace
 
 void DisplayPolicyDomains(TeskAccessInterfaceImpl& access, const std::string& domain) {
-  PolicyObserver nobody;
-  DisplayPolicyDomains(access, domain, nobody);
+  DisplayPolicyDomains(access, domain, Nobody());
 }
 
 void DisplayPolicyDomains(TeskAccessInterfaceImpl& access, const std::string& domain,
@@ -44,8 +43,7 @@ void DisplayPolicyDomains(TeskAccessInterfaceImpl& access, const std::string& do
 }
 
 void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id) {
-  PolicyObserver nobody;
-  DisplayDomainPolicy(access, id, nobody);
+  DisplayDomainPolicy(access, id, Nobody());
 }
 
 void DisplayDomainPolicy(TeskAccessInterfaceImpl& access, unsigned int id,

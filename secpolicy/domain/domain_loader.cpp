@@ -77,8 +77,16 @@ bool SetPolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& acce
   return set;
 }
 
-void LoadDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
-                 PolicyObserver& observer) {
+}  // namespace
+
+void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access) {
+  LoadPolicyDomains(dir, access, Nobody());
+}
+
+void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                       PolicyObserver& observer) {
+  const PhaseOfLoad phase(
+      dir == kPartnerDomainsDir ? LoadPhase::kPartnerDomains : LoadPhase::kDomains, observer);
   std::list<DomainPolicy> domains = NameDomains(dir, access, observer);
   const bool parsed = ParsePolicies(domains, access, observer);
   CheckConstraints(domains, access, observer);
@@ -87,28 +95,13 @@ void LoadDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
   if (!parsed || !set) RaiseError("Failure in domain policy");
 }
 
-}  // namespace
-
-void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  LoadPolicyDomains(dir, access, nobody);
-}
-
-void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
-                       PolicyObserver& observer) {
-  const PhaseOfLoad phase(LoadPhase::kDomains, observer);
-  LoadDomains(dir, access, observer);
-}
-
 void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  LoadPartnerPolicyDomains(access, nobody);
+  LoadPartnerPolicyDomains(access, Nobody());
 }
 
 void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   if (File_Exists(kPartnerDomainsDir) && File_IsDirectory(kPartnerDomainsDir)) {
-    const PhaseOfLoad phase(LoadPhase::kPartnerDomains, observer);
-    LoadDomains(kPartnerDomainsDir, access, observer);
+    LoadPolicyDomains(kPartnerDomainsDir, access, observer);
   }
 }
 

@@ -33,54 +33,37 @@ DomainPolicy::DomainPolicy(const std::string& domainName, unsigned int domainId)
   AddRuleSet<FilePathAccessRules>("-r");
 }
 
-void DomainPolicy::ParsePolicy(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  ParsePolicy(access, nobody);
-}
-
 void DomainPolicy::ParsePolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   if (policyFile.empty()) RaiseError("Policy file path has not been set for domain " + name);
 
-  std::map<unsigned int, std::queue<std::string>> parsed;
-  TellFailure(policyFile, observer, [&] { ParseFile(policyFile, parsed); });
-  ProcessParsedPolicyFile(access, parsed, observer);
+  TellFailure(policyFile, observer, [&] {
+    std::map<unsigned int, std::queue<std::string>> parsed;
+    ParseFile(policyFile, parsed);
+    ProcessParsedPolicyFile(access, parsed);
+  });
 }
 
 void DomainPolicy::ProcessParsedPolicyFile(
     TeskAccessInterfaceImpl& access, std::map<unsigned int, std::queue<std::string>>& parsed) {
-  PolicyObserver nobody;
-  ProcessParsedPolicyFile(access, parsed, nobody);
+  for (auto& [line, tokens] : parsed) {
+    if (!tokens.empty()) ParseLine(line, tokens, access);
+  }
 }
 
-void DomainPolicy::ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
-                                           std::map<unsigned int, std::queue<std::string>>& parsed,
-                                           PolicyObserver& observer) {
-  ReadLines(policyFile, parsed, observer,
-            [&](auto& tokens, Problem& problem) { ParseLine(tokens, access, problem); });
-}
-
-void DomainPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
-                             Problem& problem) {
+void DomainPolicy::ParseLine(unsigned int line, std::queue<std::string>& tokens,
+                             TeskAccessInterfaceImpl& access) {
   const std::string keyword = std::move(tokens.front());
   tokens.pop();
   const auto rules = ruleSets.find(keyword);
   if (rules == ruleSets.end()) {
-    problem.fault = Fault::kRuleType;
-    problem.word = 0;
-    problem.reason = "invalid policy rule type (" + keyword + ")";
-    RaisePolicyParseError(problem.line, name, problem.reason);
+    RaisePolicyParseError(line, name, "invalid policy rule type (" + keyword + ")",
+                          Fault::kRuleType, 0);
   }
-  RuleLine line(problem.line, name, id, tokens, problem);
-  rules->second->AddLine(line, access);
+  rules->second->AddRule(line, name, id, tokens, access);
 }
 
 void DomainPolicy::CheckPolicyConstraints(TeskAccessInterfaceImpl& access) {
   for (const auto& [keyword, rules] : ruleSets) rules->CheckConstraints(name, access);
-}
-
-void DomainPolicy::SetPolicy(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  SetPolicy(access, nobody);
 }
 
 void DomainPolicy::SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
@@ -88,13 +71,14 @@ void DomainPolicy::SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& ob
     RaiseError("Skipping the policy for domain " + name + " due to errors in the policy");
   }
   TellFailure(policyFile, observer, [&] {
-    for (const auto& [keyword, rules] : ruleSets) rules->SetObserved(access, observer);
+    for (const auto& [keyword, rules] : ruleSets) {
+      if (auto* const paths = dynamic_cast<FilePathAccessRules*>(rules.get())) {
+        paths->SetObserved(observer);
+      } else {
+        rules->Set(access);
+      }
+    }
   });
-}
-
-void DomainPolicy::ReadSystemPolicy(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  ReadSystemPolicy(access, nobody);
 }
 
 void DomainPolicy::ReadSystemPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {

@@ -6,6 +6,7 @@
 #include <string>
 
 #include "secpolicy/domain/policy_rules.h"
+#include "secpolicy/report.h"
 
 namespace SecPolicy {
 
@@ -17,33 +18,26 @@ class DomainPolicy {
   DomainPolicy(const std::string& name, unsigned int id);
 
   // Reads `policyFile` into the rule sets. Throws at the first bad line; the rules before it stay.
-  void ParsePolicy(TeskAccessInterfaceImpl& access);
-  void ParsePolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
+  void ParsePolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer = Nobody());
 
   // Hands every line of `parsed` to the rule set of its first word, which is taken off the line.
   // Throws at the first bad line; the rules before it stay.
   void ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
                                std::map<unsigned int, std::queue<std::string>>& parsed);
-  void ProcessParsedPolicyFile(TeskAccessInterfaceImpl& access,
-                               std::map<unsigned int, std::queue<std::string>>& parsed,
-                               PolicyObserver& observer);
 
-  // The same for the line `problem.line`, which has tokens. Before it throws, `problem` says what
-  // is wrong with the line.
-  void ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
-                 Problem& problem);
+  // The same for one line, which has tokens. Throws LineFailure.
+  void ParseLine(unsigned int line, std::queue<std::string>& tokens,
+                 TeskAccessInterfaceImpl& access);
 
   // Checks the rules of each set against each other. Throws at the first set that fails.
   void CheckPolicyConstraints(TeskAccessInterfaceImpl& access);
 
   // Installs all rule sets. Throws, having touched none, while `hasErrors` is set, and at the first
   // set that is refused; those before it stay installed.
-  void SetPolicy(TeskAccessInterfaceImpl& access);
-  void SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
+  void SetPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer = Nobody());
 
   // Fills the rule sets from the kernel. A set that cannot be read is reported, not thrown.
-  void ReadSystemPolicy(TeskAccessInterfaceImpl& access);
-  void ReadSystemPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
+  void ReadSystemPolicy(TeskAccessInterfaceImpl& access, PolicyObserver& observer = Nobody());
 
   // Prints the rules to standard output.
   void PrintPolicy();

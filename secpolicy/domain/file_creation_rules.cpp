@@ -17,9 +17,10 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void FileCreationRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_FileCreationRule& rule) { TakeTokens(rule, kTokens, line, access); });
+void FileCreationRules::AddRule(unsigned int line, const std::string& domainName,
+                                unsigned int domainId, std::queue<std::string> args,
+                                TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
 }
 
 void FileCreationRules::Set(TeskAccessInterfaceImpl& access) {
@@ -30,12 +31,6 @@ void FileCreationRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfa
   access.GetFileCreationRules(domainId, rules);
 }
 
-void FileCreationRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
-
-void FileCreationRules::PrintRules() {
-  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_FileCreationRule& rule) {
-    AppendTokens(text, rule, kTokens);
-  });
-}
+void FileCreationRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
 
 }  // namespace SecPolicy

@@ -29,6 +29,26 @@ const Access& FindAccess(char letter) {
   RaiseError("Unknown access privilege specified.");
 }
 
+unsigned int MaskOf(const std::string& permissions) {
+  if (permissions.size() > kAccesses.size()) RaiseError("Please enter the permissions from [rwx].");
+  unsigned int mask = 0;
+  for (const char letter : permissions) {
+    const Access& access = FindAccess(letter);
+    if ((mask & access.bit) != 0) RaiseError(access.repeated);
+    mask |= access.bit;
+  }
+  return mask;
+}
+
+// Permissions are checked only when a rule is set, and their failure is meant to stay bare.
+unsigned int MaskOf(const TeskAccess_FilePathAccessRule& rule) {
+  try {
+    return MaskOf(rule.permissions);
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    throw LineFailure(failure.what(), {.line = rule.line, .reason = failure.what()});
+  }
+}
+
 void TakePath(TeskAccess_FilePathAccessRule& rule, RuleLine& line) {
   line.RequireCount(1, 2);
   rule.path = line.Take();
@@ -49,33 +69,22 @@ unsigned int FillPaths(PathEntries& entries, const std::string& path) {
 
 }  // namespace
 
-void FilePathAccessRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl&) {
-  AppendRule(rules, line, [&](TeskAccess_FilePathAccessRule& rule) { TakePath(rule, line); });
+void FilePathAccessRules::AddRule(unsigned int line, const std::string& domainName,
+                                  unsigned int domainId, std::queue<std::string> args,
+                                  TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakePath);
 }
 
 unsigned int FilePathAccessRules::GetPermission(const std::string& permissions) {
-  if (permissions.size() > kAccesses.size()) RaiseError("Please enter the permissions from [rwx].");
-  unsigned int mask = 0;
-  for (const char letter : permissions) {
-    const Access& access = FindAccess(letter);
-    if ((mask & access.bit) != 0) RaiseError(access.repeated);
-    mask |= access.bit;
-  }
-  return mask;
+  return MaskOf(permissions);
 }
 
-void FilePathAccessRules::Set(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  SetObserved(access, nobody);
-}
-
-void FilePathAccessRules::SetObserved(TeskAccessInterfaceImpl&, PolicyObserver& observer) {
+void FilePathAccessRules::SetObserved(PolicyObserver& observer) {
   for (const TeskAccess_FilePathAccessRule& rule : rules) {
     observer.OnPathRule(rule);
     PathEntries entries{};
     const unsigned int count = FillPaths(entries, rule.path);
-    // Permissions are checked only here, and their failure is meant to stay bare.
-    const unsigned int permission = GetPermission(rule.permissions);
+    const unsigned int permission = MaskOf(rule);
     for (TeskAccess_FileRule& entry : entries) entry.permission = permission;
 
     unsigned int result = 0;
@@ -90,8 +99,6 @@ void FilePathAccessRules::SetObserved(TeskAccessInterfaceImpl&, PolicyObserver& 
 void FilePathAccessRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImpl& access) {
   access.GetFilePathAccessRules(domainId, rules);
 }
-
-void FilePathAccessRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
 
 void FilePathAccessRules::PrintRules() {
   PrintEach(keyword, rules, [](std::string& text, const TeskAccess_FilePathAccessRule& rule) {

@@ -1,9 +1,9 @@
 #pragma once
 
 #include <list>
-#include <utility>
 
 #include "secpolicy/domain/policy_rules.h"
+#include "secpolicy/report.h"
 
 namespace SecPolicy {
 
@@ -11,16 +11,15 @@ namespace SecPolicy {
 class FilePathAccessRules : public virtual PolicyRules {
  public:
   void AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
-               std::queue<std::string> args, TeskAccessInterfaceImpl& access) override {
-    AddWords(line, domainName, domainId, std::move(args), access);
-  }
-  void Set(TeskAccessInterfaceImpl& access) override;
+               std::queue<std::string> args, TeskAccessInterfaceImpl& access) override;
+  void Set(TeskAccessInterfaceImpl&) override { SetObserved(Nobody()); }
   void ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImpl& access) override;
-  void CheckConstraints(const std::string& domainName, TeskAccessInterfaceImpl& access) override;
+  void CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) override {}
   void PrintRules() override;
   ~FilePathAccessRules() override = default;
-  void AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) override;
-  void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) override;
+
+  // As Set, and tells `observer` of each rule: the host is not told the lines of these.
+  void SetObserved(PolicyObserver& observer);
 
   // Returns the kernel's permission mask for `permissions`, at most one each of "r", "w" and "x";
   // 0 when empty. Throws for anything else, with a message that names neither domain nor line.

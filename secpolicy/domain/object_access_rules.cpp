@@ -15,9 +15,10 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void ObjectAccessRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_ObjectAccessRule& rule) { TakeTokens(rule, kTokens, line, access); });
+void ObjectAccessRules::AddRule(unsigned int line, const std::string& domainName,
+                                unsigned int domainId, std::queue<std::string> args,
+                                TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
 }
 
 void ObjectAccessRules::Set(TeskAccessInterfaceImpl& access) {
@@ -28,12 +29,6 @@ void ObjectAccessRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfa
   access.GetObjectAccessRules(domainId, rules);
 }
 
-void ObjectAccessRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
-
-void ObjectAccessRules::PrintRules() {
-  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_ObjectAccessRule& rule) {
-    AppendTokens(text, rule, kTokens);
-  });
-}
+void ObjectAccessRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
 
 }  // namespace SecPolicy

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <list>
-#include <utility>
 
 #include "secpolicy/domain/policy_rules.h"
 
@@ -11,15 +10,12 @@ namespace SecPolicy {
 class ObjectAccessRules : public virtual PolicyRules {
  public:
   void AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
-               std::queue<std::string> args, TeskAccessInterfaceImpl& access) override {
-    AddWords(line, domainName, domainId, std::move(args), access);
-  }
+               std::queue<std::string> args, TeskAccessInterfaceImpl& access) override;
   void Set(TeskAccessInterfaceImpl& access) override;
   void ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImpl& access) override;
-  void CheckConstraints(const std::string& domainName, TeskAccessInterfaceImpl& access) override;
+  void CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) override {}
   void PrintRules() override;
   ~ObjectAccessRules() override = default;
-  void AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) override;
 
   std::list<TeskCtl::Security::TeskAccess_ObjectAccessRule> rules;
 };

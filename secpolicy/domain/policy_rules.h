@@ -3,8 +3,6 @@
 #include <queue>
 #include <string>
 
-#include "secpolicy/domain/rule_line.h"
-#include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
@@ -37,20 +35,7 @@ class PolicyRules {
 
   virtual ~PolicyRules() = default;
 
-  // As AddRule, of a line that keeps what is wrong with it.
-  virtual void AddLine(RuleLine& line, TeskAccessInterfaceImpl& access);
-
-  // As Set, and tells `observer` of the rules whose lines the host is not told.
-  virtual void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& /*observer*/) {
-    Set(access);
-  }
-
   std::string keyword;  // the rule-type word, such as "-r"
-
- protected:
-  // AddLine for who has only the words.
-  void AddWords(unsigned int line, const std::string& domainName, unsigned int domainId,
-                std::queue<std::string> args, TeskAccessInterfaceImpl& access);
 };
 
 }  // namespace SecPolicy

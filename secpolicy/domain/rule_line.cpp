@@ -7,15 +7,11 @@
 
 namespace SecPolicy {
 
-RuleLine::RuleLine(unsigned int lineNumber, const std::string& nameOfDomain,
-                   unsigned int idOfDomain, std::queue<std::string> args, Problem& noted)
-    : line(lineNumber),
-      domainName(nameOfDomain),
-      domainId(idOfDomain),
-      words(std::move(args)),
-      problem(noted) {}
+RuleLine::RuleLine(unsigned int line, const std::string& name, unsigned int id,
+                   std::queue<std::string> args, TeskAccessInterfaceImpl& host)
+    : number(line), domainName(name), domainId(id), words(std::move(args)), access(host) {}
 
-void RuleLine::RequireCount(std::size_t least, std::size_t most) const {
+void RuleLine::RequireCount(std::size_t least, std::size_t most) {
   Note(Fault::kArgumentCount, Problem::kWholeLine);
   if (words.size() < least || words.size() > most) RuleSizeError();
 }
@@ -33,28 +29,26 @@ bool RuleLine::TakeGrant() {
   return IsGrant(word);
 }
 
-unsigned int RuleLine::FindDomain(const std::string& name, TeskAccessInterfaceImpl& access) const {
+unsigned int RuleLine::FindDomain(const std::string& domain) {
   Note(Fault::kUnknownDomain, taken);
   unsigned int id = 0;
-  if (!access.FindDomain(name, &id)) RaiseError("Failed to fetch domain id for: " + name);
+  if (!access.FindDomain(domain, &id)) RaiseError("Failed to fetch domain id for: " + domain);
   return id;
 }
 
 void RuleLine::Validate(const std::string& text, std::size_t word,
-                        TeskCtl::Security::TeskAccess_KeywordType table,
-                        TeskAccessInterfaceImpl& access) const {
+                        TeskCtl::Security::TeskAccess_KeywordType table) {
   Note(Fault::kUnknownWord, word);
   access.ValidateKeyword(table, text);
 }
 
 void RuleLine::Refuse(const std::string& reason) const {
-  problem.reason = reason;
-  RaisePolicyParseError(line, domainName, reason);
+  RaisePolicyParseError(number, domainName, reason, notedFault, notedWord);
 }
 
-void RuleLine::Note(Fault fault, std::size_t word) const {
-  problem.fault = fault;
-  problem.word = word;
+void RuleLine::Note(Fault fault, std::size_t word) {
+  notedFault = fault;
+  notedWord = word;
 }
 
 }  // namespace SecPolicy

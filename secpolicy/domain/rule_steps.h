@@ -25,34 +25,36 @@ struct RuleToken {
 template <class Rule>
 RuleToken(std::string Rule::*, TeskCtl::Security::TeskAccess_KeywordType) -> RuleToken<Rule>;
 
-// Fills a record with the line's header and with what `parse` takes from the line, and appends it.
+// Fills a record with the line's header and with what `take` takes from the line, and appends it.
 // A failure becomes a parse error that names the line; nothing is appended then.
-template <class Rule, class Parse>
-void AppendRule(std::list<Rule>& rules, const RuleLine& line, Parse parse) {
+template <class Rule, class Take>
+void AppendRule(std::list<Rule>& rules, RuleLine line, Take take) {
   try {
     Rule rule;
-    rule.line = line.line;
+    rule.line = line.number;
     rule.domainId = line.domainId;
     rule.domainName = line.domainName;
-    parse(rule);
+    take(rule, line);
     rules.push_back(std::move(rule));
   } catch (const Braxo::Lib::BraxoException& failure) {
     line.Refuse(failure.what());
   }
 }
 
-// Takes a line of exactly `tokens` and the grant word. The words are checked after all are taken,
-// so a bad grant word is reported before a word that the kernel does not know.
+// The same of a line of exactly `tokens` and the grant word. The words are checked after all are
+// taken, so a bad grant word is reported before a word that the kernel does not know.
 template <class Rule, std::size_t Count>
-void TakeTokens(Rule& rule, const std::array<RuleToken<Rule>, Count>& tokens, RuleLine& line,
-                TeskAccessInterfaceImpl& access) {
-  line.RequireCount(Count + 1);
-  for (const RuleToken<Rule>& token : tokens) rule.*token.field = line.Take();
-  rule.grant = line.TakeGrant();
-  std::size_t word = 0;
-  for (const RuleToken<Rule>& token : tokens) {
-    line.Validate(rule.*token.field, ++word, token.keywords, access);
-  }
+void AppendRule(std::list<Rule>& rules, RuleLine words,
+                const std::array<RuleToken<Rule>, Count>& tokens) {
+  AppendRule(rules, std::move(words), [&](Rule& rule, RuleLine& line) {
+    line.RequireCount(Count + 1);
+    for (const RuleToken<Rule>& token : tokens) rule.*token.field = line.Take();
+    rule.grant = line.TakeGrant();
+    std::size_t word = 0;
+    for (const RuleToken<Rule>& token : tokens) {
+      line.Validate(rule.*token.field, ++word, token.keywords);
+    }
+  });
 }
 
 // Hands a copy of every rule to the kernel, in order. A refusal becomes a set error that names the
@@ -79,14 +81,6 @@ inline void AppendGrant(std::string& text, bool grant) {
   AppendWord(text, grant ? "grant" : "revoke");
 }
 
-// Appends `tokens` and the grant word of `rule` to a printed rule.
-template <class Rule, std::size_t Count>
-void AppendTokens(std::string& text, const Rule& rule,
-                  const std::array<RuleToken<Rule>, Count>& tokens) {
-  for (const RuleToken<Rule>& token : tokens) AppendWord(text, rule.*token.field);
-  AppendGrant(text, rule.grant);
-}
-
 // Prints every rule as a policy line, whose words `appendWords` appends to the keyword, and two
 // empty lines after the last one; nothing when there are no rules.
 template <class Rule, class AppendWords>
@@ -99,6 +93,16 @@ void PrintEach(const std::string& keyword, const std::list<Rule>& rules, AppendW
   }
   PrintLine();
   PrintLine();
+}
+
+// The same of rules that are `tokens` and the grant word.
+template <class Rule, std::size_t Count>
+void PrintEach(const std::string& keyword, const std::list<Rule>& rules,
+               const std::array<RuleToken<Rule>, Count>& tokens) {
+  PrintEach(keyword, rules, [&](std::string& text, const Rule& rule) {
+    for (const RuleToken<Rule>& token : tokens) AppendWord(text, rule.*token.field);
+    AppendGrant(text, rule.grant);
+  });
 }
 
 }  // namespace SecPolicy

@@ -13,9 +13,9 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void SyscallRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line,
-             [&](TeskAccess_SyscallRule& rule) { TakeTokens(rule, kTokens, line, access); });
+void SyscallRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
+                           std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
 }
 
 void SyscallRules::Set(TeskAccessInterfaceImpl& access) {
@@ -26,12 +26,6 @@ void SyscallRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImp
   access.GetSyscallRules(domainId, rules);
 }
 
-void SyscallRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
-
-void SyscallRules::PrintRules() {
-  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_SyscallRule& rule) {
-    AppendTokens(text, rule, kTokens);
-  });
-}
+void SyscallRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
 
 }  // namespace SecPolicy

@@ -15,10 +15,10 @@ constexpr std::array kTokens = {
 
 }  // namespace
 
-void UnixSockCreationRules::AddLine(RuleLine& line, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, line, [&](TeskAccess_UnixSockCreationRule& rule) {
-    TakeTokens(rule, kTokens, line, access);
-  });
+void UnixSockCreationRules::AddRule(unsigned int line, const std::string& domainName,
+                                    unsigned int domainId, std::queue<std::string> args,
+                                    TeskAccessInterfaceImpl& access) {
+  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
 }
 
 void UnixSockCreationRules::Set(TeskAccessInterfaceImpl& access) {
@@ -30,12 +30,6 @@ void UnixSockCreationRules::ReadSystemRules(unsigned int domainId,
   access.GetUnixSockCreationRules(domainId, rules);
 }
 
-void UnixSockCreationRules::CheckConstraints(const std::string&, TeskAccessInterfaceImpl&) {}
-
-void UnixSockCreationRules::PrintRules() {
-  PrintEach(keyword, rules, [](std::string& text, const TeskAccess_UnixSockCreationRule& rule) {
-    AppendTokens(text, rule, kTokens);
-  });
-}
+void UnixSockCreationRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
 
 }  // namespace SecPolicy

@@ -35,8 +35,7 @@ bool ParseFiles(const std::string& dir, FileLabelPolicy& policy, TeskAccessInter
 }  // namespace
 
 void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  LoadPolicyFileLabels(dir, access, nobody);
+  LoadPolicyFileLabels(dir, access, Nobody());
 }
 
 void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& access,

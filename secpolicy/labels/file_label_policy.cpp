@@ -4,7 +4,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "secpolicy/carry_on.h"
-#include "secpolicy/report.h"
+#include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicy {
 namespace {
@@ -19,26 +19,24 @@ std::string LineMessage(const std::string& file, unsigned int line, const std::s
   return StrCat(file, ":", line, " : ", message);
 }
 
-[[noreturn]] void Refuse(Problem& problem, Fault fault, std::size_t word, const char* reason) {
-  problem.fault = fault;
-  problem.word = word;
-  problem.reason = reason;
-  RaiseError(LineMessage(problem.file, problem.line, problem.reason));
+[[noreturn]] void Refuse(const std::string& file, unsigned int line, Fault fault, std::size_t word,
+                         const char* reason) {
+  throw LineFailure(LineMessage(file, line, reason),
+                    {.line = line, .fault = fault, .word = word, .reason = reason});
 }
 
 // An unknown label is told in the kernel's own words.
-void ValidateLabel(const std::string& label, TeskAccessInterfaceImpl& access, Problem& problem) {
+void ValidateLabel(const std::string& label, unsigned int line, TeskAccessInterfaceImpl& access) {
   try {
     access.ValidateKeyword(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL, label);
   } catch (const BraxoException& failure) {
-    problem.fault = Fault::kUnknownWord;
-    problem.word = 1;
-    problem.reason = failure.what();
-    throw;
+    throw LineFailure(
+        failure.what(),
+        {.line = line, .fault = Fault::kUnknownWord, .word = 1, .reason = failure.what()});
   }
 }
 
-void Apply(const FileLabel& fileLabel, TeskAccessInterfaceImpl& access) {
+void Apply(const FileLabelPolicy::FileLabel& fileLabel, TeskAccessInterfaceImpl& access) {
   if (fileLabel.recursive) {
     SetDirLabelRecursive(fileLabel.path, fileLabel.label, access);
   } else {
@@ -48,44 +46,35 @@ void Apply(const FileLabel& fileLabel, TeskAccessInterfaceImpl& access) {
 
 }  // namespace
 
-void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  ParsePolicy(file, access, nobody);
-}
-
 void FileLabelPolicy::ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access,
                                   PolicyObserver& observer) {
-  ReadLines(file, observer, [&](auto& tokens, Problem& problem) {
-    ParseLine(tokens, access, problem);
+  ReadLines(file, observer, [&](unsigned int line, std::queue<std::string>& tokens) {
+    ParseLine(file, line, tokens, access);
     observer.OnFileLabel(fileLabels.back());
   });
 }
 
-void FileLabelPolicy::ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
-                                Problem& problem) {
+void FileLabelPolicy::ParseLine(const std::string& file, unsigned int line,
+                                const std::queue<std::string>& tokens,
+                                TeskAccessInterfaceImpl& access) {
   if (tokens.size() != 2) {
-    Refuse(problem, Fault::kArgumentCount, Problem::kWholeLine, "incorrect no of parameters");
+    Refuse(file, line, Fault::kArgumentCount, Problem::kWholeLine, "incorrect no of parameters");
   }
   const std::string& pattern = tokens.front();
   const std::string& label = tokens.back();
   // An unknown label is told before the pattern is looked at.
-  ValidateLabel(label, access, problem);
+  ValidateLabel(label, line, access);
 
   const std::size_t marker = pattern.find(kTreeMarker);
   const bool recursive = marker != std::string::npos;
   if (recursive && marker + kTreeMarker.size() != pattern.size()) {
-    Refuse(problem, Fault::kTreeMarker, 0, "Unrecognized format for file/dir specification");
+    Refuse(file, line, Fault::kTreeMarker, 0, "Unrecognized format for file/dir specification");
   }
   fileLabels.push_back({.path = pattern.substr(0, marker),
                         .label = label,
                         .recursive = recursive,
-                        .policyFile = problem.file,
-                        .lineNumber = problem.line});
-}
-
-void FileLabelPolicy::SetFileLabels(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  SetFileLabels(access, nobody);
+                        .policyFile = file,
+                        .lineNumber = line});
 }
 
 void FileLabelPolicy::SetFileLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {

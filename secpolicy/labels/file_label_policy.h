@@ -1,9 +1,10 @@
 #pragma once
 
 #include <deque>
+#include <queue>
 #include <string>
 
-#include "secpolicy/observed/policy_observer.h"
+#include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
@@ -11,23 +12,27 @@ namespace SecPolicy {
 // The file labels of one load, in the order in which they were read.
 class FileLabelPolicy {
  public:
-  using FileLabel = SecPolicy::FileLabel;
+  // The label that a line of a policy gives to files.
+  struct FileLabel {
+    std::string path = {};
+    std::string label = {};
+    bool recursive = false;  // everything below the path, too
+    std::string policyFile = {};
+    unsigned int lineNumber = 0;
+  };
 
   // Appends the labels of the policy file `file`. Throws BraxoException at the first bad line;
   // the labels before it are kept.
-  void ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access);
   void ParsePolicy(const std::string& file, TeskAccessInterfaceImpl& access,
-                   PolicyObserver& observer);
+                   PolicyObserver& observer = Nobody());
 
-  // Appends the label of the line `problem.line` of the file `problem.file`. Before it throws,
-  // `problem` says what is wrong with the line.
-  void ParseLine(std::queue<std::string>& tokens, TeskAccessInterfaceImpl& access,
-                 Problem& problem);
+  // Appends the label of the line `line` of the file `file`. Throws LineFailure for a bad one.
+  void ParseLine(const std::string& file, unsigned int line, const std::queue<std::string>& tokens,
+                 TeskAccessInterfaceImpl& access);
 
   // Applies and drops all labels, in order. One that fails is reported; throws BraxoException at
   // the end when one did.
-  void SetFileLabels(TeskAccessInterfaceImpl& access);
-  void SetFileLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
+  void SetFileLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer = Nobody());
 
   std::deque<FileLabel> fileLabels;
 };

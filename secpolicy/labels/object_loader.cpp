@@ -27,8 +27,7 @@ bool ParseFiles(const std::string& dir, ObjectPolicy& policy, PolicyObserver& ob
 }  // namespace
 
 void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  LoadPolicyObjects(dir, access, nobody);
+  LoadPolicyObjects(dir, access, Nobody());
 }
 
 void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access,

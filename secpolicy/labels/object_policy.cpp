@@ -2,25 +2,22 @@
 
 #include "braxo/misc/strcat.h"
 #include "secpolicy/carry_on.h"
-#include "secpolicy/report.h"
+#include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicy {
 
-void ObjectPolicy::ParsePolicy(const std::string& path) {
-  PolicyObserver nobody;
-  ParsePolicy(path, nobody);
-}
-
 void ObjectPolicy::ParsePolicy(const std::string& path, PolicyObserver& observer) {
-  ReadLines(path, observer, [&](auto& tokens, Problem& problem) { ParseLine(tokens, problem); });
+  ReadLines(path, observer, [&](unsigned int line, std::queue<std::string>& tokens) {
+    ParseLine(path, line, tokens);
+  });
 }
 
-void ObjectPolicy::ParseLine(std::queue<std::string>& tokens, Problem& problem) {
+void ObjectPolicy::ParseLine(const std::string& path, unsigned int line,
+                             std::queue<std::string>& tokens) {
   if (tokens.size() != 1) {
-    problem.fault = Fault::kArgumentCount;
-    problem.word = Problem::kWholeLine;
-    problem.reason = "cannot define more than one object per line";
-    RaiseError(Braxo::Misc::StrCat(problem.file, ":", problem.line, " : ", problem.reason));
+    const std::string reason = "cannot define more than one object per line";
+    throw LineFailure(Braxo::Misc::StrCat(path, ":", line, " : ", reason),
+                      {.line = line, .fault = Fault::kArgumentCount, .reason = reason});
   }
   names.push_back(std::move(tokens.front()));
 }

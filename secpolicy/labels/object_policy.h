@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "secpolicy/observed/policy_observer.h"
+#include "secpolicy/report.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicy {
@@ -13,12 +13,10 @@ class ObjectPolicy {
  public:
   // Appends the names in the object file at `path`. Throws BraxoException when it cannot be opened
   // and at the first line that is not one name; the names before it are kept.
-  void ParsePolicy(const std::string& path);
-  void ParsePolicy(const std::string& path, PolicyObserver& observer);
+  void ParsePolicy(const std::string& path, PolicyObserver& observer = Nobody());
 
-  // Appends the name in the line `problem.line` of the file `problem.file`. Before it throws,
-  // `problem` says what is wrong with the line.
-  void ParseLine(std::queue<std::string>& tokens, Problem& problem);
+  // Appends the name in the line `line` of the file at `path`. Throws LineFailure for a bad one.
+  void ParseLine(const std::string& path, unsigned int line, std::queue<std::string>& tokens);
 
   // Makes the kernel's object labels equal to the names. Throws what the kernel throws.
   void SetObjects(TeskAccessInterfaceImpl& access);

@@ -1,23 +1,18 @@
 #pragma once
 
-#include <deque>
 #include <list>
 #include <memory>
-#include <span>
+#include <queue>
 #include <string>
-#include <vector>
 
 #include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
 
 // Policies line by line, for those who look at them without a load. Each line is read as a load
-// reads it: `problem` names the file and the line, and `words` are what stands there. Returns
-// whether a load takes the line; when it does not, `problem` says why.
+// reads it; one that a load does not take throws LineFailure.
 namespace SecPolicy {
 
 class DomainPolicy;
-
-using LineWords = std::span<const std::string>;
 
 // The lines of a domain's policy file.
 class DomainLines {
@@ -27,7 +22,7 @@ class DomainLines {
   DomainLines& operator=(const DomainLines&) = delete;
   ~DomainLines();
 
-  bool Read(LineWords words, TeskAccessInterfaceImpl& access, Problem& problem);
+  void Read(unsigned int line, std::queue<std::string> words, TeskAccessInterfaceImpl& access);
 
   // The "-p" rules among the lines that were taken.
   std::list<TeskCtl::Security::TeskAccess_CapabilityParamRule>& ParameterRules();
@@ -39,26 +34,19 @@ class DomainLines {
 // The lines of the policy file of the tardisk `tardiskPath`.
 class TardiskLines {
  public:
-  TardiskLines(const std::string& policyFile, const std::string& tardiskPath);
+  TardiskLines(const std::string& policyFile, const std::string& tardiskPath)
+      : policy(policyFile), tardisk(tardiskPath) {}
 
-  bool Read(LineWords words, TeskAccessInterfaceImpl& access, Problem& problem);
+  void Read(unsigned int line, std::queue<std::string> words, TeskAccessInterfaceImpl& access);
 
  private:
   TardiskPolicy policy;
   std::string tardisk;
 };
 
-// Appends the name of an object to `names`.
-bool ReadObjectLine(LineWords words, std::vector<std::string>& names, Problem& problem);
-
-// Appends a file label to `labels`.
-bool ReadFileLabelLine(LineWords words, TeskAccessInterfaceImpl& access,
-                       std::deque<FileLabel>& labels, Problem& problem);
-
-// Appends the labels of a whole file to `labels`. Throws BraxoException at the first line that a
-// load does not take; the labels before it are kept.
-void ReadFileLabels(const std::string& file, TeskAccessInterfaceImpl& access,
-                    std::deque<FileLabel>& labels);
+// Returns the name of an object.
+std::string ReadObjectLine(const std::string& file, unsigned int line,
+                           std::queue<std::string> words);
 
 // Throws BraxoException, as the installing of a "-r" rule does, unless `permissions` are well.
 void CheckPermissions(const std::string& permissions);

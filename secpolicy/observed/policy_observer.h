@@ -3,7 +3,10 @@
 #include <cstddef>
 #include <optional>
 #include <string>
+#include <utility>
 
+#include "braxo/lib/exception.h"
+#include "secpolicy/labels/file_label_policy.h"
 #include "teskctl/security.h"
 
 // For those who link the library's objects in and want to know what a load does while it does it.
@@ -32,16 +35,20 @@ struct Problem {
   std::string reason = {};          // the error's text; of such a line without the place
 };
 
+// A failure that is about a line. Who reads the file tells its problem, and throws on what is no
+// more than a BraxoException.
+class LineFailure : public Braxo::Lib::BraxoException {
+ public:
+  // `cause` names no file.
+  LineFailure(const std::string& text, Problem cause)
+      : BraxoException(text), problem(std::move(cause)) {}
+
+  Problem problem;
+};
+
 enum class LoadPhase { kObjects, kDomains, kPartnerDomains, kTardisks, kFileLabels };
 
-// The label that a line of a policy gives to files.
-struct FileLabel {
-  std::string path = {};
-  std::string label = {};
-  bool recursive = false;  // everything below the path, too
-  std::string policyFile = {};
-  unsigned int lineNumber = 0;
-};
+using FileLabel = FileLabelPolicy::FileLabel;
 
 // Is told what a load, a restore or a display does, as it happens; nothing that it does changes
 // what they do. It must not throw. What is handed to it is only borrowed. This one does nothing.
@@ -52,9 +59,7 @@ class PolicyObserver {
   PolicyObserver& operator=(const PolicyObserver&) = delete;
   virtual ~PolicyObserver() = default;
 
-  // A phase begins and ends; it ends, too, when it fails. Partner domains are no phase where there
-  // are none.
-  virtual void OnBegin(LoadPhase) {}
+  // A phase ends, also when it fails. Partner domains are no phase where there are none.
   virtual void OnEnd(LoadPhase) {}
 
   // An error is about to be written to standard error.

@@ -25,8 +25,7 @@ bool TryDefault(const char* heading, PolicyObserver& observer, Step step) {
 }  // namespace
 
 void SetDefaultTardiskPolicy(std::list<std::string>& tardisks, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  SetDefaultTardiskPolicy(tardisks, access, nobody);
+  SetDefaultTardiskPolicy(tardisks, access, Nobody());
 }
 
 void SetDefaultTardiskPolicy(const std::list<std::string>& tardisks,

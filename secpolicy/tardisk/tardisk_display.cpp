@@ -8,8 +8,7 @@
 namespace SecPolicy {
 
 void DisplayPolicyTardiskLabels(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  DisplayPolicyTardiskLabels(access, nobody);
+  DisplayPolicyTardiskLabels(access, Nobody());
 }
 
 void DisplayPolicyTardiskLabels(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {

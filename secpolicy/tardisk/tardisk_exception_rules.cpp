@@ -3,7 +3,6 @@
 #include <utility>
 
 #include "braxo/misc/strcat.h"
-#include "secpolicy/report.h"
 
 namespace SecPolicy {
 namespace {
@@ -50,8 +49,7 @@ void SetTransitions(const TeskAccess_TardiskExceptionRule& rule, TeskAccessInter
   }
 }
 
-// Runs `set` on every rule; the first failure is told, and thrown on with the rule's place and
-// tardisk.
+// Runs `set` on every rule; the first failure is thrown on with the rule's place and tardisk.
 template <class SetRule>
 void SetEachRule(const std::list<TeskAccess_TardiskExceptionRule>& rules,
                  TeskAccessInterfaceImpl& access, PolicyObserver& observer, SetRule set) {
@@ -59,10 +57,9 @@ void SetEachRule(const std::list<TeskAccess_TardiskExceptionRule>& rules,
     try {
       set(rule, access, observer);
     } catch (const BraxoException& failure) {
-      observer.OnProblem(
-          {.file = rule.policyFile, .line = rule.lineNumber, .reason = failure.what()});
-      RaiseError(StrCat(rule.policyFile, ":", rule.lineNumber, " : Tardisk: ", rule.tardiskPath,
-                        " : ", failure.what()));
+      throw LineFailure(StrCat(rule.policyFile, ":", rule.lineNumber,
+                               " : Tardisk: ", rule.tardiskPath, " : ", failure.what()),
+                        {.line = rule.lineNumber, .reason = failure.what()});
     }
   }
 }
@@ -72,41 +69,29 @@ void SetEachRule(const std::list<TeskAccess_TardiskExceptionRule>& rules,
 void TardiskExceptionRules::AddRule(unsigned int lineNumber, const std::string& tardiskPath,
                                     const std::string& policyFile, std::queue<std::string> tokens,
                                     TeskAccessInterfaceImpl& access) {
-  Problem unheard{.file = policyFile, .line = lineNumber};
-  AddLine(tardiskPath, std::move(tokens), access, unheard);
-}
-
-void TardiskExceptionRules::AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
-                                    TeskAccessInterfaceImpl& access, Problem& problem) {
-  problem.word = Problem::kWholeLine;
+  Problem problem{.line = lineNumber, .fault = Fault::kArgumentCount};
   if (!rules.empty()) {
     problem.fault = Fault::kSecondRule;
     problem.reason = "Only one rule of this type is allowed";
     // This one failure is meant to name neither file nor line.
-    RaiseError(problem.reason);
+    throw LineFailure(problem.reason, problem);
   }
   try {
-    problem.fault = Fault::kArgumentCount;
     if (tokens.size() != 2) RuleSizeError();
     problem.fault = Fault::kUnknownDomain;
     problem.word = 2;
     const std::string& label = tokens.front();
     const std::string& domainName = tokens.back();
-    rules.push_back({.lineNumber = problem.line,
+    rules.push_back({.lineNumber = lineNumber,
                      .tardiskPath = tardiskPath,
                      .label = label,
                      .domainName = domainName,
                      .domainId = DomainId(domainName, access),
-                     .policyFile = problem.file});
+                     .policyFile = policyFile});
   } catch (const BraxoException& failure) {
     problem.reason = failure.what();
-    RaiseTardiskParseError(problem.file, problem.line, problem.reason);
+    RaiseTardiskParseError(policyFile, problem);
   }
-}
-
-void TardiskExceptionRules::Set(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  SetObserved(access, nobody);
 }
 
 void TardiskExceptionRules::SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {

@@ -2,6 +2,7 @@
 
 #include <list>
 
+#include "secpolicy/report.h"
 #include "secpolicy/tardisk/tardisk_rules.h"
 
 namespace SecPolicy {
@@ -22,11 +23,11 @@ class TardiskExceptionRules : public virtual TardiskRules {
   void AddRule(unsigned int lineNumber, const std::string& tardiskPath,
                const std::string& policyFile, std::queue<std::string> tokens,
                TeskAccessInterfaceImpl& access) override;
-  void Set(TeskAccessInterfaceImpl& access) override;
+  void Set(TeskAccessInterfaceImpl& access) override { SetObserved(access, Nobody()); }
   ~TardiskExceptionRules() override = default;
-  void AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
-               TeskAccessInterfaceImpl& access, Problem& problem) override;
-  void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer) override;
+
+  // As Set, and tells `observer` what was installed for which line.
+  void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
 
   std::list<TeskAccess_TardiskExceptionRule> rules;
 };

@@ -54,10 +54,7 @@ void AddPolicy(const std::string& path, std::list<TardiskPolicy*>& policies,
 
 }  // namespace
 
-void GetAllTardisks(std::list<std::string>& tardisks) {
-  PolicyObserver nobody;
-  GetAllTardisks(tardisks, nobody);
-}
+void GetAllTardisks(std::list<std::string>& tardisks) { GetAllTardisks(tardisks, Nobody()); }
 
 void GetAllTardisks(std::list<std::string>& tardisks, PolicyObserver& observer) {
   errno = 0;
@@ -70,8 +67,7 @@ void GetAllTardisks(std::list<std::string>& tardisks, PolicyObserver& observer) 
 
 void GetTardiskLists(const std::string& policyDir, std::list<TardiskPolicy*>& policies,
                      std::list<std::string>& unmatched) {
-  PolicyObserver nobody;
-  GetTardiskLists(policyDir, policies, unmatched, nobody);
+  GetTardiskLists(policyDir, policies, unmatched, Nobody());
 }
 
 void GetTardiskLists(const std::string& policyDir, std::list<TardiskPolicy*>& policies,

@@ -34,8 +34,7 @@ bool SetSpecifiedPolicy(const std::string& dir, std::list<std::string>& unmatche
 }  // namespace
 
 void ParseAndSetTardiskPolicy(std::list<TardiskPolicy*> policies, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  ParseAndSetTardiskPolicy(policies, access, nobody);
+  ParseAndSetTardiskPolicy(policies, access, Nobody());
 }
 
 void ParseAndSetTardiskPolicy(const std::list<TardiskPolicy*>& policies,
@@ -62,8 +61,7 @@ void ParseAndSetTardiskPolicy(const std::list<TardiskPolicy*>& policies,
 }
 
 void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  LoadPolicyTardisks(dir, access, nobody);
+  LoadPolicyTardisks(dir, access, Nobody());
 }
 
 void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access,

@@ -50,11 +50,11 @@ std::string ReadTardiskName(unsigned long inode) {
 
 }  // namespace
 
-void RaiseTardiskParseError(const std::string& policyFile, unsigned int lineNumber,
-                            const std::string& message) {
+void RaiseTardiskParseError(const std::string& policyFile, const Problem& problem) {
   // Worded like the error of a domain policy, for those who watch for either.
-  RaiseError(Braxo::Misc::StrCat("Error in parsing policy for domain: ", policyFile, ": ",
-                                 lineNumber, " : ", message));
+  throw LineFailure(Braxo::Misc::StrCat("Error in parsing policy for domain: ", policyFile, ": ",
+                                        problem.line, " : ", problem.reason),
+                    problem);
 }
 
 TardiskPolicy::TardiskPolicy(const std::string& path) : policyFile(path) {
@@ -77,13 +77,11 @@ std::string TardiskPolicy::GetBackingTardiskPath() {
 }
 
 void TardiskPolicy::ParsePolicy(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  TardiskPolicySteps(*this, nobody).ParsePolicy(access);
+  TardiskPolicySteps(*this, Nobody()).ParsePolicy(access);
 }
 
 void TardiskPolicy::SetPolicy(TeskAccessInterfaceImpl& access) {
-  PolicyObserver nobody;
-  TardiskPolicySteps(*this, nobody).SetPolicy(access);
+  TardiskPolicySteps(*this, Nobody()).SetPolicy(access);
 }
 
 std::string TardiskPolicySteps::GetBackingTardiskPath() {
@@ -93,30 +91,37 @@ std::string TardiskPolicySteps::GetBackingTardiskPath() {
 }
 
 void TardiskPolicySteps::ParsePolicy(TeskAccessInterfaceImpl& access) {
-  const std::string& file = policy.policyFile;
   const std::string tardisk = GetBackingTardiskPath();
-  if (tardisk.empty()) return ReportWithoutTardisk(file, observer);
+  if (tardisk.empty()) return ReportWithoutTardisk(policy.policyFile, observer);
 
-  ReadLines(file, observer,
-            [&](auto& tokens, Problem& problem) { ParseLine(tardisk, tokens, access, problem); });
+  ReadLines(policy.policyFile, observer, [&](unsigned int line, std::queue<std::string>& tokens) {
+    ParseLine(tardisk, line, tokens, access);
+  });
 }
 
-void TardiskPolicySteps::ParseLine(const std::string& tardisk, std::queue<std::string>& tokens,
-                                   TeskAccessInterfaceImpl& access, Problem& problem) {
+void TardiskPolicySteps::ParseLine(const std::string& tardisk, unsigned int line,
+                                   std::queue<std::string>& tokens,
+                                   TeskAccessInterfaceImpl& access) {
   const std::string type = std::move(tokens.front());
   tokens.pop();
   const auto rules = policy.ruleSets.find(type);
   if (rules == policy.ruleSets.end()) {
-    problem.fault = Fault::kRuleType;
-    problem.word = 0;
-    problem.reason = "invalid tardisk policy rule type (" + type + ")";
-    RaiseTardiskParseError(problem.file, problem.line, problem.reason);
+    RaiseTardiskParseError(policy.policyFile,
+                           {.line = line,
+                            .fault = Fault::kRuleType,
+                            .word = 0,
+                            .reason = "invalid tardisk policy rule type (" + type + ")"});
   }
-  rules->second->AddLine(tardisk, tokens, access, problem);
+  rules->second->AddRule(line, tardisk, policy.policyFile, tokens, access);
 }
 
 void TardiskPolicySteps::SetPolicy(TeskAccessInterfaceImpl& access) {
-  for (const auto& [type, rules] : policy.ruleSets) rules->SetObserved(access, observer);
+  TellFailure(policy.policyFile, observer, [&] {
+    for (const auto& [type, rules] : policy.ruleSets) {
+      // The only kind.
+      dynamic_cast<TardiskExceptionRules&>(*rules).SetObserved(access, observer);
+    }
+  });
 }
 
 void ReportWithoutTardisk(const std::string& policyFile, PolicyObserver& observer) {

@@ -20,10 +20,9 @@ class TardiskPolicySteps {
   void ParsePolicy(TeskAccessInterfaceImpl& access);
   void SetPolicy(TeskAccessInterfaceImpl& access);
 
-  // Reads the line `problem.line` of the policy file; `tardisk` is the tardisk that it came from.
-  // Throws BraxoException for a bad line, after `problem` says what is wrong with it.
-  void ParseLine(const std::string& tardisk, std::queue<std::string>& tokens,
-                 TeskAccessInterfaceImpl& access, Problem& problem);
+  // Reads a line of the policy file, which came from `tardisk`. Throws LineFailure for a bad one.
+  void ParseLine(const std::string& tardisk, unsigned int line, std::queue<std::string>& tokens,
+                 TeskAccessInterfaceImpl& access);
 
  private:
   TardiskPolicy& policy;

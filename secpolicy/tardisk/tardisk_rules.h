@@ -2,7 +2,6 @@
 
 #include <queue>
 #include <string>
-#include <utility>
 
 #include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/secpolicy.h"
@@ -17,8 +16,8 @@ class TardiskRules {
   TardiskRules& operator=(const TardiskRules&) = delete;
 
   // Appends the rule of the line `lineNumber` of `policyFile`, which came from the tardisk
-  // `tardiskPath`; the caller has removed the keyword from `tokens`. Throws BraxoException for a
-  // bad line; nothing is appended then.
+  // `tardiskPath`; the caller has removed the keyword from `tokens`. Throws LineFailure for a bad
+  // line; nothing is appended then.
   virtual void AddRule(unsigned int lineNumber, const std::string& tardiskPath,
                        const std::string& policyFile, std::queue<std::string> tokens,
                        TeskAccessInterfaceImpl& access) = 0;
@@ -28,23 +27,10 @@ class TardiskRules {
 
   virtual ~TardiskRules() = default;
 
-  // As AddRule, of the line `problem.line` of the file `problem.file`. Before it throws, `problem`
-  // says what is wrong with the line.
-  virtual void AddLine(const std::string& tardiskPath, std::queue<std::string> tokens,
-                       TeskAccessInterfaceImpl& access, Problem& problem) {
-    AddRule(problem.line, tardiskPath, problem.file, std::move(tokens), access);
-  }
-
-  // As Set, and tells `observer` what was installed for which line.
-  virtual void SetObserved(TeskAccessInterfaceImpl& access, PolicyObserver& /*observer*/) {
-    Set(access);
-  }
-
   std::string ruleType;  // the keyword, such as "-E"
 };
 
-// Throws BraxoException for the line `lineNumber` of a tardisk policy file that cannot be read.
-[[noreturn]] void RaiseTardiskParseError(const std::string& policyFile, unsigned int lineNumber,
-                                         const std::string& message);
+// Throws LineFailure for a line of a tardisk policy file that cannot be read.
+[[noreturn]] void RaiseTardiskParseError(const std::string& policyFile, const Problem& problem);
 
 }  // namespace SecPolicy

@@ -33,7 +33,6 @@ TEST(LoadListener, NamesThePhases) {
   LoadListener listener;
   using enum SecPolicy::LoadPhase;
   for (const auto phase : {kObjects, kDomains, kPartnerDomains, kTardisks, kFileLabels}) {
-    listener.OnBegin(phase);
     listener.OnEnd(phase);
   }
   std::vector<std::string> names;

@@ -61,7 +61,7 @@ TEST_F(CapabilityParamRules, TakesAnyParameters) {
 
 TEST_F(CapabilityParamRules, RefusesBadVerdictInThreeWords) {
   EXPECT_EQ(Add("bind_port 80 443").Text(),
-            "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: 7 : "
+            "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: 7 : "
             "invalid keyword 443\n");
   EXPECT_TRUE(rules.rules.empty());
 }

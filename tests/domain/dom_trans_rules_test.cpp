@@ -35,7 +35,7 @@ TEST_F(DomTransRules, LooksTargetUpWhileParsing) {
 TEST_F(DomTransRules, RefusesUnknownTarget) {
   EXPECT_EQ(Add("toolLabel otherDom exec grant").Text(),
             Lines({R"(FindDomain("otherDom"))",
-                   "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: "
+                   "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: "
                    "4 : Failed to fetch domain id for: otherDom"}));
   EXPECT_TRUE(rules.rules.empty());
 }
@@ -50,7 +50,7 @@ TEST_F(DomTransRules, ReportsUnknownTargetBeforeBadVerdict) {
 
 TEST_F(DomTransRules, CountsWordsBeforeLookingTargetUp) {
   EXPECT_EQ(Add("toolLabel otherDom exec extra grant").Text(),
-            "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: 4 : "
+            "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: 4 : "
             "incorrect number of arguments for this rule type\n");
 }
 
@@ -58,7 +58,7 @@ TEST_F(DomTransRules, NamesLineOfFailedLookup) {
   host.Fail("FindDomain", "table unreadable");
   EXPECT_EQ(Add("toolLabel targetDom exec grant").Text(),
             Lines({R"(FindDomain("targetDom"))",
-                   "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: "
+                   "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: "
                    "4 : table unreadable"}));
 }
 

@@ -323,7 +323,7 @@ TEST_F(DomainPolicyTest, RefusesUnknownKeyword) {
     parsed[12].push("read");
     EXPECT_EQ(Process(parsed),
               Lines({R"(AddRule(-s, 11, "foo", 42, read))",
-                     "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: foo: "
+                     "throws SecPolicy::LineFailure: Error in parsing policy for domain: foo: "
                      "12 : invalid policy rule type (" +
                          word + ")"}));
   }

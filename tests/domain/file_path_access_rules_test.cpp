@@ -162,7 +162,7 @@ TEST_F(FilePathAccessRules, NamesLineOfBatchThatKernelRefuses) {
   EXPECT_EQ(Set(),
             Lines({R"(RealPath("/bin/ls"))",
                    R"(Call(0x405f, 0, 42, [{"/bin/ls", 1}, {"/bin/ls", 1}], 2, &out))",
-                   "throws Braxo::Lib::BraxoException: Error in setting policy for domain: appDom: "
+                   "throws SecPolicy::LineFailure: Error in setting policy for domain: appDom: "
                    "12 : Failed to add file policies to domain :42: world ID :0:Operation not "
                    "permitted"}));
 }
@@ -182,7 +182,7 @@ TEST_F(FilePathAccessRules, KeepsRulesBeforeRefusedBatch) {
                    R"(Call(0x405f, 0, 42, [{"/first", 1}, {"/first", 1}], 2, &out))",
                    R"(RealPath("/second"))",
                    R"(Call(0x405f, 0, 42, [{"/second", 1}, {"/second", 1}], 2, &out))",
-                   "throws Braxo::Lib::BraxoException: Error in setting policy for domain: appDom: "
+                   "throws SecPolicy::LineFailure: Error in setting policy for domain: appDom: "
                    "2 : Failed to add file policies to domain :42: world ID :0:No space left on "
                    "device"}));
 }
@@ -278,11 +278,10 @@ TEST_P(FilePathAccessRulesPermissions, AreRefusedOnlyWhenSet) {
   EXPECT_EQ(Add(std::string("/second ") + GetParam().permissions, 2).Text(), "returns\n");
   EXPECT_EQ(Add("/third rwx", 3).Text(), "returns\n");
 
-  EXPECT_EQ(Set(),
-            Lines({R"(RealPath("/first"))",
-                   R"(Call(0x405f, 0, 42, [{"/first", 19}, {"/first", 19}], 2, &out))",
-                   R"(RealPath("/second"))",
-                   std::string("throws Braxo::Lib::BraxoException: ") + GetParam().message}));
+  EXPECT_EQ(Set(), Lines({R"(RealPath("/first"))",
+                          R"(Call(0x405f, 0, 42, [{"/first", 19}, {"/first", 19}], 2, &out))",
+                          R"(RealPath("/second"))",
+                          std::string("throws SecPolicy::LineFailure: ") + GetParam().message}));
 }
 
 // The real path comes first, so its information is written for a rule that fails afterwards.
@@ -291,7 +290,7 @@ TEST_F(FilePathAccessRules, ReportsUnresolvablePathBeforeBadPermissions) {
   Add("/gone R");
   EXPECT_EQ(Set(), Lines({R"(RealPath("/gone"))",
                           R"(syslog(LOG_INFO, "%s", "Getting realpath failed: /gone"))",
-                          "throws Braxo::Lib::BraxoException: Unknown access privilege "
+                          "throws SecPolicy::LineFailure: Unknown access privilege "
                           "specified."}));
 }
 

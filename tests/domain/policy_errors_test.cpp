@@ -11,21 +11,21 @@ TEST(RaisePolicyParseError, NamesDomainLineAndFailure) {
   ScriptedHost host;
   EXPECT_EQ(
       Record([] { SecPolicy::RaisePolicyParseError(7, "appDom", "invalid keyword x"); }).Text(),
-      "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: 7 : invalid "
+      "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: 7 : invalid "
       "keyword x\n");
 }
 
 TEST(RaisePolicyParseError, KeepsEmptyPieces) {
   ScriptedHost host;
   EXPECT_EQ(Record([] { SecPolicy::RaisePolicyParseError(4294967295, "", ""); }).Text(),
-            "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: : 4294967295 : "
+            "throws SecPolicy::LineFailure: Error in parsing policy for domain: : 4294967295 : "
             "\n");
 }
 
 TEST(RaisePolicySetError, NamesDomainLineAndFailure) {
   ScriptedHost host;
   EXPECT_EQ(Record([] { SecPolicy::RaisePolicySetError(12, "foo", "no room: 5%"); }).Text(),
-            "throws Braxo::Lib::BraxoException: Error in setting policy for domain: foo: 12 : no "
+            "throws SecPolicy::LineFailure: Error in setting policy for domain: foo: 12 : no "
             "room: 5%\n");
 }
 

@@ -68,7 +68,7 @@ TEST_P(RuleSet, TakesGoodLine) {
 TEST_P(RuleSet, RefusesLineWithTooFewOrTooManyWords) {
   for (const char* line : GetParam().wrongLength) {
     EXPECT_EQ(Add(line).Text(),
-              "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: 7 : "
+              "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: 7 : "
               "incorrect number of arguments for this rule type\n")
         << line;
   }
@@ -195,7 +195,7 @@ TEST_P(VerdictRuleSet, RefusesVerdictThatIsNeitherGrantNorRevoke) {
   for (const std::string word : {"Grant", "allow", "deny", "REVOKE", "grants"}) {
     EXPECT_EQ(Add(WordsBeforeVerdict() + word).Text(),
               LookupsBeforeVerdict() +
-                  "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: "
+                  "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: "
                   "7 : invalid keyword " +
                   word + "\n");
   }
@@ -217,7 +217,7 @@ TEST_P(VerdictRuleSet, RefusesWordThatKernelDoesNotKnow) {
 
     EXPECT_EQ(Add(GetParam().granted).Text(),
               Lookups(index + 1) +
-                  "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: appDom: "
+                  "throws SecPolicy::LineFailure: Error in parsing policy for domain: appDom: "
                   "7 : " +
                   message + "\n");
   }
@@ -276,7 +276,7 @@ TEST_P(VerdictRuleSet, StopsAtRefusedRuleAndNamesItsLine) {
 
   EXPECT_EQ(Set(),
             Lines({OnLine(call, 10), OnLine(call, 20), OnLine(call, 30),
-                   "throws Braxo::Lib::BraxoException: Error in setting policy for domain: appDom: "
+                   "throws SecPolicy::LineFailure: Error in setting policy for domain: appDom: "
                    "30 : no room"}));
   EXPECT_EQ(Set(), Lines({OnLine(call, 10), OnLine(call, 20), OnLine(call, 30), OnLine(call, 40),
                           OnLine(call, 50), "returns"}));

@@ -2,7 +2,6 @@
 // one order.
 
 #include <cstddef>
-#include <cstring>
 #include <type_traits>
 
 #include "secpolicy/domain/capability_param_rules.h"
@@ -13,6 +12,7 @@
 #include "secpolicy/domain/object_access_rules.h"
 #include "secpolicy/domain/syscall_rules.h"
 #include "secpolicy/domain/unix_sock_creation_rules.h"
+#include "support/slot.h"
 #include "teskctl/security.h"
 
 namespace SecPolicyTest {
@@ -27,16 +27,6 @@ concept PlainlyDerived = std::is_base_of_v<Base, Derived> && requires(Base* base
 };
 template <class Derived, class Base>
 concept VirtuallyDerived = std::is_convertible_v<Derived*, Base*> && !PlainlyDerived<Derived, Base>;
-
-// The number of a virtual operation in its table: a pointer to it holds one more than its distance
-// from the table's start, in bytes.
-template <class Operation>
-std::ptrdiff_t Slot(Operation operation) {
-  std::ptrdiff_t distance = 0;
-  static_assert(sizeof operation >= sizeof distance);
-  std::memcpy(&distance, &operation, sizeof distance);
-  return (distance - 1) / static_cast<std::ptrdiff_t>(sizeof(void*));
-}
 
 template <class Rules>
 std::vector<std::ptrdiff_t> Slots() {
@@ -56,9 +46,15 @@ TEST(PolicyRulesShape, IsAbstractWithKeywordOnly) {
   EXPECT_TRUE((std::is_same_v<decltype(PolicyRules::keyword), std::string>));
 }
 
-// The destructors stand behind: they would move the others up.
-TEST(PolicyRulesShape, OrdersOperations) {
+// The slot of whatever comes behind all operations tells how many there are: two are the
+// destructor's.
+struct OneMoreOperation : PolicyRules {
+  virtual void Next() {}
+};
+
+TEST(PolicyRulesShape, OrdersFiveOperationsAndHasNoOther) {
   EXPECT_EQ(Slots<PolicyRules>(), (std::vector<std::ptrdiff_t>{0, 1, 2, 3, 4}));
+  EXPECT_EQ(Slot(&OneMoreOperation::Next), 7);
 }
 
 template <class RuleFamily>

@@ -160,7 +160,7 @@ TEST_F(FileLabelPolicyParsePolicy, PassesTheKernelsMessageForAnUnknownLabel) {
             Lines({
                 Validated("toolLabel"),
                 Validated("noLabel"),
-                "throws SecPolicyTest::DerivedBraxoException: no word",
+                "throws Braxo::Lib::BraxoException: no word",
             }));
   EXPECT_EQ(Records(), Lines({R"("/a" toolLabel entry )" + tree / "labels:1"}));
 }

@@ -119,11 +119,10 @@ TEST_F(ObservedLoad, TellsOfALineWithTwoObjects) {
   const PolicyTree tree({{"base", "one\ntwo words\nthree\n"}});
   EXPECT_THROW(SecPolicy::LoadPolicyObjects(tree.Root(), access, log), BraxoException);
   const std::string reason = "cannot define more than one object per line";
-  EXPECT_EQ(log.lines,
-            (std::vector<std::string>{
-                "begin objects", "problem " + tree / "base" + ":2 argument-count in all " + reason,
-                "error " + tree / "base" + ":2 : " + reason,
-                "error Error in parsing some object files", "end objects"}));
+  EXPECT_EQ(log.lines, (std::vector<std::string>{
+                           "problem " + tree / "base" + ":2 argument-count in all " + reason,
+                           "error " + tree / "base" + ":2 : " + reason,
+                           "error Error in parsing some object files", "end objects"}));
 }
 
 TEST_F(ObservedLoad, TellsOfADirectoryThatCannotBeRead) {
@@ -145,10 +144,19 @@ TEST_F(ObservedLoad, TellsOfPathRulesBeforeTheyAreInstalledAndOfTheOneThatFails)
   const PolicyTree tree({{"one", "-r /a r\n\n-r /b q\n-r /c\n"}});
   EXPECT_THROW(SecPolicy::LoadPolicyDomains(tree.Root(), access, log), BraxoException);
   EXPECT_EQ(log.lines, (std::vector<std::string>{
-                           "begin domains", "path /a of one:1", "path /b of one:3",
-                           "problem " + tree / "one" + ":0 Unknown access privilege specified.",
+                           "path /a of one:1", "path /b of one:3",
+                           "problem " + tree / "one" + ":3 Unknown access privilege specified.",
                            "error Unknown access privilege specified.",
                            "error Error in setting the policy for some domains", "end domains"}));
+}
+
+TEST_F(ObservedLoad, TellsTheLineOfARuleThatTheKernelRefuses) {
+  host.Fail("SetSyscallRule", Nth(2), "no room");
+  const PolicyTree tree({{"one", "-s a grant\n\n-s b grant\n-s c grant\n"}});
+  EXPECT_THROW(SecPolicy::LoadPolicyDomains(tree.Root(), access, log), BraxoException);
+  EXPECT_THAT(log.Problems(),
+              ElementsAre("problem " + tree / "one" +
+                          ":3 Error in setting policy for domain: one: 3 : no room"));
 }
 
 TEST_F(ObservedLoad, TellsOfConflictsOnce) {
@@ -173,7 +181,7 @@ TEST_F(ObservedLoad, EndsThePhaseWhenAnotherExceptionPasses) {
   host.FailForeign("GetInvalidLabels");
   const PolicyTree tree({{"base", "one\n"}});
   EXPECT_THROW(SecPolicy::LoadPolicyObjects(tree.Root(), access, log), ForeignException);
-  EXPECT_EQ(log.lines, (std::vector<std::string>{"begin objects", "end objects"}));
+  EXPECT_EQ(log.lines, (std::vector<std::string>{"end objects"}));
 }
 
 constexpr char kToolPolicy[] = "/etc/zorvan/secpolicy/tardisks/tool";

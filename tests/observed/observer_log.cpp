@@ -55,8 +55,6 @@ std::string Describe(const Problem& problem) {
          (problem.word == Problem::kWholeLine ? "all" : "word " + std::to_string(problem.word));
 }
 
-void ObserverLog::OnBegin(LoadPhase phase) { lines.push_back("begin " + NameOf(phase)); }
-
 void ObserverLog::OnEnd(LoadPhase phase) { lines.push_back("end " + NameOf(phase)); }
 
 void ObserverLog::OnError(const std::string& message) { lines.push_back("error " + message); }

@@ -10,7 +10,6 @@ namespace SecPolicyTest {
 // Keeps a line of text for everything that an observer is told.
 class ObserverLog : public SecPolicy::PolicyObserver {
  public:
-  void OnBegin(SecPolicy::LoadPhase phase) override;
   void OnEnd(SecPolicy::LoadPhase phase) override;
   void OnError(const std::string& message) override;
   void OnProblem(const SecPolicy::Problem& problem) override;

@@ -31,14 +31,12 @@ TEST_F(ObservedWholeLoad, TellsPhasesAndWhatWasReadAndInstalled) {
   EXPECT_EQ(
       log.lines,
       (std::vector<std::string>{
-          "begin objects", "end objects", "begin domains", "path /vm of globalVMDom:1",
-          "end domains", "begin partner domains", "end partner domains", "begin tardisks",
+          "end objects", "path /vm of globalVMDom:1", "end domains", "end partner domains",
           "label toolLabel of /tardisks/base.tgz from " + std::string(kTardiskPolicy) + ":1",
           "transition hostDom toolLabel globalVMDom from " + std::string(kTardiskPolicy) + ":1",
           "transition daemonFrameworkDom toolLabel globalVMDom from " +
               std::string(kTardiskPolicy) + ":1",
-          "end tardisks", "begin file labels",
-          "label toolLabel of /opt/tool/run from /policy/fileLabels/tools:1",
+          "end tardisks", "label toolLabel of /opt/tool/run from /policy/fileLabels/tools:1",
           "label logLabel of /opt/log/* from /policy/fileLabels/tools:2", "end file labels"}));
 }
 
@@ -46,8 +44,7 @@ TEST_F(ObservedWholeLoad, TellsPhasesOfAnEarlyLoad) {
   GoodHost good;
   const Transcript run = Record([this] { SecPolicy::LoadPolicyEarly("/early", log); });
   EXPECT_EQ(run.Text(), kEarlyLoad.Text());
-  EXPECT_EQ(log.lines, (std::vector<std::string>{"begin objects", "end objects", "begin domains",
-                                                 "end domains", "begin file labels",
+  EXPECT_EQ(log.lines, (std::vector<std::string>{"end objects", "end domains",
                                                  "label earlyLabel of /opt/early from "
                                                  "/etc/zorvan/secpolicy/fileLabels/base:1",
                                                  "end file labels"}));

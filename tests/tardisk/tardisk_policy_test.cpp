@@ -16,6 +16,7 @@
 #include "secpolicy/tardisk/tardisk_rules.h"
 #include "support/policy_tree.h"
 #include "support/scripted_host.h"
+#include "support/slot.h"
 
 namespace SecPolicyTest {
 namespace {
@@ -50,30 +51,16 @@ TEST(TardiskRulesShape, IsAbstractWithOneField) {
   EXPECT_EQ(sizeof(TardiskRules), sizeof(void*) + sizeof(std::string));
 }
 
-// A kind of rules that has but the operations that every kind must have.
-class CountedRules : public virtual TardiskRules {
- public:
-  void AddRule(unsigned int lineNumber, const std::string& tardiskPath,
-               const std::string& policyFile, std::queue<std::string> tokens,
-               TeskAccessInterfaceImpl&) override {
-    calls.push_back(policyFile + ":" + std::to_string(lineNumber) + " of " + tardiskPath + " " +
-                    tokens.front());
-  }
-  void Set(TeskAccessInterfaceImpl&) override { calls.push_back("set"); }
-
-  std::vector<std::string> calls;
+// The slot of whatever comes behind all operations tells how many there are: two are the
+// destructor's.
+struct OneMoreOperation : TardiskRules {
+  virtual void Next() {}
 };
 
-TEST(TardiskRulesShape, AsksAKindForItsTwoOperationsWhoeverObserves) {
-  ScriptedHost host;
-  TeskAccessInterfaceImpl access;
-  SecPolicy::PolicyObserver observer;
-  SecPolicy::Problem problem{.file = "/policy/base", .line = 3};
-  CountedRules rules;
-  rules.AddLine("/tardisks/base.tgz", Tokens({"label"}), access, problem);
-  rules.SetObserved(access, observer);
-  EXPECT_EQ(rules.calls,
-            (std::vector<std::string>{"/policy/base:3 of /tardisks/base.tgz label", "set"}));
+TEST(TardiskRulesShape, OrdersTwoOperationsAndHasNoOther) {
+  EXPECT_EQ(Slot(&TardiskRules::AddRule), 0);
+  EXPECT_EQ(Slot(&TardiskRules::Set), 1);
+  EXPECT_EQ(Slot(&OneMoreOperation::Next), 4);
 }
 
 TEST(TardiskExceptionRulesShape, IsAListWithAVirtualBase) {
@@ -142,7 +129,7 @@ TEST_F(TardiskExceptionRulesAddRule, KeepsTheRuleWithTheDomainsIdentifier) {
 TEST_F(TardiskExceptionRulesAddRule, RefusesASecondRuleWithoutSayingWhere) {
   Add(Tokens({"toolLabel", "toolDom"}));
   EXPECT_EQ(Add(Tokens({"otherLabel", "toolDom"})).Text(),
-            Lines({"throws Braxo::Lib::BraxoException: Only one rule of this type is allowed"}));
+            Lines({"throws SecPolicy::LineFailure: Only one rule of this type is allowed"}));
   ASSERT_EQ(rules.rules.size(), 1U);
   EXPECT_EQ(rules.rules.front().label, "toolLabel");
 }
@@ -150,14 +137,14 @@ TEST_F(TardiskExceptionRulesAddRule, RefusesASecondRuleWithoutSayingWhere) {
 TEST_F(TardiskExceptionRulesAddRule, RefusesASecondRuleBeforeItCountsTheWords) {
   Add(Tokens({"toolLabel", "toolDom"}));
   EXPECT_EQ(Add(Tokens({"otherLabel"})).Text(),
-            Lines({"throws Braxo::Lib::BraxoException: Only one rule of this type is allowed"}));
+            Lines({"throws SecPolicy::LineFailure: Only one rule of this type is allowed"}));
 }
 
 TEST_F(TardiskExceptionRulesAddRule, NeedsExactlyTwoWords) {
   for (const auto& tokens :
        {Tokens({}), Tokens({"toolLabel"}), Tokens({"toolLabel", "toolDom", "grant"})}) {
     EXPECT_EQ(Add(tokens).Text(),
-              Lines({"throws Braxo::Lib::BraxoException: Error in parsing policy for domain: "
+              Lines({"throws SecPolicy::LineFailure: Error in parsing policy for domain: "
                      "/p/tool: 3 : incorrect number of arguments for this rule type"}));
   }
   EXPECT_TRUE(rules.rules.empty());
@@ -168,7 +155,7 @@ TEST_F(TardiskExceptionRulesAddRule, RefusesADomainThatIsNotThere) {
   EXPECT_EQ(Add(Tokens({"toolLabel", "toolDom"})).Text(),
             Lines({
                 FoundDomain("toolDom"),
-                "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: /p/tool: 3 "
+                "throws SecPolicy::LineFailure: Error in parsing policy for domain: /p/tool: 3 "
                 ": Failed to fetch domain id for toolDom",
             }));
   EXPECT_TRUE(rules.rules.empty());
@@ -179,7 +166,7 @@ TEST_F(TardiskExceptionRulesAddRule, WrapsAFailingLookup) {
   EXPECT_EQ(Add(Tokens({"toolLabel", "toolDom"})).Text(),
             Lines({
                 FoundDomain("toolDom"),
-                "throws Braxo::Lib::BraxoException: Error in parsing policy for domain: /p/tool: 3 "
+                "throws SecPolicy::LineFailure: Error in parsing policy for domain: /p/tool: 3 "
                 ": no table",
             }));
 }
@@ -276,7 +263,7 @@ TEST_F(TardiskExceptionRulesSet, WrapsAnUnknownLabelAndInstallsNothing) {
   EXPECT_EQ(Set().Text(),
             Lines({
                 R"(LookupLabel("toolLabel", OBJECT))",
-                "throws Braxo::Lib::BraxoException: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
+                "throws SecPolicy::LineFailure: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
                 "Invalid label (toolLabel) for file /tardisks/tool.tgz",
             }));
 }
@@ -287,7 +274,7 @@ TEST_F(TardiskExceptionRulesSet, WrapsALabelThatCannotBeWritten) {
   EXPECT_EQ(Set().Text(),
             Lines({
                 Labelled("/tardisks/tool.tgz", "toolLabel", 42),
-                "throws Braxo::Lib::BraxoException: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
+                "throws SecPolicy::LineFailure: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
                 "Unable to set file label (toolLabel) for file /tardisks/tool.tgz: No such file or "
                 "directory",
             }));
@@ -302,7 +289,7 @@ TEST_F(TardiskExceptionRulesSet, WrapsAMissingLaunchDomain) {
                 "GetTardiskLaunchDomains()",
                 "GetTardiskExecEventKeyword()",
                 FoundDomain("hostdDom"),
-                "throws Braxo::Lib::BraxoException: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
+                "throws SecPolicy::LineFailure: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
                 "Failed to fetch domain id for hostdDom",
             }));
 }
@@ -320,7 +307,7 @@ TEST_F(TardiskExceptionRulesSet, StopsAtTheFirstTransitionThatIsRefused) {
           R"(SetDomTransRule({line: 3, domainId: 0, domainName: "hostDom", label: "toolLabel", )"
           R"(targetDomain: "toolDom", targetDomainId: 7, transitionKind: "tardisk_exec", )"
           R"(grant: true}))",
-          "throws Braxo::Lib::BraxoException: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
+          "throws SecPolicy::LineFailure: /p/tool:3 : Tardisk: /tardisks/tool.tgz : "
           "table full",
       }));
 }
@@ -337,7 +324,7 @@ TEST_P(TardiskExceptionRulesHostCall, IsWrappedWhenItFails) {
   host.FailWith(GetParam(), Every(), DerivedBraxoException("refused"));
   const Transcript run = Set();
   EXPECT_TRUE(run.trace.back().starts_with(GetParam())) << run.Text();
-  EXPECT_EQ(run.exceptionType, "Braxo::Lib::BraxoException");
+  EXPECT_EQ(run.exceptionType, "SecPolicy::LineFailure");
   EXPECT_EQ(run.exceptionText, "/p/tool:3 : Tardisk: /tardisks/tool.tgz : refused");
 }
 
@@ -389,7 +376,7 @@ TEST_F(TardiskExceptionRulesSet, NamesTheFailingRule) {
             Lines({
                 Labelled("/tardisks/tool.tgz", "toolLabel", 42),
                 Labelled("/tardisks/other.tgz", "toolLabel", 42),
-                "throws Braxo::Lib::BraxoException: /p/other:4 : Tardisk: /tardisks/other.tgz : "
+                "throws SecPolicy::LineFailure: /p/other:4 : Tardisk: /tardisks/other.tgz : "
                 "Unable to set file label (toolLabel) for file /tardisks/other.tgz: Read-only file "
                 "system",
             }));

@@ -63,10 +63,14 @@ class DomainCheck {
 
   bool Accepts(unsigned int line, const Words& words) {
     NoteUse(words);
-    SecPolicy::Problem problem{.file = file.Path(), .line = line};
-    if (lines.Read(words, run.access, problem)) return true;
-    AddRefusal(run, file, problem, HintForRule(run, CodeOf(*problem.fault), words, problem.word));
-    return false;
+    try {
+      lines.Read(line, file.TokensOf(line), run.access);
+      return true;
+    } catch (const SecPolicy::LineFailure& failure) {
+      const SecPolicy::Problem& problem = failure.problem;
+      AddRefusal(run, file, problem, HintForRule(run, CodeOf(*problem.fault), words, problem.word));
+      return false;
+    }
   }
 
   // Also what a bad line names counts as used: its own problem is enough.

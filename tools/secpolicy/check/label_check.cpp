@@ -1,6 +1,5 @@
 #include <sys/stat.h>
 
-#include <deque>
 #include <filesystem>
 #include <optional>
 #include <tuple>
@@ -10,7 +9,7 @@
 #include "host/linux/operation/noted_labels.h"
 #include "root.h"
 #include "rule_form.h"
-#include "secpolicy/observed/policy_lines.h"
+#include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -42,12 +41,12 @@ std::string HintFor(CheckRun& run, const SecPolicy::Problem& problem,
 
 void ReadLabels(CheckRun& run, const SourceFile& file, std::vector<LabelLine>& labels) {
   for (const auto& [line, words] : file.Lines()) {
-    std::deque<FileLabel> label;
-    SecPolicy::Problem problem{.file = file.Path(), .line = line};
-    if (SecPolicy::ReadFileLabelLine(words, run.access, label, problem)) {
-      labels.push_back({&file, line, std::move(label.front())});
-    } else {
-      AddRefusal(run, file, problem, HintFor(run, problem, words));
+    SecPolicy::FileLabelPolicy policy;
+    try {
+      policy.ParseLine(file.Path(), line, file.TokensOf(line), run.access);
+      labels.push_back({&file, line, std::move(policy.fileLabels.front())});
+    } catch (const SecPolicy::LineFailure& failure) {
+      AddRefusal(run, file, failure.problem, HintFor(run, failure.problem, words));
     }
   }
 }

@@ -20,12 +20,13 @@ void Declare(CheckRun& run, const SourceFile& file, unsigned int line, const std
 
 void ReadObjects(CheckRun& run, const SourceFile& file, std::vector<std::string>& names) {
   for (const auto& [line, words] : file.Lines()) {
-    SecPolicy::Problem problem{.file = file.Path(), .line = line};
-    if (SecPolicy::ReadObjectLine(words, names, problem)) {
+    try {
+      names.push_back(SecPolicy::ReadObjectLine(file.Path(), line, file.TokensOf(line)));
       Declare(run, file, line, names.back());
-    } else {
-      run.diagnostics.Add(file.AtWords(CodeOf(*problem.fault), line, 1, words.size() - 1,
-                                       problem.reason, "write each name on a line of its own"));
+    } catch (const SecPolicy::LineFailure& failure) {
+      run.diagnostics.Add(file.AtWords(CodeOf(*failure.problem.fault), line, 1, words.size() - 1,
+                                       failure.problem.reason,
+                                       "write each name on a line of its own"));
     }
   }
 }

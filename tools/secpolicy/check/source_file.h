@@ -1,6 +1,7 @@
 #pragma once
 
 #include <map>
+#include <queue>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -25,6 +26,12 @@ class SourceFile {
 
   // The bytes of the line `number`, without its line feed; of one that is too long, its beginning.
   std::string_view Text(unsigned int number) const { return texts.at(number - 1); }
+
+  // The words of the line `number`, for the library.
+  std::queue<std::string> TokensOf(unsigned int number) const {
+    const Words& words = lines.at(number);
+    return std::queue<std::string>({words.begin(), words.end()});
+  }
 
   // A problem of the whole file.
   Diagnostic About(const Code& code, std::string message, std::string hint = {}) const;

@@ -23,8 +23,10 @@ void CheckLabel(CheckRun& run, const SourceFile& file, unsigned int line,
 void CheckLines(CheckRun& run, const SourceFile& file, const std::string& tardisk) {
   SecPolicy::TardiskLines lines(file.Path(), tardisk);
   for (const auto& [line, words] : file.Lines()) {
-    SecPolicy::Problem problem{.file = file.Path(), .line = line};
-    if (!lines.Read(words, run.access, problem)) {
+    try {
+      lines.Read(line, file.TokensOf(line), run.access);
+    } catch (const SecPolicy::LineFailure& failure) {
+      const SecPolicy::Problem& problem = failure.problem;
       const bool isNoRule = problem.fault == SecPolicy::Fault::kRuleType;
       AddRefusal(run, file, problem,
                  isNoRule ? "write: -E LABEL DOMAIN"

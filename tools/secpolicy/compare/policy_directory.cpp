@@ -5,7 +5,7 @@
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "scratch/scratch_state.h"
-#include "secpolicy/observed/policy_lines.h"
+#include "secpolicy/observed/policy_observer.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -44,12 +44,12 @@ void InstallPartners(const std::string& dir, const std::string& copies,
 
 std::map<std::string, std::string> ReadLabels(const std::string& dir, bool& isClean,
                                               TeskAccessInterfaceImpl& access) {
-  std::deque<SecPolicy::FileLabel> lines;
+  SecPolicy::FileLabelPolicy policy;
   for (const auto& [path, name] : FilesOf(dir)) {
-    isClean &= Try([&, &file = path] { SecPolicy::ReadFileLabels(file, access, lines); });
+    isClean &= Try([&, &file = path] { policy.ParsePolicy(file, access); });
   }
   std::map<std::string, std::string> labels;
-  for (const SecPolicy::FileLabel& line : lines) {
+  for (const SecPolicy::FileLabel& line : policy.fileLabels) {
     labels[line.path + (line.recursive ? "/*" : "")] = line.label;
   }
   return labels;

@@ -8,7 +8,6 @@
 #include <map>
 
 #include "braxo/misc/strcat.h"
-#include "secpolicy/observed/policy_lines.h"
 
 namespace SecPolicyCli {
 
@@ -25,14 +24,14 @@ LabelPlan::LabelPlan(LabelRun& labelRun, const std::string& dir) : run(labelRun)
 
 // What was read before a bad line counts, as in a load.
 void LabelPlan::ReadFile(const std::string& path) {
-  std::deque<SecPolicy::FileLabel> labels;
+  SecPolicy::FileLabelPolicy policy;
   try {
-    SecPolicy::ReadFileLabels(path, run.access, labels);
+    policy.ParsePolicy(path, run.access);
   } catch (const BraxoException& failure) {
     run.Error("Error parsing file " + path);
     run.Error(failure.what());
   }
-  for (auto& label : labels) {
+  for (auto& label : policy.fileLabels) {
     LabelLine line{std::move(label), 0};
     line.id = run.FindLabel(line.label.label);
     if (line.id == kNoSuchLabel) {
