@@ -1,0 +1,193 @@
+// Hunts words of a command line that are dropped, taken for others or refused without saying what
+// would be understood.
+
+#include "command_line.h"
+
+#include <gmock/gmock.h>
+
+#include <algorithm>
+
+namespace {
+
+using SecPolicyCli::Action;
+using SecPolicyCli::CommandLine;
+using SecPolicyCli::kFailed;
+using SecPolicyCli::Kind;
+using SecPolicyCli::kUsage;
+using SecPolicyCli::kWell;
+using SecPolicyCli::Option;
+using SecPolicyCli::Syntax;
+using SecPolicyCli::Verb;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+// What the verbs of these tests were given.
+struct Given {
+  bool thick = false;
+  bool thin = false;
+  bool isVerbose = false;
+  std::string color = "white";
+  std::string format;
+  std::string wood;
+  std::vector<std::string> coats;
+  std::vector<std::string> walls;
+};
+
+Given given;
+
+std::string WhyNoColor(const std::string& color) { return color == "plaid" ? "no color" : ""; }
+
+const Verb kPaint = {
+    .name = "paint",
+    .summary = "Paints",
+    .help = "Example: paint",
+    .define = [](Syntax& syntax) -> Action {
+      const Option thick = syntax.AddFlag("--thick", given.thick, "Thick");
+      syntax.AddFlag("--thin", given.thin, "Thin").Exclude(thick);
+      syntax.AddOption("--color", given.color, "Color").Check(WhyNoColor).Need(thick);
+      syntax.AddFormat(given.format, "it", {"text", "json", "xml"});
+      syntax.AddList("--coat", given.coats, "Coat");
+      syntax.AddList("WALL", given.walls, "Walls").Require();
+      return [verbose = syntax.Verbose()] {
+        given.isVerbose = verbose.IsGiven();
+        return kFailed;
+      };
+    },
+};
+
+const Verb kCarve = {
+    .name = "carve",
+    .summary = "Carves",
+    .help = "Example: carve",
+    .define = [](Syntax& syntax) -> Action {
+      static const Kind kinds[] = {
+          {"bowl", "A bowl", "Bowls are round",
+           [](Syntax& kind) -> Action {
+             kind.AddOption("WOOD", given.wood, "Wood").Require();
+             return [] { return kWell; };
+           }},
+          {"spoon", "A spoon", nullptr, [](Syntax&) -> Action { return [] { return kFailed; }; }},
+      };
+      return syntax.AddKinds(kinds);
+    },
+};
+
+constexpr const Verb* kVerbs[] = {&kPaint, &kCarve};
+
+class CommandLineTest : public testing::Test {
+ protected:
+  // A command line is read once.
+  std::optional<SecPolicyCli::ExitCode> Read(std::vector<std::string> words) {
+    given = {};
+    line.emplace(SecPolicyCli::Description{"Tests.", "The end.", "secpolicy 1.2.3"}, kVerbs);
+    words.insert(words.begin(), "secpolicy");
+    std::vector<char*> arguments(words.size() + 1);
+    std::transform(words.begin(), words.end(), arguments.begin(),
+                   [](std::string& word) { return word.data(); });
+    testing::internal::CaptureStdout();
+    testing::internal::CaptureStderr();
+    const auto end = line->Read(static_cast<int>(words.size()), arguments.data());
+    output = testing::internal::GetCapturedStdout();
+    error = testing::internal::GetCapturedStderr();
+    return end;
+  }
+
+  std::optional<CommandLine> line;
+  std::string output;
+  std::string error;
+};
+
+TEST_F(CommandLineTest, LeavesWhatIsNotGiven) {
+  EXPECT_EQ(Read({"paint", "north"}), std::nullopt);
+  EXPECT_EQ(&line->AskedVerb(), &kPaint);
+  EXPECT_EQ(line->Root(), std::nullopt);
+  EXPECT_FALSE(line->IsVerbose());
+  EXPECT_EQ(line->Act(), kFailed);
+  EXPECT_FALSE(given.isVerbose);
+  EXPECT_FALSE(given.thick);
+  EXPECT_EQ(given.color, "white");
+  EXPECT_EQ(given.format, "text");
+  EXPECT_THAT(given.coats, IsEmpty());
+  EXPECT_THAT(given.walls, ElementsAre("north"));
+}
+
+TEST_F(CommandLineTest, TakesWhatIsGiven) {
+  EXPECT_EQ(Read({"--root", "/r", "paint", "north", "--coat", "a", "south", "--coat", "b",
+                  "--thick", "--color=red", "--format", "xml"}),
+            std::nullopt);
+  EXPECT_EQ(line->Root(), "/r");
+  EXPECT_TRUE(given.thick);
+  EXPECT_EQ(given.color, "red");
+  EXPECT_EQ(given.format, "xml");
+  EXPECT_THAT(given.coats, ElementsAre("a", "b"));
+  EXPECT_THAT(given.walls, ElementsAre("north", "south"));
+}
+
+TEST_F(CommandLineTest, TakesTheCommonOptionsBehindTheVerb) {
+  EXPECT_EQ(Read({"paint", "north", "--root", "", "-v"}), std::nullopt);
+  EXPECT_EQ(line->Root(), "");
+  EXPECT_TRUE(line->IsVerbose());
+  line->Act();
+  EXPECT_TRUE(given.isVerbose);
+}
+
+TEST_F(CommandLineTest, DoesWhatTheKindDoes) {
+  EXPECT_EQ(Read({"carve", "bowl", "oak"}), std::nullopt);
+  EXPECT_EQ(&line->AskedVerb(), &kCarve);
+  EXPECT_EQ(given.wood, "oak");
+  EXPECT_EQ(line->Act(), kWell);
+  EXPECT_EQ(Read({"carve", "spoon"}), std::nullopt);
+  EXPECT_EQ(line->Act(), kFailed);
+}
+
+struct Misuse {
+  std::vector<std::string> words;
+  const char* problem;
+  const char* command;
+};
+
+TEST_F(CommandLineTest, RefusesWhatItDoesNotUnderstand) {
+  const Misuse table[] = {
+      {{"pant", "north"}, "there is no verb or option 'pant'; did you mean 'paint'?", "secpolicy"},
+      {{"xyzzy"}, "there is no verb or option 'xyzzy'", "secpolicy"},
+      {{"--rot", "/r"}, "there is no verb or option '--rot'", "secpolicy"},
+      {{}, "A subcommand is required", "secpolicy"},
+      {{"carve"}, "A subcommand is required: one of bowl, spoon", "secpolicy carve"},
+      {{"carve", "bowl"}, "WOOD is required", "secpolicy carve"},
+      {{"paint"}, "WALL is required", "secpolicy paint"},
+      {{"paint", "north", "--thick", "--thin"}, "--thick excludes --thin", "secpolicy paint"},
+      {{"paint", "north", "--color", "red"}, "--color requires --thick", "secpolicy paint"},
+      {{"paint", "north", "--thick", "--color", "plaid"}, "--color: no color", "secpolicy paint"},
+      {{"paint", "a\x1b[31m", "--no\x1b"},
+       "The following argument was not expected: --no^[",
+       "secpolicy paint"},
+  };
+  for (const auto& [words, problem, command] : table) {
+    EXPECT_EQ(Read(words), kUsage);
+    EXPECT_EQ(output, "");
+    EXPECT_EQ(error, std::string("secpolicy: ") + problem + "\n'" + command +
+                         " --help' explains the usage.\n");
+  }
+}
+
+TEST_F(CommandLineTest, RefusesAFormatThatThereIsNot) {
+  EXPECT_EQ(Read({"paint", "north", "--format", "yaml"}), kUsage);
+  EXPECT_THAT(error, HasSubstr("yaml"));
+}
+
+TEST_F(CommandLineTest, TellsItsVersionAndItsUsage) {
+  EXPECT_EQ(Read({"--version"}), kWell);
+  EXPECT_EQ(output, "secpolicy 1.2.3\n");
+  EXPECT_EQ(Read({"--help"}), kWell);
+  for (const char* part : {"Tests.", "paint", "Carves", "--root", "The end."}) {
+    EXPECT_THAT(output, HasSubstr(part));
+  }
+  EXPECT_EQ(Read({"carve", "bowl", "--help"}), kWell);
+  EXPECT_THAT(output, HasSubstr("Bowls are round"));
+  EXPECT_EQ(Read({"paint", "--help"}), kWell);
+  EXPECT_THAT(output, HasSubstr("How to write it: text, json or xml"));
+  EXPECT_EQ(error, "");
+}
+
+}  // namespace
