@@ -230,7 +230,7 @@ class DomainFiles {
 
 // As the command does it: as one step.
 void LoadAsAWhole(const DomainFiles& files, TeskAccessInterfaceImpl& access) {
-  LinuxHost::PolicyTransaction transaction;
+  LinuxHost::PolicyTransaction transaction(LinuxHost::CurrentState());
   transaction.BeginLoad({.directory = files.Path(), .domains = {}});
   SecPolicy::LoadPolicyDomains(files.Path(), access);
   transaction.EndLoad(false);

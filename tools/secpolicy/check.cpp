@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "host/linux/operation/policy_load.h"
+#include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
@@ -70,7 +71,7 @@ ExitCode Check(const std::string& dir, const Options& options) {
                                "that it is in (--root DIR).");
   }
   CheckRun run(options.fresh, options.unwanted);
-  LinuxHost::PolicyTransaction load;
+  LinuxHost::PolicyTransaction load(LinuxHost::CurrentState());
   HideOldDomains(load, dir);
   CheckPolicy(run, dir);
   run.diagnostics.Sort();

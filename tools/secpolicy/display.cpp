@@ -6,6 +6,7 @@
 #include "ending.h"
 #include "error_list.h"
 #include "host/linux/operation/stable_view.h"
+#include "host/linux/operation/state_use.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
@@ -69,7 +70,7 @@ Action Define(Syntax& syntax) {
         "display",
         [&](ErrorList& errors) {
           // A load may end meanwhile.
-          const LinuxHost::StableView view;
+          const LinuxHost::StableView view(LinuxHost::CurrentState());
           show(*domain, errors);
         },
         Advise);

@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "host/linux/operation/load_record.h"
+#include "host/linux/operation/state_use.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "scratch/scratch_state.h"
@@ -45,7 +46,7 @@ Status ReadStatus() {
   Status status;
   status.policy = ReadInstalledPolicy(access);
   status.tardisks = ReadTardisks(access);
-  status.load = LinuxHost::LatestLoad();
+  status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
   for (const Policy::InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);
     status.ruleCount += domain.rules.size();

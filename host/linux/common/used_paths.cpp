@@ -13,6 +13,9 @@ constexpr char kStateVariable[] = "SECPOLICY_HOST_STATE";
 constexpr char kSettings[] = "/var/lib/secpolicy/config.db";
 constexpr char kSettingsVariable[] = "SECPOLICY_HOST_CONFIG";
 
+// What takes the place of the host's own, if anything. Not the environment: a program with more
+// rights than its user may not trust what it reads there, not even what it wrote itself.
+const UsedState* usedState = nullptr;
 std::optional<std::string> usedSettings;
 
 std::string PathIn(const char* variable, const char* otherwise) {
@@ -30,18 +33,14 @@ std::string StatePathOfHost() {
 
 }  // namespace
 
-// What takes the place of the host's own, if anything. Not the environment: a program with more
-// rights than its user may not trust what it reads there, not even what it wrote itself.
-std::optional<UsedState::Paths> UsedState::used;
-
 const std::string& StatePath() {
-  if (UsedState::used) return UsedState::used->real;
+  if (usedState != nullptr) return usedState->path;
   static const std::string path = StatePathOfHost();
   return path;
 }
 
 const std::string& ShownStatePath() {
-  return UsedState::used ? UsedState::used->shown : StatePath();
+  return usedState != nullptr ? usedState->shownAs : StatePath();
 }
 
 const std::string& SettingsPath() {
@@ -50,10 +49,10 @@ const std::string& SettingsPath() {
   return path;
 }
 
-UsedState::UsedState(const std::string& path, const std::string& shownAs)
-    : before(std::exchange(used, Paths{path, shownAs})) {}
+UsedState::UsedState(const std::string& file, const std::string& name)
+    : path(file), shownAs(name), before(std::exchange(usedState, this)) {}
 
-UsedState::~UsedState() { used = before; }
+UsedState::~UsedState() { usedState = before; }
 
 UsedSettings::UsedSettings(const std::string& path) : before(std::exchange(usedSettings, path)) {}
 

@@ -22,24 +22,19 @@ const std::string& SettingsPath();
 // no variable can change that. The latest one counts. Not while other threads use the host.
 class UsedState {
  public:
-  explicit UsedState(const std::string& path) : UsedState(path, path) {}
+  explicit UsedState(const std::string& file) : UsedState(file, file) {}
 
-  // Messages call it `shownAs`.
-  UsedState(const std::string& path, const std::string& shownAs);
+  // Messages call it `name`.
+  UsedState(const std::string& file, const std::string& name);
   UsedState(const UsedState&) = delete;
   UsedState& operator=(const UsedState&) = delete;
   ~UsedState();
 
- private:
-  struct Paths {
-    std::string real;
-    std::string shown;
-  };
-  static std::optional<Paths> used;
-  friend const std::string& StatePath();
-  friend const std::string& ShownStatePath();
+  const std::string path;
+  const std::string shownAs;
 
-  const std::optional<Paths> before;
+ private:
+  const UsedState* const before;
 };
 
 // The same for the wanted settings.

@@ -6,8 +6,8 @@
 
 namespace LinuxHost {
 
-void RecordLoad(const LoadRecord& record) {
-  Store& store = HostState::Current().Database();
+void RecordLoad(HostState& state, const LoadRecord& record) {
+  Store& store = state.Database();
   Transaction transaction(store);
   store.Run("DELETE FROM load_record");
   store.Run("DELETE FROM load_error");
@@ -21,8 +21,8 @@ void RecordLoad(const LoadRecord& record) {
   transaction.Commit();
 }
 
-std::optional<LoadRecord> LatestLoad() {
-  Store& store = HostState::Current().Database();
+std::optional<LoadRecord> LatestLoad(HostState& state) {
+  Store& store = state.Database();
   LoadRecord record;
   {
     Rows rows = store.Select(

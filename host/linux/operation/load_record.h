@@ -9,6 +9,8 @@
 // Braxo::Lib::BraxoException when the state cannot be used.
 namespace LinuxHost {
 
+class HostState;
+
 struct LoadRecord {
   std::string verb;
   std::string directory;
@@ -24,9 +26,9 @@ struct LoadRecord {
 constexpr std::size_t kKeptErrors = 100;
 
 // Takes the place of the earlier record.
-void RecordLoad(const LoadRecord& record);
+void RecordLoad(HostState& state, const LoadRecord& record);
 
 // Empty when nothing was recorded since the boot.
-std::optional<LoadRecord> LatestLoad();
+std::optional<LoadRecord> LatestLoad(HostState& state);
 
 }  // namespace LinuxHost

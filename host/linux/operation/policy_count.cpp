@@ -5,8 +5,8 @@
 namespace LinuxHost {
 
 // The policies of worlds belong to running services: no display shows them.
-PolicyCount CountPolicy() {
-  Rows rows = HostState::Current().Database().Select(
+PolicyCount CountPolicy(HostState& state) {
+  Rows rows = state.Database().Select(
       "SELECT (SELECT count(*) FROM domain), (SELECT count(*) FROM rule) + (SELECT count(*) FROM "
       "parameter_rule) + (SELECT count(*) FROM file_policy WHERE world = 0), (SELECT count(*) FROM "
       "label)");

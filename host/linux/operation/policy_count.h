@@ -4,6 +4,8 @@
 
 namespace LinuxHost {
 
+class HostState;
+
 // How much policy is installed. Rules are counted as a display shows them, one a line.
 struct PolicyCount {
   std::uint64_t domains = 0;
@@ -12,6 +14,6 @@ struct PolicyCount {
 };
 
 // Throws Braxo::Lib::BraxoException when the state cannot be used.
-PolicyCount CountPolicy();
+PolicyCount CountPolicy(HostState& state);
 
 }  // namespace LinuxHost

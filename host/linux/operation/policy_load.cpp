@@ -130,8 +130,8 @@ void DestroyUnused(HostState& state, const std::vector<std::string>& names, Load
 
 }  // namespace
 
-PolicyTransaction::PolicyTransaction()
-    : state(HostState::Current().shared_from_this()),
+PolicyTransaction::PolicyTransaction(HostState& hostState)
+    : state(hostState.shared_from_this()),
       transaction(std::make_unique<Transaction>(state->Database())) {
   state->Refresh();
 }

@@ -40,7 +40,7 @@ class Transaction;
 // step, or never. Only one at a time. Others may read meanwhile; who wants to write waits.
 class PolicyTransaction {
  public:
-  PolicyTransaction();
+  explicit PolicyTransaction(HostState& hostState);
   PolicyTransaction(const PolicyTransaction&) = delete;
   PolicyTransaction& operator=(const PolicyTransaction&) = delete;
 

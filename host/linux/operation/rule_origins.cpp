@@ -39,8 +39,8 @@ std::vector<RuleSource> ReadSources(Rows rows) {
 
 }  // namespace
 
-std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind) {
-  Store& store = HostState::Current().Database();
+std::vector<RuleSource> FindRuleSources(HostState& state, unsigned int id, Policy::RuleKind kind) {
+  Store& store = state.Database();
   if (kind == Policy::RuleKind::kParameterCheck) {
     return ReadSources(store.Select(
         "SELECT p.kind, p.directory, p.kind IS NULL OR p.number = "
@@ -64,9 +64,9 @@ std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind) 
                    id, FormOf(kind).name));
 }
 
-std::vector<std::string> FindDomainsWithoutFile() {
+std::vector<std::string> FindDomainsWithoutFile(HostState& state) {
   std::vector<std::string> names;
-  Rows rows = HostState::Current().Database().Select(
+  Rows rows = state.Database().Select(
       "SELECT p.name FROM policy_domain AS p JOIN domain AS d ON d.name = p.name "
       "WHERE NOT d.created_at_run_time AND d.id <> 0 GROUP BY p.name HAVING max(p.load = "
       "(SELECT max(number) FROM policy_load WHERE kind = p.kind)) = 0 ORDER BY p.name");
@@ -74,8 +74,9 @@ std::vector<std::string> FindDomainsWithoutFile() {
   return names;
 }
 
-void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels) {
-  Store& store = HostState::Current().Database();
+void RecordOrigins(HostState& state, std::span<const RuleOrigin> rules,
+                   std::span<const LabelOrigin> labels) {
+  Store& store = state.Database();
   Transaction transaction(store);
   for (const RuleOrigin& origin : rules) {
     store.Run("INSERT OR REPLACE INTO rule_origin VALUES (?1, ?2, ?3, ?4)", origin.domain,
@@ -90,11 +91,11 @@ void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigi
   transaction.Commit();
 }
 
-void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules) {
+void FindRuleOrigins(HostState& state, const std::string& domain, std::span<Policy::Rule> rules) {
   // A rule's text stands for its kind, words and verdict.
   std::unordered_map<std::string, Policy::Origin> recorded;
-  Rows rows = HostState::Current().Database().Select(
-      "SELECT rule, file, line FROM rule_origin WHERE domain = ?1", domain);
+  Rows rows =
+      state.Database().Select("SELECT rule, file, line FROM rule_origin WHERE domain = ?1", domain);
   while (rows.Next()) {
     recorded[rows.Text(0)] = {.file = rows.Text(1),
                               .line = static_cast<unsigned int>(rows.Integer(2))};
@@ -108,8 +109,8 @@ void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules) {
   }
 }
 
-std::optional<LabelOrigin> FindLabelOrigin(const std::string& path) {
-  Store& store = HostState::Current().Database();
+std::optional<LabelOrigin> FindLabelOrigin(HostState& state, const std::string& path) {
+  Store& store = state.Database();
   LatestLabel latest;
   KeepLater(store, path, false, latest);
   std::string tree = path;

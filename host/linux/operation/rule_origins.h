@@ -13,6 +13,8 @@
 // now. Everything throws Braxo::Lib::BraxoException when the state cannot be used.
 namespace LinuxHost {
 
+class HostState;
+
 // The load that installed a rule.
 struct RuleSource {
   std::optional<LoadKind> kind;  // none: no load, but a service
@@ -36,20 +38,21 @@ struct LabelOrigin {
 
 // Records origins, all or none. A later one of the same rule of a domain, and of the same path,
 // takes the place of an earlier one.
-void RecordOrigins(std::span<const RuleOrigin> rules, std::span<const LabelOrigin> labels);
+void RecordOrigins(HostState& state, std::span<const RuleOrigin> rules,
+                   std::span<const LabelOrigin> labels);
 
 // Gives those of the domain's rules their file and line that have recorded ones.
-void FindRuleOrigins(const std::string& domain, std::span<Policy::Rule> rules);
+void FindRuleOrigins(HostState& state, const std::string& domain, std::span<Policy::Rule> rules);
 
 // The sources of all rules of the kind that the domain `id` has, in the order in which the rules
 // are read.
-std::vector<RuleSource> FindRuleSources(unsigned int id, Policy::RuleKind kind);
+std::vector<RuleSource> FindRuleSources(HostState& state, unsigned int id, Policy::RuleKind kind);
 
 // The domains that the latest load of their kind has not found in any file, by name.
-std::vector<std::string> FindDomainsWithoutFile();
+std::vector<std::string> FindDomainsWithoutFile(HostState& state);
 
 // The line that labels the file at the absolute path `path`: of those for the path and for the
 // trees around it, the one that was recorded last.
-std::optional<LabelOrigin> FindLabelOrigin(const std::string& path);
+std::optional<LabelOrigin> FindLabelOrigin(HostState& state, const std::string& path);
 
 }  // namespace LinuxHost

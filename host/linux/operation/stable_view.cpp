@@ -4,9 +4,8 @@
 
 namespace LinuxHost {
 
-StableView::StableView()
-    : state(HostState::Current().shared_from_this()),
-      snapshot(std::make_unique<Snapshot>(state->Database())) {
+StableView::StableView(HostState& viewed)
+    : state(viewed.shared_from_this()), snapshot(std::make_unique<Snapshot>(state->Database())) {
   state->Forget();
 }
 

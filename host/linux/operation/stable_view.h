@@ -12,10 +12,12 @@ class Snapshot;
 // cannot be used.
 class StableView {
  public:
-  StableView();
+  explicit StableView(HostState& viewed);
   StableView(const StableView&) = delete;
   StableView& operator=(const StableView&) = delete;
   ~StableView();
+
+  HostState& State() const { return *state; }
 
  private:
   std::shared_ptr<HostState> state;

@@ -14,6 +14,8 @@ namespace LinuxHost {
 
 using Braxo::Misc::StrCat;
 
+HostState& CurrentState() { return HostState::Current(); }
+
 bool IsStateMissing() {
   return faccessat(AT_FDCWD, StatePath().c_str(), F_OK, AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
          (errno == ENOENT || errno == ENOTDIR);

@@ -8,6 +8,12 @@
 // Which state and settings the command works with: those of the host, or copies of its own.
 namespace LinuxHost {
 
+class HostState;
+
+// The state that this process works with, made if there is none. The reference holds until the
+// state is used next. Throws HostError when it cannot be used.
+HostState& CurrentState();
+
 // True when there is surely no state where this process looks for it: one that this user may not
 // look for counts as there.
 bool IsStateMissing();

@@ -123,7 +123,7 @@ INSTANTIATE_TEST_SUITE_P(
         Deed{"boot", [](HostState& state, unsigned int /*domain*/) { state.Reset(); }},
         Deed{"load",
              [](HostState& /*state*/, unsigned int domain) {
-               LinuxHost::PolicyTransaction load;
+               LinuxHost::PolicyTransaction load(HostState::Current());
                load.BeginLoad({.directory = "/policy", .domains = {}});
                InstallRule(HostState::Current(), domain, true);
                load.EndLoad(true);
@@ -167,12 +167,12 @@ INSTANTIATE_TEST_SUITE_P(
                            std::list<TeskCtl::Security::TeskAccess_SyscallRule> rules;
                            access.GetSyscallRules(domain, rules);
                            access.LookupLabel("aLabel", TESKACCESS_LABEL_OBJECT);
-                           LinuxHost::CountPolicy();
-                           LinuxHost::LatestLoad();
+                           LinuxHost::CountPolicy(HostState::Current());
+                           LinuxHost::LatestLoad(HostState::Current());
                          }},
                     Deed{"view",
                          [](HostState& state, unsigned int domain) {
-                           const LinuxHost::StableView view;
+                           const LinuxHost::StableView view(HostState::Current());
                            state.FilePolicies().Read(domain);
                          }},
                     Deed{"copy",
@@ -183,7 +183,7 @@ INSTANTIATE_TEST_SUITE_P(
                          }},
                     Deed{"load undone",
                          [](HostState& /*state*/, unsigned int domain) {
-                           LinuxHost::PolicyTransaction load;
+                           LinuxHost::PolicyTransaction load(HostState::Current());
                            load.BeginLoad({.directory = "/policy", .domains = {}});
                            InstallRule(HostState::Current(), domain, false);
                          }}),

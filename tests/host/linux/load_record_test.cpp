@@ -34,11 +34,13 @@ LoadRecord FailedLoad() {
   return record;
 }
 
-TEST_F(LoadRecordTest, IsEmptyBeforeTheFirstLoad) { EXPECT_FALSE(LatestLoad().has_value()); }
+TEST_F(LoadRecordTest, IsEmptyBeforeTheFirstLoad) {
+  EXPECT_FALSE(LatestLoad(HostState::Current()).has_value());
+}
 
 TEST_F(LoadRecordTest, KeepsWhatItIsGiven) {
-  RecordLoad(FailedLoad());
-  const auto record = LatestLoad();
+  RecordLoad(HostState::Current(), FailedLoad());
+  const auto record = LatestLoad(HostState::Current());
   ASSERT_TRUE(record.has_value());
   EXPECT_EQ(record->verb, "load");
   EXPECT_EQ(record->directory, "/etc/zorvan/secpolicy");
@@ -49,12 +51,12 @@ TEST_F(LoadRecordTest, KeepsWhatItIsGiven) {
 }
 
 TEST_F(LoadRecordTest, IsOfTheLatestLoadAlone) {
-  RecordLoad(FailedLoad());
+  RecordLoad(HostState::Current(), FailedLoad());
   LoadRecord good;
   good.verb = "load-early";
   good.ending = "done";
-  RecordLoad(good);
-  const auto record = LatestLoad();
+  RecordLoad(HostState::Current(), good);
+  const auto record = LatestLoad(HostState::Current());
   ASSERT_TRUE(record.has_value());
   EXPECT_EQ(record->verb, "load-early");
   EXPECT_EQ(record->errorCount, 0U);
@@ -66,8 +68,8 @@ TEST_F(LoadRecordTest, KeepsTheFirstOfVeryManyErrors) {
   many.errorCount = 1000;
   many.errors.assign(1000, "again");
   many.errors.front() = "first";
-  RecordLoad(many);
-  const auto record = LatestLoad();
+  RecordLoad(HostState::Current(), many);
+  const auto record = LatestLoad(HostState::Current());
   ASSERT_TRUE(record.has_value());
   EXPECT_EQ(record->errorCount, 1000U);
   ASSERT_EQ(record->errors.size(), LinuxHost::kKeptErrors);
@@ -75,11 +77,11 @@ TEST_F(LoadRecordTest, KeepsTheFirstOfVeryManyErrors) {
 }
 
 TEST_F(LoadRecordTest, GoesWithABoot) {
-  RecordLoad(FailedLoad());
+  RecordLoad(HostState::Current(), FailedLoad());
   HostState::Current().Reset();
-  EXPECT_FALSE(LatestLoad().has_value());
-  RecordLoad(LoadRecord{});
-  EXPECT_THAT(LatestLoad()->errors, IsEmpty());
+  EXPECT_FALSE(LatestLoad(HostState::Current()).has_value());
+  RecordLoad(HostState::Current(), LoadRecord{});
+  EXPECT_THAT(LatestLoad(HostState::Current())->errors, IsEmpty());
 }
 
 }  // namespace

@@ -27,9 +27,9 @@ class PolicyCounts : public ::testing::Test {
 };
 
 TEST_F(PolicyCounts, BeginWithWhatIsBuiltIn) {
-  EXPECT_EQ(CountPolicy().domains, 1U);
-  EXPECT_EQ(CountPolicy().rules, 0U);
-  EXPECT_EQ(CountPolicy().objects, 2U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).domains, 1U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).rules, 0U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).objects, 2U);
 }
 
 TEST_F(PolicyCounts, AddUpRulesOfAllTables) {
@@ -39,16 +39,16 @@ TEST_F(PolicyCounts, AddUpRulesOfAllTables) {
   access.SetCapabilityParamRule({2, id, "owner", "bind_port", "80", "", true});
   const FilePolicy policy = {.domain = {id, "owner"}, .path = "/etc", .permission = 1};
   LinuxHost::HostState::Current().FilePolicies().Install({&policy, 1});
-  EXPECT_EQ(CountPolicy().domains, 2U);
-  EXPECT_EQ(CountPolicy().rules, 3U);
-  EXPECT_EQ(CountPolicy().objects, 3U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).domains, 2U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).rules, 3U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).objects, 3U);
 }
 
 TEST_F(PolicyCounts, LeaveOutThePoliciesOfWorlds) {
   const FilePolicy policy = {
       .domain = {Create(), "owner"}, .world = getpid(), .path = "/etc", .permission = 1};
   LinuxHost::HostState::Current().FilePolicies().Install({&policy, 1});
-  EXPECT_EQ(CountPolicy().rules, 0U);
+  EXPECT_EQ(CountPolicy(LinuxHost::HostState::Current()).rules, 0U);
 }
 
 }  // namespace

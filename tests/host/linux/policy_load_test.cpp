@@ -102,7 +102,7 @@ class PolicyLoad : public ::testing::Test {
 
   LoadEnding Load(const std::vector<DomainFile>& files, LoadKind kind = LoadKind::kFull,
                   bool remove = true) {
-    PolicyTransaction transaction;
+    PolicyTransaction transaction(HostState::Current());
     transaction.BeginLoad({.kind = kind, .directory = "/p", .domains = NamesOf(files)});
     Install(files);
     const LoadEnding ending = transaction.EndLoad(remove);
@@ -135,7 +135,7 @@ class PolicyLoad : public ::testing::Test {
 
 TEST_F(PolicyLoad, IsSeenByOthersOnlyAsAWhole) {
   Load({{"d", {"read"}}});
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d", "e"}});
   Install({{"d", {"write"}}, {"e", {}}});
   EXPECT_EQ(
@@ -157,7 +157,7 @@ TEST_F(PolicyLoad, IsSeenByOthersOnlyAsAWhole) {
 TEST_F(PolicyLoad, ThatIsNotCommittedNeverWas) {
   Load({{"d", {"read"}}});
   {
-    PolicyTransaction transaction;
+    PolicyTransaction transaction(HostState::Current());
     transaction.BeginLoad({.directory = "/p", .domains = {"e"}});
     Install({{"e", {"write"}}});
     access.AddLabels({"new"}, TESKACCESS_LABEL_OBJECT);
@@ -173,7 +173,7 @@ TEST_F(PolicyLoad, ThatIsNotCommittedNeverWas) {
 TEST_F(PolicyLoad, OfAProcessThatIsKilledNeverWas) {
   Load({{"d", {"read"}}});
   ChildProcess child([] {
-    PolicyTransaction transaction;
+    PolicyTransaction transaction(HostState::Current());
     transaction.BeginLoad({.directory = "/p", .domains = {}});
     transaction.EndLoad(true);
     kill(getpid(), SIGKILL);
@@ -183,7 +183,7 @@ TEST_F(PolicyLoad, OfAProcessThatIsKilledNeverWas) {
 }
 
 TEST_F(PolicyLoad, SeesWhatItHasInstalledItself) {
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
   Install({{"d", {"read"}}});
   access.AddLabels({"key"}, TESKACCESS_LABEL_OBJECT);
@@ -201,7 +201,7 @@ TEST_F(PolicyLoad, SeesWhatItHasInstalledItself) {
 }
 
 TEST_F(PolicyLoad, ARefusedCallUndoesOnlyItself) {
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
   Install({{"d", {"read"}}});
   EXPECT_EQ(MessageOf([&] {
@@ -229,7 +229,7 @@ TEST_F(PolicyLoad, RemovesWhatItsFilesHaveNoMore) {
 
 TEST_F(PolicyLoad, RemovesRulesOfEveryTable) {
   const auto load = [&](bool withRules) {
-    PolicyTransaction transaction;
+    PolicyTransaction transaction(HostState::Current());
     transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
     Install({{"d", {}}});
     const unsigned int id = IdOf("d");
@@ -283,7 +283,7 @@ TEST_F(PolicyLoad, ADestroyedDomainTakesWhatWasCoveredAlong) {
   Load({{"d", {}}});
   const unsigned int id = IdOf("d");
   GrantOfEachTable(id, 0, false);
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
   GrantOfEachTable(id, 1, true);
   transaction.EndLoad(true);
@@ -347,7 +347,7 @@ TEST_F(PolicyLoad, LeavesDomainsOfServicesAndOfTheOtherKind) {
 
 TEST_F(PolicyLoad, DoesNotFindADomainThatNoFileDefines) {
   Load({{"d", {}}, {"gone", {}}});
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
   EXPECT_FALSE(Exists("gone"));
   EXPECT_EQ(MessageOf([&] {
@@ -361,7 +361,7 @@ TEST_F(PolicyLoad, DoesNotFindADomainThatNoFileDefines) {
 TEST_F(PolicyLoad, TakesADomainThatAppearsMeanwhile) {
   Load({{"d", {}}, {"late", {"read"}}});
   const unsigned int id = IdOf("late");
-  PolicyTransaction transaction;
+  PolicyTransaction transaction(HostState::Current());
   transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
   EXPECT_EQ(access.CreateDomain("late", TESKACCESS_DEFAULT_DOM_NONE), id);
   EXPECT_TRUE(Exists("late"));
@@ -374,7 +374,7 @@ TEST_F(PolicyLoad, ARemovedPolicyOfAServiceDoesNotComeBack) {
   const LinuxHost::FilePolicy policy = {.domain = {id, {}}, .path = "/etc", .permission = 1};
   policies.Install({&policy, 1});
   {
-    PolicyTransaction transaction;
+    PolicyTransaction transaction(HostState::Current());
     transaction.BeginLoad({.directory = "/p", .domains = {"d"}});
     policies.Install({&policy, 1});
     transaction.EndLoad(true);

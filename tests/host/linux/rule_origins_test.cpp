@@ -32,7 +32,7 @@ RuleOrigin OriginOf(const std::string& domain, const std::string& call, const st
 // "FILE:LINE" of the rule of the domain for the system call; ":0" when none is recorded.
 std::string PlaceOf(const std::string& domain, const std::string& call) {
   std::vector<Rule> rules = {Call("getpid"), Call(call)};
-  FindRuleOrigins(domain, rules);
+  FindRuleOrigins(HostState::Current(), domain, rules);
   EXPECT_EQ(rules.front().origin.file, "");
   const Policy::Origin& origin = rules.back().origin;
   return origin.file + ":" + std::to_string(origin.line);
@@ -40,14 +40,18 @@ std::string PlaceOf(const std::string& domain, const std::string& call) {
 
 // The line that labels `path`; 0 when there is none.
 unsigned int LineFor(const std::string& path) {
-  const auto origin = FindLabelOrigin(path);
+  const auto origin = FindLabelOrigin(HostState::Current(), path);
   return origin ? origin->line : 0;
 }
 
 class RuleOriginsTest : public ::testing::Test {
  protected:
-  static void RecordRules(const std::vector<RuleOrigin>& rules) { RecordOrigins(rules, {}); }
-  static void RecordLabels(const std::vector<LabelOrigin>& labels) { RecordOrigins({}, labels); }
+  static void RecordRules(const std::vector<RuleOrigin>& rules) {
+    RecordOrigins(HostState::Current(), rules, {});
+  }
+  static void RecordLabels(const std::vector<LabelOrigin>& labels) {
+    RecordOrigins(HostState::Current(), {}, labels);
+  }
 
   StateDirectory directory;
 };
@@ -70,7 +74,7 @@ TEST_F(RuleOriginsTest, AreOfExactlyTheRule) {
   Rule capability = Call("bind");
   capability.kind = Policy::RuleKind::kCapability;
   std::vector<Rule> others = {revoked, capability};
-  FindRuleOrigins("sshDom", others);
+  FindRuleOrigins(HostState::Current(), "sshDom", others);
   for (const Rule& rule : others) EXPECT_EQ(rule.origin.file, "") << rule.Text();
 }
 
@@ -78,7 +82,7 @@ TEST_F(RuleOriginsTest, KeepWhatElseIsKnownOfTheRule) {
   RecordRules({OriginOf("sshDom", "bind", "/p/sshDom", 4)});
   std::vector<Rule> rules = {Call("bind")};
   rules.front().origin.isGone = true;
-  FindRuleOrigins("sshDom", rules);
+  FindRuleOrigins(HostState::Current(), "sshDom", rules);
   EXPECT_EQ(rules.front().origin.line, 4U);
   EXPECT_TRUE(rules.front().origin.isGone);
 }
@@ -120,7 +124,7 @@ TEST_F(RuleOriginsTest, TheTreeOfEverythingReachesEveryPath) {
 
 TEST_F(RuleOriginsTest, TellsLabelAndFile) {
   RecordLabels({{"/etc", true, "hostConfig", "/p/fileLabels/base", 3}});
-  const auto origin = FindLabelOrigin("/etc/passwd");
+  const auto origin = FindLabelOrigin(HostState::Current(), "/etc/passwd");
   ASSERT_TRUE(origin.has_value());
   EXPECT_EQ(origin->path, "/etc");
   EXPECT_TRUE(origin->isTree);
@@ -129,7 +133,8 @@ TEST_F(RuleOriginsTest, TellsLabelAndFile) {
 }
 
 TEST_F(RuleOriginsTest, GoWithABoot) {
-  RecordOrigins(std::vector<RuleOrigin>{OriginOf("sshDom", "bind", "/p/sshDom", 4)},
+  RecordOrigins(HostState::Current(),
+                std::vector<RuleOrigin>{OriginOf("sshDom", "bind", "/p/sshDom", 4)},
                 std::vector<LabelOrigin>{{"/etc", true, "hostConfig", "/l", 1}});
   HostState::Current().Reset();
   EXPECT_EQ(PlaceOf("sshDom", "bind"), ":0");

@@ -164,17 +164,17 @@ TEST_F(SavedPolicy, KeepsTheNumbersOfLabelsThatAreStillThere) {
 TEST_F(SavedPolicy, PutsOriginsOfRulesBackAndKeepsThoseOfLabels) {
   const LinuxHost::RuleOrigin rule{"hostDom", CallFrom("/old")};
   const LinuxHost::LabelOrigin label{"/etc", false, "unlabeled", "/old", 1};
-  LinuxHost::RecordOrigins({&rule, 1}, {&label, 1});
+  LinuxHost::RecordOrigins(HostState::Current(), {&rule, 1}, {&label, 1});
   const std::string copy = Copy();
   const LinuxHost::RuleOrigin newRule{"hostDom", CallFrom("/new")};
   const LinuxHost::LabelOrigin newLabel{"/etc", false, "unlabeled", "/new", 2};
-  LinuxHost::RecordOrigins({&newRule, 1}, {&newLabel, 1});
+  LinuxHost::RecordOrigins(HostState::Current(), {&newRule, 1}, {&newLabel, 1});
 
   RestorePolicy(copy);
   Policy::Rule found = CallFrom("");
-  LinuxHost::FindRuleOrigins("hostDom", {&found, 1});
+  LinuxHost::FindRuleOrigins(HostState::Current(), "hostDom", {&found, 1});
   EXPECT_EQ(found.origin.file, "/old");
-  EXPECT_EQ(LinuxHost::FindLabelOrigin("/etc")->file, "/new");
+  EXPECT_EQ(LinuxHost::FindLabelOrigin(HostState::Current(), "/etc")->file, "/new");
 }
 
 TEST_F(SavedPolicy, KeepsWhereInodesCameFromAndTheAttribute) {

@@ -36,8 +36,9 @@ std::string Portrait() {
   }
   char name[64] = {};
   Zorvan::Kernel::Call(0x4066, {2, reinterpret_cast<std::uintptr_t>(name), sizeof name});
-  const auto load = LinuxHost::LatestLoad();
-  return portrait + " " + name + " " + std::to_string(LinuxHost::CountPolicy().objects) + " " +
+  const auto load = LinuxHost::LatestLoad(HostState::Current());
+  return portrait + " " + name + " " +
+         std::to_string(LinuxHost::CountPolicy(HostState::Current()).objects) + " " +
          (load ? load->directory : "-") + " " + LinuxHost::LabelAttribute();
 }
 
@@ -48,7 +49,8 @@ void Fill(const std::string& name, const std::string& attribute, std::size_t lab
     state.Labels().Add({name + std::to_string(number)});
   }
   state.ChooseLabelAttribute(attribute);
-  LinuxHost::RecordLoad({.verb = "load", .directory = "/" + name, .ending = "done", .errors = {}});
+  LinuxHost::RecordLoad(HostState::Current(),
+                        {.verb = "load", .directory = "/" + name, .ending = "done", .errors = {}});
 }
 
 TEST(StateUse, ServesTwoStatesOneAfterTheOther) {
@@ -75,7 +77,7 @@ TEST(StateUse, SeesTheAttributeOfTheNextBoot) {
 
 TEST(StateUse, RefusesACopyWhileALoadKeepsToItsState) {
   const StateDirectory directory;
-  LinuxHost::PolicyTransaction load;
+  LinuxHost::PolicyTransaction load(HostState::Current());
   load.BeginLoad({.directory = "/policy", .domains = {}});
   const std::string copy = directory.Path() + "/copy.db";
   EXPECT_EQ(MessageOf([&] { LinuxHost::UsedCopy used(copy, copy); }),

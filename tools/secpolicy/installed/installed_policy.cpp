@@ -5,6 +5,7 @@
 
 #include "host/linux/operation/rule_origins.h"
 #include "host/linux/operation/stable_view.h"
+#include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
@@ -35,20 +36,20 @@ Origin OriginOf(const std::string& domain, const Rule& rule, const RuleSource& s
   return origin;
 }
 
-void AddOrigins(InstalledDomain& domain) {
+void AddOrigins(InstalledDomain& domain, LinuxHost::HostState& state) {
   auto rule = domain.rules.begin();
   const auto isOf = [&](Policy::RuleKind kind) {
     return rule != domain.rules.end() && rule->kind == kind;
   };
   for (const Policy::RuleForm& form : Policy::kRuleForms) {
-    for (const RuleSource& source : LinuxHost::FindRuleSources(domain.id, form.kind)) {
+    for (const RuleSource& source : LinuxHost::FindRuleSources(state, domain.id, form.kind)) {
       if (!isOf(form.kind)) break;
       rule->origin = OriginOf(domain.name, *rule, source);
       ++rule;
     }
     while (isOf(form.kind)) ++rule;
   }
-  LinuxHost::FindRuleOrigins(domain.name, domain.rules);
+  LinuxHost::FindRuleOrigins(state, domain.name, domain.rules);
 }
 
 std::string ReadLabel(const std::string& path, TeskAccessInterfaceImpl& access) {
@@ -63,23 +64,23 @@ std::string ReadLabel(const std::string& path, TeskAccessInterfaceImpl& access) 
 
 InstalledPolicy ReadInstalledPolicy(TeskAccessInterfaceImpl& access) {
   // A load may end meanwhile.
-  const LinuxHost::StableView view;
+  const LinuxHost::StableView view(LinuxHost::CurrentState());
   InstalledPolicy policy = Policy::ReadPolicy(access);
-  const std::vector<std::string> withoutFile = LinuxHost::FindDomainsWithoutFile();
+  const std::vector<std::string> withoutFile = LinuxHost::FindDomainsWithoutFile(view.State());
   for (InstalledDomain& domain : policy.domains) {
     domain.isGone = std::binary_search(withoutFile.begin(), withoutFile.end(), domain.name);
-    AddOrigins(domain);
+    AddOrigins(domain, view.State());
   }
   return policy;
 }
 
 std::optional<InstalledDomain> ReadInstalledDomain(const std::string& name,
                                                    TeskAccessInterfaceImpl& access) {
-  const LinuxHost::StableView view;
+  const LinuxHost::StableView view(LinuxHost::CurrentState());
   unsigned int id = 0;
   if (!access.FindDomain(name, &id)) return std::nullopt;
   auto domain = Policy::ReadDomain(access, id);
-  if (domain) AddOrigins(*domain);
+  if (domain) AddOrigins(*domain, view.State());
   return domain;
 }
 

@@ -6,6 +6,7 @@
 
 #include "ending.h"
 #include "host/linux/operation/load_record.h"
+#include "host/linux/operation/state_use.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -13,14 +14,14 @@ namespace {
 
 void Record(const RecordedLoad& load, const std::string& directory,
             const LinuxHost::LoadRemainder& removed) {
-  LinuxHost::RecordLoad({.verb = load.verb,
-                         .directory = directory,
-                         .time = std::time(nullptr),
-                         .ending = load.ending,
-                         .errorCount = load.errors.size(),
-                         .errors = load.errors,
-                         .removedRules = removed.rules,
-                         .removedDomains = removed.domains.size()});
+  LinuxHost::RecordLoad(LinuxHost::CurrentState(), {.verb = load.verb,
+                                                    .directory = directory,
+                                                    .time = std::time(nullptr),
+                                                    .ending = load.ending,
+                                                    .errorCount = load.errors.size(),
+                                                    .errors = load.errors,
+                                                    .removedRules = removed.rules,
+                                                    .removedDomains = removed.domains.size()});
 }
 
 }  // namespace
@@ -38,7 +39,7 @@ void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
   try {
     const std::string directory = CanonicalName(load.policyDir);
     Record(load, directory, ending.removed);
-    LinuxHost::RecordOrigins(listener.Rules(), listener.Labels());
+    LinuxHost::RecordOrigins(LinuxHost::CurrentState(), listener.Rules(), listener.Labels());
   } catch (const std::exception& failure) {
     if (load.ending != "done") return;
     Summarize(load.verb,

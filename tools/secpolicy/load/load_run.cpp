@@ -129,7 +129,7 @@ class LoadRun {
     if (!request.dryRun) PutBackLeftOver();
     if (request.prepare) request.prepare(listener.timing);
     stateIsNew = LinuxHost::IsStateMissing();
-    listener.Follow(transaction.emplace());
+    listener.Follow(transaction.emplace(LinuxHost::CurrentState()));
     hasBegun = true;
     if (request.begin) request.begin();
     // A number on a file is to be one that the state knows.

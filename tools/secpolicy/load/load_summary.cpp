@@ -4,6 +4,7 @@
 
 #include "ending.h"
 #include "host/linux/operation/policy_count.h"
+#include "host/linux/operation/state_use.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
 #include "text/visible.h"
@@ -35,7 +36,7 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
 }
 
 std::string CountInstalled() {
-  const LinuxHost::PolicyCount count = LinuxHost::CountPolicy();
+  const LinuxHost::PolicyCount count = LinuxHost::CountPolicy(LinuxHost::CurrentState());
   return CountOf(count.domains, "domain") + ", " + CountOf(count.rules, "rule") + ", " +
          CountOf(count.objects, "object");
 }

@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "host/linux/operation/file_label.h"
+#include "host/linux/operation/state_use.h"
 #include "text/suggestion.h"
 #include "zorvan/kernel.h"
 
@@ -114,7 +115,7 @@ std::optional<LabelOrigin> FindOriginAbove(const FileFacts& file) {
   std::string path = file.paths.back();
   while (path.size() > 1) {
     path.resize(std::max<std::size_t>(path.rfind('/'), 1));
-    auto origin = LinuxHost::FindLabelOrigin(path);
+    auto origin = LinuxHost::FindLabelOrigin(LinuxHost::CurrentState(), path);
     if (origin && origin->label == file.label) return origin;
   }
   return std::nullopt;
@@ -123,7 +124,7 @@ std::optional<LabelOrigin> FindOriginAbove(const FileFacts& file) {
 // The line for one of the paths that gave the label that the file has now.
 std::optional<LabelOrigin> FindOriginOf(const FileFacts& file) {
   for (const std::string& path : file.paths) {
-    auto origin = LinuxHost::FindLabelOrigin(path);
+    auto origin = LinuxHost::FindLabelOrigin(LinuxHost::CurrentState(), path);
     if (origin && origin->label == file.label) return origin;
   }
   return file.labelIsInherited ? FindOriginAbove(file) : std::nullopt;
