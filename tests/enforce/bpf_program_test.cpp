@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 #include <linux/audit.h>
 
+#include <initializer_list>
 #include <random>
 
 #include "enforce/bpf_machine.h"
@@ -23,6 +24,7 @@ using Enforce::FilterProgram;
 using Enforce::Half;
 using Enforce::ValueSet;
 using Calls = std::map<int, CallVerdict>;
+using Numbers = std::initializer_list<std::uint64_t>;
 
 constexpr std::uint32_t kArchitecture = AUDIT_ARCH_X86_64;
 constexpr int kX32 = 0x4000'0000;
@@ -81,10 +83,10 @@ TEST(Assemble, LooksAtTheMaskedHalf) {
   const ArgumentCheck lower = {.argument = 1, .mask = 0xff, .values = {{2, 4}, {9, 9}}};
   const ArgumentCheck upper = {.argument = 2, .half = Half::kUpper, .values = {{0, 0}}};
   const FilterProgram program = Assemble({{7, Allowed({{lower}, {upper}})}}, kArchitecture);
-  for (const std::uint64_t value : {2, 3, 4, 9, 0x102, 0x7fffff09}) {
+  for (const std::uint64_t value : Numbers{2, 3, 4, 9, 0x102, 0x7fff'ff09}) {
     EXPECT_EQ(Ask(program, 7, {0, value, 0xffff'ffff}), "allowed") << value;
   }
-  for (const std::uint64_t value : {0, 1, 5, 8, 10, 0xff, 0x101}) {
+  for (const std::uint64_t value : Numbers{0, 1, 5, 8, 10, 0xff, 0x101}) {
     EXPECT_EQ(Ask(program, 7, {0, value}), "EPERM") << value;
   }
   EXPECT_EQ(Ask(program, 7, {0, 2 | std::uint64_t{1} << 32}), "allowed");
@@ -115,7 +117,7 @@ TEST(Assemble, LetsTheSecretPassOnceItIsSet) {
   FilterProgram program = Assemble({{59, entry}, {60, Allowed()}, {322, entry}}, kArchitecture);
   ASSERT_TRUE(program.secret);
   EXPECT_EQ(RefusalOf(program.instructions), "");
-  for (const std::uint64_t guess : {std::uint64_t{0}, kSecret, ~std::uint64_t{0}}) {
+  for (const std::uint64_t guess : Numbers{0, kSecret, ~std::uint64_t{0}}) {
     EXPECT_EQ(Ask(program, 59, {0, 0, 0, 0, 0, guess}), "EPERM");
   }
   SetSecret(program.instructions.data(), *program.secret, kSecret);

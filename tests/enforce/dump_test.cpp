@@ -54,6 +54,7 @@ TEST(Dump, ShowsWhatIsClosedBesides) {
   EXPECT_EQ(
       Dump(PlanCalls(DomainOf({"-s socket grant", "-s sendto grant", "-s unshare grant",
                                "-s execve grant", "-p connect_port 443 grant"}))),
+      "answered as unknown: clone3\n"
       "allowed: execve\n"
       "allowed where argument 1 & 0xfffaf0ff in 0, and upper half of argument 1 in 0: unshare\n"
       "allowed where argument 1 in 0-16 18-20 22-23 25-29 31-32 34-40 42 45, and argument 1 in 0-1 "

@@ -263,8 +263,9 @@ class CallPlanner {
     return &verdicts[*number];
   }
 
-  // Tells those who grant the call.
+  // Tells those who grant the call, unless another revokes it.
   void Tell(const std::string& call, const std::string& reason) {
+    if (FindGranted(call) == nullptr) return;
     for (const Rule* const rule : callRules) {
       if (rule->Grants() && Policy::SpeaksOfCall(rule->words[0], call)) {
         remarks.Add(*rule, reason, call);
@@ -279,16 +280,13 @@ class CallPlanner {
 
   // Demands what no rule says.
   void Close(const std::string& call, Condition condition, const std::string& reason) {
-    if (FindGranted(call) == nullptr) return;
-    Demand(call, std::move(condition));
     Tell(call, reason);
+    Demand(call, std::move(condition));
   }
 
   void Withdraw(const std::string& call, Answer answer, const std::string& reason) {
-    CallVerdict* const verdict = FindGranted(call);
-    if (verdict == nullptr) return;
-    *verdict = {answer};
     Tell(call, reason);
+    AnswersCall(call, answer);
   }
 
   // ---- -p
@@ -311,10 +309,7 @@ class CallPlanner {
   // Tells those who grant lost values; where none grants any, all pass, and so who grants the call.
   void TellOfLoss(const Check& check, const std::string& call, const ValueSet& lost,
                   const std::string& reason) {
-    if (std::ranges::none_of(check.rules, &Rule::Grants)) {
-      if (FindGranted(call) != nullptr) Tell(call, reason);
-      return;
-    }
+    if (std::ranges::none_of(check.rules, &Rule::Grants)) return Tell(call, reason);
     for (const Rule* const rule : check.rules) {
       const bool hasLost = rule->Grants() && !PassingValues({&rule, 1}).Within(lost).IsEmpty();
       if (hasLost) remarks.Add(*rule, reason);
@@ -358,27 +353,30 @@ class CallPlanner {
 
   void CloseClone() {
     Withdraw("clone3", Answer::kUnknown, "answered as unknown, so that programs use clone");
-    std::uint32_t allowed = 0;
-    std::uint32_t revoked = 0;
-    bool isGranted = false;
-    for (const Rule* const rule : RulesOfCheck(domain.rules, Policy::kMaskCheck)) {
-      (rule->Grants() ? allowed : revoked) |= static_cast<std::uint32_t>(rule->Range().first);
-      isGranted |= rule->Grants();
-    }
-    if (!isGranted) {
-      allowed = ~(kNamespaces | kTimeNamespace);
-      for (const char* const call : {"clone", "unshare"}) {
-        if (FindGranted(call) == nullptr) continue;
-        Tell(call, "new namespaces are refused unless clone_flags grants them");
-      }
-    }
-    allowed &= ~revoked;
-    if (isGranted && (allowed & kTimeNamespace) == 0 && FindGranted("unshare") != nullptr) {
-      Tell("unshare", "a new time namespace is refused unless clone_flags grants 0x80");
-    }
+    const std::uint32_t allowed = AllowedFlags();
     DemandFlags("clone", allowed | kChildSignal);
     DemandFlags("unshare", allowed & kUnshareFlags);
     Demand("unshare", {{.argument = 0, .half = Half::kUpper, .values = {{0, 0}}}});
+  }
+
+  std::uint32_t AllowedFlags() {
+    std::uint32_t granted = 0;
+    std::uint32_t revoked = 0;
+    const std::vector<const Rule*> rules = RulesOfCheck(domain.rules, Policy::kMaskCheck);
+    for (const Rule* const rule : rules) {
+      (rule->Grants() ? granted : revoked) |= static_cast<std::uint32_t>(rule->Range().first);
+    }
+    if (std::ranges::none_of(rules, &Rule::Grants)) {
+      const char* const reason = "new namespaces are refused unless clone_flags grants them";
+      Tell("clone", reason);
+      Tell("unshare", reason);
+      return ~(kNamespaces | kTimeNamespace | revoked);
+    }
+    const std::uint32_t allowed = granted & ~revoked;
+    if ((allowed & kTimeNamespace) == 0) {
+      Tell("unshare", "a new time namespace is refused unless clone_flags grants 0x80");
+    }
+    return allowed;
   }
 
   void DemandFlags(const char* call, std::uint32_t allowed) {
