@@ -25,7 +25,7 @@ void TakeParamCheck(TeskAccess_CapabilityParamRule& rule, RuleLine& line) {
 void CapabilityParamRules::AddRule(unsigned int line, const std::string& domainName,
                                    unsigned int domainId, std::queue<std::string> args,
                                    TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakeParamCheck);
+  AppendRule(rules, {line, domainName, domainId, args, access}, TakeParamCheck);
 }
 
 void CapabilityParamRules::Set(TeskAccessInterfaceImpl& access) {

@@ -26,7 +26,7 @@ void TakeTransition(TeskAccess_DomTransRule& rule, RuleLine& line) {
 
 void DomTransRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
                             std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakeTransition);
+  AppendRule(rules, {line, domainName, domainId, args, access}, TakeTransition);
 }
 
 void DomTransRules::Set(TeskAccessInterfaceImpl& access) {

@@ -72,7 +72,7 @@ unsigned int FillPaths(PathEntries& entries, const std::string& path) {
 void FilePathAccessRules::AddRule(unsigned int line, const std::string& domainName,
                                   unsigned int domainId, std::queue<std::string> args,
                                   TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, TakePath);
+  AppendRule(rules, {line, domainName, domainId, args, access}, TakePath);
 }
 
 unsigned int FilePathAccessRules::GetPermission(const std::string& permissions) {

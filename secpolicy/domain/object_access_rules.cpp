@@ -18,7 +18,7 @@ constexpr std::array kTokens = {
 void ObjectAccessRules::AddRule(unsigned int line, const std::string& domainName,
                                 unsigned int domainId, std::queue<std::string> args,
                                 TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, std::move(args), access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
 }
 
 void ObjectAccessRules::Set(TeskAccessInterfaceImpl& access) {

@@ -7,10 +7,6 @@
 
 namespace SecPolicy {
 
-RuleLine::RuleLine(unsigned int line, const std::string& name, unsigned int id,
-                   std::queue<std::string> args, TeskAccessInterfaceImpl& host)
-    : number(line), domainName(name), domainId(id), words(std::move(args)), access(host) {}
-
 void RuleLine::RequireCount(std::size_t least, std::size_t most) {
   Note(Fault::kArgumentCount, Problem::kWholeLine);
   if (words.size() < least || words.size() > most) RuleSizeError();

@@ -13,9 +13,10 @@ namespace SecPolicy {
 // looked at, so that it is known what a failure was about.
 class RuleLine {
  public:
-  // `name` and `host` are only borrowed.
+  // `name`, `args` and `host` are only borrowed.
   RuleLine(unsigned int line, const std::string& name, unsigned int id,
-           std::queue<std::string> args, TeskAccessInterfaceImpl& host);
+           std::queue<std::string>& args, TeskAccessInterfaceImpl& host)
+      : number(line), domainName(name), domainId(id), words(args), access(host) {}
 
   // Throws the failure of a line with the wrong number of words unless so many are left.
   void RequireCount(std::size_t least, std::size_t most);
@@ -47,7 +48,7 @@ class RuleLine {
  private:
   void Note(Fault fault, std::size_t word);
 
-  std::queue<std::string> words;
+  std::queue<std::string>& words;
   TeskAccessInterfaceImpl& access;
   std::size_t taken = 0;
   Fault notedFault = Fault::kArgumentCount;

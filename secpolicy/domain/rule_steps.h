@@ -46,7 +46,7 @@ void AppendRule(std::list<Rule>& rules, RuleLine line, Take take) {
 template <class Rule, std::size_t Count>
 void AppendRule(std::list<Rule>& rules, RuleLine words,
                 const std::array<RuleToken<Rule>, Count>& tokens) {
-  AppendRule(rules, std::move(words), [&](Rule& rule, RuleLine& line) {
+  AppendRule(rules, words, [&](Rule& rule, RuleLine& line) {
     line.RequireCount(Count + 1);
     for (const RuleToken<Rule>& token : tokens) rule.*token.field = line.Take();
     rule.grant = line.TakeGrant();
