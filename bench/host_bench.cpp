@@ -103,7 +103,7 @@ class LabelledTree {
   }
   const fs::path& Path() const { return scratch.path; }
 
-  static constexpr char kAttribute[] = "security.zorvan";
+  static constexpr char kAttribute[] = "security.bpf.zorvan";
 
  private:
   static void Label(const fs::path& path, std::uint32_t id) {

@@ -37,7 +37,7 @@ load helper
   id=$("$SECPOLICY" --root "$root" display 2>/dev/null | sed -n 's/^sshProgram (\([0-9]*\))$/\1/p')
   [[ -n $id ]]
   hex=$(printf '%02x%02x%02x%02x' $((id & 255)) $((id >> 8 & 255)) $((id >> 16 & 255)) $((id >> 24)))
-  for attribute in security.zorvan user.zorvan.security; do
+  for attribute in security.bpf.zorvan user.zorvan.security; do
     if run getfattr --absolute-names --name "$attribute" --encoding hex "$root/usr/sbin/sshd"; then
       [[ $output == *"$attribute=0x$hex"* ]] && return 0
     fi
@@ -275,7 +275,7 @@ files to get their first label: "[0-9]* ]]
   boot
   local labelled
   labelled=$(find "$root" -path "$root/run" -prune -o -print0 |
-    xargs -0 getfattr --absolute-names --no-dereference --match '^(user\.zorvan\.security|security\.zorvan)$' 2>/dev/null |
+    xargs -0 getfattr --absolute-names --no-dereference --match '^(user\.zorvan\.security|security\.bpf\.zorvan)$' 2>/dev/null |
     grep -c '^# file:')
   [[ $planned -eq $labelled ]]
 }

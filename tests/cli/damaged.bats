@@ -59,3 +59,20 @@ is_damaged() {
   exits 0
   is_done boot
 }
+
+@test "what an older version has left is refused, and a boot moves on to this one's labels" {
+  ((EUID == 0)) || skip "only the superuser writes attributes of the system"
+  local program=$root/usr/sbin/sshd
+  damage "PRAGMA user_version = 3"
+  setfattr --name security.zorvan --value 0x0b000000 "$program"
+  setfattr --remove security.bpf.zorvan "$program"
+  secpolicy label get /usr/sbin/sshd
+  exits 1
+  ends_with 'secpolicy: label get: Unable to use the host state /run/secpolicy/host.db: it has schema 3, this program works with schema 4: it was made by another version of it. Remove the file and run "secpolicy boot", which makes a new one'
+  secpolicy boot
+  exits 0
+  secpolicy label get /usr/sbin/sshd
+  [[ $output == "/usr/sbin/sshd: sshProgram" ]]
+  run getfattr --dump --match=- --absolute-names "$program"
+  [[ $output == *security.bpf.zorvan=* && $output != *security.zorvan=* ]]
+}

@@ -16,7 +16,7 @@ unlabel() {
 import os, sys
 for path in sys.argv[1:]:
     for name in os.listxattr(path):
-        if name.endswith(("security.zorvan", "zorvan.security")):
+        if name in ("security.bpf.zorvan", "user.zorvan.security"):
             os.removexattr(path, name)' "${@/#/$root}"
 }
 

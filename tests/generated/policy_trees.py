@@ -32,7 +32,7 @@ import traceback
 
 POLICY = "etc/zorvan/secpolicy"
 NEEDED = ["globalVMDom", "ioFilterDom", "appDom", "daemonFrameworkDom"]
-ATTRIBUTES = ["security.zorvan", "user.zorvan.security"]
+ATTRIBUTES = ["security.bpf.zorvan", "user.zorvan.security"]
 TREES_IN_A_CHAIN = 10
 
 OBJECTS = ["tool", "data", "spool", "Mixed.Case-1", "-a", "grant", "f\u00fcr", "o;x", "%s", "a" * 255]

@@ -33,11 +33,11 @@ const char* Attribute() {
     const int file = mkstemp(name);
     Require(file >= 0, "mkstemp");
     unlink(name);
-    const bool may = fsetxattr(file, "security.zorvan", "", 0, 0) == 0;
+    const bool may = fsetxattr(file, "security.bpf.zorvan", "", 0, 0) == 0;
     close(file);
     return may;
   }();
-  return privileged ? "security.zorvan" : "user.zorvan.security";
+  return privileged ? "security.bpf.zorvan" : "user.zorvan.security";
 }
 
 }  // namespace

@@ -20,8 +20,11 @@ namespace LinuxHost {
 namespace {
 
 constexpr char kContractName[] = "zorvan.security";
-constexpr char kPrivilegedName[] = "security.zorvan";
+constexpr char kPrivilegedName[] = "security.bpf.zorvan";
 constexpr char kOrdinaryName[] = "user.zorvan.security";
+
+// What older versions called the privileged one, which programs of the kernel cannot read.
+constexpr char kFormerName[] = "security.zorvan";
 
 // The contract's calls take no parameter for it.
 AttributeStandIn* standIn = nullptr;
@@ -70,7 +73,11 @@ bool CanCarryLabel(mode_t mode, const std::string& attribute) {
 
 int GiveFirstLabel(const char* path, const std::string& attribute) {
   const std::uint32_t id = kUnlabeledId;
-  return lsetxattr(path, attribute.c_str(), &id, sizeof id, 0);
+  if (lsetxattr(path, attribute.c_str(), &id, sizeof id, 0) != 0) return -1;
+  // Asked for first: on some file systems even removing nothing is written to the disk.
+  const bool isLeftOver =
+      attribute == kPrivilegedName && lgetxattr(path, kFormerName, nullptr, 0) >= 0;
+  return isLeftOver ? lremovexattr(path, kFormerName) : 0;
 }
 
 std::optional<std::string> ReadCarried(const char* path, const std::string& attribute) {

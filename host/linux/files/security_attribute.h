@@ -9,7 +9,7 @@
 // The attribute "zorvan.security" as stock Linux can hold it.
 namespace LinuxHost {
 
-// The name of the real attribute: "security.zorvan" where this process may write it, else
+// The name of the real attribute: "security.bpf.zorvan" where this process may write it, else
 // "user.zorvan.security". Chosen at the first call for the life of the state in use and recorded
 // there. Throws HostError when the state cannot be used.
 std::string LabelAttribute();
@@ -23,7 +23,8 @@ std::string UsableLabelAttribute(const std::string& otherDirectory);
 bool CanCarryLabel(mode_t mode, const std::string& attribute);
 
 // Gives the file at `path`, which is not a link, the label "unlabeled" in the real attribute
-// `attribute`, whether or not it had one. Returns 0, or -1 with errno set. Links on the way to the
+// `attribute`, whether or not it had one, and takes off what an older version of this host has
+// labelled it with under another name. Returns 0, or -1 with errno set. Links on the way to the
 // file are followed, the last one is not.
 int GiveFirstLabel(const char* path, const std::string& attribute);
 

@@ -8,6 +8,7 @@
 #include <linux/fs.h>
 #include <sys/ioctl.h>
 #include <sys/stat.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -167,6 +168,26 @@ TEST_F(Boot, GivesFirstLabelInPlaceOfAnyOther) {
             }),
             "mine");
   EXPECT_EQ(BootAnd([] { return Label("/file"); }), "unlabeled");
+}
+
+TEST_F(Boot, TakesOffTheLabelsOfOlderVersions) {
+  static constexpr char kFormer[] = "security.zorvan";
+  const std::uint32_t id = 7;
+  scratch.Write("old/file", "here before");
+  for (const char* path : {"old", "old/file"}) {
+    if (setxattr((scratch.Root() / path).c_str(), kFormer, &id, sizeof id, 0) != 0) {
+      GTEST_SKIP() << "this user may not write system attributes";
+    }
+  }
+  EXPECT_EQ(BootAnd([] {
+              std::string seen;
+              for (const char* path : {"/old", "/old/file"}) {
+                seen += lgetxattr(path, kFormer, nullptr, 0) < 0 ? "gone " : "there ";
+                seen += Label(path) + " ";
+              }
+              return seen;
+            }),
+            "gone unlabeled gone unlabeled ");
 }
 
 TEST_F(Boot, StartsFromEmptyState) {

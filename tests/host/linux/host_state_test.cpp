@@ -228,11 +228,11 @@ TEST_F(HostStateFile, TakesTheGreatestInodeNumber) {
 
 TEST_F(HostStateFile, KeepsTheFirstChoiceOfAnAttribute) {
   HostState& state = HostState::Current();
-  EXPECT_EQ(state.ChooseLabelAttribute("security.zorvan"), "security.zorvan");
-  EXPECT_EQ(state.ChooseLabelAttribute("user.zorvan.security"), "security.zorvan");
-  EXPECT_EQ(state.LabelAttribute(), "security.zorvan");
+  EXPECT_EQ(state.ChooseLabelAttribute("security.bpf.zorvan"), "security.bpf.zorvan");
+  EXPECT_EQ(state.ChooseLabelAttribute("user.zorvan.security"), "security.bpf.zorvan");
+  EXPECT_EQ(state.LabelAttribute(), "security.bpf.zorvan");
   EXPECT_EQ(RunInChild([] {
-              if (HostState::Current().LabelAttribute() != "security.zorvan")
+              if (HostState::Current().LabelAttribute() != "security.bpf.zorvan")
                 throw std::runtime_error("another");
             }),
             "");

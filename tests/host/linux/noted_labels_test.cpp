@@ -30,7 +30,7 @@ using LinuxHost::NotedLabels;
 // The real attribute, whatever is noted.
 std::string RealLabel(const char* path) {
   std::uint32_t id = 0;
-  for (const char* name : {"security.zorvan", "user.zorvan.security"}) {
+  for (const char* name : {"security.bpf.zorvan", "user.zorvan.security"}) {
     if (lgetxattr(path, name, &id, sizeof id) == sizeof id) return std::to_string(id);
   }
   return "none";

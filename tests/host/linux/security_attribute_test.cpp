@@ -31,7 +31,7 @@ int Put(const char* path, int flags) {
 // The real attributes that `path` carries.
 std::string RealNames(const char* path) {
   std::string names;
-  for (const char* name : {"security.zorvan", "user.zorvan.security"}) {
+  for (const char* name : {"security.bpf.zorvan", "user.zorvan.security"}) {
     if (getxattr(path, name, nullptr, 0) == sizeof kValue) names += std::string(name) + " ";
   }
   return names;
@@ -67,7 +67,7 @@ TEST_F(SecurityAttribute, IsOneRealAttribute) {
     Put("file", 0);
     return RealNames("file");
   });
-  EXPECT_TRUE(names == "security.zorvan " || names == "user.zorvan.security ") << names;
+  EXPECT_TRUE(names == "security.bpf.zorvan " || names == "user.zorvan.security ") << names;
 }
 
 TEST_F(SecurityAttribute, IsReplacedOnlyWhereItIs) {
@@ -140,7 +140,7 @@ TEST_F(SecurityAttribute, StaysPrivilegedOnceChosen) {
     Put("file", 0);
     return RealNames("file");
   });
-  if (chosen != "security.zorvan ") GTEST_SKIP() << "this user may not write system attributes";
+  if (chosen != "security.bpf.zorvan ") GTEST_SKIP() << "this user may not write system attributes";
   EXPECT_EQ(Run([]() -> std::string {
               if (!DropSystemAdministration()) return "(rights cannot be dropped)";
               return Told(Put("file", XATTR_REPLACE));

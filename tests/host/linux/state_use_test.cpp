@@ -60,8 +60,8 @@ TEST(StateUse, ServesTwoStatesOneAfterTheOther) {
   EXPECT_EQ(portrait, "one one 3 /one user.zorvan.security");
   {
     const StateDirectory second;
-    Fill("two", "security.zorvan", 2);
-    EXPECT_EQ(Portrait(), "two two 4 /two security.zorvan");
+    Fill("two", "security.bpf.zorvan", 2);
+    EXPECT_EQ(Portrait(), "two two 4 /two security.bpf.zorvan");
   }
   EXPECT_EQ(Portrait(), portrait);
 }
@@ -71,8 +71,8 @@ TEST(StateUse, SeesTheAttributeOfTheNextBoot) {
   Fill("one", "user.zorvan.security", 0);
   EXPECT_EQ(LinuxHost::LabelAttribute(), "user.zorvan.security");
   HostState::Current().Reset();
-  HostState::Current().ChooseLabelAttribute("security.zorvan");
-  EXPECT_EQ(LinuxHost::LabelAttribute(), "security.zorvan");
+  HostState::Current().ChooseLabelAttribute("security.bpf.zorvan");
+  EXPECT_EQ(LinuxHost::LabelAttribute(), "security.bpf.zorvan");
 }
 
 TEST(StateUse, RefusesACopyWhileALoadKeepsToItsState) {
