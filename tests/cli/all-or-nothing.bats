@@ -181,8 +181,9 @@ os.close(reader)
 sys.exit(abs(subprocess.run(sys.argv[1:], stderr=writer).returncode))
 END
   [[ $status -ne 0 ]]
-  # Takes the journal of the database away.
+  # Takes the journals of the databases away.
   secpolicy status
+  secpolicy settings option /None
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 

@@ -70,3 +70,76 @@ nothing_is_stored() {
   [[ $stderr == "Error: "* ]]
   ends_with "secpolicy: restore: failed (1 error above)"
 }
+
+# kept_number LABEL: the number that display shows.
+kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 (\([0-9]*\))\$/\1/p"; }
+
+@test "a label has the same number after a boot, and one that came later has a new one" {
+  echo firstLabel >"$policy/objects/more"
+  boot
+  local first program
+  first=$(kept_number firstLabel)
+  program=$(kept_number sshProgram)
+  rm "$policy/objects/more"
+  secpolicy load
+  exits 0
+  [[ -n $first && -z $(kept_number firstLabel) ]]
+  # A machine that starts has no state.
+  rm -r "$root/run/secpolicy"
+  echo secondLabel >"$policy/objects/aaa"
+  boot
+  [[ $(kept_number sshProgram) -eq $program && $(kept_number secondLabel) -gt $first ]]
+  echo firstLabel >"$policy/objects/more"
+  secpolicy load
+  exits 0
+  [[ $(kept_number firstLabel) -eq $first ]]
+}
+
+@test "settings that were lost are told of by the next load, and no number is used again" {
+  boot
+  local highest
+  highest=$("$SECPOLICY" --root "$root" display 2>/dev/null | sed -n 's/^[[:alnum:]]* (\([0-9]*\))$/\1/p' | sort -n | tail -1)
+  rm -r "$root/var/lib/secpolicy"
+  echo newLabel >"$policy/objects/more"
+  secpolicy load
+  exits 0
+  says "secpolicy: load: /var/lib/secpolicy/config.db did not know the numbers of the labels in use, so they were written into it again; new ones begin above $highest"
+  [[ $(kept_number newLabel) -eq $((highest + 1)) ]]
+  secpolicy load
+  exits 0
+  [[ $stderr != *"did not know"* ]]
+}
+
+@test "damaged settings stop a load that has a new label, and say what to do" {
+  boot
+  echo broken >"$root/var/lib/secpolicy/config.db"
+  echo newLabel >"$policy/objects/more"
+  secpolicy load
+  exits 1
+  [[ $stderr == *"Unable to use the configuration /var/lib/secpolicy/config.db: it is damaged or no such thing (file is not a database). Move the file away and store the wanted settings again"* ]]
+  [[ -z $(kept_number newLabel) ]]
+}
+
+@test "settings of the version before stay stored" {
+  secpolicy settings enforcement appDom permissive
+  sqlite3 "$root/var/lib/secpolicy/config.db" 'DROP TABLE label_number; PRAGMA user_version = 1'
+  boot
+  secpolicy settings enforcement appDom
+  exits 0
+  [[ $output == permissive ]]
+  [[ $(sqlite3 "$root/var/lib/secpolicy/config.db" "SELECT id FROM label_number WHERE name = 'sshProgram'") -eq $(kept_number sshProgram) ]]
+}
+
+@test "what only looks gives no numbers" {
+  boot
+  local before
+  before=$(sqlite3 "$root/var/lib/secpolicy/config.db" 'SELECT * FROM label_number')
+  cp -r "$policy" "$root/new"
+  echo newLabel >"$root/new/objects/more"
+  secpolicy check /new
+  secpolicy load --plan /new
+  exits 0
+  [[ $output == *newLabel* ]]
+  secpolicy diff installed /new
+  [[ $(sqlite3 "$root/var/lib/secpolicy/config.db" 'SELECT * FROM label_number') == "$before" ]]
+}

@@ -4,8 +4,8 @@
 //   hostile_child parse FILE [MIB]        reads a policy file, in at most MIB of address space;
 //                                         prints the number of lines with words and the most memory
 //                                         that was in use, in kB
-//   hostile_child label UID STATE DIR     labels DIR and its tree as the user UID, with the host
-//                                         state STATE; prints what that threw
+//   hostile_child label UID HOST DIR      labels DIR and its tree as the user UID, with the host's
+//                                         files in the directory HOST; prints what that threw
 //   hostile_child read UID DIR            reads every policy file of DIR likewise
 #include <grp.h>
 #include <sys/resource.h>
@@ -53,7 +53,9 @@ void Become(const char* user) {
 
 void Label(std::span<char*> arguments) {
   Become(arguments[0]);
-  setenv("SECPOLICY_HOST_STATE", arguments[1], 1);
+  const std::string directory = arguments[1];
+  setenv("SECPOLICY_HOST_STATE", (directory + "/host.db").c_str(), 1);
+  setenv("SECPOLICY_HOST_CONFIG", (directory + "/config.db").c_str(), 1);
   TeskAccessInterfaceImpl access;
   access.AddLabels({"toolLabel"}, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
   SecPolicy::SetDirLabelRecursive(arguments[2], "toolLabel", access);

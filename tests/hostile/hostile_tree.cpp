@@ -69,6 +69,7 @@ unsigned int OpenDescriptors() {
 
 void HostileTree::SetUp() {
   setenv("SECPOLICY_HOST_STATE", (scratch / "state/host.db").c_str(), 1);
+  setenv("SECPOLICY_HOST_CONFIG", (scratch / "state/config.db").c_str(), 1);
   MakeDirectory(tree);
   MakeDirectory(outside);
   Require(mkdir(unlabelled.c_str(), 0755) == 0, unlabelled);

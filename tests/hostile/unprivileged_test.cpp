@@ -45,7 +45,7 @@ class Unprivileged : public testing::Test {
   }
 
   std::string LabelTree() const {
-    return RunChild({"label", std::to_string(kUser), *this / "state/host.db", *this / "tree"})
+    return RunChild({"label", std::to_string(kUser), *this / "state", *this / "tree"})
         .output;
   }
 

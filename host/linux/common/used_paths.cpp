@@ -49,6 +49,8 @@ const std::string& SettingsPath() {
   return path;
 }
 
+bool AreLabelNumbersKept() { return usedState == nullptr || usedSettings; }
+
 UsedState::UsedState(const std::string& file, const std::string& name)
     : path(file), shownAs(name), before(std::exchange(usedState, this)) {}
 

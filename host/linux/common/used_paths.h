@@ -18,6 +18,10 @@ const std::string& ShownStatePath();
 // absolute path. Programs that run with more rights than their user ignore both variables.
 const std::string& SettingsPath();
 
+// True when the numbers of labels are to outlive the state: it is the host's own, or one that is
+// used together with settings of its own. Of any other nothing is to remain.
+bool AreLabelNumbersKept();
+
 // As long as it lives, this process works with the state at `path`, and not with that of the host;
 // no variable can change that. The latest one counts. Not while other threads use the host.
 class UsedState {

@@ -18,8 +18,8 @@
 #include "host/linux/files/directory_entry.h"
 #include "host/linux/files/first_labels.h"
 #include "host/linux/files/security_attribute.h"
-#include "host/linux/services/config_database.h"
 #include "host/linux/services/system_log.h"
+#include "host/linux/state/config_database.h"
 #include "host/linux/state/host_state.h"
 
 namespace LinuxHost {

@@ -170,12 +170,17 @@ constexpr Sql kMoveWorlds[] = {
        ORDER BY id)",
 };
 
-// Files may carry the number of a label that is gone: it gets a new one.
-constexpr Sql kRenewLabels[] = {
-    "DELETE FROM main.label WHERE name NOT IN (SELECT name FROM saved.label)",
-    "INSERT INTO main.label (name) SELECT name FROM saved.label "
-    "WHERE name NOT IN (SELECT name FROM main.label) ORDER BY id",
-};
+// Files may carry the number of a label: it keeps the one that it has here.
+void RenewLabels(HostState& state) {
+  state.Database().Run("DELETE FROM main.label WHERE name NOT IN (SELECT name FROM saved.label)");
+  std::vector<std::string> saved;
+  {
+    Rows rows = state.Database().Select("SELECT name FROM saved.label ORDER BY id");
+    while (rows.Next()) saved.push_back(rows.Text(0));
+  }
+  state.Forget();
+  state.Labels().Add(saved);
+}
 
 // The tables that come back as they were. Their rows are read in the order of their numbers.
 void PutTablesBack(Store& store) {
@@ -209,7 +214,7 @@ void RestorePolicy(const std::string& copy) {
   RefuseHomelessWorlds(state);
   for (const Sql& statement : kMoveWorlds) store.Run(statement);
   PutTablesBack(store);
-  for (const Sql& statement : kRenewLabels) store.Run(statement);
+  RenewLabels(state);
   // Every process notices.
   store.Run(
       "UPDATE main.state SET domain_version = domain_version + 1, label_version = label_version + "

@@ -3,7 +3,7 @@
 #include <optional>
 #include <string>
 
-#include "host/linux/services/config_database.h"
+#include "host/linux/state/config_database.h"
 
 // The settings that the user wants of the host. They outlive a boot, in
 // /var/lib/secpolicy/config.db unless SECPOLICY_HOST_CONFIG names another absolute path. All throw

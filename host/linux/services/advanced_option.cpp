@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include "host/linux/services/config_database.h"
+#include "host/linux/state/config_database.h"
 #include "teskctl/adv.h"
 
 namespace TeskCtl::Adv {

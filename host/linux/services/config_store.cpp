@@ -1,6 +1,6 @@
 #include "orinconfigstore/config_store.h"
 
-#include "host/linux/services/config_database.h"
+#include "host/linux/state/config_database.h"
 
 namespace OrinConfigStore {
 namespace {

@@ -75,9 +75,9 @@ void HostState::Reset() {
   for (const StateTable& table : kStateTables) {
     store.RunScript(Braxo::Misc::StrCat("DELETE FROM ", table.name));
   }
-  store.Run("DELETE FROM sqlite_sequence");
   store.RunScript(kStateLayout.firstRows);
-  // The versions go on, so that every process notices.
+  // Numbers of labels go on, as files may carry those that were; and versions, so that every
+  // process notices.
   store.Run(
       "UPDATE state SET domain_version = domain_version + 1, label_version = label_version + 1, "
       "label_attribute = ''");

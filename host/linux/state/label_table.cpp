@@ -1,10 +1,14 @@
 #include "host/linux/state/label_table.h"
 
 #include <cerrno>
+#include <numeric>
+#include <set>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/require_text.h"
+#include "host/linux/common/used_paths.h"
+#include "host/linux/state/config_database.h"
 #include "host/linux/state/removal.h"
 
 using Braxo::Misc::StrCat;
@@ -57,13 +61,37 @@ void LabelTable::Add(const std::vector<std::string>& added) {
   for (const auto& name : added) RequireText(name, kName);
   Transaction transaction(base.Database());
   base.Refresh();
-  int changes = 0;
-  for (const auto& name : added) {
-    changes += base.Database().Run(
-        "INSERT INTO label (name) SELECT ?1 WHERE NOT EXISTS (SELECT 1 FROM label WHERE name = ?1)",
-        name);
+  const std::vector<std::string> missing = Missing(added);
+  if (missing.empty()) return;
+  const std::vector<std::uint32_t> numbers = NumbersFor(missing);
+  for (std::size_t index = 0; index < missing.size(); ++index) {
+    base.Database().Run("INSERT INTO label VALUES (?1, ?2)", numbers[index], missing[index]);
   }
-  if (changes != 0) base.CommitLabels(transaction);
+  base.CommitLabels(transaction);
+}
+
+// Each once, in the order of `wanted`.
+std::vector<std::string> LabelTable::Missing(const std::vector<std::string>& wanted) {
+  Load();
+  std::vector<std::string> missing;
+  std::set<std::string_view> seen;
+  for (const std::string& name : wanted) {
+    if (!identifiers.contains(name) && seen.insert(name).second) missing.push_back(name);
+  }
+  return missing;
+}
+
+std::vector<std::uint32_t> LabelTable::NumbersFor(const std::vector<std::string>& added) {
+  const std::int64_t highest = HighestNumber();
+  if (AreLabelNumbersKept()) return ConfigDatabase::Current().NumberLabels(added, All(), highest);
+  std::vector<std::uint32_t> numbers(added.size());
+  std::iota(numbers.begin(), numbers.end(), static_cast<std::uint32_t>(highest + 1));
+  return numbers;
+}
+
+std::int64_t LabelTable::HighestNumber() {
+  Rows rows = base.Database().Select("SELECT seq FROM sqlite_sequence WHERE name = 'label'");
+  return rows.Next() ? rows.Integer(0) : kNoLabel;
 }
 
 void LabelTable::Remove(const std::vector<std::string>& removed) {

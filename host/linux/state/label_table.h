@@ -20,6 +20,7 @@ constexpr unsigned int kNoLabel = 1;
 constexpr char kUnlabeled[] = "unlabeled";
 constexpr unsigned int kUnlabeledId = 2;
 constexpr char kDefaultTardiskLabel[] = "tardiskDefault";
+constexpr unsigned int kHighestBuiltInId = 3;
 
 // The object labels, as of the last StateBase::Refresh(). Failures are HostErrors.
 class LabelTable {
@@ -38,15 +39,22 @@ class LabelTable {
   // All labels with their identifiers.
   std::map<std::string, long> All();
 
-  // Adds those of `added` that are missing, all or none. Identifiers are never used again within
-  // one state. Throws for a name that cannot be a label.
+  // Adds those of `added` that are missing, all or none. An identifier is never used again for
+  // another name: in the host's own state not after a boot either, where a name has the one that it
+  // has ever had. Throws for a name that cannot be a label, and when a new identifier cannot be
+  // kept for the next boot.
   void Add(const std::vector<std::string>& added);
 
   // Removes labels, and the rules that name them; unknown and predefined ones are left out.
   void Remove(const std::vector<std::string>& removed);
 
+  // The highest identifier that this state has ever given.
+  std::int64_t HighestNumber();
+
  private:
   void Load();
+  std::vector<std::string> Missing(const std::vector<std::string>& wanted);
+  std::vector<std::uint32_t> NumbersFor(const std::vector<std::string>& added);
 
   StateBase& base;
   std::optional<std::int64_t> loadedVersion;

@@ -206,17 +206,21 @@ bool Store::IsReady() {
     RequireStructure();
     return true;
   }
+  if (IsOfVersionBefore(version)) return false;
   Refuse(EPROTO, StrCat("has schema ", version, ", this program works with schema ", layout.version,
                         ": it was made by another version of it"));
+}
+
+bool Store::IsOfVersionBefore(std::int64_t version) const {
+  return *layout.addition != '\0' && version == layout.version - 1;
 }
 
 // The engine keeps the text of each statement that made something.
 void Store::RequireStructure() {
   constexpr std::string_view kCreate = "CREATE ";
-  const std::string_view schema = layout.schema;
+  const std::string schema = StrCat(layout.schema, layout.addition);
   std::int64_t wanted = 0;
-  for (auto at = schema.find(kCreate); at != std::string_view::npos;
-       at = schema.find(kCreate, at + 1)) {
+  for (auto at = schema.find(kCreate); at != std::string::npos; at = schema.find(kCreate, at + 1)) {
     ++wanted;
   }
   Rows rows = Select("SELECT count(*) FROM sqlite_schema WHERE instr(?1, sql) > 0", schema);
@@ -235,9 +239,11 @@ void Store::Create() {
   const DirectoryLock lock(directory);
   if (IsReady()) return;
   SwitchToWriteAheadLog();
+  const bool isNew = ReadInteger("PRAGMA user_version") == 0;
   Transaction transaction(*this);
-  RunScript(StrCat(layout.schema, layout.firstRows, ";PRAGMA application_id = ",
-                   layout.applicationId, ";PRAGMA user_version = ", layout.version));
+  if (isNew) RunScript(StrCat(layout.schema, layout.firstRows));
+  RunScript(StrCat(layout.addition, ";PRAGMA application_id = ", layout.applicationId,
+                   ";PRAGMA user_version = ", layout.version));
   transaction.Commit();
 }
 

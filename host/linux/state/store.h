@@ -31,6 +31,7 @@ struct StoreLayout {
   std::int32_t applicationId;  // marks the file as ours; not 0
   std::int32_t version;        // of the schema; a file of any other one is refused; not 0
   const char* schema;          // SQL statements that fill an empty database
+  const char* addition = "";   // and those that a file of the version before is made one of this by
   const char* firstRows = "";  // and those for the rows that it begins with
   bool survivesPowerLoss;      // false: survives any death of its users, not of the machine
 };
@@ -160,6 +161,7 @@ class Store {
 
   void Open();
   bool IsReady();
+  bool IsOfVersionBefore(std::int64_t version) const;
   void RequireStructure();
   void Create();
   void SwitchToWriteAheadLog();

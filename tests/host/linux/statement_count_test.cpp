@@ -95,12 +95,12 @@ TEST_F(StatementsOfACall, AreOneForEachFilePolicyAndTwoForTheBatch) {
   EXPECT_EQ(Steps([&] { policies.Install(same); }), 3);
 }
 
-// The transaction, the version of the table, and each label.
-TEST_F(StatementsOfACall, AreOneForEachLabelAndThreeForTheBatch) {
+// The transaction, the highest number, the version of the table, and each label.
+TEST_F(StatementsOfACall, AreOneForEachLabelAndFourForTheBatch) {
   std::vector<std::string> labels;
   for (int number = 0; number < 100; ++number) labels.push_back("label" + std::to_string(number));
   EXPECT_EQ(Steps([&] { access.AddLabels(labels, TeskCtl::Security::TESKACCESS_LABEL_OBJECT); }),
-            103);
+            104);
 }
 
 // One for each row, and one that finds the end.

@@ -47,6 +47,18 @@ unsigned int ModeOf(const std::string& path) {
   return status.st_mode & 07777;
 }
 
+// A later version of it, with what that has besides.
+constexpr StoreLayout kNextLayout = {
+    .purpose = "shopping list",
+    .remedy = "Write a new one",
+    .applicationId = 42,
+    .version = 4,
+    .schema = "CREATE TABLE item (name TEXT UNIQUE, count INTEGER)",
+    .addition =
+        ";CREATE TABLE shop (name TEXT);"
+        "INSERT INTO shop VALUES ('corner')",
+    .survivesPowerLoss = false};
+
 class StoreFile : public ::testing::Test {
  protected:
   // The message of what opening `wanted` throws; its error number goes to `code`.
@@ -184,6 +196,34 @@ TEST_F(StoreFile, RefusesAnotherSchemaAndLeavesItAlone) {
   EXPECT_EQ(code, EPROTO);
   Store store(path, newer);
   EXPECT_EQ(CountOf(store, "milk"), 2);
+}
+
+TEST_F(StoreFile, TakesTheVersionBeforeWithWhatItLacks) {
+  Store(path, kLayout).Run("INSERT INTO item VALUES ('milk', 2)");
+  for (int use = 1; use <= 2; ++use) {
+    Store store(path, kNextLayout);
+    EXPECT_EQ(CountOf(store, "milk"), 2);
+    EXPECT_EQ(store.ReadInteger("SELECT count(*) FROM shop"), 1);
+  }
+  EXPECT_EQ(Refusal(path), "Unable to use the shopping list " + path +
+                               ": it has schema 4, this program works with schema 3: it was made "
+                               "by another version of it. Write a new one");
+}
+
+TEST_F(StoreFile, IsNewWithWhatTheVersionBeforeLacks) {
+  Store store(path, kNextLayout);
+  EXPECT_EQ(store.ReadInteger("SELECT count(*) FROM shop"), 1);
+  EXPECT_EQ(store.ReadInteger("SELECT count(*) FROM item"), 0);
+}
+
+TEST_F(StoreFile, RefusesTheVersionBeforeThatOne) {
+  StoreLayout older = kLayout;
+  older.version = 2;
+  { const Store store(path, older); }
+  EXPECT_EQ(Refusal(path, kNextLayout),
+            "Unable to use the shopping list " + path +
+                ": it has schema 2, this program works with schema 4: it was made by another "
+                "version of it. Write a new one");
 }
 
 TEST_F(StoreFile, RefusesTheDatabaseOfSomethingElse) {

@@ -13,6 +13,7 @@
 
 #include "ending.h"
 #include "host/linux/operation/label_journal.h"
+#include "host/linux/operation/label_numbers.h"
 #include "host/linux/operation/noted_labels.h"
 #include "host/linux/operation/state_use.h"
 #include "load/load_listener.h"
@@ -126,7 +127,10 @@ class LoadRun {
 
   void Install() {
     if (request.mend) request.mend();
-    if (!request.dryRun) PutBackLeftOver();
+    if (!request.dryRun) {
+      PutBackLeftOver();
+      KeepLabelNumbers();
+    }
     if (request.prepare) request.prepare(listener.timing);
     stateIsNew = LinuxHost::IsStateMissing();
     listener.Follow(transaction.emplace(LinuxHost::CurrentState()));
@@ -147,12 +151,16 @@ class LoadRun {
 
   // A load that was killed while it gave labels, all of them or none, has left them half done.
   void PutBackLeftOver() {
-    if (LinuxHost::IsStateMissing()) return;
     const auto back = LinuxHost::LabelJournal::PutBackLeftOver(LinuxHost::StatePath());
     if (!back) return;
     Summarize("load", "a load before this one was killed, so " +
                           CountOf(back->count, "file label") + " were put back first");
     ReportPutBack(*back);
+  }
+
+  void KeepLabelNumbers() const {
+    const std::string done = LinuxHost::TakeOverLabelNumbers();
+    if (!done.empty()) Summarize(request.verb, done);
   }
 
   // A file without its label is an error of a load that was well until then.

@@ -1,9 +1,12 @@
 #pragma once
 
+#include <cstdint>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <variant>
+#include <vector>
 
 #include "host/linux/state/store.h"
 #include "orinconfigstore/config_store.h"
@@ -13,7 +16,11 @@ namespace LinuxHost {
 // An advanced option is an integer or a text.
 using OptionValue = std::variant<long, std::string>;
 
-// The database of wanted settings. Failures are HostErrors.
+// Labels by name, with their numbers.
+using LabelNumbers = std::map<std::string, long>;
+
+// The database of what outlives a boot: the wanted settings, and which label has which number.
+// Failures are HostErrors.
 class ConfigDatabase {
  public:
   // The calling thread's connection; the database is created if it is not there. The reference
@@ -40,7 +47,23 @@ class ConfigDatabase {
   void SetBootStatus(const OrinConfigStore::ConfigStoreObjectId& id, bool applied);
   void ClearBootStatus();
 
+  // The number of each label of `names`: the one that it has ever had, or else a new one above all
+  // that are known here and above `highest`, in the order of `names`. What is new survives the
+  // power of the machine when this returns. No label gets a number that another one has in `used`.
+  std::vector<std::uint32_t> NumberLabels(const std::vector<std::string>& names,
+                                          const LabelNumbers& used, std::int64_t highest);
+
+  // The highest number that was ever given here.
+  std::int64_t HighestLabelNumber();
+
+  // Takes the numbers of `used` over for the labels that have none here. New ones are above
+  // `highest` from now on.
+  void TakeOverLabelNumbers(const LabelNumbers& used, std::int64_t highest);
+
  private:
+  std::optional<std::int64_t> FindNumber(const std::string& name);
+  std::int64_t GiveNumber(const std::string& name);
+
   Store store;
 };
 

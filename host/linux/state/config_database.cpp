@@ -1,9 +1,10 @@
-#include "host/linux/services/config_database.h"
+#include "host/linux/state/config_database.h"
 
 #include <sys/stat.h>
 
 #include <cerrno>
 #include <filesystem>
+#include <set>
 #include <system_error>
 
 #include "host/linux/common/used_paths.h"
@@ -17,7 +18,7 @@ constexpr StoreLayout kLayout{
     .purpose = "configuration",
     .remedy = "Move the file away and store the wanted settings again",
     .applicationId = 0x5a4f4346,
-    .version = 1,
+    .version = 2,
     .schema = R"(
         CREATE TABLE advanced_option(
           path TEXT PRIMARY KEY,
@@ -34,6 +35,14 @@ constexpr StoreLayout kLayout{
           applied INTEGER NOT NULL,
           PRIMARY KEY(first, second, third, fourth)
         ) STRICT, WITHOUT ROWID;
+      )",
+    // Names stay when their labels are removed: files elsewhere may carry the number.
+    .addition = R"(
+        CREATE TABLE label_number(
+          id INTEGER PRIMARY KEY AUTOINCREMENT CHECK (id BETWEEN 2 AND 4294967295),
+          name TEXT NOT NULL UNIQUE
+        ) STRICT;
+        INSERT INTO label_number VALUES (2, 'unlabeled'), (3, 'tardiskDefault');
       )",
     .survivesPowerLoss = true,
 };
@@ -117,5 +126,52 @@ void ConfigDatabase::SetBootStatus(const ConfigStoreObjectId& id, bool applied) 
 }
 
 void ConfigDatabase::ClearBootStatus() { store.Run("DELETE FROM boot_status"); }
+
+std::int64_t ConfigDatabase::HighestLabelNumber() {
+  Rows rows = store.Select("SELECT seq FROM sqlite_sequence WHERE name = 'label_number'");
+  return rows.Next() ? rows.Integer(0) : 0;
+}
+
+void ConfigDatabase::TakeOverLabelNumbers(const LabelNumbers& used, std::int64_t highest) {
+  Transaction transaction(store);
+  for (const auto& [name, number] : used) {
+    store.Run("INSERT OR IGNORE INTO label_number VALUES (?1, ?2)", number, name);
+  }
+  store.Run("UPDATE sqlite_sequence SET seq = max(seq, ?1) WHERE name = 'label_number'", highest);
+  transaction.Commit();
+}
+
+std::vector<std::uint32_t> ConfigDatabase::NumberLabels(const std::vector<std::string>& names,
+                                                        const LabelNumbers& used,
+                                                        std::int64_t highest) {
+  std::set<std::int64_t> taken;
+  for (const auto& [name, number] : used) taken.insert(number);
+  Transaction transaction(store);
+  if (HighestLabelNumber() < highest) TakeOverLabelNumbers(used, highest);
+  std::vector<std::uint32_t> numbers;
+  numbers.reserve(names.size());
+  for (const std::string& name : names) {
+    std::optional<std::int64_t> number = FindNumber(name);
+    if (number && taken.contains(*number)) {
+      // These settings come from another host, or from earlier times.
+      store.Run("DELETE FROM label_number WHERE name = ?1", name);
+      number.reset();
+    }
+    numbers.push_back(static_cast<std::uint32_t>(number ? *number : GiveNumber(name)));
+  }
+  transaction.Commit();
+  return numbers;
+}
+
+std::optional<std::int64_t> ConfigDatabase::FindNumber(const std::string& name) {
+  Rows rows = store.Select("SELECT id FROM label_number WHERE name = ?1", name);
+  if (!rows.Next()) return std::nullopt;
+  return rows.Integer(0);
+}
+
+std::int64_t ConfigDatabase::GiveNumber(const std::string& name) {
+  store.Run("INSERT INTO label_number (name) VALUES (?1)", name);
+  return HighestLabelNumber();
+}
 
 }  // namespace LinuxHost
