@@ -22,6 +22,8 @@
 #include <string>
 #include <vector>
 
+#include "host/enforce/label_index.h"
+#include "host/linux/files/labelled_places.h"
 #include "host/linux/operation/policy_load.h"
 #include "host/linux/operation/state_use.h"
 #include "secpolicy/domain/domain_policy.h"
@@ -159,6 +161,77 @@ void LabelTreeBare(benchmark::State& state, const fs::path& parent) {
     // The identifiers of the two labels: the first ones behind those that are built in.
     LabelBare(path.data(), tree.size(), 4 + static_cast<std::uint32_t>(++shared.round % 2));
   }
+}
+
+// ---- Indexing the labels of a tree ------------------------------------------------------------
+
+// A tree in which every tenth file has a label of its own, and the last index of it.
+class IndexedTree {
+ public:
+  explicit IndexedTree(const fs::path& parent) : tree(parent), output(parent) {
+    constexpr std::uint32_t kOther = 3;
+    for (int i = 0; i < kDirectories; ++i) {
+      for (int j = 0; j < kFilesPerDirectory; j += 10) {
+        const fs::path file =
+            tree.Path() / ("d" + std::to_string(i)) / ("file" + std::to_string(j));
+        if (setxattr(file.c_str(), LabelledTree::kAttribute, &kOther, sizeof kOther, 0) != 0) {
+          std::abort();
+        }
+      }
+    }
+  }
+
+  std::string Path() const { return tree.Path().string(); }
+  std::string IndexFile() const { return (output.path / "labels.index").string(); }
+
+ private:
+  const LabelledTree tree;
+  const ScratchDir output;
+};
+
+void IndexTree(benchmark::State& state, const fs::path& parent) {
+  const IndexedTree tree(parent);
+  for (auto _ : state) {
+    const Enforce::LabelIndex index(
+        {.device = 1, .serial = 1},
+        LinuxHost::FindLabelledPlaces(tree.Path(), LabelledTree::kAttribute));
+    index.Write(tree.IndexFile());
+    state.counters["places"] = static_cast<double>(index.Size());
+    state.counters["bytes"] = static_cast<double>(fs::file_size(tree.IndexFile()));
+  }
+}
+
+std::uint64_t ReadBare(char* path, std::size_t length) {
+  std::uint64_t sum = 0;
+  DIR* const directory = opendir(path);
+  while (const dirent* entry = readdir(directory)) {
+    if (std::strcmp(entry->d_name, ".") == 0 || std::strcmp(entry->d_name, "..") == 0) continue;
+    const std::size_t nameLength = std::strlen(entry->d_name);
+    path[length] = '/';
+    std::memcpy(path + length + 1, entry->d_name, nameLength + 1);
+    std::uint32_t id = 0;
+    lgetxattr(path, LabelledTree::kAttribute, &id, sizeof id);
+    sum += id;
+    if (entry->d_type == DT_DIR) sum += ReadBare(path, length + 1 + nameLength);
+    path[length] = '\0';
+  }
+  closedir(directory);
+  return sum;
+}
+
+void IndexTreeBare(benchmark::State& state, const fs::path& parent) {
+  const IndexedTree tree(parent);
+  std::array<char, 4096> path{};
+  tree.Path().copy(path.data(), path.size() - 1);
+  for (auto _ : state) benchmark::DoNotOptimize(ReadBare(path.data(), tree.Path().size()));
+}
+
+void ReadIndex(benchmark::State& state, const fs::path& parent) {
+  const IndexedTree tree(parent);
+  Enforce::LabelIndex({.device = 1, .serial = 1},
+                      LinuxHost::FindLabelledPlaces(tree.Path(), LabelledTree::kAttribute))
+      .Write(tree.IndexFile());
+  for (auto _ : state) benchmark::DoNotOptimize(Enforce::LabelIndex::Read(tree.IndexFile()).Size());
 }
 
 // ---- Installing rules -------------------------------------------------------------------------
@@ -442,13 +515,18 @@ BENCHMARK(WriteLinesBare)->UseRealTime()->Unit(benchmark::kMillisecond);
 }  // namespace
 
 int main(int argc, char** argv) {
+  using Work = void (*)(benchmark::State&, const fs::path&);
+  const std::pair<const char*, Work> works[] = {{"LabelTree", LabelTree},
+                                                {"LabelTreeBare", LabelTreeBare},
+                                                {"IndexTree", IndexTree},
+                                                {"IndexTreeBare", IndexTreeBare},
+                                                {"ReadIndex", ReadIndex}};
   for (const fs::path& dir : BenchDirs()) {
-    benchmark::RegisterBenchmark(("LabelTree" + dir.string()).c_str(), LabelTree, dir)
-        ->UseRealTime()
-        ->Unit(benchmark::kMillisecond);
-    benchmark::RegisterBenchmark(("LabelTreeBare" + dir.string()).c_str(), LabelTreeBare, dir)
-        ->UseRealTime()
-        ->Unit(benchmark::kMillisecond);
+    for (const auto& [name, work] : works) {
+      benchmark::RegisterBenchmark((name + dir.string()).c_str(), work, dir)
+          ->UseRealTime()
+          ->Unit(benchmark::kMillisecond);
+    }
   }
   benchmark::Initialize(&argc, argv);
   benchmark::RunSpecifiedBenchmarks();

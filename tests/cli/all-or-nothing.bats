@@ -184,7 +184,8 @@ END
   # Takes the journals of the databases away.
   secpolicy status
   secpolicy settings option /None
-  everything | diff "$BATS_TEST_TMPDIR/before" -
+  # The next load makes the index of labels anew.
+  everything | diff <(grep -v /labels.index "$BATS_TEST_TMPDIR/before") -
 }
 
 @test "a load that is asked to end while it gives labels ends whole" {

@@ -104,6 +104,7 @@ domains
 partner domains
 tardisks
 file labels
+label index
 all" ]]
 }
 

@@ -424,3 +424,64 @@ END
   exits 0
   [[ $output == *"Examples:"*"secpolicy label get -R /etc"* ]]
 }
+
+# index: which index of labels lies beside the state, by device and inode.
+index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
+
+@test "the index of labels is made anew when labels change, and only then" {
+  boot
+  local first second third
+  [[ $(stat --format='%a %u' "$root/run/secpolicy/labels.index") == "600 $EUID" ]]
+  # A file of its own name keeps its inode from being used again.
+  ln "$root/run/secpolicy/labels.index" "$BATS_TEST_TMPDIR/first"
+  first=$(index)
+  secpolicy load
+  exits 0
+  secpolicy load-early
+  secpolicy load --plan
+  secpolicy load --all-or-nothing
+  exits 0
+  secpolicy label relabel --dry-run
+  secpolicy label get -R /etc
+  [[ $(index) == "$first" ]]
+  secpolicy label set unlabeled /etc/ssh/host_key
+  exits 0
+  ln "$root/run/secpolicy/labels.index" "$BATS_TEST_TMPDIR/second"
+  second=$(index)
+  [[ $second != "$first" ]]
+  secpolicy label relabel
+  exits 0
+  ln "$root/run/secpolicy/labels.index" "$BATS_TEST_TMPDIR/third"
+  third=$(index)
+  [[ $third != "$second" ]]
+  cmp "$BATS_TEST_TMPDIR/second" "$root/run/secpolicy/labels.index" && return 1
+  echo "/usr/sbin/sshd unlabeled" >>"$policy/fileLabels/zzz"
+  secpolicy load --all-or-nothing
+  exits 0
+  [[ $(index) != "$third" ]]
+}
+
+@test "an index of labels that is gone or damaged is made by the next load" {
+  boot
+  rm "$root/run/secpolicy/labels.index"
+  secpolicy load
+  exits 0
+  [[ -s $root/run/secpolicy/labels.index ]]
+  echo broken >"$root/run/secpolicy/labels.index"
+  secpolicy load
+  exits 0
+  [[ $(head --bytes=7 "$root/run/secpolicy/labels.index") == ZorvLab ]]
+}
+
+@test "a load says that the index of labels cannot be written, and has installed the policy" {
+  boot
+  rm "$root/run/secpolicy/labels.index"
+  mkdir "$root/run/secpolicy/labels.index"
+  secpolicy load
+  exits 1
+  says "Error: Unable to write the label index /run/secpolicy/labels.index: Is a directory"
+  ends_with "secpolicy: load: failed (1 error above)"
+  rmdir "$root/run/secpolicy/labels.index"
+  secpolicy load
+  exits 0
+}

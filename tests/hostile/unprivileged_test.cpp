@@ -45,8 +45,7 @@ class Unprivileged : public testing::Test {
   }
 
   std::string LabelTree() const {
-    return RunChild({"label", std::to_string(kUser), *this / "state", *this / "tree"})
-        .output;
+    return RunChild({"label", std::to_string(kUser), *this / "state", *this / "tree"}).output;
   }
 
   std::string ReadPolicyFiles() const {

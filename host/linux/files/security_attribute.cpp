@@ -36,18 +36,22 @@ bool MayWritePrivileged(const char* directory) {
   return file.IsOpen() && fsetxattr(file.Number(), kPrivilegedName, &value, sizeof value, 0) == 0;
 }
 
-std::string RecordedOrChosen(HostState& state) {
+const std::string& RecordedOrChosen(HostState& state) {
   const std::string& recorded = state.LabelAttribute();
   if (!recorded.empty()) return recorded;
   return state.ChooseLabelAttribute(UsableLabelAttribute(state.Directory()));
 }
 
-// The real name for `name`, or nothing with errno set as for a name that no file system knows.
+// Sets errno for any other as for a name that no file system knows.
+bool IsContractName(const char* name) {
+  if (name != nullptr && std::strcmp(name, kContractName) == 0) return true;
+  errno = name == nullptr ? EFAULT : EOPNOTSUPP;
+  return false;
+}
+
+// The real name for `name`, or nothing with errno set.
 std::optional<std::string> RealName(const char* name) {
-  if (name == nullptr || std::strcmp(name, kContractName) != 0) {
-    errno = name == nullptr ? EFAULT : EOPNOTSUPP;
-    return std::nullopt;
-  }
+  if (!IsContractName(name)) return std::nullopt;
   try {
     return LabelAttribute();
   } catch (const HostError& error) {
@@ -57,6 +61,28 @@ std::optional<std::string> RealName(const char* name) {
 }
 
 }  // namespace
+
+const char* BeginLabelChange() {
+  try {
+    HostState& state = HostState::Known();
+    const std::string& attribute = RecordedOrChosen(state);
+    state.TellLabelsChange();
+    return attribute.c_str();
+  } catch (const HostError& error) {
+    errno = error.Code();
+    return nullptr;
+  }
+}
+
+bool EndLabelChange() {
+  try {
+    HostState::Known().TellLabelsChange();
+    return true;
+  } catch (const HostError& error) {
+    errno = error.Code();
+    return false;
+  }
+}
 
 std::string LabelAttribute() { return RecordedOrChosen(HostState::Known()); }
 
@@ -101,15 +127,16 @@ AttributeStandIn::~AttributeStandIn() { standIn = nullptr; }
 namespace Zorvan::Kernel {
 
 int SetXattr(const char* path, const char* name, const void* value, std::size_t size, int flags) {
-  const std::optional<std::string> found = LinuxHost::RealName(name);
-  if (!found) return -1;
-  const char* const realName = found->c_str();
   if (auto* standIn = LinuxHost::standIn) {
-    return standIn->Set(path, realName, value, size, flags);
+    const std::optional<std::string> found = LinuxHost::RealName(name);
+    return found ? standIn->Set(path, found->c_str(), value, size, flags) : -1;
   }
-  const int result = setxattr(path, realName, value, size, flags);
-  if (result == 0 || errno != ENODATA) return result;
-  return LinuxHost::ReplaceInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
+  if (!LinuxHost::IsContractName(name)) return -1;
+  return LinuxHost::ChangeLabel([&](const char* realName) {
+    const int result = setxattr(path, realName, value, size, flags);
+    if (result == 0 || errno != ENODATA) return result;
+    return LinuxHost::ReplaceInherited(path, LinuxHost::LastLink::kFollowed, realName, value, size);
+  });
 }
 
 ssize_t GetXattr(const char* path, const char* name, void* value, std::size_t size) {

@@ -28,6 +28,23 @@ bool CanCarryLabel(mode_t mode, const std::string& attribute);
 // file are followed, the last one is not.
 int GiveFirstLabel(const char* path, const std::string& attribute);
 
+// What ChangeLabel() does before and after. The first one returns the real attribute, which is
+// valid until the state is used again, or null; the second one whether all was well. Both set errno
+// where the state cannot be used.
+const char* BeginLabelChange();
+bool EndLabelChange();
+
+// Calls `change` with the real attribute; it gives a file a label, and returns as setxattr(2). No
+// label index of before counts any more then. Returns what `change` did, or -1 with errno set when
+// the state cannot be written.
+template <class Change>
+int ChangeLabel(const Change& change) {
+  const char* const attribute = BeginLabelChange();
+  if (attribute == nullptr) return -1;
+  const int result = change(attribute);
+  return result != 0 || EndLabelChange() ? result : -1;
+}
+
 // What the file at `path` itself carries in the real attribute `attribute`, whatever that is;
 // nothing, with errno set, when it carries none (ENODATA) or it cannot be read. Links on the way to
 // the file are followed, the last one is not.

@@ -188,6 +188,7 @@ void UnpackTardisks(const std::vector<std::string>& images, const TardiskRules& 
   EditWatch watch(HostState::Current());
   CheckArchives(images, rules, watch);
   root.editedFiles = watch.Edited();
+  HostState::Current().TellLabelsChange();
   for (const std::string& image : images) Unpack(image, rules, root);
 }
 

@@ -24,9 +24,15 @@ std::optional<FileLabel> ReadLabel(const char* path) {
 int ReplaceLabel(const char* path, std::uint32_t id) {
   const std::string attribute = LabelAttribute();
   const char* const name = attribute.c_str();
-  const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
-  if (result == 0 || errno != ENODATA) return result;
-  return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
+  // Most files of a load have their label from the one before: what changes nothing is not written,
+  // and makes no index old.
+  std::uint32_t carried = 0;
+  if (lgetxattr(path, name, &carried, sizeof carried) == sizeof carried && carried == id) return 0;
+  return ChangeLabel([&](const char* /*name*/) {
+    const int result = lsetxattr(path, name, &id, sizeof id, XATTR_REPLACE);
+    if (result == 0 || errno != ENODATA) return result;
+    return ReplaceInherited(path, LastLink::kKept, name, &id, sizeof id);
+  });
 }
 
 }  // namespace LinuxHost

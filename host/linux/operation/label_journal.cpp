@@ -13,6 +13,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstring>
 #include <fstream>
 #include <istream>
 #include <utility>
@@ -22,6 +23,7 @@
 #include "host/linux/common/private_file.h"
 #include "host/linux/files/directory_entry.h"
 #include "host/linux/files/security_attribute.h"
+#include "host/linux/state/host_state.h"
 
 namespace LinuxHost {
 namespace {
@@ -40,6 +42,11 @@ constexpr char kCarriesNothing = 'N';
 
 std::string JournalBeside(const std::string& statePath) {
   return statePath.substr(0, statePath.rfind('/') + 1) + "labels.undo";
+}
+
+bool IsLabel(const std::optional<std::string>& carried, std::uint32_t id) {
+  return carried && carried->size() == sizeof id &&
+         std::memcmp(carried->data(), &id, sizeof id) == 0;
 }
 
 bool IsLink(const char* name) {
@@ -107,9 +114,10 @@ class Undoing {
     if (!now && errno != ENODATA) return errno;
     if (now == before) return 0;
     if (IsLink(name)) return ENOENT;
-    const int result = before
-                           ? lsetxattr(name, attribute.c_str(), before->data(), before->size(), 0)
-                           : lremovexattr(name, attribute.c_str());
+    const int result = ChangeLabel([&](const char* /*chosen*/) {
+      return before ? lsetxattr(name, attribute.c_str(), before->data(), before->size(), 0)
+                    : lremovexattr(name, attribute.c_str());
+    });
     if (result != 0) return errno;
     ++done.count;
     return 0;
@@ -198,10 +206,12 @@ void LabelJournal::Keep(const NotedLabels& labels) {
   const std::string attribute = LabelAttribute();
   std::string text = kAttribute + attribute + '\0';
   const DirectoryPlace* entered = nullptr;
-  labels.ForEach([&](const DirectoryPlace& directory, const char* name, std::uint32_t) {
+  bool willChange = false;
+  labels.ForEach([&](const DirectoryPlace& directory, const char* name, std::uint32_t id) {
     const auto carried = ReadCarried(name, attribute);
     // What cannot be read is not given a label either.
     if (!carried && errno != ENODATA) return;
+    willChange = willChange || !IsLabel(carried, id);
     if (&directory != entered) {
       text +=
           kDirectory + StrCat(directory.device, " ", directory.inode, " ", directory.path) + '\0';
@@ -215,6 +225,8 @@ void LabelJournal::Keep(const NotedLabels& labels) {
     text.clear();
   });
   Write(text);
+  // The labels come before the commit, and until then the state tells nobody that they change.
+  if (willChange) unlink(HostState::Current().LabelIndexPath().c_str());
 }
 
 void LabelJournal::Write(const std::string& text) const {
@@ -231,6 +243,10 @@ LabelsPutBack LabelJournal::PutBack() const {
   Undoing undoing;
   while (PutLineBack(reader, undoing)) continue;
   return undoing.Done();
+}
+
+void LabelJournal::DiscardLeftOver(const std::string& statePath) {
+  unlink(JournalBeside(statePath).c_str());
 }
 
 std::optional<LabelsPutBack> LabelJournal::PutBackLeftOver(const std::string& statePath) {

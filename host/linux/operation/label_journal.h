@@ -43,6 +43,10 @@ class LabelJournal {
   // Nothing when there is none, or its process lives. Throws as the constructor.
   static std::optional<LabelsPutBack> PutBackLeftOver(const std::string& statePath);
 
+  // Removes what a process that died has left, and puts nothing back: the state that its labels are
+  // of has gone, and all files are about to be labelled anew.
+  static void DiscardLeftOver(const std::string& statePath);
+
  private:
   LabelJournal(std::string journalPath, Descriptor opened)
       : path(std::move(journalPath)), file(std::move(opened)) {}

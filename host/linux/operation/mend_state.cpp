@@ -5,6 +5,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/used_paths.h"
+#include "host/linux/operation/label_journal.h"
 #include "host/linux/state/host_state.h"
 
 namespace LinuxHost {
@@ -18,6 +19,7 @@ std::string MendState() {
     return "";
   } catch (const UnusableContent&) {
     MoveAside(path);
+    LabelJournal::DiscardLeftOver(path);
   }
   return Braxo::Misc::StrCat(
       "the host state could not be used, so a new one is made; what was there is now ", path,

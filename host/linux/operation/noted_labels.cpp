@@ -12,11 +12,14 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <bit>
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <functional>
 #include <optional>
+#include <string_view>
 
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/files/inherited_label.h"
@@ -205,8 +208,11 @@ std::vector<LabelFailure> NotedLabels::ForEach(const OnNote& visit) const {
   DirectoryVisit at;
   const Directory* entered = nullptr;
   int error = 0;
+  const std::vector<bool> isFinal = FindFinal();
   const char* name = names.c_str();
-  for (const Note& note : notes) {
+  for (std::size_t number = 0; number < notes.size(); name += std::strlen(name) + 1, ++number) {
+    if (!isFinal[number]) continue;
+    const Note& note = notes[number];
     const Directory& directory = directories[note.directory];
     if (&directory != entered) error = at.Enter(directory.place) ? 0 : errno;
     entered = &directory;
@@ -215,9 +221,37 @@ std::vector<LabelFailure> NotedLabels::ForEach(const OnNote& visit) const {
     } else {
       unreachable.push_back({JoinPath(directory.place.path, name), error});
     }
-    name += std::strlen(name) + 1;
   }
   return unreachable;
+}
+
+// A file that a policy names twice, with its tree and by itself, must not change its label at each
+// load, not even for a moment. The last note about an entry is found first, in a table of numbers
+// of notes: a set of names would take as much memory again as all notes.
+std::vector<bool> NotedLabels::FindFinal() const {
+  constexpr std::uint32_t kFree = 0;
+  std::vector<const char*> nameOf(notes.size());
+  const char* next = names.c_str();
+  for (const char*& name : nameOf) {
+    name = next;
+    next += std::strlen(next) + 1;
+  }
+  std::vector<std::uint32_t> table(std::bit_ceil(2 * notes.size() + 1), kFree);
+  std::vector<bool> isFinal(notes.size());
+  for (std::size_t number = notes.size(); number-- > 0;) {
+    const std::size_t directory = notes[number].directory;
+    const std::size_t hash = std::hash<std::string_view>()(nameOf[number]) + 31 * directory;
+    std::size_t slot = hash & (table.size() - 1);
+    const auto isOther = [&](std::uint32_t entry) {
+      return notes[entry - 1].directory != directory ||
+             std::strcmp(nameOf[entry - 1], nameOf[number]) != 0;
+    };
+    while (table[slot] != kFree && isOther(table[slot])) slot = (slot + 1) & (table.size() - 1);
+    if (table[slot] != kFree) continue;
+    table[slot] = static_cast<std::uint32_t>(number + 1);
+    isFinal[number] = true;
+  }
+  return isFinal;
 }
 
 std::vector<LabelFailure> NotedLabels::Apply() const {

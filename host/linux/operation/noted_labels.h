@@ -52,12 +52,14 @@ class NotedLabels : public AttributeStandIn {
   // The files that would have been labelled by now, in ascending order of their paths.
   std::vector<LabelChange> Changes() const;
 
-  // Gives the files their labels, in the order in which that was asked for. Returns those that
-  // could not be given theirs: one that has gone meanwhile, or was replaced by a link, is among
-  // them, as are all in a directory that was replaced. Changes the working directory while it runs.
+  // Gives the files their labels, in the order in which that was asked for; of several for an entry
+  // of a directory only the last one, and that only where the file does not carry it. Returns those
+  // that could not be given theirs: one that has gone meanwhile, or was replaced by a link, is
+  // among them, as are all in a directory that was replaced. Changes the working directory while it
+  // runs.
   std::vector<LabelFailure> Apply() const;
 
-  // Hands every label to `visit`, in that order, with the directory of the file as the working
+  // Hands these labels to `visit`, in that order, with the directory of the file as the working
   // directory. Returns the files that cannot be reached any more.
   using OnNote =
       std::function<void(const DirectoryPlace& directory, const char* name, std::uint32_t id)>;
@@ -87,6 +89,7 @@ class NotedLabels : public AttributeStandIn {
   const std::uint32_t* FindDirectory(const std::string& path);
   bool IsPassedOver(const Directory& directory, const std::string& name) const;
   void IndexNotes();
+  std::vector<bool> FindFinal() const;
 
   const LabelNotes purpose;
   DirectoryPlace passedOver;

@@ -80,7 +80,8 @@ void HostState::Reset() {
   // process notices.
   store.Run(
       "UPDATE state SET domain_version = domain_version + 1, label_version = label_version + 1, "
-      "label_attribute = ''");
+      "label_attribute = '', label_index = ?1",
+      kLabelsChanged);
   transaction.Commit();
   Forget();
   Refresh();

@@ -12,7 +12,8 @@ CREATE TABLE state (
   one INTEGER PRIMARY KEY CHECK (one = 1),
   domain_version INTEGER NOT NULL,
   label_version INTEGER NOT NULL,
-  label_attribute TEXT NOT NULL
+  label_attribute TEXT NOT NULL,
+  label_index INTEGER NOT NULL
 );
 CREATE TABLE domain (
   id INTEGER PRIMARY KEY,
@@ -152,7 +153,7 @@ CREATE TABLE load_record (
   removed_domains INTEGER NOT NULL
 );
 CREATE TABLE load_error (id INTEGER PRIMARY KEY, message TEXT NOT NULL);
-INSERT INTO state VALUES (1, 1, 1, '');
+INSERT INTO state VALUES (1, 1, 1, '', 0);
 )sql";
 
 constexpr char kFirstRows[] = R"sql(

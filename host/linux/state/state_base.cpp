@@ -14,11 +14,13 @@ void StateBase::Refresh() {
   // The mark is taken first: what is then read is at least as new.
   Store::CommitMark now{};
   const bool told = database.ReadCommitMark(&now);
-  Rows rows = database.Select("SELECT domain_version, label_version, label_attribute FROM state");
+  Rows rows = database.Select(
+      "SELECT domain_version, label_version, label_attribute, label_index FROM state");
   if (!rows.Next()) database.TellDamage("the table state is empty");
   domainVersion = rows.Integer(0);
   labelVersion = rows.Integer(1);
   labelAttribute = rows.Text(2);
+  labelIndex = rows.Integer(3);
   marked = told;
   seen = now;
 }
@@ -39,6 +41,19 @@ void StateBase::CommitLabels(Transaction& transaction) {
   database.Run("UPDATE state SET label_version = label_version + 1");
   transaction.Commit();
   ++labelVersion;
+}
+
+std::string StateBase::LabelIndexPath() const {
+  const std::string& path = database.Path();
+  return path.substr(0, path.rfind('/') + 1) + "labels.index";
+}
+
+void StateBase::TellLabelsChange() {
+  Refresh();
+  if (labelIndex == kLabelsChanged) return;
+  database.Run("UPDATE state SET label_index = ?1", kLabelsChanged);
+  // Within a transaction nothing tells of it before its end.
+  labelIndex = kLabelsChanged;
 }
 
 const std::string& StateBase::LabelAttribute() {

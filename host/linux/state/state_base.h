@@ -7,6 +7,11 @@
 
 namespace LinuxHost {
 
+// What the state has in place of the number of a label index: no file was ever labelled, or files
+// were labelled since. What is lower is an index in the making.
+constexpr std::int64_t kNeverLabelled = 0;
+constexpr std::int64_t kLabelsChanged = -1;
+
 // What every table of a state stands on: the database, the versions of what is kept in memory, and
 // the load that is installing its policy. Failures are HostErrors.
 class StateBase {
@@ -41,6 +46,16 @@ class StateBase {
   // holds.
   const std::string& ChooseLabelAttribute(const std::string& name);
 
+  // The number of the index that has the labels as they are, as of the last look, or what stands
+  // for none; and the file that it lies in.
+  std::int64_t LabelIndex() const { return labelIndex; }
+  std::string LabelIndexPath() const;
+
+  // To be told before and after a file is labelled, so that no index that was made meanwhile
+  // counts, nor one of a process that died in between. Looks at the database only when there is
+  // something to write, or something was committed since the last look.
+  void TellLabelsChange();
+
   // The number of the load that is installing its policy, 0 while none is.
   std::int64_t CurrentLoad() const { return currentLoad; }
   void SetCurrentLoad(std::int64_t number) { currentLoad = number; }
@@ -55,6 +70,7 @@ class StateBase {
   std::int64_t labelVersion = 0;
   std::int64_t unknownVersion = 0;  // below those of any state
   std::string labelAttribute;
+  std::int64_t labelIndex = kNeverLabelled;
   bool marked = false;
   Store::CommitMark seen{};
   std::int64_t currentLoad = 0;

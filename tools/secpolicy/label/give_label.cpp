@@ -2,6 +2,7 @@
 #include <cerrno>
 #include <filesystem>
 
+#include "host/linux/operation/label_index.h"
 #include "label_actions.h"
 #include "secpolicy/observed/policy_lines.h"
 #include "text/suggestion.h"
@@ -50,6 +51,7 @@ std::string GiveLabel(LabelRun& run, const std::string& label,
                       const std::vector<std::string>& paths, bool wholeTrees) {
   if (run.FindLabel(label) == kNoSuchLabel) RefuseLabel(run, label, paths);
   for (const std::string& path : paths) GiveLabelTo(run, label, path, wholeTrees);
+  LinuxHost::RefreshLabelIndex();
   return "done";
 }
 

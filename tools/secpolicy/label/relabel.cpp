@@ -4,6 +4,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/operation/file_label.h"
+#include "host/linux/operation/label_index.h"
 #include "label_actions.h"
 #include "label_plan.h"
 #include "text/format.h"
@@ -67,6 +68,7 @@ std::string Relabel(LabelRun& run, const std::string& dir, const std::vector<std
                                   [&](const LinuxHost::WalkedFile& file, const LabelLine& line) {
                                     relabelling.Visit(file, line);
                                   });
+  if (!dryRun) LinuxHost::RefreshLabelIndex();
   return relabelling.Summarize();
 }
 

@@ -12,6 +12,7 @@
 #include <optional>
 
 #include "ending.h"
+#include "host/linux/operation/label_index.h"
 #include "host/linux/operation/label_journal.h"
 #include "host/linux/operation/label_numbers.h"
 #include "host/linux/operation/noted_labels.h"
@@ -103,6 +104,7 @@ class LoadRun {
       transaction.reset();
       Fail(raised);
     }
+    if (hasBegun && !request.dryRun && (isInstalled || !stateIsNew)) IndexLabels();
     if (request.timing) std::cout << Describe(listener.timing.Phases());
     std::cout.flush();
     return WentWell() ? ReportDone() : ReportFailure();
@@ -151,11 +153,23 @@ class LoadRun {
 
   // A load that was killed while it gave labels, all of them or none, has left them half done.
   void PutBackLeftOver() {
+    if (LinuxHost::IsStateMissing()) return;
     const auto back = LinuxHost::LabelJournal::PutBackLeftOver(LinuxHost::StatePath());
     if (!back) return;
     Summarize("load", "a load before this one was killed, so " +
                           CountOf(back->count, "file label") + " were put back first");
     ReportPutBack(*back);
+  }
+
+  // Also after a load that failed, which may have labelled files.
+  void IndexLabels() {
+    try {
+      if (LinuxHost::RefreshLabelIndex()) listener.timing.EndPhase("label index");
+    } catch (const Braxo::Lib::BraxoException& problem) {
+      listener.OnError(problem.what());
+      SecPolicy::SecpolicyError(problem.what());
+      if (isInstalled) RecordLoad(Ending(), ending, listener);
+    }
   }
 
   void KeepLabelNumbers() const {
