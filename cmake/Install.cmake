@@ -34,8 +34,9 @@ install(FILES "${PROJECT_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_
 
 # The command.
 install(TARGETS secpolicy_cli)
+install(TARGETS secpolicy_run DESTINATION "${CMAKE_INSTALL_LIBEXECDIR}/secpolicy")
 install(FILES docs/man/secpolicy.5 DESTINATION "${CMAKE_INSTALL_MANDIR}/man5")
-install(FILES docs/man/secpolicy.8 DESTINATION "${CMAKE_INSTALL_MANDIR}/man8")
+install(FILES docs/man/secpolicy.8 docs/man/secpolicy-run.8 DESTINATION "${CMAKE_INSTALL_MANDIR}/man8")
 install(FILES completions/secpolicy.bash RENAME secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions")
 install(FILES completions/_secpolicy

@@ -1,0 +1,93 @@
+#include "host/enforce/launcher/program.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <string_view>
+
+#include "host/enforce/kernel.h"
+#include "host/enforce/launcher/refuse.h"
+
+namespace Enforce {
+namespace {
+
+constexpr char kUsualPath[] = "/bin:/usr/bin";
+
+// 0 when the path leads to a program, else the system error that tells why not.
+int ReasonAgainst(const std::string& path) {
+  struct stat status = {};
+  if (stat(path.c_str(), &status) != 0) return errno;
+  if (!S_ISREG(status.st_mode)) return EACCES;
+  return access(path.c_str(), X_OK) == 0 ? 0 : errno;
+}
+
+// A part of PATH that is empty is the working directory.
+std::string PathIn(std::string_view directory, const std::string& name) {
+  return directory.empty() ? "./" + name : std::string(directory) + "/" + name;
+}
+
+struct Found {
+  std::string path;
+  int reason;  // 0, or why it is none
+};
+
+// In the first directory of PATH that has it. One that may not be executed is passed over.
+Found SearchPath(const std::string& name) {
+  if (name.empty()) return {name, ENOENT};
+  const char* const given = std::getenv("PATH");
+  std::string_view unread = given == nullptr ? kUsualPath : given;
+  int reason = ENOENT;
+  while (true) {
+    const std::size_t end = std::min(unread.find(':'), unread.size());
+    const std::string path = PathIn(unread.substr(0, end), name);
+    const int reasonHere = ReasonAgainst(path);
+    if (reasonHere == 0) return {path, 0};
+    if (reasonHere == EACCES) reason = EACCES;
+    if (end == unread.size()) return {name, reason};
+    unread.remove_prefix(end + 1);
+  }
+}
+
+[[noreturn]] void RefuseProgram(const std::string& name, int reason) {
+  if (reason == ENOENT || reason == ENOTDIR) Refuse("there is no program " + name, kNotFound);
+  Refuse("cannot execute " + name + ": " + std::strerror(reason));
+}
+
+bool IsScript(int program) {
+  char beginning[2] = {};
+  return pread(program, beginning, sizeof(beginning), 0) == sizeof(beginning) &&
+         std::string_view(beginning, sizeof(beginning)) == "#!";
+}
+
+}  // namespace
+
+Program FindProgram(char* const* arguments, char* const* environment) {
+  const std::string name = arguments[0];
+  const bool isPath = name.find('/') != std::string::npos;
+  const Found found = isPath ? Found{name, ReasonAgainst(name)} : SearchPath(name);
+  if (found.reason != 0) RefuseProgram(name, found.reason);
+  return {found.path, -1, arguments, environment};
+}
+
+Program ProgramOf(int descriptor, char* const* arguments, char* const* environment) {
+  const int flags = IsScript(descriptor) ? 0 : FD_CLOEXEC;
+  const std::string name = "descriptor " + std::to_string(descriptor);
+  if (fcntl(descriptor, F_SETFD, flags) != 0) RefuseForErrno("cannot execute " + name);
+  return {name, descriptor, arguments, environment};
+}
+
+void Start(const Program& program, std::uint64_t secret, const std::string& surroundings) {
+  if (program.descriptor >= 0) {
+    Kernel::ExecuteDescriptor(program.descriptor, program.arguments, program.environment, secret);
+  } else {
+    Kernel::Execute(program.path.c_str(), program.arguments, program.environment, secret);
+  }
+  RefuseForErrno("cannot execute " + program.path + surroundings);
+}
+
+}  // namespace Enforce

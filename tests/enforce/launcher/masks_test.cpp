@@ -1,0 +1,180 @@
+// Places where a domain may do less than above them: hunts for a way around a mask, and for one
+// that others see. Without a mask each way works.
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+
+#include "host/enforce/features.h"
+#include "launch.h"
+
+namespace EnforceTest {
+namespace {
+
+using Enforce::Mask;
+using Enforce::MaskKind;
+using testing::StrEq;
+
+class Masks : public testing::TestWithParam<User> {
+ protected:
+  void SetUp() override {
+    if (!CanBe(user)) GTEST_SKIP() << "only root can start somebody as root";
+    if (Enforce::ProbeFeatures().mounts == Enforce::Namespace::kNone) {
+      GTEST_SKIP() << "this system gives nobody a mount namespace";
+    }
+  }
+
+  std::string AnswerUnder(const std::vector<Mask>& masks, const std::string& operation) const {
+    Enforce::Plan plan = PlanOf(tree);
+    plan.masks = masks;
+    return AnswerOf(user, tree, plan, operation);
+  }
+
+  const User user = GetParam();
+  const Tree tree{CanBe(GetParam()) ? GetParam() : User::kNobody};
+};
+
+INSTANTIATE_TEST_SUITE_P(Users, Masks, testing::Values(User::kRoot, User::kNobody),
+                         [](const auto& tested) { return NameOf(tested.param); });
+
+TEST_P(Masks, HideDirectories) {
+  const std::vector<Mask> masks = {{tree / "kept", MaskKind::kHidden}};
+  const char* const absent = user == User::kRoot ? "ENOENT" : "EACCES";
+  for (const char* const operation : {"read=@/kept/file", "run=@/kept/program"}) {
+    EXPECT_THAT(AnswerUnder({}, operation), StrEq("ok")) << operation;
+    EXPECT_THAT(AnswerUnder(masks, operation), StrEq(absent)) << operation;
+  }
+  EXPECT_THAT(AnswerUnder(masks, "create=@/kept/new"),
+              StrEq(user == User::kRoot ? "EROFS" : "EACCES"));
+  EXPECT_THAT(AnswerUnder(masks, "read=@/open/file"), StrEq("ok"));
+}
+
+TEST_P(Masks, HideFiles) {
+  const std::vector<Mask> masks = {{tree / "kept/file", MaskKind::kHidden}};
+  for (const char* const operation : {"read=@/kept/file", "write=@/kept/file"}) {
+    EXPECT_THAT(AnswerUnder(masks, operation), StrEq("EACCES")) << operation;
+    EXPECT_THAT(AnswerUnder({}, operation), StrEq("ok")) << operation;
+  }
+  EXPECT_THAT(AnswerUnder(masks, "unlink=@/kept/file"), StrEq("EBUSY"));
+  EXPECT_THAT(AnswerUnder(masks, "run=@/kept/program"), StrEq("ok"));
+}
+
+TEST_P(Masks, KeepFromExecution) {
+  const std::vector<Mask> masks = {{tree / "kept", MaskKind::kNoExec}};
+  EXPECT_THAT(AnswerUnder({}, "run=@/kept/program"), StrEq("ok"));
+  EXPECT_THAT(AnswerUnder(masks, "run=@/kept/program"), StrEq("EACCES"));
+  EXPECT_THAT(AnswerUnder(masks, "read=@/kept/program"), StrEq("ok"));
+  EXPECT_THAT(AnswerUnder(masks, "write=@/kept/file"), StrEq("ok"));
+}
+
+TEST_P(Masks, KeepFromChanges) {
+  const std::vector<Mask> masks = {{tree / "kept", MaskKind::kReadOnly}};
+  for (const char* const operation :
+       {"write=@/kept/file", "truncate=@/kept/file", "chmod=@/kept/file", "create=@/kept/new"}) {
+    EXPECT_THAT(AnswerUnder(masks, operation), StrEq("EROFS")) << operation;
+    EXPECT_THAT(AnswerUnder({}, operation), StrEq("ok")) << operation;
+  }
+  EXPECT_THAT(AnswerUnder(masks, "run=@/kept/program"), StrEq("ok"));
+}
+
+TEST_P(Masks, CannotBeTakenAway) {
+  const std::vector<Mask> masks = {{tree / "kept", MaskKind::kNoExec}};
+  for (const char* const operation :
+       {"unmount=@/kept", "remount=@/kept", "bind-mount=@/open,@/kept"}) {
+    EXPECT_THAT(AnswerUnder(masks, operation), StrEq("EPERM")) << operation;
+  }
+  // In a user namespace one may do with mounts of its own as one likes.
+  Enforce::Plan plan = PlanOf(tree);
+  plan.masks = masks;
+  const Outcome outcome =
+      Probe(user, tree, plan, {"unshare-user", "unmount=@/kept", "run=@/kept/program"});
+  EXPECT_THAT(outcome.output, StrEq(tree.Resolve("unshare-user ok\nunmount=@/kept EINVAL\n"
+                                                 "run=@/kept/program EACCES\n")));
+}
+
+// The same without Landlock, which forbids all mounting: what keeps the mask are the capabilities
+// that are gone, and the namespace.
+TEST_P(Masks, CannotBeTakenAwayWithoutLandlock) {
+  Enforce::Plan plan;
+  plan.domain = "testDom";
+  plan.capabilities = 0;
+  plan.masks = {{tree / "kept", MaskKind::kNoExec}};
+  const Outcome outcome = Probe(
+      user, tree, plan,
+      {"unmount=@/kept", "unshare-user", "unmount=@/kept", "remount=@/kept", "run=@/kept/program"});
+  EXPECT_THAT(outcome.output,
+              StrEq(tree.Resolve("unmount=@/kept EPERM\nunshare-user ok\nunmount=@/kept EINVAL\n"
+                                 "remount=@/kept EPERM\nrun=@/kept/program EACCES\n")));
+}
+
+TEST(MasksControl, CanBeTakenAwayByWhoMayUnmount) {
+  if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root may unmount";
+  const Tree tree(User::kRoot);
+  Enforce::Plan plan;
+  plan.capabilities = ~std::uint64_t{0};
+  plan.masks = {{tree / "kept", MaskKind::kNoExec}};
+  const Outcome outcome = Probe(User::kRoot, tree, plan,
+                                {"run=@/kept/program", "unmount=@/kept", "run=@/kept/program"});
+  EXPECT_THAT(outcome.output, StrEq(tree.Resolve("run=@/kept/program EACCES\nunmount=@/kept ok\n"
+                                                 "run=@/kept/program ok\n")));
+}
+
+TEST_P(Masks, ReachTheWorkingDirectory) {
+  Enforce::Plan plan = PlanOf(tree);
+  const auto runIn = [&](const char* directory, const char* operation) {
+    const std::string before = std::filesystem::current_path();
+    std::filesystem::current_path(tree / directory);
+    const Outcome outcome = Probe(user, tree, plan, {operation});
+    std::filesystem::current_path(before);
+    return outcome.errors + outcome.output;
+  };
+  EXPECT_THAT(runIn("kept", "run=./program"), StrEq("run=./program ok\n"));
+  EXPECT_THAT(runIn("kept/directory", "run=../program"), StrEq("run=../program ok\n"));
+  plan.masks = {{tree / "kept", MaskKind::kNoExec}};
+  EXPECT_THAT(runIn("kept", "run=./program"), StrEq("run=./program EACCES\n"));
+  EXPECT_THAT(runIn("kept/directory", "run=../program"), StrEq("run=../program EACCES\n"));
+  plan.masks = {{tree / "kept", MaskKind::kHidden}};
+  EXPECT_THAT(runIn("kept", "run=./program"),
+              StrEq(user == User::kRoot ? "run=./program ENOENT\n" : "run=./program EACCES\n"));
+  EXPECT_THAT(runIn("kept/directory", "run=../program"),
+              StrEq("secpolicy-run: cannot stay in the directory " + tree / "kept/directory" +
+                    ": No such file or directory\n"));
+}
+
+TEST_P(Masks, AreSeenByNobodyElse) {
+  const auto mounts = [] {
+    std::ifstream file("/proc/self/mountinfo");
+    return std::string{std::istreambuf_iterator<char>(file), {}};
+  };
+  const std::string before = mounts();
+  EXPECT_THAT(AnswerUnder({{tree / "kept", MaskKind::kHidden}}, "list=@/open"), StrEq("ok"));
+  EXPECT_THAT(mounts(), StrEq(before));
+}
+
+TEST_P(Masks, LeaveTheUserAsItIs) {
+  const std::vector<Mask> masks = {{tree / "kept", MaskKind::kNoExec}};
+  EXPECT_THAT(AnswerUnder(masks, "is-superuser"), StrEq(user == User::kRoot ? "ok" : "EPERM"));
+  EXPECT_THAT(AnswerUnder(masks, "has-capability=21"), StrEq(user == User::kRoot ? "ok" : "EPERM"));
+}
+
+TEST_P(Masks, AreNotLaidThroughLinks) {
+  std::filesystem::create_symlink(tree / "kept", tree / "link");
+  Enforce::Plan plan = PlanOf(tree);
+  for (const char* const name : {"link", "gone"}) {
+    plan.masks = {{tree / name, MaskKind::kHidden}};
+    const Outcome outcome = Probe(user, tree, plan, {"read=@/kept/file"});
+    EXPECT_TRUE(WIFEXITED(outcome.status));
+    EXPECT_EQ(WEXITSTATUS(outcome.status), 126);
+    EXPECT_THAT(outcome.output, StrEq(""));
+    EXPECT_THAT(outcome.errors,
+                testing::StartsWith("secpolicy-run: cannot mask " + tree / name + ": "));
+  }
+}
+
+}  // namespace
+}  // namespace EnforceTest

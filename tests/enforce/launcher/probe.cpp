@@ -1,0 +1,316 @@
+// Tries operations, one after the other, and prints what becomes of each: "OPERATION ok" or
+// "OPERATION EACCES". An operation is NAME or NAME=WORD[,WORD]. It is one static program: a domain
+// that may execute it may need nothing else.
+
+#include <fcntl.h>
+#include <linux/capability.h>
+#include <linux/fs.h>
+#include <sched.h>
+#include <signal.h>
+#include <sys/capability.h>
+#include <sys/mman.h>
+#include <sys/mount.h>
+#include <sys/prctl.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/un.h>
+#include <sys/wait.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+namespace {
+
+struct Words {
+  std::string first;
+  std::string second;
+
+  const char* First() const { return first.c_str(); }
+  const char* Second() const { return second.c_str(); }
+  int Number() const { return std::atoi(first.c_str()); }
+};
+
+// Every operation returns a negative number, with errno, when it fails.
+using Operation = long (*)(const Words&);
+
+int Close(int descriptor) {
+  if (descriptor < 0) return -1;
+  return close(descriptor);
+}
+
+long Read(const Words& words) {
+  const int file = open(words.First(), O_RDONLY);
+  char byte = 0;
+  const ssize_t size = file < 0 ? -1 : read(file, &byte, 1);
+  return size;
+}
+
+long Truncate(const Words& words) {
+  const int file = open(words.First(), O_WRONLY);
+  return file < 0 ? -1 : ftruncate(file, 0);
+}
+
+// A file without a name, then linked to one.
+long LinkNameless(const Words& words) {
+  const int file = open(words.First(), O_TMPFILE | O_WRONLY, 0600);
+  if (file < 0) return -1;
+  const std::string path = "/proc/self/fd/" + std::to_string(file);
+  return linkat(AT_FDCWD, path.c_str(), AT_FDCWD, words.Second(), AT_SYMLINK_FOLLOW);
+}
+
+sockaddr_un AddressOf(const Words& words) {
+  sockaddr_un address = {};
+  address.sun_family = AF_UNIX;
+  std::strncpy(address.sun_path, words.First(), sizeof(address.sun_path) - 1);
+  return address;
+}
+
+long BindUnix(const Words& words) {
+  const sockaddr_un address = AddressOf(words);
+  return bind(socket(AF_UNIX, SOCK_STREAM, 0), reinterpret_cast<const sockaddr*>(&address),
+              sizeof(address));
+}
+
+// Sends itself through a socket with an abstract name.
+long ConnectAbstract(const Words& words) {
+  sockaddr_un address = AddressOf({"-" + words.first, ""});
+  address.sun_path[0] = '\0';
+  const auto size =
+      static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + 1 + words.first.size());
+  return connect(socket(AF_UNIX, SOCK_STREAM, 0), reinterpret_cast<const sockaddr*>(&address),
+                 size);
+}
+
+// What the child ended with is its errno.
+long Wait(pid_t child) {
+  int status = 0;
+  if (child < 0 || waitpid(child, &status, 0) < 0) return -1;
+  errno = WIFEXITED(status) ? WEXITSTATUS(status) : EINTR;
+  return errno == 0 ? 0 : -1;
+}
+
+// Lets a child process execute the program, which tries the operation of the second word.
+template <typename Execution>
+long InChild(const Words& words, Execution execute) {
+  std::fflush(stdout);
+  const pid_t child = fork();
+  if (child != 0) return Wait(child);
+  std::array<char*, 3> arguments = {
+      const_cast<char*>(words.First()),
+      words.second.empty() ? nullptr : const_cast<char*>(words.Second())};
+  execute(arguments.data());
+  _exit(errno);
+}
+
+long Run(const Words& words) {
+  return InChild(words, [&](char** arguments) { execv(words.First(), arguments); });
+}
+
+long RunBySecret(const Words& words) {
+  return InChild({words.first, ""}, [&](char** arguments) {
+    syscall(SYS_execve, words.First(), arguments, environ, 0, 0,
+            std::strtoull(words.Second(), nullptr, 0));
+  });
+}
+
+long RunByDescriptor(const Words& words) {
+  const int program = open(words.First(), O_PATH);
+  return InChild(words, [&](char** arguments) {
+    syscall(SYS_execveat, program, "", arguments, environ, AT_EMPTY_PATH);
+  });
+}
+
+long RunFromMemory(const Words& words) {
+  const int source = open(words.First(), O_RDONLY);
+  const int memory = static_cast<int>(syscall(SYS_memfd_create, "program", 0));
+  if (source < 0 || memory < 0) return -1;
+  std::array<char, 1 << 16> block{};
+  ssize_t size = 0;
+  while ((size = read(source, block.data(), block.size())) > 0) {
+    if (write(memory, block.data(), static_cast<std::size_t>(size)) != size) return -1;
+  }
+  return InChild({words.first, ""}, [&](char** arguments) {
+    syscall(SYS_execveat, memory, "", arguments, environ, AT_EMPTY_PATH);
+  });
+}
+
+long OpenByHandle(const Words& words) {
+  alignas(file_handle) std::array<unsigned char, sizeof(file_handle) + 128> room{};
+  auto* const handle = reinterpret_cast<file_handle*>(room.data());
+  handle->handle_bytes = 128;
+  int mount = 0;
+  if (name_to_handle_at(AT_FDCWD, words.First(), handle, &mount, 0) != 0) return -1;
+  return open_by_handle_at(open(words.Second(), O_RDONLY | O_DIRECTORY), handle, O_RDONLY);
+}
+
+long EnterOwnMounts(const Words&) {
+  return setns(open("/proc/self/ns/mnt", O_RDONLY), CLONE_NEWNS);
+}
+
+long SendBySigqueue(const Words& words) {
+  siginfo_t info = {};
+  info.si_code = SI_QUEUE;
+  return syscall(SYS_rt_sigqueueinfo, words.Number(), 0, &info);
+}
+
+long SendByPidfd(const Words& words) {
+  const int process = static_cast<int>(syscall(SYS_pidfd_open, words.Number(), 0));
+  return process < 0 ? -1 : syscall(SYS_pidfd_send_signal, process, 0, nullptr, 0);
+}
+
+// Makes another process the one that is told of input, by a signal of one's choice, and gives it
+// some. Whether the signal came is for the other process to say.
+long SendByInput(const Words& words) {
+  std::array<int, 2> sockets{};
+  if (socketpair(AF_UNIX, SOCK_STREAM, 0, sockets.data()) != 0) return -1;
+  if (fcntl(sockets[0], F_SETOWN, words.Number()) != 0) return -1;
+  if (fcntl(sockets[0], F_SETSIG, SIGUSR1) != 0) return -1;
+  if (fcntl(sockets[0], F_SETFL, O_ASYNC) != 0) return -1;
+  return write(sockets[1], "x", 1);
+}
+
+// Puts the capability back into all sets.
+long RaiseCapability(const Words& words) {
+  __user_cap_header_struct header = {_LINUX_CAPABILITY_VERSION_3, 0};
+  std::array<__user_cap_data_struct, 2> halves{};
+  if (capget(&header, halves.data()) != 0) return -1;
+  const auto bit = std::uint32_t{1} << words.Number() % 32;
+  __user_cap_data_struct& half = halves.at(static_cast<std::size_t>(words.Number() / 32));
+  half.permitted |= bit;
+  half.effective |= bit;
+  half.inheritable |= bit;
+  return capset(&header, halves.data());
+}
+
+long HasCapability(const Words& words) {
+  __user_cap_header_struct header = {_LINUX_CAPABILITY_VERSION_3, 0};
+  std::array<__user_cap_data_struct, 2> halves{};
+  if (capget(&header, halves.data()) != 0) return -1;
+  const __user_cap_data_struct& half = halves.at(static_cast<std::size_t>(words.Number() / 32));
+  errno = EPERM;
+  return (half.effective >> words.Number() % 32 & 1) != 0 ? 0 : -1;
+}
+
+// 0 for the superuser's rights to files, which do not show in what getuid says.
+long IsSuperuser(const Words&) {
+  errno = EPERM;
+  return geteuid() == 0 ? 0 : -1;
+}
+
+// Whether the bit is among the bounding capabilities.
+long IsBounding(const Words& words) {
+  errno = EPERM;
+  return prctl(PR_CAPBSET_READ, words.Number(), 0, 0, 0) == 1 ? 0 : -1;
+}
+
+long CallOldTable(const Words&) {
+#ifdef __x86_64__
+  long result = 20;  // getpid
+  asm volatile("int $0x80" : "+a"(result) : : "memory", "r8", "r9", "r10", "r11");
+  if (result >= 0) return 0;
+  errno = static_cast<int>(-result);
+  return -1;
+#else
+  return 0;
+#endif
+}
+
+struct NamedOperation {
+  const char* name;
+  Operation act;
+};
+
+// clang-format off
+const NamedOperation kOperations[] = {
+    {"read", Read},
+    {"write", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY)); }},
+    {"open-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY | O_TRUNC)); }},
+    {"truncate", [](const Words& w) -> long { return truncate(w.First(), 0); }},
+    {"ftruncate", Truncate},
+    {"create", [](const Words& w) -> long { return Close(open(w.First(), O_CREAT | O_EXCL | O_WRONLY, 0600)); }},
+    {"link-nameless", LinkNameless},
+    {"mkdir", [](const Words& w) -> long { return mkdir(w.First(), 0700); }},
+    {"symlink", [](const Words& w) -> long { return symlink("target", w.First()); }},
+    {"mkfifo", [](const Words& w) -> long { return mkfifo(w.First(), 0600); }},
+    {"mknod-file", [](const Words& w) -> long { return mknod(w.First(), S_IFREG | 0600, 0); }},
+    {"mknod-socket", [](const Words& w) -> long { return mknod(w.First(), S_IFSOCK | 0600, 0); }},
+    {"mknod-character", [](const Words& w) -> long { return mknod(w.First(), S_IFCHR | 0600, 0x103); }},
+    {"mknod-block", [](const Words& w) -> long { return mknod(w.First(), S_IFBLK | 0600, 0x700); }},
+    {"bind-unix", BindUnix},
+    {"connect-abstract", ConnectAbstract},
+    {"unlink", [](const Words& w) -> long { return unlink(w.First()); }},
+    {"rmdir", [](const Words& w) -> long { return rmdir(w.First()); }},
+    {"rename", [](const Words& w) -> long { return rename(w.First(), w.Second()); }},
+    {"exchange", [](const Words& w) -> long { return renameat2(AT_FDCWD, w.First(), AT_FDCWD, w.Second(), RENAME_EXCHANGE); }},
+    {"link", [](const Words& w) -> long { return link(w.First(), w.Second()); }},
+    {"list", [](const Words& w) -> long { return Close(open(w.First(), O_RDONLY | O_DIRECTORY)); }},
+    {"chmod", [](const Words& w) -> long { return chmod(w.First(), 0755); }},
+    {"chown", [](const Words& w) -> long { return chown(w.First(), geteuid(), getegid()); }},
+    {"utime", [](const Words& w) -> long { return utimensat(AT_FDCWD, w.First(), nullptr, 0); }},
+    {"setxattr", [](const Words& w) -> long { return setxattr(w.First(), w.Second(), "x", 1, 0); }},
+    {"run", Run},
+    {"run-by-secret", RunBySecret},
+    {"run-by-descriptor", RunByDescriptor},
+    {"run-from-memory", RunFromMemory},
+    {"open-by-handle", OpenByHandle},
+    {"setns", EnterOwnMounts},
+    {"unshare-user", [](const Words&) -> long { return unshare(CLONE_NEWUSER | CLONE_NEWNS); }},
+    {"unmount", [](const Words& w) -> long { return umount2(w.First(), MNT_DETACH); }},
+    {"remount", [](const Words& w) -> long { return mount(nullptr, w.First(), nullptr, MS_REMOUNT | MS_BIND, nullptr); }},
+    {"bind-mount", [](const Words& w) -> long { return mount(w.First(), w.Second(), nullptr, MS_BIND, nullptr); }},
+    {"is-open", [](const Words& w) -> long { return fcntl(w.Number(), F_GETFD); }},
+    {"kill", [](const Words& w) -> long { return kill(w.Number(), 0); }},
+    {"tgkill", [](const Words& w) -> long { return tgkill(w.Number(), w.Number(), 0); }},
+    {"sigqueue", SendBySigqueue},
+    {"pidfd", SendByPidfd},
+    {"input-signal", SendByInput},
+    {"setuid", [](const Words& w) -> long { return setresuid(static_cast<uid_t>(w.Number()), static_cast<uid_t>(w.Number()), static_cast<uid_t>(w.Number())); }},
+    {"raise-capability", RaiseCapability},
+    {"raise-ambient", [](const Words& w) -> long { return prctl(PR_CAP_AMBIENT, PR_CAP_AMBIENT_RAISE, w.Number(), 0, 0); }},
+    {"has-capability", HasCapability},
+    {"has-bounding", IsBounding},
+    {"is-superuser", IsSuperuser},
+    {"clear-securebits", [](const Words&) -> long { return prctl(PR_SET_SECUREBITS, 0, 0, 0, 0); }},
+    {"keep-capabilities", [](const Words&) -> long { return prctl(PR_SET_KEEPCAPS, 1, 0, 0, 0); }},
+    {"variable", [](const Words& w) -> long { errno = ENOENT; return std::getenv(w.First()) == nullptr ? -1 : 0; }},
+    {"call", [](const Words& w) -> long { return syscall(w.Number(), 0, 0, 0, 0, 0, 0); }},
+    {"call-x32", [](const Words&) -> long { return syscall(0x4000'0000 | SYS_getpid); }},
+    {"call-int80", CallOldTable},
+};
+// clang-format on
+
+Words Split(const std::string& operation) {
+  const std::size_t equals = operation.find('=');
+  if (equals == std::string::npos) return {};
+  const std::string rest = operation.substr(equals + 1);
+  const std::size_t comma = rest.find(',');
+  if (comma == std::string::npos) return {rest, ""};
+  return {rest.substr(0, comma), rest.substr(comma + 1)};
+}
+
+void Try(const std::string& operation) {
+  const std::string name = operation.substr(0, operation.find('='));
+  for (const NamedOperation& known : kOperations) {
+    if (name != known.name) continue;
+    errno = 0;
+    const bool isDone = known.act(Split(operation)) >= 0;
+    std::printf("%s %s\n", operation.c_str(), isDone ? "ok" : strerrorname_np(errno));
+    std::fflush(stdout);
+    return;
+  }
+  std::printf("%s is no operation\n", operation.c_str());
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  for (int index = 1; index < argc; ++index) Try(argv[index]);
+  return 0;
+}
