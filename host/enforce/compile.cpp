@@ -1,6 +1,7 @@
 #include "host/enforce/compile.h"
 
 #include <algorithm>
+#include <array>
 #include <iterator>
 #include <sstream>
 #include <utility>
@@ -10,6 +11,7 @@
 #include "host/enforce/plan/dump.h"
 #include "host/enforce/plan/net_plan.h"
 #include "host/enforce/plan/port_check.h"
+#include "policy/call_set.h"
 
 namespace Enforce {
 namespace {
@@ -48,6 +50,20 @@ RuleFate WithoutLandlock(RuleFate fate) {
 RuleFate WithoutSeccomp(RuleFate fate) {
   fate.fate = Fate::kNotExpressible;
   fate.how = "this kernel filters no system calls";
+  return fate;
+}
+
+// Landlock lets signals through to what was started in the same entry alone.
+RuleFate WithScope(RuleFate fate) {
+  constexpr std::array kSending = {
+      "kill", "tkill", "tgkill", "rt_sigqueueinfo", "rt_tgsigqueueinfo", "pidfd_send_signal"};
+  const bool sends = fate.rule.Grants() && std::ranges::any_of(kSending, [&](const char* call) {
+                       return Policy::SpeaksOfCall(fate.rule.words[0], call);
+                     });
+  if (!sends) return fate;
+  fate.fate = std::max(fate.fate, Fate::kNarrowed);
+  fate.how += fate.how.empty() ? "" : "; ";
+  fate.how += "signals reach only what was started with the same entry into the domain";
   return fate;
 }
 
@@ -112,6 +128,7 @@ CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surround
         rule.kind == RuleKind::kSyscall || rule.kind == RuleKind::kParameterCheck;
     if (IsAboutFiles(rule.kind) && !hasLandlock) fate = WithoutLandlock(std::move(fate));
     if (isAboutCalls && !features.seccomp) fate = WithoutSeccomp(std::move(fate));
+    if (rule.kind == RuleKind::kSyscall && plan.isScoped) fate = WithScope(std::move(fate));
     compiled.fates.push_back(std::move(fate));
   }
   return compiled;

@@ -367,11 +367,42 @@ TEST(PlanCalls, LeavesOnlyTcpBesidePorts) {
 
 TEST(PlanCalls, LeavesAllSocketsBesideChecksThatAllPortsPass) {
   const std::vector<std::string> lines = {"-s @network grant", "-p connect_port 0 65535 grant",
-                                          "-p bind_port 70000 revoke"};
+                                          "-p bind_port 70000 revoke",
+                                          "-p socket_family 2 45 grant"};
   EXPECT_EQ(Ask(lines, "socket", {AF_INET, SOCK_DGRAM, 0}), "allowed");
   EXPECT_EQ(Ask(lines, "sendto", {0, 0, 0, MSG_FASTOPEN}), "allowed");
   EXPECT_EQ(Ask(lines, "listen"), "allowed");
   EXPECT_THAT(ToldOf(lines), IsEmpty());
+}
+
+TEST(PlanCalls, RefusesUnixSocketsThatReachWhoeverListens) {
+  for (const char* const call : {"connect", "sendto", "sendmsg", "sendmmsg"}) {
+    const std::vector<std::string> lines = {std::string("-s ") + call + " grant", "-s socket grant",
+                                            "-s socketpair grant"};
+    EXPECT_EQ(Ask(lines, "socket", {AF_UNIX, SOCK_STREAM, 0}), "EPERM") << call;
+    EXPECT_EQ(Ask(lines, "socket", {AF_INET, SOCK_STREAM, 0}), "allowed") << call;
+    EXPECT_EQ(Ask(lines, "socketpair", {AF_UNIX, SOCK_STREAM, 0}), "allowed") << call;
+    EXPECT_THAT(ToldOf(lines), ElementsAre("narrowed: -s socket grant (socket: unix sockets are "
+                                           "refused unless socket_family grants 1, as they reach "
+                                           "whoever listens)"));
+  }
+}
+
+TEST(PlanCalls, LeavesUnixSocketsToWhoOnlyListens) {
+  const std::vector<std::string> lines = {"-s socket grant", "-s bind grant", "-s listen grant",
+                                          "-s accept4 grant"};
+  EXPECT_EQ(Ask(lines, "socket", {AF_UNIX, SOCK_STREAM, 0}), "allowed");
+  EXPECT_THAT(ToldOf(lines), IsEmpty());
+}
+
+TEST(PlanCalls, TellsThatGrantedUnixSocketsReachWhoeverListens) {
+  const std::vector<std::string> lines = {"-s socket grant", "-s connect grant",
+                                          "-p socket_family 1 grant"};
+  EXPECT_EQ(Ask(lines, "socket", {AF_UNIX, SOCK_STREAM, 0}), "allowed");
+  EXPECT_THAT(ToldOf(lines),
+              ElementsAre("notExpressible: -p socket_family 1 grant (beside connect or sending, a "
+                          "unix socket reaches whoever listens: this kernel has no rules for "
+                          "that)"));
 }
 
 TEST(PlanCalls, RefusesToConnectBySending) {

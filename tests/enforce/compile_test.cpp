@@ -100,6 +100,22 @@ TEST(Compile, GivesNoRightThatTheKernelDoesNotKnow) {
   }
 }
 
+TEST(Compile, TellsHowFarSignalsReach) {
+  Features features = NewKernel();
+  const std::vector<std::string> lines = {"-s kill grant", "-s @signal grant", "-s tkill revoke",
+                                          "-s read grant"};
+  const std::vector<Fate> narrowed = {Fate::kNarrowed, Fate::kNarrowed, Fate::kEnforced,
+                                      Fate::kEnforced};
+  const CompiledPlan compiled = CompileOn(features, lines);
+  for (std::size_t index = 0; index < lines.size(); ++index) {
+    EXPECT_EQ(compiled.fates[index].fate, narrowed[index]) << lines[index];
+  }
+  EXPECT_EQ(compiled.fates[0].how,
+            "signals reach only what was started with the same entry into the domain");
+  features.landlock = 5;
+  EXPECT_EQ(CompileOn(features, lines).fates[0].fate, Fate::kEnforced);
+}
+
 TEST(Compile, TellsWhatAKernelWithoutFiltersCannotRefuse) {
   Features features = NewKernel();
   features.seccomp = false;

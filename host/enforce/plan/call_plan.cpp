@@ -10,6 +10,7 @@
 #include <sys/socket.h>
 
 #include <algorithm>
+#include <array>
 #include <csignal>
 #include <initializer_list>
 #include <set>
@@ -164,6 +165,12 @@ class Remarks {
     if (!call.empty()) known->calls.insert(call);
   }
 
+  // The domain can do more than the rule says.
+  void Surrender(const Rule& rule, const std::string& reason) {
+    Add(rule, reason);
+    surrendered.insert(&rule);
+  }
+
   RuleFate FateOf(const Rule& rule) const {
     const auto known = remarks.find(&rule);
     if (known == remarks.end()) return {rule, Fate::kEnforced, {}};
@@ -172,7 +179,8 @@ class Remarks {
       how += how.empty() ? "" : "; ";
       how += TextOf(remark);
     }
-    return {.rule = rule, .fate = Fate::kNarrowed, .how = std::move(how)};
+    const Fate fate = surrendered.contains(&rule) ? Fate::kNotExpressible : Fate::kNarrowed;
+    return {.rule = rule, .fate = fate, .how = std::move(how)};
   }
 
  private:
@@ -188,6 +196,7 @@ class Remarks {
   }
 
   std::map<const Rule*, std::vector<Remark>> remarks;
+  std::set<const Rule*> surrendered;
 };
 
 // ---- The plan
@@ -212,6 +221,7 @@ class CallPlanner {
 
   CallPlan Plan() {
     CloseDangerousValues();
+    CloseNamedSockets();
     CloseClone();
     CloseSignalsByDescriptors();
     CloseGroups();
@@ -348,6 +358,27 @@ class CallPlanner {
     for (const auto& [check, call, value, name] : kDangerousValues) {
       if (IsGrantedByItself(check, value)) continue;
       TakeValues(check, call, Single(value), StrCat(name, " is refused unless granted by itself"));
+    }
+  }
+
+  // No rule of the kernel is about who connects to a unix socket that has a name.
+  void CloseNamedSockets() {
+    static constexpr std::array kConnecting = {"connect", "sendmmsg", "sendmsg", "sendto"};
+    const bool connects =
+        std::ranges::any_of(kConnecting, [&](const char* call) { return FindGranted(call); });
+    if (!connects || !checks.at("socket_family").passing.Has(AF_UNIX)) return;
+    if (!IsGrantedByItself("socket_family", AF_UNIX)) {
+      const char* const reason =
+          "unix sockets are refused unless socket_family grants 1, as they reach whoever listens";
+      Tell("socket", reason);
+      Demand("socket", {Among(0, Single(AF_UNIX).Complement())});
+      return;
+    }
+    for (const Rule* const rule : checks.at("socket_family").rules) {
+      if (!rule->Grants() || !PassingValues({&rule, 1}).Has(AF_UNIX)) continue;
+      remarks.Surrender(*rule,
+                        "beside connect or sending, a unix socket reaches whoever listens: this "
+                        "kernel has no rules for that");
     }
   }
 

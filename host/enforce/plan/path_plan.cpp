@@ -6,6 +6,7 @@
 #include <array>
 #include <map>
 #include <memory>
+#include <span>
 #include <utility>
 
 #include "host/enforce/plan/value_set.h"
@@ -387,19 +388,23 @@ class Planner {
 
   struct Loss {
     Rights rights = 0;
-    Fate fate = Fate::kEnforced;
+    Fate fate = Fate::kNarrowed;
     std::string how;
   };
 
   void Lose(const Region& region, Rights lost, const std::string& how,
             Fate fate = Fate::kNarrowed) {
     if (lost == 0) return;
-    for (Loss* const loss : {&pathLosses[region.rule], &labelLosses[region.label]}) {
-      loss->rights |= lost;
-      if (loss->fate >= fate) continue;
-      loss->fate = fate;
-      loss->how = how;
+    Note(pathLosses[region.rule], {lost, fate, how});
+    Note(labelLosses[region.label], {lost, fate, how});
+  }
+
+  // Of each fate the first reason is enough for the same rights.
+  static void Note(std::vector<Loss>& losses, Loss loss) {
+    for (const Loss& known : losses) {
+      if (known.fate == loss.fate) loss.rights &= ~known.rights;
     }
+    if (loss.rights != 0) losses.push_back(std::move(loss));
   }
 
   // The rights that a rule grants, if it is about files.
@@ -429,13 +434,13 @@ class Planner {
     return granted;
   }
 
-  const Loss* FindLoss(const Rule& rule) const {
+  std::span<const Loss> LossesOf(const Rule& rule) const {
     if (rule.kind == RuleKind::kFilePath) {
       const auto found = pathLosses.find(&rule);
-      return found == pathLosses.end() ? nullptr : &found->second;
+      return found == pathLosses.end() ? std::span<const Loss>() : found->second;
     }
     const auto found = labelLosses.find(std::string_view(rule.words[0]));
-    return found == labelLosses.end() ? nullptr : &found->second;
+    return found == labelLosses.end() ? std::span<const Loss>() : found->second;
   }
 
   RuleFate FateOf(const Rule& rule) const {
@@ -444,9 +449,12 @@ class Planner {
       return {rule, Fate::kNarrowed, "only services of this host enter a domain this way"};
     }
     if (isWayIn) return {rule, Fate::kNarrowed, "only by \"secpolicy exec\""};
-    const Loss* const loss = FindLoss(rule);
-    if (loss == nullptr || (loss->rights & RightsOf(rule)) == 0) return {rule, Fate::kEnforced, ""};
-    return {rule, loss->fate, loss->how};
+    RuleFate fate{rule, Fate::kEnforced, ""};
+    const Rights granted = RightsOf(rule);
+    for (const Loss& loss : LossesOf(rule)) {
+      if ((loss.rights & granted) != 0 && loss.fate > fate.fate) fate = {rule, loss.fate, loss.how};
+    }
+    return fate;
   }
 
   std::vector<RuleFate> Fates() const {
@@ -476,8 +484,8 @@ class Planner {
   const std::array<bool, 3> socketKinds;
   std::map<Region, Rights> regions;
   std::map<const Node*, Finding> findings;
-  std::map<const Rule*, Loss> pathLosses;
-  std::map<std::string_view, Loss> labelLosses;
+  std::map<const Rule*, std::vector<Loss>> pathLosses;
+  std::map<std::string_view, std::vector<Loss>> labelLosses;
   std::vector<PathRight> rights;
 };
 
