@@ -8,6 +8,14 @@ _secpolicy_saved() {
   done
 }
 
+# The domains that policy files below the root $1 define.
+_secpolicy_domains() {
+  local file
+  for file in "$1"/etc/zorvan/secpolicy/domains/*; do
+    [[ -f $file ]] && basename "$file"
+  done
+}
+
 # The names of the tardisks below the root $1.
 _secpolicy_tardisks() {
   local file
@@ -18,12 +26,12 @@ _secpolicy_tardisks() {
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display why who-can words graph diff save history rollback label settings'
+  local verbs='boot check load load-early restore status display run exec features why who-can words graph diff save history rollback label settings'
   local questions='read write exec list remove truncate make make-socket call use access enter create create-socket pass'
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy || $word == --policy-from ]]; then
+    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy || $word == --policy-from || $word == --for ]]; then
       index=$((index + 1))
       [[ $word == --root ]] && root=${COMP_WORDS[index]}
     elif [[ $word == -* ]]; then
@@ -43,12 +51,18 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json sarif' -- "$current")
-  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == words || $verb == status || $verb == diff || $verb == load || $verb == boot) && $previous == --format ]]; then
+  elif [[ ($verb == display || $verb == why || $verb == who-can || $verb == words || $verb == features || $verb == status || $verb == diff || $verb == load || $verb == boot) && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'text json' -- "$current")
   elif [[ $verb == graph && $previous == --format ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'dot svg' -- "$current")
   elif [[ $verb == graph && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--domain --format --root --help -h' -- "$current")
+  elif [[ $verb == run && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--best-effort --explain --root --help -h' -- "$current")
+  elif [[ $verb == exec && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--best-effort --root --help -h' -- "$current")
+  elif [[ $verb == features && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--for --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'byte-order-mark cannot-start carriage-return contradicting-rule duplicate-object
       duplicate-rule editor-copy installed-only long-line missing-path nul-byte relative-path skipped-entry
@@ -90,6 +104,11 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W "installed $(_secpolicy_saved "$root")" -- "$current"; compgen -d -- "$current")
   elif [[ $verb == words ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W 'objects accesses capabilities transitions files checks calls sockets' -- "$current")
+  elif [[ $verb == features && $previous == --for ]] || [[ $verb == run && $positional -eq 0 && $current != -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_domains "$root")" -- "$current")
+  elif [[ $verb == run || $verb == exec ]]; then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == rollback ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_saved "$root")" -- "$current")
   elif [[ $verb == label && -z $kind ]]; then

@@ -48,8 +48,13 @@ secpolicy: diff: the same" ]]
 - -a filterCache read grant
 - -a filterCache write grant
 - -a filterProgram execute grant
+- -r /bin rx
 - -r /usr/lib/io-filters/cache rx
 - -r /var/cache/io-filters rw
+- -s @file grant
+- -s @io grant
+- -s @process grant
+- -s @signal grant
 - -s @start grant
 @@ domain plugin-disk (only in /new)
 + level enforcing

@@ -50,12 +50,13 @@ load helper
     '  node [shape=box, style=rounded, fontname="sans-serif"]' \
     '  edge [fontname="sans-serif", fontsize=10]' \
     '  "all capabilities" [label="capabilities\ncap_net_bind_service\ncap_setgid\ncap_setuid\ncap_sys_chroot", shape="note", style="solid"]' \
-    '  "all parameter checks" [label="parameter checks\nbind_port 22", shape="note", style="solid"]' \
-    '  "all system calls" [label="system calls\n@start\naccept4\nbind\nlisten", shape="note", style="solid"]' \
+    '  "all parameter checks" [label="parameter checks\nbind_port 0\nbind_port 22", shape="note", style="solid"]' \
+    '  "all system calls" [label="system calls\n@file\n@io\n@process\n@signal\n@start\naccept\naccept4\nbind\nlisten\nsocket", shape="note", style="solid"]' \
     '  "all unix sockets" [label="unix sockets\nsshSocket seqpacket", shape="note", style="solid"]' \
     '  "hostDom" [label="hostDom\n(permissive)", style="rounded,dashed"]' \
     '  "object sshKey" [label="sshKey", shape="ellipse", style="solid"]' \
     '  "object sshProgram" [label="sshProgram", shape="ellipse", style="solid"]' \
+    '  "path /bin" [label="/bin", shape="folder", style="solid"]' \
     '  "path /etc/ssh" [label="/etc/ssh", shape="folder", style="solid"]' \
     '  "path /usr/sbin/sshd" [label="/usr/sbin/sshd", shape="folder", style="solid"]' \
     '  "sshDom"' \
@@ -66,6 +67,7 @@ load helper
     '  "sshDom" -> "hostDom" [label="hostProgram, exec"]' \
     '  "sshDom" -> "object sshKey" [label="read"]' \
     '  "sshDom" -> "object sshProgram" [label="execute"]' \
+    '  "sshDom" -> "path /bin" [label="rx"]' \
     '  "sshDom" -> "path /etc/ssh" [label="r"]' \
     '  "sshDom" -> "path /usr/sbin/sshd" [label="rx"]' \
     '}'
@@ -75,7 +77,7 @@ load helper
   printf -- '-s %s grant\n' bind listen accept4 dup dup2 dup3 pipe pipe2 kill chdir >>"$policy/domains/appDom"
   boot
   secpolicy graph --domain appDom
-  [[ $output == *'[label="system calls\n@start\naccept4\nbind\nchdir\nconnect\ndup\ndup2\ndup3\nkill\nlisten\npipe\npipe2\nand 1 more"'* ]]
+  [[ $output == *'[label="system calls\n@file\n@io\n@start\naccept4\nbind\nchdir\nconnect\ndup\ndup2\ndup3\nkill\nlisten\nand 3 more"'* ]]
 }
 
 @test "a path of any letters is escaped, and one without permissions is not reached" {

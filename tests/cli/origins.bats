@@ -86,7 +86,7 @@ END
   printf -- '-s bind revoke\n-s reed grant\n-s accept4 revoke\n' >>"$policy/domains/sshDom"
   "$SECPOLICY" --root "$root" load 2>/dev/null || true
   comes_from sshDom "/etc/zorvan/secpolicy/domains/sshDom:$(($(wc -l <"$policy/domains/sshDom") - 2)): -s bind revoke"
-  comes_from sshDom "/etc/zorvan/secpolicy/domains/sshDom:$(line_of domains/sshDom '-s accept4 grant'): -s accept4 grant"
+  comes_from sshDom "/etc/zorvan/secpolicy/domains/sshDom:$(line_of domains/sshDom '-s accept4  grant'): -s accept4 grant"
 }
 
 @test "a rule that a program made comes from no file" {

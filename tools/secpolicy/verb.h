@@ -10,7 +10,8 @@ enum ExitCode : int {
   kWell = 0,
   kFailed = 1,
   kUsage = 2,
-  kStopped = 3  // the library stopped the load: a well-known domain is missing
+  kStopped = 3,       // the library stopped the load: a well-known domain is missing
+  kNotConfined = 126  // as of a shell that finds a program and cannot start it
 };
 
 // What a verb does when the command line has been read and the root has been entered.
@@ -44,6 +45,9 @@ extern const Verb kSettings;
 extern const Verb kGraph;
 extern const Verb kLabel;
 extern const Verb kStatus;
+extern const Verb kRun;
+extern const Verb kExec;
+extern const Verb kFeatures;
 extern const Verb kWhoCan;
 extern const Verb kWhy;
 extern const Verb kWords;

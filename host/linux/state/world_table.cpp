@@ -54,11 +54,15 @@ void WorldTable::Place(int world, unsigned int domainId) {
   if (placed == 0) throw HostError(ENOENT, StrCat("unknown domain ", domainId));
 }
 
+std::optional<unsigned int> WorldTable::FindDomainOf(int world) {
+  Rows rows = store.Select("SELECT started, domain_id FROM world WHERE id = ?1", world);
+  if (!rows.Next() || !IsStill(world, rows.Integer(0))) return std::nullopt;
+  return static_cast<unsigned int>(rows.Integer(1));
+}
+
 unsigned int WorldTable::DomainOf(int world) {
   RequireAlive(world);
-  Rows rows = store.Select("SELECT started, domain_id FROM world WHERE id = ?1", world);
-  if (!rows.Next() || !IsStill(world, rows.Integer(0))) return kStartDomain;
-  return static_cast<unsigned int>(rows.Integer(1));
+  return FindDomainOf(world).value_or(kStartDomain);
 }
 
 unsigned int WorldTable::CountIn(unsigned int domainId) {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <optional>
+
 #include "host/linux/state/store.h"
 
 namespace LinuxHost {
@@ -18,6 +20,9 @@ class WorldTable {
 
   // The domain that a living world runs in.
   unsigned int DomainOf(int world);
+
+  // The same, but nothing for one that was never placed.
+  std::optional<unsigned int> FindDomainOf(int world);
 
   // The number of living worlds that were placed in the domain.
   unsigned int CountIn(unsigned int domainId);

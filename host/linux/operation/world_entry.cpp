@@ -1,0 +1,46 @@
+#include "host/linux/operation/world_entry.h"
+
+#include <sys/prctl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <fstream>
+#include <string>
+
+#include "host/linux/common/host_error.h"
+#include "host/linux/state/domain.h"
+#include "host/linux/state/host_state.h"
+
+namespace LinuxHost {
+namespace {
+
+// 0 where it cannot be told.
+pid_t ParentOf(pid_t process) {
+  std::ifstream status("/proc/" + std::to_string(process) + "/status");
+  std::string word;
+  while (status >> word) {
+    pid_t parent = 0;
+    if (word == "PPid:" && status >> parent) return parent;
+  }
+  return 0;
+}
+
+}  // namespace
+
+void EnterWorld(unsigned int id) { HostState::Current().Worlds().Place(getpid(), id); }
+
+unsigned int DomainOfCaller() {
+  WorldTable& worlds = HostState::Current().Worlds();
+  // A child is in the domain of its parent, unless it was placed elsewhere itself.
+  for (pid_t process = getpid(); process > 1; process = ParentOf(process)) {
+    if (const auto placed = worlds.FindDomainOf(process)) return *placed;
+  }
+  if (prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0) == 1) {
+    throw HostError(ESRCH,
+                    "the domain of this process is not known: it was confined, and nobody recorded "
+                    "where");
+  }
+  return kStartDomain;
+}
+
+}  // namespace LinuxHost

@@ -1,0 +1,76 @@
+#include "launcher.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <filesystem>
+
+#include "host/enforce/plan_file.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using LinuxHost::Descriptor;
+using LinuxHost::ThrowErrno;
+
+constexpr char kName[] = "secpolicy-run";
+
+int launcher = -1;
+
+// Beside this program, as it is built, or where it is installed.
+std::vector<std::filesystem::path> Places() {
+  std::error_code error;
+  const auto directory = std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
+  return {directory / kName, directory.parent_path() / SECPOLICY_LIBEXECDIR / kName};
+}
+
+// The plan as a file that has no name and that nobody can change.
+Descriptor SealedFile(const std::string& bytes) {
+  Descriptor file(memfd_create("secpolicy plan", MFD_ALLOW_SEALING));
+  if (file.Number() < 0) ThrowErrno("cannot make a plan");
+  std::size_t written = 0;
+  while (written < bytes.size()) {
+    const ssize_t count = write(file.Number(), bytes.data() + written, bytes.size() - written);
+    if (count < 0) ThrowErrno("cannot write a plan");
+    written += static_cast<std::size_t>(count);
+  }
+  constexpr int kSeals = F_SEAL_SEAL | F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_WRITE;
+  const bool isSealed = fchmod(file.Number(), 0400) == 0 &&
+                        fcntl(file.Number(), F_ADD_SEALS, kSeals) == 0 &&
+                        lseek(file.Number(), 0, SEEK_SET) == 0;
+  if (!isSealed) ThrowErrno("cannot seal a plan");
+  return file;
+}
+
+}  // namespace
+
+void OpenLauncher() {
+  for (const auto& place : Places()) {
+    launcher = open(place.c_str(), O_PATH | O_CLOEXEC);
+    if (launcher >= 0) return;
+  }
+}
+
+void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command) {
+  if (launcher < 0) {
+    throw Braxo::Lib::BraxoException(
+        "secpolicy-run, which confines programs, is neither beside this command nor where it is "
+        "installed: install secpolicy again");
+  }
+  const Descriptor file = SealedFile(Enforce::Serialize(plan));
+  std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number()), "--"};
+  words.insert(words.end(), command.begin(), command.end());
+  std::vector<char*> arguments;
+  arguments.reserve(words.size() + 1);
+  for (std::string& word : words) arguments.push_back(word.data());
+  arguments.push_back(nullptr);
+  execveat(launcher, "", arguments.data(), environ, AT_EMPTY_PATH);
+  ThrowErrno("cannot start secpolicy-run");
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,101 @@
+#include "host/enforce/features.h"
+
+#include <iostream>
+#include <memory>
+#include <string>
+
+#include "command_line.h"
+#include "enforce/domain_plan.h"
+#include "query/ask.h"
+#include "text/visible.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Enforce::Features;
+
+const char* TextOf(Enforce::Namespace mounts) {
+  switch (mounts) {
+    case Enforce::Namespace::kPrivileged:
+      return "as root";
+    case Enforce::Namespace::kUser:
+      return "in a user namespace";
+    case Enforce::Namespace::kNone:
+      break;
+  }
+  return "no";
+}
+
+std::string YesOrNo(bool isSo) { return isSo ? "yes" : "no"; }
+
+void WriteFeatures(const Features& features) {
+  std::cout << "Landlock: "
+            << (features.landlock == 0 ? "no" : "version " + std::to_string(features.landlock))
+            << "\nfilters of system calls: " << YesOrNo(features.seccomp)
+            << "\nfilters that ask a supervisor: " << YesOrNo(features.notifies)
+            << "\nmounts of one's own: " << TextOf(features.mounts) << '\n';
+}
+
+Json ToJson(const Features& features) {
+  return {{"landlock", features.landlock},
+          {"seccomp", features.seccomp},
+          {"seccompNotify", features.notifies},
+          {"mountNamespace", TextOf(features.mounts)}};
+}
+
+ExitCode ShowFeatures(const std::string& format) {
+  const Features features = Enforce::ProbeFeatures();
+  if (format == "json") {
+    std::cout << Json{{"schema", "secpolicy.features/1"}, {"features", ToJson(features)}}.Text();
+  } else {
+    WriteFeatures(features);
+  }
+  return kWell;
+}
+
+ExitCode ShowFates(const std::string& domain, const std::string& format) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  const Enforce::CompiledPlan compiled = PlanOf(domain, access);
+  if (format == "json") {
+    std::cout << Json{{"schema", "secpolicy.features/1"},
+                      {"features", ToJson(Enforce::ProbeFeatures())},
+                      {"domain", domain},
+                      {"rules", FatesToJson(compiled.fates)}}
+                     .Text();
+  } else {
+    for (const auto& fate : compiled.fates) std::cout << Visible(FateText(fate)) << '\n';
+  }
+  return NotExpressible(compiled.fates).empty() ? kWell : kFailed;
+}
+
+Action Define(Syntax& syntax) {
+  const auto domain = std::make_shared<std::string>();
+  syntax.AddOption("--for", *domain, "What becomes of each rule of a domain").NameValue("DOMAIN");
+  const auto format = AddAnswerFormat(syntax);
+  return [=] {
+    if (domain->empty()) return ShowFeatures(*format);
+    return Ask("features", [=] { return ShowFates(*domain, *format); });
+  };
+}
+
+}  // namespace
+
+const Verb kFeatures = {
+    "features", "Say what this kernel can enforce, and what becomes of each rule of a domain",
+    "Without --for, lists what this kernel and this user have to confine programs by. With it, "
+    "each\n"
+    "rule of the domain is one of\n"
+    "\n"
+    "  enforced          exactly\n"
+    "  narrowed          the domain may do less than the rule says, and how\n"
+    "  notExpressible    it could do more: 'secpolicy run' starts nothing then\n"
+    "\n"
+    "Exit status with --for: 0 all rules can be kept to, 1 some cannot.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy features\n"
+    "  secpolicy features --for sshDom --format json",
+    Define};
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,67 @@
+#include <iostream>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "command_line.h"
+#include "enforce/domain_plan.h"
+#include "enforce/entry.h"
+#include "enforce/launcher.h"
+#include "query/ask.h"
+#include "query/question.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+struct Options {
+  std::string domain;
+  std::vector<std::string> command;
+  EntryOptions entry;
+  bool explain = false;
+};
+
+ExitCode Explain(const std::string& domain) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  std::cout << ExplanationOf(domain, access);
+  return kWell;
+}
+
+ExitCode Run(const Options& options) {
+  if (options.explain) return Explain(options.domain);
+  if (options.command.empty()) throw QuestionError("CMD is required, behind --");
+  const auto domain = [&](auto& /*access*/) { return options.domain; };
+  return EnterDomain("run", domain, options.command, options.entry);
+}
+
+Action Define(Syntax& syntax) {
+  const auto options = std::make_shared<Options>();
+  syntax.AddOption("DOMAIN", options->domain, "The domain to run in").Require();
+  syntax.AddList("CMD", options->command, "The program and its arguments, behind --");
+  AddEntryOptions(syntax, options->entry);
+  syntax.AddFlag("--explain", options->explain,
+                 "Only show what the kernel would be told, and what becomes of each rule");
+  return [=] { return Ask("run", [=] { return Run(*options); }); };
+}
+
+}  // namespace
+
+const Verb kRun = {
+    "run", "Run a program in a domain, with exactly the rights of its rules",
+    "Starts CMD in the domain DOMAIN: this process, and all that it starts, may do what the\n"
+    "installed rules of the domain grant, and nothing else. Any user may; a domain never gives\n"
+    "rights that its user does not have. A domain that is permissive or disabled is only\n"
+    "recorded.\n"
+    "What this kernel cannot refuse is told with file and line before anything starts, and\n"
+    "nothing is started then; --best-effort starts it all the same.\n"
+    "\n"
+    "Exit status: that of CMD; 126 when it could not be confined, 127 when there is no such\n"
+    "program, 2 for wrong usage.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy run sshDom -- /usr/sbin/sshd\n"
+    "  secpolicy run appDom -- cat /etc/shadow     is it refused?\n"
+    "  secpolicy run appDom --explain              what is the kernel told?",
+    Define, OpenLauncher};
+
+}  // namespace SecPolicyCli
