@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Holds what "secpolicy why" says against what the kernel does.
 
-usage: domains.py COMMAND PROBE WELL [--first SEED] [--roots COUNT] [--domains COUNT] [--tries COUNT]
+usage: domains.py COMMAND PROBE WELL [--user ID] [--first SEED] [--roots COUNT] [--domains COUNT] [--tries COUNT]
 
 Makes small roots with files, labels and domains by chance, boots each, and tries operations of every
 kind in every domain by "secpolicy run --best-effort": what `why` refuses has to fail, unless the rule
@@ -278,16 +278,7 @@ def check_root(seed, options, tally):
             check_domain(root, domain, chance, options.tries, tally)
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
-    parser.add_argument("command")
-    parser.add_argument("probe")
-    parser.add_argument("well")
-    parser.add_argument("--first", type=int, default=1)
-    parser.add_argument("--roots", type=int, default=25)
-    parser.add_argument("--domains", type=int, default=8)
-    parser.add_argument("--tries", type=int, default=52)
-    options = parser.parse_args()
+def check_roots(options):
     tally = {"pairs": 0, "granted": 0, "narrowed": 0, "surrendered": 0, "refused": 0}
     failures = 0
     for seed in range(options.first, options.first + options.roots):
@@ -297,7 +288,46 @@ def main():
             failures += 1
             print(f"seed {seed}: {failure}", file=sys.stderr)
     print(", ".join(f"{count} {what}" for what, count in tally.items()))
-    sys.exit(1 if failures else 0)
+    return 1 if failures else 0
+
+
+def check_as(user, options):
+    """Checks as an ordinary user, who need not reach the directory that all was built in."""
+    launcher = os.path.join(os.path.dirname(options.command), "secpolicy-run")
+    with tempfile.TemporaryDirectory(prefix="secpolicy-programs-") as programs:
+        os.chmod(programs, 0o755)
+        for program in (options.command, options.probe, options.well, launcher):
+            shutil.copy(program, programs)
+        for name in ("command", "probe", "well"):
+            setattr(options, name, os.path.join(programs, os.path.basename(getattr(options, name))))
+        child = os.fork()
+        if child == 0:
+            os.setgroups([])
+            os.setgid(user)
+            os.setuid(user)
+            result = check_roots(options)
+            sys.stdout.flush()
+            os._exit(result)
+        return os.waitstatus_to_exitcode(os.waitpid(child, 0)[1])
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("command")
+    parser.add_argument("probe")
+    parser.add_argument("well")
+    parser.add_argument("--user", type=int, help="who tries, when root starts this")
+    parser.add_argument("--first", type=int, default=1)
+    parser.add_argument("--roots", type=int, default=25)
+    parser.add_argument("--domains", type=int, default=8)
+    parser.add_argument("--tries", type=int, default=52)
+    options = parser.parse_args()
+    if options.user is None:
+        sys.exit(check_roots(options))
+    if os.geteuid() != 0:
+        print("skipped: only root can become another user")
+        sys.exit(77)
+    sys.exit(check_as(options.user, options))
 
 
 if __name__ == "__main__":

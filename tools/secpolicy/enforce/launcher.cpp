@@ -1,12 +1,16 @@
 #include "launcher.h"
 
 #include <fcntl.h>
+#include <linux/capability.h>
 #include <sys/mman.h>
+#include <sys/prctl.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <filesystem>
+#include <iterator>
 
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/descriptor.h"
@@ -47,6 +51,20 @@ Descriptor SealedFile(const std::string& bytes) {
   return file;
 }
 
+// Whoever is not root loses what a user namespace has given to it with the next execve, unless it
+// is told to be ambient. The launcher drops what the domain is not to have.
+void HandOnCapabilities() {
+  __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+  __user_cap_data_struct data[_LINUX_CAPABILITY_U32S_3] = {};
+  if (syscall(SYS_capget, &header, data) != 0) ThrowErrno("cannot read capabilities");
+  for (auto& word : data) word.inheritable = word.permitted;
+  if (syscall(SYS_capset, &header, data) != 0) ThrowErrno("cannot keep capabilities");
+  for (unsigned int number = 0; number < 32 * std::size(data); ++number) {
+    if ((data[number / 32].permitted >> (number % 32) & 1) == 0) continue;
+    prctl(PR_CAP_AMBIENT, PR_CAP_AMBIENT_RAISE, number, 0, 0);
+  }
+}
+
 }  // namespace
 
 void OpenLauncher() {
@@ -62,6 +80,7 @@ void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& co
         "secpolicy-run, which confines programs, is neither beside this command nor where it is "
         "installed: install secpolicy again");
   }
+  if (geteuid() != 0) HandOnCapabilities();
   const Descriptor file = SealedFile(Enforce::Serialize(plan));
   std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number()), "--"};
   words.insert(words.end(), command.begin(), command.end());
