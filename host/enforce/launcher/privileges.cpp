@@ -44,7 +44,6 @@ void KeepCapabilities(std::uint64_t kept) {
     Control(PR_SET_SECUREBITS, kSecureBits);
   }
   if (Kernel::SetCapabilities({kept, kept, kept}) != 0) RefuseForErrno(kMessage);
-  Control(PR_CAP_AMBIENT, PR_CAP_AMBIENT_CLEAR_ALL);
   ForEach(kept,
           [](unsigned long number) { Control(PR_CAP_AMBIENT, PR_CAP_AMBIENT_RAISE, number); });
 }

@@ -3,6 +3,7 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <netinet/in.h>
 #include <signal.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -11,10 +12,12 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
 
+#include "host/enforce/features.h"
 #include "host/enforce/kernel.h"
 #include "launch.h"
 
@@ -28,6 +31,7 @@ class Entry : public testing::TestWithParam<User> {
  protected:
   void SetUp() override {
     if (!CanBe(user)) GTEST_SKIP() << "only root can start somebody as root";
+    if (Lacks()) GTEST_SKIP() << Lacks();
   }
 
   const User user = GetParam();
@@ -79,6 +83,22 @@ TEST_P(Entry, ClosesWhatWasOpen) {
 
   launch.options.insert(launch.options.end(), {"--keep-fd", third.Text(), "--keep-fd", "0"});
   EXPECT_THAT(RunLauncher(launch).output, StrEq(lines("ok", "ok", "ok", "ok")));
+}
+
+TEST_P(Entry, LeavesNoneOfItsOwn) {
+  Enforce::Plan plan = PlanOf(tree);
+  plan.filter = FilterWithout({});
+  plan.paths.push_back({tree / "kept", AllRights()});
+  if (Enforce::ProbeFeatures().mounts != Enforce::Namespace::kNone) {
+    plan.masks = {{tree / "open", Enforce::MaskKind::kReadOnly}};
+  }
+  Launch launch{user, {"--plan", WritePlan(tree, plan)}, {ProbePath()}};
+  std::string expected;
+  for (int number = 3; number < 20; ++number) {
+    launch.command.push_back("is-open=" + std::to_string(number));
+    expected += launch.command.back() + " EBADF\n";
+  }
+  EXPECT_THAT(RunLauncher(launch).output, StrEq(expected));
 }
 
 // ---- System calls
@@ -140,10 +160,18 @@ TEST_P(Entry, KillsWhoCallsByAnotherTable) {
 // A process of the user that waits for signals.
 class Victim {
  public:
-  explicit Victim(User user) : process(fork()) {
-    if (process != 0) return;
-    if (Become(user)) pause();
-    _exit(1);
+  explicit Victim(User user) {
+    std::array<int, 2> channel{};
+    EXPECT_EQ(pipe2(channel.data(), O_CLOEXEC), 0);
+    process = fork();
+    if (process == 0) {
+      if (Become(user) && write(channel[1], "x", 1) == 1) pause();
+      _exit(1);
+    }
+    close(channel[1]);
+    char ready = 0;
+    EXPECT_EQ(read(channel[0], &ready, 1), 1) << "before, it is not the user's";
+    close(channel[0]);
   }
   Victim(const Victim&) = delete;
   Victim& operator=(const Victim&) = delete;
@@ -162,7 +190,7 @@ class Victim {
   }
 
  private:
-  pid_t process;
+  pid_t process = -1;
   bool isEnded = false;
 };
 
@@ -212,22 +240,74 @@ TEST_P(Entry, RefusesAbstractSocketsOfOthers) {
   EXPECT_THAT(AnswerOf(user, tree, plan, "connect-abstract=" + name), StrEq("ok"));
 }
 
+// ---- Ports
+
+// A socket of TCP with a port that the kernel chose.
+class Listener {
+ public:
+  Listener() : here(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    sockaddr_in address = {};
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    socklen_t size = sizeof(address);
+    auto* const any = reinterpret_cast<sockaddr*>(&address);
+    EXPECT_EQ(bind(here.Number(), any, size), 0);
+    EXPECT_EQ(listen(here.Number(), 8), 0);
+    EXPECT_EQ(getsockname(here.Number(), any, &size), 0);
+    port = ntohs(address.sin_port);
+  }
+  std::uint16_t Port() const { return port; }
+
+ private:
+  OpenDescriptor here;
+  std::uint16_t port = 0;
+};
+
+bool HasPorts() { return Enforce::Kernel::LandlockVersion() >= Enforce::Kernel::kPortsVersion; }
+
+TEST_P(Entry, RefusesPorts) {
+  if (!HasPorts()) GTEST_SKIP() << "this version of Landlock knows nothing of ports";
+  const Listener listener;
+  const auto other = static_cast<std::uint16_t>(listener.Port() ^ 1);
+  const std::string connect = "connect-tcp=" + std::to_string(listener.Port());
+  const std::string bind = "bind-tcp=" + std::to_string(listener.Port());
+
+  Enforce::Plan plan = PlanOf(tree);
+  plan.connectsChecked = true;
+  plan.connectPorts = {other};
+  EXPECT_THAT(AnswerOf(user, tree, plan, connect), StrEq("EACCES"));
+  EXPECT_THAT(AnswerOf(user, tree, plan, bind), StrEq("EADDRINUSE"));
+  plan.connectPorts = {other, listener.Port()};
+  EXPECT_THAT(AnswerOf(user, tree, plan, connect), StrEq("ok"));
+
+  plan = PlanOf(tree);
+  plan.bindsChecked = true;
+  plan.bindPorts = {other};
+  EXPECT_THAT(AnswerOf(user, tree, plan, bind), StrEq("EACCES"));
+  EXPECT_THAT(AnswerOf(user, tree, plan, connect), StrEq("ok"));
+  plan.bindPorts = {other, listener.Port()};
+  EXPECT_THAT(AnswerOf(user, tree, plan, bind), StrEq("EADDRINUSE"));
+}
+
 // ---- Capabilities and identities
 
 constexpr int kDacOverride = 1;
 
 TEST(Capabilities, AreGoneForGood) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root has capabilities";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   const Tree tree(User::kRoot);
   Enforce::Plan plan = PlanOf(tree);
   const std::string again = "run=" + ProbePath() + ",has-capability=1";
-  const std::vector<std::string> operations = {"has-capability=1", "has-bounding=1",
-                                               "raise-capability=1", "raise-ambient=1"};
-  for (const std::string& operation : operations) {
-    plan.capabilities = ~(std::uint64_t{1} << kDacOverride);
-    EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, operation), StrEq("EPERM")) << operation;
-    plan.capabilities = ~std::uint64_t{0};
-    EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, operation), StrEq("ok")) << operation;
+  for (const int number : {kDacOverride, Enforce::ProbeFeatures().lastCapability}) {
+    for (const char* const operation :
+         {"has-capability=", "has-bounding=", "raise-capability=", "raise-ambient="}) {
+      const std::string whole = operation + std::to_string(number);
+      plan.capabilities = ~(std::uint64_t{1} << number);
+      EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, whole), StrEq("EPERM")) << whole;
+      plan.capabilities = ~std::uint64_t{0};
+      EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, whole), StrEq("ok")) << whole;
+    }
   }
   plan.capabilities = 0;
   EXPECT_THAT(Probe(User::kRoot, tree, plan, {again}).output,
@@ -239,6 +319,7 @@ TEST(Capabilities, AreGoneForGood) {
 
 TEST(Capabilities, StayWithAnotherUser) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root has capabilities";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   const Tree tree(User::kRoot);
   const Enforce::Plan plan = PlanOf(tree);
   EXPECT_THAT(Probe(User::kRoot, tree, plan, {"setuid=65534", "has-capability=1"}).output,
@@ -248,9 +329,13 @@ TEST(Capabilities, StayWithAnotherUser) {
 // Bits with which the superuser would have them again.
 TEST(Capabilities, DoNotComeBackByTheUser) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root has capabilities";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   const Tree tree(User::kRoot);
   Enforce::Plan plan = PlanOf(tree);
-  for (const char* const operation : {"clear-securebits", "keep-capabilities"}) {
+  // That root is nobody special on execution, and stays so with another identity; see
+  // capabilities(7).
+  for (const char* const operation :
+       {"flip-securebit=0", "flip-securebit=2", "keep-capabilities"}) {
     plan.level = Policy::Level::kEnforcing;
     EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, operation), StrEq("EPERM")) << operation;
     plan.level = Policy::Level::kDisabled;
@@ -260,6 +345,7 @@ TEST(Capabilities, DoNotComeBackByTheUser) {
 
 TEST(Capabilities, AreNotNeededByAnotherOwner) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root can be kept from the files of others";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   const Tree tree(User::kNobody);
   std::filesystem::permissions(tree / "kept/file", std::filesystem::perms(0600));
   Enforce::Plan plan = PlanOf(tree);
@@ -271,6 +357,7 @@ TEST(Capabilities, AreNotNeededByAnotherOwner) {
 
 TEST(Capabilities, AreNotToBeHadFromAProgram) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root can make such a program";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   const Tree tree(User::kRoot);
   ASSERT_EQ(chmod((tree / "kept/program").c_str(), 04755), 0);
   Enforce::Plan plan = PlanOf(tree);
@@ -321,6 +408,19 @@ TEST_P(Entry, StartsWhatTheDescriptorIs) {
   const Outcome outcome = RunLauncher(launch);
   EXPECT_THAT(outcome.errors, StrEq(""));
   EXPECT_THAT(outcome.output, StrEq(launch.command[1] + " EBADF\n"));
+}
+
+TEST_P(Entry, AsksTheRulesAboutADescriptor) {
+  const std::string path = tree / "kept/program";
+  const OpenDescriptor program(open(path.c_str(), O_PATH | O_CLOEXEC));
+  const Launch launch{user,
+                      {"--plan", WritePlan(tree, PlanOfNothing()), "--program", program.Text()},
+                      {ProbePath()},
+                      {},
+                      {program.Number()}};
+  EXPECT_THAT(RunLauncher(launch).errors,
+              StrEq("secpolicy-run: cannot execute descriptor " + program.Text() +
+                    " in the domain testDom: Permission denied\n"));
 }
 
 void WriteScript(const std::string& path, const std::string& interpreter) {

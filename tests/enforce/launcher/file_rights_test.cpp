@@ -87,6 +87,7 @@ std::string Answer(const Try& tried, std::uint64_t missing) {
 TEST_P(FileRights, AreRefusedAndGiven) {
   const Try& tried = GetParam();
   if (!CanBe(tried.user)) GTEST_SKIP() << "only root can start somebody as root";
+  if (Lacks()) GTEST_SKIP() << Lacks();
   if ((tried.way.missing & ~AllRights()) != 0) {
     GTEST_SKIP() << "version " << Enforce::Kernel::LandlockVersion()
                  << " of Landlock has no such right";

@@ -1,9 +1,12 @@
 #include "launch.h"
 
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <linux/audit.h>
 #include <linux/seccomp.h>
+#include <sched.h>
 #include <sys/mman.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -12,6 +15,7 @@
 #include <array>
 #include <cerrno>
 #include <cstddef>
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <stdexcept>
@@ -102,6 +106,28 @@ bool Become(User user) {
   if (user == User::kRoot || geteuid() != 0) return true;
   return setresgid(kNobody, kNobody, kNobody) == 0 && syscall(SYS_setgroups, 0, nullptr) == 0 &&
          setresuid(kNobody, kNobody, kNobody) == 0;
+}
+
+const char* Lacks() {
+  if (Enforce::Kernel::LandlockVersion() == 0) return "this kernel has no Landlock";
+  if (!Enforce::Kernel::KnowsAnswer(SECCOMP_RET_ERRNO)) return "this kernel has no seccomp";
+  return nullptr;
+}
+
+void InOwnMounts(const std::function<void()>& act) {
+  std::fflush(stdout);
+  const pid_t child = fork();
+  Check(child >= 0, "fork");
+  if (child == 0) {
+    EXPECT_EQ(unshare(CLONE_NEWNS), 0);
+    EXPECT_EQ(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), 0);
+    act();
+    std::fflush(stdout);
+    _exit(testing::Test::HasFailure() ? 1 : 0);
+  }
+  int status = -1;
+  Check(waitpid(child, &status, 0) == child, "waitpid");
+  EXPECT_EQ(status, 0) << "see above";
 }
 
 std::string NameOf(User user) { return user == User::kRoot ? "AsRoot" : "AsNobody"; }

@@ -14,11 +14,18 @@ enum class User { kRoot, kNobody };
 // True when this process can start others as the user. Nobody may also be who runs the tests.
 bool CanBe(User user);
 
+// What this kernel lacks for any of these tests, for people; nullptr when it has all.
+const char* Lacks();
+
 // Makes this process the user's; false when that fails.
 bool Become(User user);
 
 // For the names of tests.
 std::string NameOf(User user);
+
+// Acts in a child process with mounts of its own, which only root can make. A failure there is one
+// here.
+void InOwnMounts(const std::function<void()>& act);
 
 // A tree below which a test plays, the same at each making, all of it the user's:
 //   open/file, open/directory, kept/file, kept/directory, kept/program (a probe)

@@ -3,6 +3,7 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -24,6 +25,7 @@ class Masks : public testing::TestWithParam<User> {
  protected:
   void SetUp() override {
     if (!CanBe(user)) GTEST_SKIP() << "only root can start somebody as root";
+    if (Lacks()) GTEST_SKIP() << Lacks();
     if (Enforce::ProbeFeatures().mounts == Enforce::Namespace::kNone) {
       GTEST_SKIP() << "this system gives nobody a mount namespace";
     }
@@ -146,14 +148,47 @@ TEST_P(Masks, ReachTheWorkingDirectory) {
                     ": No such file or directory\n"));
 }
 
+std::string Mounts() {
+  std::ifstream file("/proc/self/mountinfo");
+  return {std::istreambuf_iterator<char>(file), {}};
+}
+
 TEST_P(Masks, AreSeenByNobodyElse) {
-  const auto mounts = [] {
-    std::ifstream file("/proc/self/mountinfo");
-    return std::string{std::istreambuf_iterator<char>(file), {}};
-  };
-  const std::string before = mounts();
+  const std::string before = Mounts();
   EXPECT_THAT(AnswerUnder({{tree / "kept", MaskKind::kHidden}}, "list=@/open"), StrEq("ok"));
-  EXPECT_THAT(mounts(), StrEq(before));
+  EXPECT_THAT(Mounts(), StrEq(before));
+}
+
+TEST(MasksOfRoot, AreNotShared) {
+  if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root may mount";
+  if (Lacks()) GTEST_SKIP() << Lacks();
+  const Tree tree(User::kRoot);
+  InOwnMounts([&] {
+    const char* const path = tree.Path().c_str();
+    ASSERT_EQ(mount(path, path, nullptr, MS_BIND, nullptr), 0);
+    ASSERT_EQ(mount(nullptr, path, nullptr, MS_SHARED, nullptr), 0);
+    const std::string before = Mounts();
+    ASSERT_THAT(before, testing::HasSubstr(tree.Path()));
+    Enforce::Plan plan = PlanOf(tree);
+    plan.masks = {{tree / "kept", MaskKind::kNoExec}};
+    EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, "run=@/kept/program"), StrEq("EACCES"));
+    EXPECT_THAT(Mounts(), StrEq(before));
+  });
+}
+
+TEST(MasksOfRoot, ReachWhatIsMountedBeneath) {
+  if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root may mount";
+  if (Lacks()) GTEST_SKIP() << Lacks();
+  const Tree tree(User::kRoot);
+  InOwnMounts([&] {
+    const std::string directory = tree / "kept/directory";
+    ASSERT_EQ(mount("none", directory.c_str(), "tmpfs", 0, nullptr), 0);
+    std::filesystem::copy_file(tree / "kept/program", directory + "/program");
+    Enforce::Plan plan = PlanOf(tree);
+    EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, "run=@/kept/directory/program"), StrEq("ok"));
+    plan.masks = {{tree / "kept", MaskKind::kNoExec}};
+    EXPECT_THAT(AnswerOf(User::kRoot, tree, plan, "run=@/kept/directory/program"), StrEq("EACCES"));
+  });
 }
 
 TEST_P(Masks, LeaveTheUserAsItIs) {

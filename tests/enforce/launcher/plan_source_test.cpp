@@ -24,6 +24,7 @@ class PlanSource : public testing::TestWithParam<User> {
  protected:
   void SetUp() override {
     if (!CanBe(user)) GTEST_SKIP() << "only root can start somebody as root";
+    if (Lacks()) GTEST_SKIP() << Lacks();
   }
 
   Outcome RunWith(const std::string& source, const std::vector<int>& descriptors = {}) const {
@@ -119,6 +120,9 @@ TEST_P(PlanSource, IsWhole) {
   ExpectRefused(runWith(flipped), message("it is damaged"));
   ExpectRefused(runWith(std::string(Enforce::kMostPlanBytes + 1, 's')), message("it is no plan"));
   ExpectStarted(runWith(bytes));
+  Enforce::Plan plan = PlanOf(tree);
+  plan.mark = std::string(300'000, 'm');
+  ExpectStarted(runWith(Enforce::Serialize(plan)));
 }
 
 TEST_P(PlanSource, IsOfFilesThatAreThere) {

@@ -5,6 +5,7 @@
 #include <fcntl.h>
 #include <linux/capability.h>
 #include <linux/fs.h>
+#include <netinet/in.h>
 #include <sched.h>
 #include <signal.h>
 #include <sys/capability.h>
@@ -78,7 +79,17 @@ long BindUnix(const Words& words) {
               sizeof(address));
 }
 
-// Sends itself through a socket with an abstract name.
+template <typename Action>
+long WithPort(const Words& words, Action act) {
+  sockaddr_in address = {};
+  address.sin_family = AF_INET;
+  address.sin_port = htons(static_cast<std::uint16_t>(words.Number()));
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  return act(socket(AF_INET, SOCK_STREAM, 0), reinterpret_cast<const sockaddr*>(&address),
+             socklen_t{sizeof(address)});
+}
+
+// To a socket with an abstract name.
 long ConnectAbstract(const Words& words) {
   sockaddr_un address = AddressOf({"-" + words.first, ""});
   address.sun_path[0] = '\0';
@@ -245,6 +256,8 @@ const NamedOperation kOperations[] = {
     {"mknod-block", [](const Words& w) -> long { return mknod(w.First(), S_IFBLK | 0600, 0x700); }},
     {"bind-unix", BindUnix},
     {"connect-abstract", ConnectAbstract},
+    {"bind-tcp", [](const Words& w) -> long { return WithPort(w, bind); }},
+    {"connect-tcp", [](const Words& w) -> long { return WithPort(w, connect); }},
     {"unlink", [](const Words& w) -> long { return unlink(w.First()); }},
     {"rmdir", [](const Words& w) -> long { return rmdir(w.First()); }},
     {"rename", [](const Words& w) -> long { return rename(w.First(), w.Second()); }},
@@ -277,7 +290,7 @@ const NamedOperation kOperations[] = {
     {"has-capability", HasCapability},
     {"has-bounding", IsBounding},
     {"is-superuser", IsSuperuser},
-    {"clear-securebits", [](const Words&) -> long { return prctl(PR_SET_SECUREBITS, 0, 0, 0, 0); }},
+    {"flip-securebit", [](const Words& w) -> long { return prctl(PR_SET_SECUREBITS, prctl(PR_GET_SECUREBITS) ^ 1 << w.Number(), 0, 0, 0); }},
     {"keep-capabilities", [](const Words&) -> long { return prctl(PR_SET_KEEPCAPS, 1, 0, 0, 0); }},
     {"variable", [](const Words& w) -> long { errno = ENOENT; return std::getenv(w.First()) == nullptr ? -1 : 0; }},
     {"call", [](const Words& w) -> long { return syscall(w.Number(), 0, 0, 0, 0, 0, 0); }},
