@@ -29,7 +29,8 @@ Kernel::Capabilities Get() {
 
 template <typename Action>
 void ForEach(std::uint64_t set, Action act) {
-  for (int number = 0; number <= Kernel::LastCapability(); ++number) {
+  const int last = Kernel::LastCapability();
+  for (int number = 0; number <= last; ++number) {
     if (Kernel::HasCapability(set, number)) act(static_cast<unsigned long>(number));
   }
 }
