@@ -1,0 +1,128 @@
+// What a domain costs: makes plans for the launcher, and is itself the program that runs in one.
+//
+//   enforce_bench plan FILE DIRECTORY RULES reads|writes    a plan with so many rules about paths
+//   enforce_bench compile COUNT DIRECTORY RULES             makes such a plan so often, and prints
+//   the
+//                                                           processor time of one in microseconds
+//   enforce_bench open COUNT FILE                           opens and closes the file so often
+//   enforce_bench call COUNT                                makes the cheapest system call so often
+
+#include <fcntl.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <ctime>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/enforce/compile.h"
+#include "host/enforce/plan_file.h"
+#include "host/enforce/real_file_tree.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+using Enforce::LabelledPath;
+using Policy::Rule;
+using Policy::RuleKind;
+
+[[noreturn]] void Fail(const char* what) {
+  std::perror(what);
+  std::exit(1);
+}
+
+Rule Granting(RuleKind kind, const char* word) {
+  return {.kind = kind, .words = {word}, .verdict = true};
+}
+
+Rule Path(const std::string& path, const char* letters) {
+  return {
+      .kind = RuleKind::kFilePath, .words = {path}, .verdict = Policy::Permissions::Parse(letters)};
+}
+
+// The directories that rules are about are made where they are missing.
+Policy::InstalledDomain DomainWith(const fs::path& directory, int rules, bool writes) {
+  Policy::InstalledDomain domain;
+  domain.name = "benchDom";
+  for (const char* set : {"@start", "@file", "@io", "@network", "@process", "@signal"}) {
+    domain.rules.push_back(Granting(RuleKind::kSyscall, set));
+  }
+  domain.rules.push_back(Granting(RuleKind::kCapability, "cap_kill"));
+  for (int port = 0; port < 32; ++port) {
+    Rule rule = Granting(RuleKind::kParameterCheck, "bind_port");
+    rule.words[1] = std::to_string(8000 + port);
+    domain.rules.push_back(std::move(rule));
+  }
+  domain.rules.push_back(Path("/", "rx"));
+  for (int number = 0; number < rules; ++number) {
+    const fs::path path = directory / std::to_string(number);
+    fs::create_directories(path);
+    domain.rules.push_back(Path(path, writes ? "rwx" : "rx"));
+  }
+  return domain;
+}
+
+Enforce::CompiledPlan Compile(const Policy::InstalledDomain& domain,
+                              const std::vector<LabelledPath>& places) {
+  const Enforce::Features features = Enforce::ProbeFeatures();
+  Enforce::RealFileTree files;
+  return Enforce::Compile(domain, {.features = features, .places = places, .files = files});
+}
+
+void WritePlan(const char* file, const fs::path& directory, int rules, bool writes) {
+  const std::string bytes =
+      Enforce::Serialize(Compile(DomainWith(directory, rules, writes), {}).plan);
+  std::ofstream(file, std::ios::binary) << bytes;
+  fs::permissions(file, fs::perms(0644));
+}
+
+double ProcessorMicroseconds() {
+  timespec time{};
+  clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &time);
+  return static_cast<double>(time.tv_sec) * 1e6 + static_cast<double>(time.tv_nsec) / 1e3;
+}
+
+void TimeCompile(int count, const fs::path& directory, int rules) {
+  const Policy::InstalledDomain domain = DomainWith(directory, rules, false);
+  const std::vector<LabelledPath> places = {{"/", "label"}};
+  Compile(domain, places);
+  const double begin = ProcessorMicroseconds();
+  for (int turn = 0; turn < count; ++turn) Compile(domain, places);
+  std::printf("%.1f\n", (ProcessorMicroseconds() - begin) / count);
+}
+
+void OpenOften(int count, const char* path) {
+  for (int turn = 0; turn < count; ++turn) {
+    const int file = open(path, O_RDONLY | O_CLOEXEC);
+    if (file < 0) Fail(path);
+    close(file);
+  }
+}
+
+void CallOften(int count) {
+  for (int turn = 0; turn < count; ++turn) syscall(SYS_getppid);
+}
+
+}  // namespace
+
+int main(int count, char** words) {
+  const std::string_view verb = count > 1 ? words[1] : "";
+  if (verb == "plan" && count == 6) {
+    WritePlan(words[2], words[3], std::atoi(words[4]), std::string_view(words[5]) == "writes");
+  } else if (verb == "compile" && count == 5) {
+    TimeCompile(std::atoi(words[2]), words[3], std::atoi(words[4]));
+  } else if (verb == "open" && count == 4) {
+    OpenOften(std::atoi(words[2]), words[3]);
+  } else if (verb == "call" && count == 3) {
+    CallOften(std::atoi(words[2]));
+  } else {
+    std::fprintf(stderr, "enforce_bench: the head of its source says how it is used\n");
+    return 2;
+  }
+  return 0;
+}
