@@ -134,7 +134,7 @@ not_confined() {
   local rules
   rules=$(grep -c '^-' "$policy/domains/monitorDom")
   [[ $(grep -cE '^(enforced|narrowed): /etc/zorvan/secpolicy/domains/monitorDom:[0-9]+: -' <<<"$output") -eq $rules ]]
-  shows "enforced: /etc/zorvan/secpolicy/domains/monitorDom:$(grep -n -- '-s @start' "$policy/domains/monitorDom" | cut -d : -f 1): -s @start grant"
+  shows "enforced: /etc/zorvan/secpolicy/domains/monitorDom:$(grep -n -- '-s @file' "$policy/domains/monitorDom" | cut -d : -f 1): -s @file grant"
   secpolicy features --for monitorDom --format json
   exits 0
   fits_schema features

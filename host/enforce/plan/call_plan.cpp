@@ -121,18 +121,7 @@ ValueSet FamiliesPastPorts() {
 
 // ---- io_uring
 
-constexpr const char* kRingSetup[] = {"io_uring_enter", "io_uring_register", "io_uring_setup"};
-
-// What a ring does for a process without a call of its own.
-constexpr const char* kRingCalls[] = {
-    "accept4",   "bind",       "close",      "connect",         "epoll_ctl", "epoll_wait",
-    "fadvise64", "fallocate",  "fgetxattr",  "fsetxattr",       "fsync",     "ftruncate",
-    "futex",     "getsockopt", "getxattr",   "ioctl",           "linkat",    "listen",
-    "madvise",   "mkdirat",    "openat",     "openat2",         "pipe2",     "poll",
-    "preadv2",   "pwritev2",   "read",       "recvfrom",        "recvmsg",   "renameat2",
-    "sendmsg",   "sendto",     "setsockopt", "setxattr",        "shutdown",  "socket",
-    "splice",    "statx",      "symlinkat",  "sync_file_range", "tee",       "unlinkat",
-    "waitid",    "write"};
+constexpr const char* kRingCalls[] = {"io_uring_enter", "io_uring_register", "io_uring_setup"};
 
 // ---- Conditions
 
@@ -222,6 +211,7 @@ class CallPlanner {
   CallPlan Plan() {
     CloseDangerousValues();
     CloseNamedSockets();
+    CloseLimits();
     CloseClone();
     CloseSignalsByDescriptors();
     CloseGroups();
@@ -370,8 +360,8 @@ class CallPlanner {
     if (!IsGrantedByItself("socket_family", AF_UNIX)) {
       const char* const reason =
           "unix sockets are refused unless socket_family grants 1, as they reach whoever listens";
-      Tell("socket", reason);
-      Demand("socket", {Among(0, Single(AF_UNIX).Complement())});
+      Close("socket", {Among(0, Single(AF_UNIX).Complement())}, reason);
+      CloseDatagramPairs();
       return;
     }
     for (const Rule* const rule : checks.at("socket_family").rules) {
@@ -380,6 +370,25 @@ class CallPlanner {
                         "beside connect or sending, a unix socket reaches whoever listens: this "
                         "kernel has no rules for that");
     }
+  }
+
+  // Of a pair, sockets for datagrams still send to any address and can be connected anew. Those
+  // that are raw are the same to the kernel.
+  void CloseDatagramPairs() {
+    Close("socketpair", {Among(1, SetOf({SOCK_STREAM, SOCK_SEQPACKET}), kSocketTypes)},
+          "pairs that are neither SOCK_STREAM nor SOCK_SEQPACKET are refused unless socket_family "
+          "grants 1, as they reach whoever listens");
+  }
+
+  // A limit of processor time that is over ends a process, as a signal would.
+  void CloseLimits() {
+    constexpr unsigned int kProcess = 0;
+    constexpr unsigned int kNewLimit = 2;
+    for (const Half half : {Half::kLower, Half::kUpper}) {
+      Demand("prlimit64", {Among(kProcess, Single(0)),
+                           {.argument = kNewLimit, .half = half, .values = {{0, 0}}}});
+    }
+    Tell("prlimit64", "the limits of other processes are not changed");
   }
 
   void CloseClone() {
@@ -463,22 +472,11 @@ class CallPlanner {
     Close("sendto", {NoneOf(3, MSG_FASTOPEN)}, reason);
   }
 
+  // A ring opens sockets and sends without a call, also those that conditions are about.
   void CloseRings() {
-    const std::string reason = ReasonAgainstRings();
-    if (reason.empty()) return;
-    for (const char* const call : kRingSetup) Withdraw(call, Answer::kRefused, reason);
-  }
-
-  std::string ReasonAgainstRings() {
-    const bool hasChecks = std::ranges::any_of(
-        domain.rules, [](const Rule& rule) { return rule.kind == RuleKind::kParameterCheck; });
-    if (hasChecks) return "refused beside parameter checks, as a ring passes them by";
     for (const char* const call : kRingCalls) {
-      if (NumberOf(call) && FindGranted(call) == nullptr) {
-        return StrCat("refused, as a ring does without asking what is not granted: ", call);
-      }
+      Withdraw(call, Answer::kRefused, "refused, as no filter sees what a ring does");
     }
-    return {};
   }
 
   // ---- The end
