@@ -24,6 +24,10 @@ using Policy::RuleKind;
 // emptied.
 constexpr int kNeededLandlock = 3;
 
+constexpr char kWithoutLandlock[] =
+    "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)";
+constexpr char kWithoutSeccomp[] = "this kernel filters no system calls";
+
 // The fates of one plan, which are in the order of the domain's rules.
 class FateList {
  public:
@@ -41,16 +45,9 @@ bool IsAboutFiles(RuleKind kind) {
          kind == RuleKind::kFileCreation || kind == RuleKind::kUnixSocketCreation;
 }
 
-RuleFate WithoutLandlock(RuleFate fate) {
-  fate.fate = Fate::kNotExpressible;
-  fate.how = "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)";
-  return fate;
-}
-
-RuleFate WithoutSeccomp(RuleFate fate) {
-  fate.fate = Fate::kNotExpressible;
-  fate.how = "this kernel filters no system calls";
-  return fate;
+void GiveUp(RuleFate* fate, const char* reason) {
+  fate->fate = Fate::kNotExpressible;
+  fate->how = reason;
 }
 
 // Landlock lets signals through to what was started in the same entry alone.
@@ -109,6 +106,9 @@ CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surround
   plan.filter = std::move(calls.program);
   plan.secret = calls.secret;
 
+  if (!hasLandlock) compiled.gaps.emplace_back(kWithoutLandlock);
+  if (!features.seccomp) compiled.gaps.emplace_back(kWithoutSeccomp);
+
   FateList pathFates(std::move(paths.fates));
   FateList callFates(std::move(calls.fates));
   FateList capabilityFates(std::move(capabilities.fates));
@@ -126,8 +126,8 @@ CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surround
     }
     const bool isAboutCalls =
         rule.kind == RuleKind::kSyscall || rule.kind == RuleKind::kParameterCheck;
-    if (IsAboutFiles(rule.kind) && !hasLandlock) fate = WithoutLandlock(std::move(fate));
-    if (isAboutCalls && !features.seccomp) fate = WithoutSeccomp(std::move(fate));
+    if (IsAboutFiles(rule.kind) && !hasLandlock) GiveUp(&fate, kWithoutLandlock);
+    if (isAboutCalls && !features.seccomp) GiveUp(&fate, kWithoutSeccomp);
     if (rule.kind == RuleKind::kSyscall && plan.isScoped) fate = WithScope(std::move(fate));
     compiled.fates.push_back(std::move(fate));
   }
@@ -139,6 +139,10 @@ std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
   std::ranges::copy_if(fates, std::back_inserter(lost),
                        [](const RuleFate& fate) { return fate.fate == Fate::kNotExpressible; });
   return lost;
+}
+
+bool KeepsAllRules(const CompiledPlan& compiled) {
+  return compiled.gaps.empty() && NotExpressible(compiled.fates).empty();
 }
 
 std::string Explain(const InstalledDomain& domain, const Surroundings& surroundings) {

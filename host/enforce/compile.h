@@ -20,16 +20,20 @@ struct Surroundings {
 
 struct CompiledPlan {
   Plan plan;
-  std::vector<RuleFate> fates;  // of all rules of the domain, in order
+  std::vector<RuleFate> fates;    // of all rules of the domain, in order
+  std::vector<std::string> gaps;  // why what no rule is about cannot be refused; none, as a rule
 };
 
 // The plan that confines a process to the domain by the means of this kernel. What these cannot
-// refuse is told in the fates; it is for the caller to say whether a domain is entered then. Throws
-// BraxoException for a rule whose words are no range.
+// refuse is told in the fates and gaps; it is for the caller to say whether a domain is entered
+// then. Throws BraxoException for a rule whose words are no range.
 CompiledPlan Compile(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
 
 // The rules of a domain that cannot be kept to.
 std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates);
+
+// True where the domain can do no more than its rules say.
+bool KeepsAllRules(const CompiledPlan& compiled);
 
 // The same plan for people: what the kernel is told, and what becomes of the rules.
 std::string Explain(const Policy::InstalledDomain& domain, const Surroundings& surroundings);

@@ -107,6 +107,40 @@ not_confined() {
   [[ $output == started && $stderr == "notExpressible: "* ]]
 }
 
+# without_landlock WORD...: what the kernel says to the command if it has no Landlock.
+without_landlock() {
+  run --separate-stderr python3 - "$@" <<'END'
+import ctypes, os, struct, sys
+
+class Program(ctypes.Structure):
+    _fields_ = [("length", ctypes.c_ushort), ("instructions", ctypes.c_char_p)]
+
+LANDLOCK_CREATE_RULESET, ENOSYS = 444, 38
+filter = b"".join(struct.pack("HBBI", *instruction) for instruction in [
+    (0x20, 0, 0, 0), (0x15, 0, 1, LANDLOCK_CREATE_RULESET), (0x06, 0, 0, 0x50000 | ENOSYS),
+    (0x06, 0, 0, 0x7fff0000)])
+PR_SET_SECCOMP, PR_SET_NO_NEW_PRIVS = 22, 38
+prctl = ctypes.CDLL(None).prctl
+assert prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0
+assert prctl(PR_SET_SECCOMP, 2, ctypes.byref(Program(4, filter))) == 0
+os.execv(sys.argv[1], sys.argv[1:])
+END
+}
+
+@test "a kernel without Landlock confines no domain, also one that has no rule about files" {
+  boot
+  printf '%s\n' '-s @start grant' '-s @file grant' '-s @io grant' >"$policy/domains/appDom"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  without_landlock "$SECPOLICY" --root "$root" run appDom -- /bin/cat /etc/services.conf
+  not_confined run
+  says "notExpressible: files and calls beyond the rules (this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can))"
+  without_landlock "$SECPOLICY" --root "$root" features --for appDom
+  exits 1
+  without_landlock "$SECPOLICY" --root "$root" run appDom --best-effort -- /bin/cat /etc/services.conf
+  exits 0
+  [[ $output == *sshd* ]]
+}
+
 @test "exec enters the domain that the label leads to" {
   boot
   secpolicy exec -- /usr/lib/io-filters/cache </dev/null

@@ -88,6 +88,14 @@ TEST(Compile, TellsWhatAKernelWithoutLandlockCannotRefuse) {
   }
 }
 
+TEST(Compile, TellsWhatCannotBeRefusedAlsoWhereNoRuleIsAboutIt) {
+  EXPECT_THAT(CompileOn(NewKernel(), {"-s read grant"}).gaps, IsEmpty());
+  EXPECT_THAT(CompileOn(Features{}, {}).gaps,
+              ElementsAre("this kernel's Landlock cannot refuse what no rule grants (version 3 or "
+                          "newer can)",
+                          "this kernel filters no system calls"));
+}
+
 TEST(Compile, GivesNoRightThatTheKernelDoesNotKnow) {
   for (int version = 3; version <= 7; ++version) {
     Features features = NewKernel();

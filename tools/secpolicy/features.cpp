@@ -64,9 +64,10 @@ ExitCode ShowFates(const std::string& domain, const std::string& format) {
                       {"rules", FatesToJson(compiled.fates)}}
                      .Text();
   } else {
+    for (const auto& gap : compiled.gaps) std::cout << GapText(gap) << '\n';
     for (const auto& fate : compiled.fates) std::cout << Visible(FateText(fate)) << '\n';
   }
-  return NotExpressible(compiled.fates).empty() ? kWell : kFailed;
+  return KeepsAllRules(compiled) ? kWell : kFailed;
 }
 
 Action Define(Syntax& syntax) {

@@ -91,6 +91,11 @@ std::string FateText(const RuleFate& fate) {
   return fate.how.empty() ? text : text + " (" + fate.how + ")";
 }
 
+std::string GapText(const std::string& gap) {
+  return std::string(TextOf(Fate::kNotExpressible)) + ": files and calls beyond the rules (" + gap +
+         ")";
+}
+
 Json FatesToJson(const std::vector<RuleFate>& fates) {
   Json list = Json::Array();
   for (const RuleFate& fate : fates) {

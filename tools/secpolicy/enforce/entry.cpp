@@ -5,28 +5,22 @@
 #include "domain_plan.h"
 #include "host/linux/operation/world_entry.h"
 #include "launcher.h"
-#include "text/format.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
 
-// What cannot be refused is only of interest where something is to be refused.
-std::vector<Enforce::RuleFate> Surrendered(const Enforce::CompiledPlan& compiled) {
-  if (compiled.plan.level != Policy::Level::kEnforcing) return {};
-  return NotExpressible(compiled.fates);
-}
-
-// Tells what this kernel cannot refuse; true where it is given up for.
+// Tells what this kernel cannot refuse, which is only of interest where something is to be refused;
+// true where it is given up for.
 bool MaySurrender(const std::string& verb, const Enforce::CompiledPlan& compiled,
                   const EntryOptions& options) {
-  const std::vector<Enforce::RuleFate> surrendered = Surrendered(compiled);
-  for (const Enforce::RuleFate& fate : surrendered) {
+  if (compiled.plan.level != Policy::Level::kEnforcing || KeepsAllRules(compiled)) return true;
+  for (const std::string& gap : compiled.gaps) std::cerr << GapText(gap) << '\n';
+  for (const Enforce::RuleFate& fate : NotExpressible(compiled.fates)) {
     std::cerr << Visible(FateText(fate)) << '\n';
   }
-  if (surrendered.empty() || options.bestEffort) return true;
-  std::cerr << "secpolicy: " << verb << ": " << CountOf(surrendered.size(), "rule") << " of "
-            << compiled.plan.domain
+  if (options.bestEffort) return true;
+  std::cerr << "secpolicy: " << verb << ": the rules of " << compiled.plan.domain
             << " cannot be kept to, so nothing was started; change them, or give --best-effort"
             << std::endl;
   return false;
