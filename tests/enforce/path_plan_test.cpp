@@ -189,6 +189,19 @@ TEST(PlanPaths, MakesWhatTheLabelOfADirectoryGrants) {
                                     Landlock::kMakeFifo | Landlock::kMakeReg | Landlock::kRefer}));
 }
 
+TEST(PlanPaths, TellsThatNoNewLabelIsGiven) {
+  MemoryTree files = Files({"/spool"}, {});
+  const PathPlan plan =
+      PlanPaths(Domain({RuleOf(RuleKind::kFileCreation, {"spool", "mail", "regular"}),
+                        RuleOf(RuleKind::kFileCreation, {"spool", "spool", "fifo"}),
+                        RuleOf(RuleKind::kFileCreation, {"spool", "mail", "symlink"}, false)}),
+                {{"/spool", "spool"}}, files);
+  EXPECT_EQ(HowOf(plan, 0),
+            "narrowed: what is made has the label of its directory, as the kernel gives none");
+  EXPECT_EQ(HowOf(plan, 1), "enforced");
+  EXPECT_EQ(HowOf(plan, 2), "enforced");
+}
+
 TEST(PlanPaths, MakesNoDeviceByAPath) {
   MemoryTree files = Files({"/dev"}, {});
   const PathPlan plan = PlanPaths(

@@ -454,7 +454,16 @@ class Planner {
     for (const Loss& loss : LossesOf(rule)) {
       if ((loss.rights & granted) != 0 && loss.fate > fate.fate) fate = {rule, loss.fate, loss.how};
     }
+    if (GivesNewLabel(rule)) {
+      fate.fate = std::max(fate.fate, Fate::kNarrowed);
+      fate.how += fate.how.empty() ? "" : "; ";
+      fate.how += "what is made has the label of its directory, as the kernel gives none";
+    }
     return fate;
+  }
+
+  static bool GivesNewLabel(const Rule& rule) {
+    return rule.kind == RuleKind::kFileCreation && rule.Grants() && rule.words[0] != rule.words[1];
   }
 
   std::vector<RuleFate> Fates() const {
