@@ -207,3 +207,28 @@ END
   not_confined exec
   [[ $stderr == *"the domain of this process is not known"* ]]
 }
+
+@test "exec starts the very program that it asked about" {
+  boot
+  # Another by the same name, which PATH has later; the first is passed over, as it cannot be executed.
+  printf '%s\n' '#!/bin/sh' 'echo another' 'echo more >>/etc/services.conf' >"$root/bin/cache"
+  chmod +x "$root/bin/cache"
+  chmod -x "$root/usr/lib/io-filters/cache"
+  PATH=/usr/lib/io-filters:$PATH secpolicy exec -- cache
+  exits 0
+  # It is started in the domain of its own label, which may write there.
+  [[ $output == another && $(tail -n 1 "$root/etc/services.conf") == more ]]
+}
+
+@test "exec finds programs by names, paths and from the working directory" {
+  boot
+  secpolicy exec -- ls
+  exits 0
+  secpolicy exec -- bin/ls
+  exits 0
+  secpolicy exec -- /bin/ls
+  exits 0
+  secpolicy exec -- nothing
+  exits 126
+  [[ $stderr == "secpolicy: exec: there is no program 'nothing' in PATH; nothing was started" ]]
+}

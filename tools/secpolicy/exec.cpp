@@ -18,8 +18,8 @@ struct Options {
 };
 
 ExitCode Exec(const Options& options) {
-  const auto domain = [&](auto& access) { return DomainByExec(options.command.front(), access); };
-  return EnterDomain("exec", domain, options.command, options.entry);
+  const auto entry = [&](auto& access) { return EntryByExec(options.command, access); };
+  return EnterDomain("exec", entry, options.entry);
 }
 
 Action Define(Syntax& syntax) {

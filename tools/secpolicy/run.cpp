@@ -30,8 +30,8 @@ ExitCode Explain(const std::string& domain) {
 ExitCode Run(const Options& options) {
   if (options.explain) return Explain(options.domain);
   if (options.command.empty()) throw QuestionError("CMD is required, behind --");
-  const auto domain = [&](auto& /*access*/) { return options.domain; };
-  return EnterDomain("run", domain, options.command, options.entry);
+  const auto entry = [&](auto& /*access*/) { return Entry{options.domain, options.command}; };
+  return EnterDomain("run", entry, options.entry);
 }
 
 Action Define(Syntax& syntax) {

@@ -33,17 +33,17 @@ void AddEntryOptions(Syntax& syntax, EntryOptions& options) {
                  "Start it although this kernel cannot refuse all that the rules do");
 }
 
-ExitCode EnterDomain(
-    const std::string& verb,
-    const std::function<std::string(SecPolicy::TeskAccessInterfaceImpl&)>& findDomain,
-    const std::vector<std::string>& command, const EntryOptions& options) {
+ExitCode EnterDomain(const std::string& verb,
+                     const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
+                     const EntryOptions& options) {
   try {
     SecPolicy::TeskAccessInterfaceImpl access;
-    const Enforce::CompiledPlan compiled = PlanOf(findDomain(access), access);
+    const Entry entry = find(access);
+    const Enforce::CompiledPlan compiled = PlanOf(entry.domain, access);
     if (!MaySurrender(verb, compiled, options)) return kNotConfined;
     LinuxHost::EnterWorld(compiled.plan.domainId);
     std::cerr << std::flush;
-    StartConfined(compiled.plan, command);
+    StartConfined(compiled.plan, entry.command);
   } catch (const Braxo::Lib::BraxoException& failure) {
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
               << std::endl;

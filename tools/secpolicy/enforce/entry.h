@@ -17,11 +17,16 @@ struct EntryOptions {
 // Adds --best-effort to `syntax`.
 void AddEntryOptions(Syntax& syntax, EntryOptions& options);
 
-// Becomes the program `command` in the domain that `findDomain` names. Returns only where it was
-// not started, with what to end with; why has been told then.
-ExitCode EnterDomain(
-    const std::string& verb,
-    const std::function<std::string(SecPolicy::TeskAccessInterfaceImpl&)>& findDomain,
-    const std::vector<std::string>& command, const EntryOptions& options);
+// What is to be started, and the name of the domain that it is started in.
+struct Entry {
+  std::string domain;
+  std::vector<std::string> command;
+};
+
+// Becomes the program of the entry that `find` finds. Returns only where it was not started, with
+// what to end with; why has been told then.
+ExitCode EnterDomain(const std::string& verb,
+                     const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
+                     const EntryOptions& options);
 
 }  // namespace SecPolicyCli

@@ -1,9 +1,12 @@
 #include "transition.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
 #include <string_view>
+#include <system_error>
 
 #include "host/linux/operation/world_entry.h"
 #include "installed/installed_policy.h"
@@ -17,19 +20,31 @@ using Braxo::Lib::BraxoException;
 using Policy::Rule;
 using Policy::RuleKind;
 
-// As a shell finds it; the name itself where it does not.
+bool IsProgram(const std::filesystem::path& path) {
+  std::error_code error;
+  return std::filesystem::is_regular_file(path, error) && access(path.c_str(), X_OK) == 0;
+}
+
+// As a shell finds it.
 std::string Find(const std::string& program) {
-  if (program.find('/') != std::string::npos) return std::filesystem::absolute(program);
+  if (program.find('/') != std::string::npos) return program;
   const char* const variable = std::getenv("PATH");
-  std::string_view path = variable == nullptr ? "/usr/bin:/bin" : variable;
+  std::string_view path = variable == nullptr ? "/bin:/usr/bin" : variable;
   while (!path.empty()) {
     const std::string_view directory = path.substr(0, path.find(':'));
     path.remove_prefix(std::min(directory.size() + 1, path.size()));
-    const std::filesystem::path candidate = std::filesystem::path(directory) / program;
-    std::error_code error;
-    if (std::filesystem::is_regular_file(candidate, error)) return candidate;
+    const std::filesystem::path candidate =
+        std::filesystem::path(directory.empty() ? "." : directory) / program;
+    if (IsProgram(candidate)) return candidate;
   }
   throw BraxoException("there is no program '" + program + "' in PATH");
+}
+
+std::string Absolute(const std::string& path) {
+  std::error_code error;
+  const auto absolute = std::filesystem::absolute(path, error);
+  if (!error) return absolute;
+  throw BraxoException("cannot tell where " + path + " is: " + error.message());
 }
 
 Policy::InstalledDomain CallersDomain(SecPolicy::TeskAccessInterfaceImpl& access) {
@@ -38,11 +53,10 @@ Policy::InstalledDomain CallersDomain(SecPolicy::TeskAccessInterfaceImpl& access
   return std::move(*domain);
 }
 
-}  // namespace
-
+// By its absolute path.
 std::string DomainByExec(const std::string& program, SecPolicy::TeskAccessInterfaceImpl& access) {
   const Policy::InstalledDomain caller = CallersDomain(access);
-  const Question question = ReadQuestion({"exec", Find(program)}, access);
+  const Question question = ReadQuestion({"exec", program}, access);
   const auto& file = std::get<Policy::FileQuestion>(question.asked);
   const Policy::Decision decision = Decide(file, caller);
   if (!decision.IsAllowed()) {
@@ -55,6 +69,13 @@ std::string DomainByExec(const std::string& program, SecPolicy::TeskAccessInterf
     }
   }
   return caller.name;
+}
+
+}  // namespace
+
+Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access) {
+  command.front() = Find(command.front());
+  return {DomainByExec(Absolute(command.front()), access), command};
 }
 
 }  // namespace SecPolicyCli

@@ -1,13 +1,17 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
+#include "enforce/entry.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
 
-// The name of the domain that this process enters by executing `program`, a path or a name that is
-// looked for in PATH. Throws Braxo::Lib::BraxoException when its own domain may not execute it.
-std::string DomainByExec(const std::string& program, SecPolicy::TeskAccessInterfaceImpl& access);
+// The domain that this process enters by executing `command`, and the command by the path that this
+// was judged by: its first word is a path or a name that is looked for in PATH. Throws
+// Braxo::Lib::BraxoException when there is no such program, and when its own domain may not execute
+// it.
+Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access);
 
 }  // namespace SecPolicyCli
