@@ -5,16 +5,22 @@
 #include <fcntl.h>
 #include <linux/capability.h>
 #include <linux/fs.h>
+#include <linux/io_uring.h>
+#include <linux/sched.h>
 #include <netinet/in.h>
+#include <netinet/tcp.h>
 #include <sched.h>
 #include <signal.h>
 #include <sys/capability.h>
+#include <sys/fsuid.h>
 #include <sys/mman.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
+#include <sys/ptrace.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
+#include <sys/uio.h>
 #include <sys/un.h>
 #include <sys/wait.h>
 #include <sys/xattr.h>
@@ -36,6 +42,8 @@ struct Words {
   const char* First() const { return first.c_str(); }
   const char* Second() const { return second.c_str(); }
   int Number() const { return std::atoi(first.c_str()); }
+  unsigned long FirstBits() const { return std::strtoul(first.c_str(), nullptr, 0); }
+  unsigned long SecondBits() const { return std::strtoul(second.c_str(), nullptr, 0); }
 };
 
 // Every operation returns a negative number, with errno, when it fails.
@@ -80,6 +88,18 @@ long BindUnix(const Words& words) {
 }
 
 template <typename Action>
+long WithUnix(int type, const Words& words, Action act) {
+  const int socketHere = socket(AF_UNIX, type, 0);
+  if (socketHere < 0) return -1;
+  const sockaddr_un address = AddressOf(words);
+  return act(socketHere, reinterpret_cast<const sockaddr*>(&address), socklen_t{sizeof(address)});
+}
+
+long SendByte(int socketHere, const sockaddr* address, socklen_t size) {
+  return sendto(socketHere, "x", 1, 0, address, size);
+}
+
+template <typename Action>
 long WithPort(const Words& words, Action act) {
   sockaddr_in address = {};
   address.sin_family = AF_INET;
@@ -97,6 +117,38 @@ long ConnectAbstract(const Words& words) {
       static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + 1 + words.first.size());
   return connect(socket(AF_UNIX, SOCK_STREAM, 0), reinterpret_cast<const sockaddr*>(&address),
                  size);
+}
+
+// ---- The internet
+
+long SendFast(const Words& words) {
+  return WithPort(words, [](int socketHere, const sockaddr* address, socklen_t size) -> long {
+    return sendto(socketHere, "x", 1, MSG_FASTOPEN, address, size);
+  });
+}
+
+long SendMessageFast(const Words& words) {
+  return WithPort(words, [](int socketHere, const sockaddr* address, socklen_t size) -> long {
+    char byte = 'x';
+    iovec part = {&byte, 1};
+    msghdr message = {};
+    message.msg_name = const_cast<sockaddr*>(address);
+    message.msg_namelen = size;
+    message.msg_iov = &part;
+    message.msg_iovlen = 1;
+    return sendmsg(socketHere, &message, MSG_FASTOPEN);
+  });
+}
+
+// With the option that lets connect wait for the first data.
+long ConnectFast(const Words& words) {
+  return WithPort(words, [](int socketHere, const sockaddr* address, socklen_t size) -> long {
+    const int one = 1;
+    const bool isConnected =
+        setsockopt(socketHere, IPPROTO_TCP, TCP_FASTOPEN_CONNECT, &one, sizeof(one)) == 0 &&
+        connect(socketHere, address, size) == 0;
+    return isConnected ? write(socketHere, "x", 1) : -1;
+  });
 }
 
 // What the child ended with is its errno.
@@ -161,6 +213,36 @@ long OpenByHandle(const Words& words) {
   return open_by_handle_at(open(words.Second(), O_RDONLY | O_DIRECTORY), handle, O_RDONLY);
 }
 
+// ---- Mounts
+
+int CloneTree(const char* path) {
+  return open_tree(AT_FDCWD, path, OPEN_TREE_CLONE | AT_RECURSIVE);
+}
+
+long MoveMount(const Words& words) {
+  const int tree = CloneTree(words.First());
+  if (tree < 0) return -1;
+  return move_mount(tree, "", AT_FDCWD, words.Second(), MOVE_MOUNT_F_EMPTY_PATH);
+}
+
+long SetMountAttributes(const Words& words) {
+  mount_attr changes = {};
+  changes.attr_clr = MOUNT_ATTR_RDONLY;
+  return mount_setattr(AT_FDCWD, words.First(), 0, &changes, sizeof(changes));
+}
+
+// In a tree of mounts that is nowhere.
+long ReadInClonedTree(const Words& words) {
+  const int tree = CloneTree(words.First());
+  return tree < 0 ? -1 : openat(tree, words.Second(), O_RDONLY);
+}
+
+long EnterMountsOf(const Words& words) {
+  const std::string path = "/proc/" + words.first + "/ns/mnt";
+  const int mounts = open(path.c_str(), O_RDONLY);
+  return mounts < 0 ? -1 : setns(mounts, CLONE_NEWNS);
+}
+
 long EnterOwnMounts(const Words&) {
   return setns(open("/proc/self/ns/mnt", O_RDONLY), CLONE_NEWNS);
 }
@@ -221,6 +303,69 @@ long IsBounding(const Words& words) {
   return prctl(PR_CAPBSET_READ, words.Number(), 0, 0, 0) == 1 ? 0 : -1;
 }
 
+// ---- Other processes, and copies of this one
+
+long Clone(const Words& words) {
+  const long child = syscall(SYS_clone, words.FirstBits() | SIGCHLD, 0, 0, 0, 0);
+  if (child == 0) _exit(0);
+  return child;
+}
+
+long CloneByStruct(const Words& words) {
+  clone_args how = {};
+  how.flags = words.FirstBits();
+  how.exit_signal = SIGCHLD;
+  const long child = syscall(SYS_clone3, &how, sizeof(how));
+  if (child == 0) _exit(0);
+  return child;
+}
+
+long Trace(const Words& words) { return ptrace(PTRACE_SEIZE, words.Number(), nullptr, nullptr); }
+
+// Memory that is not there may be asked for.
+long ReadMemory(const Words& words) {
+  char byte = 0;
+  const iovec here = {&byte, 1};
+  const iovec there = {reinterpret_cast<void*>(1), 1};
+  const ssize_t size = process_vm_readv(words.Number(), &here, 1, &there, 1, 0);
+  return size < 0 && errno == EFAULT ? 0 : size;
+}
+
+long SetUserForFiles(const Words& words) {
+  setfsuid(static_cast<uid_t>(words.Number()));
+  errno = EPERM;
+  return setfsuid(static_cast<uid_t>(-1)) == words.Number() ? 0 : -1;
+}
+
+long MapExecutable(const Words& words) {
+  const int file = open(words.First(), O_RDONLY);
+  if (file < 0) return -1;
+  return mmap(nullptr, 1, PROT_READ | PROT_EXEC, MAP_PRIVATE, file, 0) == MAP_FAILED ? -1 : 0;
+}
+
+// By the loader, which is told where the library of C lies.
+long RunByLoader(const Words& words) {
+  std::fflush(stdout);
+  const pid_t child = fork();
+  if (child != 0) return Wait(child);
+  execl(words.First(), words.First(), "--library-path", "/t/public", words.Second(), nullptr);
+  _exit(errno);
+}
+
+long SetUpRing(const Words&) {
+  io_uring_params parameters = {};
+  return syscall(SYS_io_uring_setup, 1, &parameters);
+}
+
+// Ten seconds at most.
+long WaitFor(const Words& words) {
+  for (int tries = 0; tries < 1000; ++tries) {
+    if (access(words.First(), F_OK) == 0) return 0;
+    usleep(10'000);
+  }
+  return -1;
+}
+
 long CallOldTable(const Words&) {
 #ifdef __x86_64__
   long result = 20;  // getpid
@@ -243,6 +388,7 @@ const NamedOperation kOperations[] = {
     {"read", Read},
     {"write", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY)); }},
     {"open-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY | O_TRUNC)); }},
+    {"read-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_RDONLY | O_TRUNC)); }},
     {"truncate", [](const Words& w) -> long { return truncate(w.First(), 0); }},
     {"ftruncate", Truncate},
     {"create", [](const Words& w) -> long { return Close(open(w.First(), O_CREAT | O_EXCL | O_WRONLY, 0600)); }},
@@ -255,7 +401,16 @@ const NamedOperation kOperations[] = {
     {"mknod-character", [](const Words& w) -> long { return mknod(w.First(), S_IFCHR | 0600, 0x103); }},
     {"mknod-block", [](const Words& w) -> long { return mknod(w.First(), S_IFBLK | 0600, 0x700); }},
     {"bind-unix", BindUnix},
+    {"bind-unix-datagram", [](const Words& w) -> long { return WithUnix(SOCK_DGRAM, w, bind); }},
     {"connect-abstract", ConnectAbstract},
+    {"connect-unix", [](const Words& w) -> long { return WithUnix(SOCK_STREAM, w, connect); }},
+    {"send-unix", [](const Words& w) -> long { return WithUnix(SOCK_DGRAM, w, SendByte); }},
+    {"socket", [](const Words& w) -> long { return syscall(SYS_socket, w.FirstBits(), w.SecondBits(), 0); }},
+    {"socket-mptcp", [](const Words&) -> long { return socket(AF_INET, SOCK_STREAM, IPPROTO_MPTCP); }},
+    {"connect-fast", ConnectFast},
+    {"send-fast", SendFast},
+    {"send-message-fast", SendMessageFast},
+    {"listen-unbound", [](const Words&) -> long { return listen(socket(AF_INET, SOCK_STREAM, 0), 1); }},
     {"bind-tcp", [](const Words& w) -> long { return WithPort(w, bind); }},
     {"connect-tcp", [](const Words& w) -> long { return WithPort(w, connect); }},
     {"unlink", [](const Words& w) -> long { return unlink(w.First()); }},
@@ -278,6 +433,25 @@ const NamedOperation kOperations[] = {
     {"unmount", [](const Words& w) -> long { return umount2(w.First(), MNT_DETACH); }},
     {"remount", [](const Words& w) -> long { return mount(nullptr, w.First(), nullptr, MS_REMOUNT | MS_BIND, nullptr); }},
     {"bind-mount", [](const Words& w) -> long { return mount(w.First(), w.Second(), nullptr, MS_BIND, nullptr); }},
+    {"move-mount", MoveMount},
+    {"set-mount", SetMountAttributes},
+    {"read-in-clone", ReadInClonedTree},
+    {"setns-of", EnterMountsOf},
+    {"clone", Clone},
+    {"clone3", CloneByStruct},
+    {"unshare", [](const Words& w) -> long { return unshare(static_cast<int>(w.FirstBits())); }},
+    {"map-executable", MapExecutable},
+    {"run-by-loader", RunByLoader},
+    {"set-up-ring", SetUpRing},
+    {"trace", Trace},
+    {"read-memory", ReadMemory},
+    {"wait-for", WaitFor},
+    {"ioctl", [](const Words& w) -> long { return syscall(SYS_ioctl, STDIN_FILENO, w.FirstBits(), "x"); }},
+    {"prctl", [](const Words& w) -> long { return syscall(SYS_prctl, w.FirstBits(), w.SecondBits(), 0, 0, 0); }},
+    {"getppid", [](const Words&) -> long { return syscall(SYS_getppid); }},
+    {"getpgid", [](const Words&) -> long { return getpgid(0); }},
+    {"setfsuid", SetUserForFiles},
+    {"setgroups", [](const Words&) -> long { return syscall(SYS_setgroups, 0, nullptr); }},
     {"is-open", [](const Words& w) -> long { return fcntl(w.Number(), F_GETFD); }},
     {"kill", [](const Words& w) -> long { return kill(w.Number(), 0); }},
     {"tgkill", [](const Words& w) -> long { return tgkill(w.Number(), w.Number(), 0); }},

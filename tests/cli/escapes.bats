@@ -1,0 +1,775 @@
+# Ways out of a domain, by the commands as they are typed: hunts for one that is open. Each is tried in
+# narrowDom, which has to refuse it, and beside it in wideDom, whose rules grant it, or in openDom, which
+# refuses nothing: there the same act has to work. Numbers that are left out stand in docs/enforcement.md.
+#
+# ESCAPE_AS is the number of an ordinary user whose programs try it, when root starts this.
+
+load helper
+
+# ---- A root, and domains in it
+
+# Where an ordinary user can reach them.
+setup_file() {
+  export programs=$BATS_FILE_TMPDIR/programs
+  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
+  mkdir "$programs"
+  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$PROBE" "$PRELOADED" "$programs"
+  [[ -z $ESCAPE_AS || $(id -u) -eq 0 ]] || skip "only root can become another user"
+}
+
+setup() {
+  is_machine=
+  before=()
+  options=()
+  namespace=(unshare --mount)
+  [[ $(id -u) -eq 0 ]] || namespace+=(--map-current-user --keep-caps)
+  as=()
+  [[ -z $ESCAPE_AS ]] || as=(setpriv --reuid "$ESCAPE_AS" --regid "$ESCAPE_AS" --clear-groups)
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/etc/zorvan/secpolicy
+  victims=()
+  mkdir -p "$policy"/{objects,domains/plugins,fileLabels,early/domains} "$root"/{tardisks,proc,run,usr,programs,t/{public,secret}/directory}
+  chmod 755 "$BATS_TEST_TMPDIR"
+  ln -s usr/bin usr/lib usr/lib64 "$root"
+  cp "$PROBE" "$root/probe"
+  for place in public secret; do
+    echo content >"$root/t/$place/file"
+    cp "$PROBE" "$root/t/$place/program"
+  done
+  printf '%s\n' public secret >"$policy/objects/all"
+  printf '/t/%s/* %s\n' public public secret secret >"$policy/fileLabels/all"
+  for name in globalVMDom ioFilterDom appDom daemonFrameworkDom; do : >"$policy/domains/$name"; done
+  echo '-s @start grant' >"$policy/domains/hostDom"
+  domain openDom
+}
+
+teardown() {
+  local process
+  for process in "${victims[@]}"; do kill -KILL "$process" 2>/dev/null || true; done
+}
+
+# A domain that cannot start the probe says nothing.
+start=('-r /probe rx' '-r /proc r' '-s @start grant')
+# So that it is not for its call that an act upon a file is refused.
+calls=('-s @file grant' '-s @io grant' '-s @process grant' '-s @memory grant' '-s @signal grant')
+
+# domain NAME RULE...: a domain with these rules besides what the probe needs.
+domain() {
+  printf '%s\n' "${start[@]}" "${@:2}" >"$policy/domains/$1"
+}
+
+# boot_as: boots the root, all of which is whose programs try it.
+boot_as() {
+  [[ -z $ESCAPE_AS ]] || chown -R "$ESCAPE_AS:$ESCAPE_AS" "$root"
+  secpolicy boot
+  exits 0
+  secpolicy settings enforcement openDom permissive
+  exits 0
+  secpolicy restore
+  exits 0
+}
+
+# inside COMMAND...: with the processes of the machine below the root, for the command alone.
+inside() {
+  # shellcheck disable=SC2016
+  "${before[@]}" "${namespace[@]}" sh -c 'mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}" "$@"
+}
+
+# on_machine COMMAND...: where the root is that of a machine, with the programs of this one.
+on_machine() {
+  # shellcheck disable=SC2016
+  "${namespace[@]}" sh -ec '
+    mount --rbind "$0" "$0"
+    mount --rbind /proc "$0/proc"
+    mount --rbind /usr "$0/usr"
+    mount --bind "$programs" "$0/programs"
+    cd "$0"
+    pivot_root . .
+    umount -l .
+    exec "$@"' "$root" "${as[@]}" "$@"
+}
+
+secpolicy() {
+  if [[ $is_machine ]]; then
+    run --separate-stderr on_machine /programs/secpolicy "$@"
+  else
+    run --separate-stderr inside "$programs/secpolicy" --root "$root" "$@"
+  fi
+}
+
+# ---- What becomes of an operation of the probe
+
+# tries DOMAIN OPERATION...: the answers are in $output, a line each.
+tries() {
+  secpolicy run "$1" "${options[@]}" -- /probe "${@:2}"
+}
+
+# gets DOMAIN ERRORS OPERATION...: each ends with one of the errors, such as "EACCES|EXDEV".
+gets() {
+  local operation answers=
+  tries "$1" "${@:3}"
+  for operation in "${@:3}"; do answers+="$operation ($2)"$'\n'; done
+  # A terminal has ends of lines of its own.
+  [[ $status -eq 0 && ${output//$'\r'}$'\n' =~ ^$answers$ ]] && return
+  printf 'in %s not %s:\n%s\n%s\n' "$1" "$2" "$output" "$stderr"
+  return 1
+}
+
+# refuses ERRORS OPERATION...: narrowDom does, and wideDom does not.
+refuses() {
+  gets narrowDom "$@" && gets wideDom ok "${@:2}"
+}
+
+# only WHO: what others cannot do anyhow is nothing to refuse them.
+only() {
+  [[ $1 == root && -z $ESCAPE_AS && $(id -u) -eq 0 ]] || skip "only root could do it outside"
+}
+
+# in_background COMMAND...: $process runs until the test ends; its output is in $told.
+in_background() {
+  told=$BATS_TEST_TMPDIR/told.${#victims[@]}
+  "$@" >"$told" 2>&1 3>&- &
+  process=$!
+  victims+=("$process")
+}
+
+# a_victim: $process is one of who tries it, in no domain.
+a_victim() {
+  in_background "${as[@]}" sleep 60
+  until_true '[[ $(tr "\0" " " <"/proc/$process/cmdline") == "sleep 60 " ]]'
+}
+
+# ---- Files
+
+@test "1 reading what has a label that is not granted" {
+  domain narrowDom "${calls[@]}" '-a public read grant'
+  domain wideDom "${calls[@]}" '-a public read grant' '-a secret read grant'
+  boot_as
+  refuses EACCES read=/t/secret/file
+  gets narrowDom ok read=/t/public/file
+}
+
+@test "2 writing to what may only be read" {
+  domain narrowDom "${calls[@]}" '-r /t r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses EACCES write=/t/secret/file
+  gets narrowDom ok read=/t/secret/file
+}
+
+@test "3 emptying what may only be read" {
+  domain narrowDom "${calls[@]}" '-r /t r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
+}
+
+@test "3 emptying what may be written but not truncated" {
+  domain narrowDom "${calls[@]}" '-a secret read grant' '-a secret write grant'
+  domain wideDom "${calls[@]}" '-a secret read grant' '-a secret write grant' '-a secret truncate grant'
+  boot_as
+  refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
+  gets narrowDom ok write=/t/secret/file
+}
+
+@test "4 making a file where nothing may be written" {
+  domain narrowDom "${calls[@]}" '-r /t r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses EACCES create=/t/secret/new link-nameless=/t/secret,/t/secret/linked
+}
+
+@test "4 linking a file without a name from where files may be made" {
+  domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses "EACCES|EXDEV" link-nameless=/t/public,/t/secret/linked
+  gets narrowDom ok link-nameless=/t/public,/t/public/linked
+}
+
+# makes_only KIND OPERATION...: who may make one kind makes it, and none of the others.
+makes_only() {
+  local kind=$1 operation
+  shift
+  gets "$kind" ok "$1=/t/public/new_$kind" || return
+  for operation in mknod-file mkdir symlink mkfifo mknod-socket mknod-character mknod-block; do
+    [[ $operation == "$1" ]] || gets "$kind" "EACCES|EPERM" "$operation=/t/public/$operation" || return
+  done
+}
+
+@test "5 making another kind of file than is granted" {
+  local kind devices=()
+  [[ -n $ESCAPE_AS ]] || devices=(char_device block_device)
+  for kind in regular directory symlink fifo "${devices[@]}"; do
+    domain "$kind" "${calls[@]}" "-f public public $kind grant" '-c cap_mknod grant'
+  done
+  domain stream "${calls[@]}" '-u public stream grant' '-p socket_type 1 grant'
+  boot_as
+  makes_only regular mknod-file
+  makes_only directory mkdir
+  makes_only symlink symlink
+  makes_only fifo mkfifo
+  makes_only stream mknod-socket
+  [[ -n $ESCAPE_AS ]] || makes_only char_device mknod-character
+  [[ -n $ESCAPE_AS ]] || makes_only block_device mknod-block
+}
+
+@test "6 removing an entry of a directory that may only be read" {
+  domain narrowDom "${calls[@]}" '-r /t rw' '-r /t/secret r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses EACCES unlink=/t/secret/file rmdir=/t/secret/directory
+}
+
+@test "6 removing the directory itself" {
+  domain narrowDom "${calls[@]}" '-r /t rw' '-r /t/secret/directory r'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses "EACCES|EXDEV" rmdir=/t/secret/directory rename=/t/secret,/t/other
+}
+
+@test "7 moving or linking a file to where it may be read" {
+  domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret w'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses "EACCES|EXDEV" link=/t/secret/file,/t/public/linked rename=/t/secret/file,/t/public/moved
+}
+
+@test "8 exchanging a file with one that may be read" {
+  domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret w'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  refuses "EACCES|EXDEV" exchange=/t/public/file,/t/secret/file exchange=/t/secret/file,/t/public/file
+}
+
+@test "9 listing" {
+  domain narrowDom "${calls[@]}" '-a secret read grant'
+  domain wideDom "${calls[@]}" '-a secret read grant' '-a secret list grant'
+  boot_as
+  refuses EACCES list=/t/secret list=/t/secret/directory
+}
+
+@test "10 by the links of processes" {
+  domain narrowDom "${calls[@]}" '-r /t/public r'
+  domain wideDom "${calls[@]}" '-r /t r'
+  boot_as
+  refuses EACCES read=/proc/self/root/t/secret/file read=/proc/thread-self/cwd/t/secret/file
+  gets narrowDom ok read=/proc/self/root/t/public/file
+  in_background "${as[@]}" sh -c 'cd "$0/t/secret" && exec sleep 60 7<file' "$root"
+  until_true '[[ $(readlink "/proc/$process/fd/7") == */t/secret/file ]]'
+  # A user namespace would keep it from processes outside.
+  is_machine=yes
+  gets openDom ok "read=/proc/$process/cwd/file" "read=/proc/$process/root$root/t/secret/file" "read=/proc/$process/fd/7"
+  gets narrowDom EACCES "read=/proc/$process/cwd/file" "read=/proc/$process/root$root/t/secret/file" "read=/proc/$process/fd/7"
+}
+
+@test "11 a link in place of a file while the domain is entered" {
+  domain narrowDom "${calls[@]}" '-r /t/public/data r'
+  domain wideDom "${calls[@]}" '-r /t r'
+  boot_as
+  echo content >"$root/t/data"
+  ln -s /t/secret/file "$root/t/link"
+  cp "$root/t/data" "$root/t/public/data"
+  # shellcheck disable=SC2016
+  in_background sh -c 'cd "$0/t" && while :; do cp -P link public/new; mv public/new public/data; ln -f data public/data; done' "$root"
+  local _
+  for _ in {1..20}; do
+    tries narrowDom read=/t/secret/file read=/t/public/data
+    [[ $output != *"read=/t/secret/file ok"* ]]
+  done
+  kill "$process"
+  wait "$process" || true
+  ln -sfn /t/secret/file "$root/t/public/data"
+  refuses EACCES read=/t/public/data
+}
+
+@test "12 by the directory above" {
+  domain narrowDom "${calls[@]}" '-r /t/public r'
+  domain wideDom "${calls[@]}" '-r /t r'
+  boot_as
+  refuses EACCES read=/t/public/../secret/file read=/t/public/directory/../../secret/file list=/t/public/..
+}
+
+@test "13 all that may be done above a narrower part" {
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
+  domain wideDom "${calls[@]}" '-r /t rwx'
+  boot_as
+  refuses "EACCES" run=/t/secret/program map-executable=/t/secret/program write=/t/secret/file read=/t/secret/file list=/t/secret create=/t/secret/new
+  gets narrowDom ok run=/t/public/program map-executable=/t/public/program write=/t/public/file list=/t/public
+}
+
+mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_mount grant' '-s mount_setattr grant')
+
+@test "14 mounts over and around a narrower part" {
+  only root
+  local part=('-r /t rwx' '-r /t/secret' '-c cap_sys_admin grant')
+  domain narrowDom "${calls[@]}" "${part[@]}"
+  domain wideDom "${calls[@]}" "${part[@]}" "${mounting[@]}"
+  boot_as
+  local acts=("bind-mount=/t/secret,/t/public" "move-mount=/t/secret,/t/public" remount=/proc unmount=/proc)
+  # With its calls as well nothing is mounted. Where nothing is refused all of it works.
+  gets narrowDom EPERM set-mount=/proc "${acts[@]}"
+  gets wideDom EPERM "${acts[@]}"
+  gets openDom ok set-mount=/proc "${acts[@]}"
+}
+
+@test "15 mounting in a user namespace of its own" {
+  local part=('-r /t rwx' '-r /t/secret' '-s unshare grant')
+  domain narrowDom "${calls[@]}" "${part[@]}"
+  domain wideDom "${calls[@]}" "${part[@]}" "${mounting[@]}" '-p clone_flags 0x10020000 grant'
+  boot_as
+  # Below a root that is not the machine's nobody is given a user namespace.
+  is_machine=yes
+  tries narrowDom unshare-user
+  answers 0 'unshare-user EPERM'
+  tries wideDom unshare-user bind-mount=/t/secret,/t/public read=/t/secret/file
+  answers 0 'unshare-user ok' 'bind-mount=/t/secret,/t/public EPERM' 'read=/t/secret/file EACCES'
+  tries openDom unshare-user bind-mount=/t/secret,/t/public read=/t/public/file
+  answers 0 'unshare-user ok' 'bind-mount=/t/secret,/t/public ok' 'read=/t/public/file ok'
+}
+
+@test "16 entering a namespace of others" {
+  only root
+  local can=('-c cap_sys_admin grant' '-c cap_sys_chroot grant')
+  domain narrowDom "${calls[@]}" "${can[@]}"
+  domain wideDom "${calls[@]}" "${can[@]}" '-s setns grant'
+  boot_as
+  refuses EPERM setns
+  a_victim
+  gets narrowDom "EPERM|EACCES" "setns-of=$process"
+  gets wideDom "EACCES" "setns-of=$process"
+  tries openDom "setns-of=$process" read=/etc/passwd
+  answers 0 "setns-of=$process ok" 'read=/etc/passwd ok'
+  # Whose mounts it enters, its rules stay.
+  tries wideDom setns read=/etc/passwd "read=$root/t/secret/file"
+  answers 0 'setns ok' 'read=/etc/passwd EACCES' "read=$root/t/secret/file EACCES"
+}
+
+@test "17 opening by a handle" {
+  only root
+  local can=('-c cap_dac_read_search grant' '-r /t/public r' '-s name_to_handle_at grant')
+  domain narrowDom "${calls[@]}" "${can[@]}"
+  domain wideDom "${calls[@]}" "${can[@]}" '-s open_by_handle_at grant'
+  boot_as
+  refuses EPERM open-by-handle=/t/public/file,/t/public
+  gets wideDom EACCES open-by-handle=/t/secret/file,/t/public
+  gets openDom ok open-by-handle=/t/secret/file,/t/public
+}
+
+@test "18 inherited descriptors" {
+  domain narrowDom "${calls[@]}"
+  boot_as
+  exec 7<"$root/t/secret/file" 18<"$root"
+  gets narrowDom EBADF is-open=7 is-open=18
+  gets openDom ok is-open=7 is-open=18
+  exec 7<&- 18<&-
+  # Nor is one left of what the command and the launcher use.
+  gets narrowDom EBADF is-open={3..24}
+}
+
+@test "20 modes, owners, times and labels" {
+  domain narrowDom "${calls[@]}" '-r /t rwx'
+  domain wideDom "${calls[@]}" '-r /t rwx' '-s @attributes grant' '-c cap_sys_admin grant'
+  boot_as
+  local label=user.zorvan.security
+  [[ -n $ESCAPE_AS ]] || label=security.bpf.zorvan
+  refuses EPERM chmod=/t/secret/file chown=/t/secret/file utime=/t/secret/file "setxattr=/t/secret/file,$label"
+}
+
+# ---- System calls
+
+@test "21 calls that no rule grants, or one revokes" {
+  domain narrowDom '-s getppid revoke'
+  domain wideDom '-s getpgid grant'
+  boot_as
+  refuses EPERM getppid getpgid
+}
+
+@test "22 by the numbers of another table" {
+  [[ $(uname -m) == x86_64 ]] || skip "only x86_64 has other tables"
+  domain narrowDom "${calls[@]}"
+  boot_as
+  local operation bad_call=159
+  for operation in call-int80 call-x32; do
+    tries narrowDom "$operation"
+    exits "$bad_call"
+    [[ -z $output ]]
+    # Whether a kernel has these tables is its own affair.
+    tries openDom "$operation"
+    [[ $status -ne $bad_call ]]
+  done
+}
+
+@test "23 numbers that no call has, or that nobody can look into" {
+  domain narrowDom "${calls[@]}" '-s clone3 grant'
+  boot_as
+  gets narrowDom ENOSYS call=9999 call=4294967295 clone3=0
+  gets openDom ok clone3=0
+}
+
+@test "24 families with high bits" {
+  domain narrowDom '-s socket grant' '-p socket_family 2 grant'
+  boot_as
+  gets narrowDom EPERM socket=0x100000010,3 socket=0x10,3
+  gets narrowDom ok socket=0x100000002,1 socket=2,1
+  gets openDom ok socket=0x100000010,3 socket=0x10,3
+}
+
+@test "25 types with flags and high bits" {
+  domain narrowDom '-s socket grant' '-p socket_type 1 grant'
+  boot_as
+  gets narrowDom EPERM socket=2,2 socket=2,0x80002 socket=2,0x800 socket=2,0x100000002
+  gets narrowDom ok socket=2,1 socket=2,0x80001 socket=2,0x80801
+  gets openDom ok socket=2,2 socket=2,0x80002 socket=2,0x100000002
+}
+
+# ---- Networks
+
+# a_server KIND NAME: a server of another that says where it listens: $at, a port or NAME.
+a_server() {
+  in_background python3 -uc '
+import socket, sys, time
+kind, name = sys.argv[1:]
+families = {"tcp": (socket.AF_INET, socket.SOCK_STREAM), "stream": (socket.AF_UNIX, socket.SOCK_STREAM),
+            "datagram": (socket.AF_UNIX, socket.SOCK_DGRAM)}
+server = socket.socket(*families[kind])
+server.bind(("127.0.0.1", 0) if kind == "tcp" else name.replace("@", "\0"))
+if kind != "datagram": server.listen(64)
+print(server.getsockname()[1] if kind == "tcp" else "ready")
+time.sleep(60)' "$@"
+  until_true '[[ -s $told ]]'
+  at=$(<"$told")
+}
+
+network=("${calls[@]}" '-s @network grant' '-p socket_family 2 grant')
+
+@test "26 MPTCP past the rules for ports" {
+  [[ $(cat /proc/sys/net/mptcp/enabled) == 1 ]] || skip "this kernel has no MPTCP"
+  domain narrowDom "${network[@]}" '-p connect_port 1 grant'
+  domain wideDom "${network[@]}"
+  boot_as
+  refuses EPERM socket-mptcp
+}
+
+@test "27 fast open past the rules for ports" {
+  a_server tcp any
+  domain narrowDom "${network[@]}" '-p connect_port 1 grant'
+  domain wideDom "${network[@]}"
+  boot_as
+  refuses "EACCES|EPERM" "connect-tcp=$at" "send-fast=$at" "send-message-fast=$at" "connect-fast=$at"
+}
+
+@test "28 other protocols, and listening without a port" {
+  domain narrowDom "${network[@]}" '-p connect_port 53 grant' '-p bind_port 53 grant'
+  domain wideDom "${network[@]}"
+  boot_as
+  refuses EPERM socket=2,2 listen-unbound
+}
+
+@test "29 another port, and port 0" {
+  a_server tcp any
+  domain narrowDom "${network[@]}" '-p connect_port 1 grant' '-p bind_port 7391 grant'
+  domain wideDom "${network[@]}" "-p connect_port $at grant" '-p bind_port 0 grant' '-p bind_port 7392 grant'
+  boot_as
+  refuses EACCES "connect-tcp=$at" bind-tcp=7392 bind-tcp=0
+  gets narrowDom ok bind-tcp=7391
+}
+
+# reaches NAME OPERATION: refused with and without a family of sockets; where that is not expressible
+# nothing starts.
+reaches() {
+  gets narrowDom EPERM "$1"
+  gets openDom ok "$1"
+  tries wideDom "$1"
+  exits 126
+  [[ -z $output && $stderr == *"notExpressible: "*" -p socket_family 1 grant ("* ]]
+  options=(--best-effort)
+  gets wideDom ok "$1"
+  options=()
+}
+
+@test "30 unix sockets of others that have a name" {
+  domain narrowDom "${calls[@]}" '-s @network grant' '-r /run r'
+  domain wideDom "${calls[@]}" '-s @network grant' '-r /run r' '-p socket_family 1 grant'
+  boot_as
+  # Outside of the root such a name would be too long.
+  cd "$root/run"
+  a_server stream stream
+  a_server datagram datagram
+  chmod 777 stream datagram
+  reaches connect-unix=/run/stream
+  reaches send-unix=/run/datagram
+}
+
+@test "31 abstract unix sockets of others" {
+  domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant'
+  boot_as
+  a_server stream "@secpolicy-$$"
+  gets openDom ok "connect-abstract=secpolicy-$$"
+  options=(--best-effort)
+  gets narrowDom EPERM "connect-abstract=secpolicy-$$"
+}
+
+@test "32 unix sockets elsewhere, or of another kind" {
+  domain narrowDom '-s socket grant' '-s bind grant' '-u public stream grant' '-p socket_type 1 grant'
+  domain wideDom '-s socket grant' '-s bind grant' '-r /t rw'
+  boot_as
+  refuses EACCES bind-unix=/t/secret/socket
+  refuses EPERM bind-unix-datagram=/t/public/datagram
+  gets narrowDom ok bind-unix=/t/public/socket
+}
+
+# ---- Terminals, processes, identities
+
+@test "33 typing into the terminal" {
+  domain narrowDom "${calls[@]}"
+  domain wideDom "${calls[@]}" '-p ioctl_request 0x5412 grant' '-p ioctl_request 0x541c grant' '-c cap_sys_admin grant'
+  boot_as
+  before=(python3 -c 'import os, pty, sys; sys.exit(os.waitstatus_to_exitcode(pty.spawn(sys.argv[1:])))')
+  # TIOCSTI, and TIOCLINUX, which only consoles have. Without rights a kernel may refuse the first anyhow.
+  gets narrowDom EPERM ioctl=0x5412 ioctl=0x100005412 ioctl=0x541c ioctl=0x10000541c
+  tries wideDom ioctl=0x5412 ioctl=0x100005412
+  [[ $output =~ "ioctl=0x5412 "(ok${ESCAPE_AS:+|EIO})$'\r\n'.*"ioctl=0x100005412 "(ok${ESCAPE_AS:+|EIO}) ]]
+  gets wideDom ENOTTY ioctl=0x541c
+}
+
+@test "34 options of prctl" {
+  domain narrowDom "${calls[@]}" '-p prctl_option 15 grant'
+  domain wideDom "${calls[@]}"
+  boot_as
+  # PR_SET_DUMPABLE; then PR_SET_NAME, without a name.
+  refuses EPERM prctl=4,1 prctl=0x100000004,1
+  gets narrowDom EFAULT prctl=15,0
+}
+
+@test "34 PR_SET_MM" {
+  domain narrowDom "${calls[@]}"
+  domain wideDom "${calls[@]}" '-p prctl_option 35 grant'
+  boot_as
+  # PR_SET_MM_MAP_SIZE, which any user may ask for, without a place for the answer.
+  gets narrowDom EPERM prctl=35,15 prctl=0x100000023,15
+  gets wideDom EFAULT prctl=35,15 prctl=0x100000023,15
+}
+
+@test "35 namespaces by clone, unshare and clone3" {
+  domain narrowDom "${calls[@]}" '-s unshare grant' '-r /probe rx'
+  domain wideDom "${calls[@]}" '-s unshare grant' '-p clone_flags 0x10000000 grant' '-p clone_flags 0 grant'
+  boot_as
+  is_machine=yes
+  local user=0x10000000
+  tries narrowDom clone=$user unshare=$user clone3=$user clone=0
+  answers 0 "clone=$user EPERM" "unshare=$user EPERM" "clone3=$user ENOSYS" "clone=0 ok"
+  tries wideDom clone=$user unshare=$user clone3=$user
+  answers 0 "clone=$user ok" "unshare=$user ok" "clone3=$user ENOSYS"
+  tries openDom clone3=$user
+  answers 0 "clone3=$user ok"
+}
+
+@test "36 signals to others" {
+  domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant'
+  boot_as
+  a_victim
+  gets openDom ok "kill=$process" "tgkill=$process" "sigqueue=$process" "pidfd=$process"
+  options=(--best-effort)
+  gets narrowDom EPERM "kill=$process" "tgkill=$process" "sigqueue=$process" "pidfd=$process"
+  # It may be named as who is to be told, and is not.
+  tries narrowDom "input-signal=$process"
+  kill -0 "$process"
+  options=()
+  gets openDom ok "input-signal=$process"
+  until_true '! kill -0 "$process"'
+}
+
+@test "36 other signals than are granted" {
+  domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant' '-p kill_signal 15 grant'
+  boot_as
+  a_victim
+  options=(--best-effort)
+  gets narrowDom EPERM "kill=$process" "input-signal=$process"
+  kill -0 "$process"
+  options=()
+  gets openDom ok "kill=$process"
+}
+
+@test "37 other users" {
+  only root
+  local can=('-s @identity grant' '-c cap_setuid grant' '-c cap_setgid grant')
+  domain narrowDom "${calls[@]}" "${can[@]}" '-p set_uid 7 grant' '-p set_gid 7 grant'
+  domain wideDom "${calls[@]}" "${can[@]}"
+  boot_as
+  refuses EPERM setuid=8 setfsuid=8 setgroups
+  gets narrowDom ok setuid=7 setfsuid=7
+}
+
+@test "38 regaining capabilities" {
+  only root
+  domain narrowDom "${calls[@]}" '-s capset grant'
+  domain wideDom "${calls[@]}" '-s capset grant' '-c cap_dac_override grant'
+  boot_as
+  refuses EPERM has-capability=1 has-bounding=1 raise-capability=1 raise-ambient=1
+  gets narrowDom EPERM flip-securebit=0 flip-securebit=2 keep-capabilities
+  gets openDom ok flip-securebit=0
+  chmod 4755 "$root/probe"
+  tries narrowDom run=/probe,has-capability=1
+  shows "has-capability=1 EPERM"
+  tries wideDom run=/probe,has-capability=1
+  shows "has-capability=1 ok"
+}
+
+@test "39 the files of others without the capability to" {
+  only root
+  domain narrowDom "${calls[@]}" '-r /t r'
+  domain wideDom "${calls[@]}" '-r /t r' '-c cap_dac_override grant'
+  boot_as
+  chown 65534:65534 "$root/t/secret/file"
+  chmod 600 "$root/t/secret/file"
+  refuses EACCES read=/t/secret/file
+}
+
+# ---- Programs
+
+@test "40 a second program" {
+  local rules=('-s @file grant' '-s @io grant' '-s clone grant' '-s wait4 grant' '-s memfd_create grant' '-r /t rx')
+  domain narrowDom "${rules[@]}"
+  domain wideDom "${rules[@]}" '-s execve grant' '-s execveat grant'
+  boot_as
+  refuses EPERM run=/t/public/program run-by-secret=/t/public/program,{0,1,0xffffffffffffffff} run-by-descriptor=/t/public/program \
+    run-from-memory=/t/public/program
+}
+
+@test "40 a program from memory" {
+  domain narrowDom "${calls[@]}" '-r /t/public r'
+  domain wideDom "${calls[@]}" '-r /t/public r' '-s memfd_create grant'
+  boot_as
+  refuses EPERM run-from-memory=/t/public/program
+}
+
+@test "41 by the loader, and by a script" {
+  cp "$(ldd /bin/true | sed -n 's/.*=> \(.*libc\.so\.6\) .*/\1/p')" "$root/t/public"
+  cp "$(ldd /bin/true | sed -n 's/^[[:blank:]]*\(\/.*ld-linux[^ ]*\) .*/\1/p')" "$root/t/public/loader"
+  cp /bin/true "$root/t/secret/true"
+  printf '#!/t/public/program\n' >"$root/t/public/script"
+  printf '#!/t/secret/program\n' >"$root/t/public/other"
+  chmod +x "$root"/t/public/{script,other}
+  domain narrowDom "${calls[@]}" '-r /t r' '-r /t/public/script rx' '-r /t/public/other rx' '-r /t/public/program rx'
+  domain wideDom "${calls[@]}" '-r /t rx'
+  domain loaderDom "${calls[@]}" '-r /t r' '-r /t/public/loader rx'
+  boot_as
+  refuses EACCES run-by-loader=/t/public/loader,/t/secret/true run=/t/secret/program
+  gets narrowDom EACCES run=/t/public/other
+  tries wideDom run=/t/public/other
+  shows "run=/t/public/other ok"
+  tries narrowDom run=/t/public/script
+  shows "run=/t/public/script ok"
+  # Reading is enough for a loader that may be executed.
+  tries loaderDom run-by-loader=/t/public/loader,/t/secret/true run=/t/secret/true
+  answers 0 "run-by-loader=/t/public/loader,/t/secret/true ok" "run=/t/secret/true EACCES"
+}
+
+@test "42 executing what enters another domain" {
+  local rules=('-r /t rx' '-f secret secret regular revoke')
+  domain narrowDom "${calls[@]}" "${rules[@]}" '-d secret openDom exec grant'
+  domain wideDom "${calls[@]}" "${rules[@]}"
+  boot_as
+  refuses EACCES run=/t/secret/program read=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program
+  gets narrowDom ok run=/t/public/program
+}
+
+# ---- What others hold
+
+@test "44 the memory of others" {
+  domain narrowDom "${calls[@]}" '-s ptrace grant' '-s process_vm_readv grant' '-c cap_sys_ptrace grant'
+  boot_as
+  a_victim
+  is_machine=yes
+  gets openDom ok "trace=$process" "read-memory=$process" "read=/proc/$process/environ" "write=/proc/$process/mem"
+  gets narrowDom "EPERM|EACCES" "trace=$process" "read-memory=$process" "read=/proc/$process/environ" "write=/proc/$process/mem"
+}
+
+@test "45 rings, beside a check" {
+  domain narrowDom "${calls[@]}" '-s io_uring_setup grant' '-p socket_family 2 grant'
+  boot_as
+  gets narrowDom EPERM set-up-ring
+  gets openDom ok set-up-ring
+}
+
+@test "46 a plan that others may have changed" {
+  local plan=$BATS_TEST_TMPDIR/plan kind
+  start_by() {
+    run --separate-stderr "${as[@]}" "$programs/secpolicy-run" --plan "$plan" -- /bin/echo started
+  }
+  cp "$SOURCE/fuzz/corpus/plan_file/disabled" "$plan"
+  chmod 644 "$plan"
+  start_by
+  answers 0 started
+  refuses_plan() {
+    start_by
+    exits 126 && [[ -z $output && $stderr == "secpolicy-run: "*"plan $plan"* ]]
+  }
+  chmod 666 "$plan"
+  refuses_plan
+  mv "$plan" "$plan.own"
+  chmod 644 "$plan.own"
+  ln -s "$plan.own" "$plan"
+  refuses_plan
+  for kind in truncated flipped_bit; do
+    rm "$plan"
+    cp "$SOURCE/fuzz/corpus/plan_file/$kind" "$plan"
+    chmod 644 "$plan"
+    refuses_plan
+  done
+  [[ $(id -u) -eq 0 ]] || return 0
+  mv -f "$plan.own" "$plan"
+  chown 7 "$plan"
+  refuses_plan
+}
+
+@test "49 a level that changes while a program runs" {
+  domain narrowDom "${calls[@]}" '-s @clock grant' '-r /t/public r'
+  boot_as
+  in_background inside "$programs/secpolicy" --root "$root" run narrowDom -- /probe getpgid wait-for=/t/public/go read=/t/secret/file
+  until_true '[[ $(<"$told") == "getpgid ok" ]]'
+  secpolicy settings enforcement narrowDom permissive
+  secpolicy restore
+  exits 0
+  touch "$root/t/public/go"
+  until_true '[[ $(<"$told") == *read=* ]]'
+  [[ $(<"$told") == *"wait-for=/t/public/go ok"$'\n'"read=/t/secret/file EACCES" ]]
+  gets narrowDom ok read=/t/secret/file
+}
+
+@test "50 what the caller puts into the environment" {
+  [[ -z $SANITIZER ]] || skip "the sanitizers' runtime has to be loaded first"
+  domain narrowDom "${calls[@]}"
+  boot_as
+  local library variable
+  library=$programs/$(basename "$PRELOADED")
+  for variable in LD_PRELOAD LD_AUDIT; do
+    run --separate-stderr env "$variable=$library" "$programs/secpolicy" --version
+    [[ $stderr == *loaded* ]]
+    run --separate-stderr env "$variable=$library" "$programs/secpolicy-run" --version
+    exits 0
+    [[ $stderr != *loaded* ]]
+  done
+}
+
+# ---- Paths of rules, and mounts
+
+@test "51 a copy of the mounts" {
+  only root
+  local part=('-r /t r' '-r /t/secret' '-c cap_sys_admin grant' '-s open_tree grant')
+  domain narrowDom "${calls[@]}" "${part[@]}"
+  domain wideDom "${calls[@]}" '-r /t r' '-c cap_sys_admin grant' '-s open_tree grant'
+  boot_as
+  gets narrowDom EACCES read-in-clone=/t,secret/file read-in-clone=/t/secret,file read-in-clone=/,t/secret/file
+  gets openDom ok read-in-clone=/t,secret/file read-in-clone=/t/secret,file
+}
+
+@test "52 a link in place of a rule's path" {
+  domain narrowDom "${calls[@]}" '-r /t/public/directory rw'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_as
+  rmdir "$root/t/public/directory"
+  ln -s /t/secret "$root/t/public/directory"
+  refuses EACCES read=/t/secret/file read=/t/public/directory/file create=/t/public/directory/new
+}
