@@ -26,7 +26,10 @@ Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
   syntax.AddList("PROGRAM", options->command, "The program and its arguments, behind --").Require();
   AddEntryOptions(syntax, options->entry);
-  return [=] { return Ask("exec", [=] { return Exec(*options); }); };
+  return [=] {
+    return Ask(
+        "exec", [=] { return Exec(*options); }, kNotConfined);
+  };
 }
 
 }  // namespace

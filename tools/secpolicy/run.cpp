@@ -41,7 +41,10 @@ Action Define(Syntax& syntax) {
   AddEntryOptions(syntax, options->entry);
   syntax.AddFlag("--explain", options->explain,
                  "Only show what the kernel would be told, and what becomes of each rule");
-  return [=] { return Ask("run", [=] { return Run(*options); }); };
+  return [=] {
+    return Ask(
+        "run", [=] { return Run(*options); }, kNotConfined);
+  };
 }
 
 }  // namespace
@@ -49,8 +52,10 @@ Action Define(Syntax& syntax) {
 const Verb kRun = {
     "run", "Run a program in a domain, with exactly the rights of its rules",
     "Starts CMD in the domain DOMAIN: this process, and all that it starts, may do what the\n"
-    "installed rules of the domain grant, and nothing else. Any user may; a domain never gives\n"
-    "rights that its user does not have. A domain that is permissive or disabled is only\n"
+    "installed rules of the domain grant, and nothing else. It is for who owns the state: root, "
+    "and any\n"
+    "user below a root of one's own (--root). A domain never gives rights that its user does not\n"
+    "have. A domain that is permissive or disabled is only\n"
     "recorded.\n"
     "What this kernel cannot refuse is told with file and line before anything starts, and\n"
     "nothing is started then; --best-effort starts it all the same.\n"

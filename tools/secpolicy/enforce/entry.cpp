@@ -1,5 +1,6 @@
 #include "entry.h"
 
+#include <exception>
 #include <iostream>
 
 #include "domain_plan.h"
@@ -44,7 +45,7 @@ ExitCode EnterDomain(const std::string& verb,
     LinuxHost::EnterWorld(compiled.plan.domainId);
     std::cerr << std::flush;
     StartConfined(compiled.plan, entry.command);
-  } catch (const Braxo::Lib::BraxoException& failure) {
+  } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
               << std::endl;
     return kNotConfined;

@@ -16,9 +16,13 @@ std::shared_ptr<const std::string> AddAnswerFormat(Syntax& syntax) {
   return format;
 }
 
-ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer) {
+ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer,
+             ExitCode withoutState) {
   // The host would make a state of its own.
-  if (LinuxHost::IsStateMissing()) return RefuseWithoutState(verb);
+  if (LinuxHost::IsStateMissing()) {
+    RefuseWithoutState(verb);
+    return withoutState;
+  }
   try {
     return answer();
   } catch (const QuestionError& error) {
