@@ -289,7 +289,7 @@ TEST(PlanCalls, RefusesTypingIntoTheTerminal) {
 }
 
 TEST(PlanCalls, TellsWhoWouldLetTheTerminalBeTypedInto) {
-  EXPECT_THAT(ToldOf({"-s ioctl grant", "-s read grant"}),
+  EXPECT_THAT(ToldOf({"-s ioctl grant", "-s kill grant"}),
               ElementsAre("narrowed: -s ioctl grant (ioctl: TIOCSTI is refused unless granted by "
                           "itself; ioctl: TIOCLINUX is refused unless granted by itself)"));
   EXPECT_THAT(
@@ -310,7 +310,7 @@ TEST(PlanCalls, RefusesToSayWhatProgramRuns) {
 // ---- Signals
 
 TEST(PlanCalls, ChecksSignalsOfDescriptors) {
-  const std::vector<std::string> lines = {"-s fcntl grant", "-s ioctl grant",
+  const std::vector<std::string> lines = {"-s fcntl grant", "-s ioctl grant", "-s tkill grant",
                                           "-p kill_signal 15 grant"};
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_GETFD, 9}), "allowed");
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETSIG, 15}), "allowed");
@@ -320,16 +320,27 @@ TEST(PlanCalls, ChecksSignalsOfDescriptors) {
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETOWN_EX, 1}), "EPERM");
   EXPECT_EQ(Ask(lines, "ioctl", {0, FIOSETOWN}), "EPERM");
   EXPECT_EQ(Ask(lines, "ioctl", {0, SIOCSPGRP}), "EPERM");
-  EXPECT_EQ(Ask({"-s fcntl grant"}, "fcntl", {0, F_SETOWN, 1}), "allowed");
+  EXPECT_EQ(Ask({"-s fcntl grant", "-s kill grant"}, "fcntl", {0, F_SETOWN, 1}), "allowed");
 }
 
 TEST(PlanCalls, LeavesOwnersOfDescriptorsToWhoMaySendTheirSignals) {
-  const std::vector<std::string> lines = {"-s fcntl grant", "-s ioctl grant",
+  const std::vector<std::string> lines = {"-s fcntl grant", "-s ioctl grant", "-s kill grant",
                                           "-p kill_signal 9 revoke"};
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETOWN, 1}), "allowed");
   EXPECT_EQ(Ask(lines, "ioctl", {0, SIOCSPGRP}), "allowed");
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETSIG, 0}), "allowed");
   EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETSIG, 9}), "EPERM");
+}
+
+TEST(PlanCalls, SendsNoSignalsByDescriptorsWhereNoCallMay) {
+  const std::vector<std::string> lines = {"-s @io grant",     "-s @signal grant",
+                                          "-s kill revoke",   "-s pidfd_send_signal revoke",
+                                          "-s tgkill revoke", "-s rt_sigqueueinfo revoke",
+                                          "-s tkill revoke",  "-s rt_tgsigqueueinfo revoke"};
+  EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETSIG, 9}), "EPERM");
+  EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETOWN, 1}), "EPERM");
+  EXPECT_EQ(Ask(lines, "ioctl", {0, FIOSETOWN}), "EPERM");
+  EXPECT_EQ(Ask(lines, "fcntl", {0, F_SETFL, 1}), "allowed");
 }
 
 TEST(PlanCalls, RefusesGroupsThatItCannotSee) {

@@ -425,16 +425,25 @@ class CallPlanner {
 
   // A descriptor that is ready sends a signal to whoever is its owner.
   void CloseSignalsByDescriptors() {
-    const ValueSet signals = checks.at("kill_signal").passing;
+    const ValueSet signals = SentSignals();
     if (signals.IsAll()) return;
     const ValueSet descriptorSignals =
         signals.Has(SIGIO) ? signals.With(Single(0)) : signals.Without(Single(0));
     Demand("fcntl", {Among(1, Single(F_SETSIG).Complement()), Among(2, descriptorSignals)});
     if (signals.Has(SIGIO) && signals.Has(SIGURG)) return;
     const char* const reason =
-        "an owner of a descriptor is refused beside kill_signal without SIGIO and SIGURG";
+        "an owner of a descriptor is refused where SIGIO and SIGURG may not be sent";
     Close("fcntl", {Among(1, SetOf(kOwnerCommands).Complement())}, reason);
     TakeValues("ioctl_request", "ioctl", SetOf(kOwnerRequests), reason);
+  }
+
+  // None where no call that sends one is granted.
+  ValueSet SentSignals() {
+    const bool sends = std::ranges::any_of(kCheckedArguments, [&](const auto& checked) {
+      return std::string_view(checked.check) == "kill_signal" &&
+             FindGranted(checked.call) != nullptr;
+    });
+    return sends ? checks.at("kill_signal").passing : ValueSet();
   }
 
   void CloseGroups() {
