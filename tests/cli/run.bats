@@ -233,3 +233,28 @@ END
   exits 126
   [[ $stderr == "secpolicy: exec: there is no program 'nothing' in PATH; nothing was started" ]]
 }
+
+@test "status lists who runs in a domain, and restore who keeps an older level" {
+  boot
+  "$SECPOLICY" --root "$root" run monitorDom -- /bin/sleep 60 3>&- &
+  local world=$!
+  local tries=0
+  until secpolicy status && [[ $output == *" monitorDom enforcing"* ]]; do
+    sleep 0.1
+    ((++tries < 100))
+  done
+  shows "worlds       1"
+  shows "             $world monitorDom enforcing"
+  secpolicy status --format json
+  fits_schema status
+  [[ $(jq -c .worlds <<<"$output") == "[{\"id\":$world,\"domain\":\"monitorDom\",\"level\":\"enforcing\"}]" ]]
+  secpolicy settings enforcement monitorDom permissive
+  secpolicy restore
+  says "still at the level of the entry: 1 world; 'secpolicy status' lists each, and a new start takes the new level"
+  secpolicy status
+  shows "             $world monitorDom enforcing, now permissive"
+  kill "$world"
+  wait "$world" || true
+  secpolicy status
+  shows "worlds       0"
+}

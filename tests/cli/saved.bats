@@ -266,7 +266,7 @@ refuses() {
   sleep 1000 &
   local world=$! start
   start=$(sed 's/.*) //' "/proc/$world/stat" | cut -d' ' -f20)
-  sqlite3 "$root/run/secpolicy/host.db" "INSERT INTO world VALUES ($world, $start, $(domain_id lateDom))"
+  sqlite3 "$root/run/secpolicy/host.db" "INSERT INTO world VALUES ($world, $start, $(domain_id lateDom), '')"
   mkdir -p "$root/proc"
   if ! mount -t proc proc "$root/proc"; then
     kill "$world"

@@ -10,6 +10,7 @@
 #include "ending.h"
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/state_use.h"
+#include "host/linux/operation/world_entry.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "scratch/scratch_state.h"
@@ -35,6 +36,7 @@ struct Status {
   std::vector<std::string>
       domainsWithoutFile;  // what loads have installed and no file has any more
   std::size_t rulesWithoutLine = 0;
+  std::vector<LinuxHost::PlacedWorld> worlds;
 
   // Beside the one that is built in, there are domains only when something was loaded.
   bool IsLoaded() const { return policy.domains.size() > 1; }
@@ -47,6 +49,7 @@ Status ReadStatus() {
   status.policy = ReadInstalledPolicy(access);
   status.tardisks = ReadTardisks(access);
   status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
+  status.worlds = LinuxHost::ListWorlds(LinuxHost::CurrentState());
   for (const Policy::InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);
     status.ruleCount += domain.rules.size();
@@ -88,6 +91,24 @@ std::string DescribeDomains(const Status& status) {
   return text;
 }
 
+const Policy::InstalledDomain* DomainOf(const LinuxHost::PlacedWorld& world, const Status& status) {
+  const auto found =
+      std::ranges::find(status.policy.domains, world.domainId, &Policy::InstalledDomain::id);
+  return found == status.policy.domains.end() ? nullptr : &*found;
+}
+
+// Who is confined keeps the level of the entry.
+std::string DescribeWorld(const LinuxHost::PlacedWorld& world, const Status& status) {
+  const Policy::InstalledDomain* const domain = DomainOf(world, status);
+  std::string text = std::to_string(world.id) + " ";
+  if (domain == nullptr) return text + "(no domain)";
+  text += domain->name;
+  if (!world.level) return text;
+  text += std::string(" ") + TextOf(*world.level);
+  if (*world.level != domain->level) text += std::string(", now ") + TextOf(domain->level);
+  return text;
+}
+
 void WriteErrors(const LinuxHost::LoadRecord& load) {
   const std::size_t shown = std::min(load.errors.size(), kShownErrors);
   for (std::size_t index = 0; index < shown; ++index) WriteLine("", load.errors[index]);
@@ -117,6 +138,8 @@ void WriteText(const Status& status) {
   for (const std::string& domain : status.domainsWithoutFile) {
     WriteLine("in no file", "domain " + domain);
   }
+  WriteLine("worlds", std::to_string(status.worlds.size()));
+  for (const auto& world : status.worlds) WriteLine("", DescribeWorld(world, status));
   WriteLine("tardisks", std::to_string(status.tardisks.size()));
   for (const InstalledTardisk& tardisk : status.tardisks) {
     WriteLine("", tardisk.path + " " + (tardisk.label.empty() ? "(no label)" : tardisk.label));
@@ -131,6 +154,17 @@ Json ToJson(const LinuxHost::LoadRecord& load) {
           {"errorCount", load.errorCount},
           {"errors", load.errors},
           {"removed", {{"domains", load.removedDomains}, {"rules", load.removedRules}}}};
+}
+
+Json WorldsToJson(const Status& status) {
+  Json worlds = Json::Array();
+  for (const LinuxHost::PlacedWorld& world : status.worlds) {
+    Json json = {{"id", world.id}};
+    if (const auto* const domain = DomainOf(world, status)) json["domain"] = domain->name;
+    if (world.level) json["level"] = TextOf(*world.level);
+    worlds.Append(json);
+  }
+  return worlds;
 }
 
 void WriteJson(const Status& status) {
@@ -152,6 +186,7 @@ void WriteJson(const Status& status) {
       {"rules", status.ruleCount},
       {"rulesByKeyword", rules},
       {"inNoFile", {{"domains", status.domainsWithoutFile}, {"rules", status.rulesWithoutLine}}},
+      {"worlds", WorldsToJson(status)},
       {"tardisks", ToJson(status.tardisks)}};
   std::cout << screen.Text();
 }

@@ -27,7 +27,17 @@ pid_t ParentOf(pid_t process) {
 
 }  // namespace
 
-void EnterWorld(unsigned int id) { HostState::Current().Worlds().Place(getpid(), id); }
+void EnterWorld(unsigned int id, Policy::Level level) {
+  HostState::Current().Worlds().Place(getpid(), id, TextOf(level));
+}
+
+std::vector<PlacedWorld> ListWorlds(HostState& state) {
+  std::vector<PlacedWorld> worlds;
+  for (const World& world : state.Worlds().All()) {
+    worlds.push_back({world.id, world.domainId, Policy::FindLevel(world.level)});
+  }
+  return worlds;
+}
 
 unsigned int DomainOfCaller() {
   WorldTable& worlds = HostState::Current().Worlds();

@@ -1,10 +1,28 @@
 #pragma once
 
+#include <optional>
+#include <vector>
+
+#include "policy/level.h"
+
 namespace LinuxHost {
 
-// Places this process in the domain `id`, which it leaves by its end or by being placed elsewhere.
-// Throws HostError when there is no such domain, or the state cannot be written.
-void EnterWorld(unsigned int id);
+class HostState;
+
+// Places this process in the domain `id`, which it leaves by its end or by being placed elsewhere,
+// confined by the level `level`. Throws HostError when there is no such domain, or the state cannot
+// be written.
+void EnterWorld(unsigned int id, Policy::Level level);
+
+// A living process that was placed in a domain.
+struct PlacedWorld {
+  int id = 0;
+  unsigned int domainId = 0;
+  std::optional<Policy::Level> level;  // that confines it; nothing where a service has placed it
+};
+
+// All of them, in ascending order of their identifiers.
+std::vector<PlacedWorld> ListWorlds(HostState& state);
 
 // The domain that this process was placed in, or the nearest process above it, or the start domain.
 // Throws HostError for a confined process of which that cannot be told.

@@ -114,7 +114,8 @@ CREATE TABLE covered_file_policy (
 CREATE TABLE world (
   id INTEGER PRIMARY KEY,
   started INTEGER NOT NULL,
-  domain_id INTEGER NOT NULL
+  domain_id INTEGER NOT NULL,
+  level TEXT NOT NULL
 );
 CREATE TABLE inode_origin (
   device INTEGER NOT NULL,

@@ -46,11 +46,11 @@ void WorldTable::RequireAlive(int world) {
   if (!IsAlive(world)) throw HostError(ESRCH, StrCat("no world has the identifier ", world));
 }
 
-void WorldTable::Place(int world, unsigned int domainId) {
+void WorldTable::Place(int world, unsigned int domainId, const std::string& level) {
   RequireAlive(world);
   const int placed =
-      store.Run("INSERT OR REPLACE INTO world SELECT ?1, ?2, id FROM domain WHERE id = ?3", world,
-                StartOf(world), domainId);
+      store.Run("INSERT OR REPLACE INTO world SELECT ?1, ?2, id, ?4 FROM domain WHERE id = ?3",
+                world, StartOf(world), domainId, level);
   if (placed == 0) throw HostError(ENOENT, StrCat("unknown domain ", domainId));
 }
 
@@ -63,6 +63,19 @@ std::optional<unsigned int> WorldTable::FindDomainOf(int world) {
 unsigned int WorldTable::DomainOf(int world) {
   RequireAlive(world);
   return FindDomainOf(world).value_or(kStartDomain);
+}
+
+std::vector<World> WorldTable::All() {
+  std::vector<World> worlds;
+  Rows rows = store.Select("SELECT id, started, domain_id, level FROM world ORDER BY id");
+  while (rows.Next()) {
+    const auto id = static_cast<int>(rows.Integer(0));
+    if (!IsStill(id, rows.Integer(1))) continue;
+    worlds.push_back({.id = id,
+                      .domainId = static_cast<unsigned int>(rows.Integer(2)),
+                      .level = std::string(rows.Text(3))});
+  }
+  return worlds;
 }
 
 unsigned int WorldTable::CountIn(unsigned int domainId) {

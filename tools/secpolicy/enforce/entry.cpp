@@ -42,7 +42,7 @@ ExitCode EnterDomain(const std::string& verb,
     const Entry entry = find(access);
     const Enforce::CompiledPlan compiled = PlanOf(entry.domain, access);
     if (!MaySurrender(verb, compiled, options)) return kNotConfined;
-    LinuxHost::EnterWorld(compiled.plan.domainId);
+    LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
     std::cerr << std::flush;
     StartConfined(compiled.plan, entry.command);
   } catch (const std::exception& failure) {
