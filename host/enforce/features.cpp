@@ -33,11 +33,6 @@ bool CanMount(int namespaces) {
   return WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
 
-Namespace ProbeMounts() {
-  if (CanMount(CLONE_NEWNS)) return Namespace::kPrivileged;
-  return CanMount(CLONE_NEWUSER | CLONE_NEWNS) ? Namespace::kUser : Namespace::kNone;
-}
-
 }  // namespace
 
 Features ProbeFeatures() {
@@ -45,10 +40,13 @@ Features ProbeFeatures() {
   static_cast<void>(Kernel::GetCapabilities(&capabilities));
   return {Kernel::LandlockVersion(),
           Kernel::KnowsAnswer(SECCOMP_RET_ERRNO) && Kernel::KnowsAnswer(SECCOMP_RET_KILL_PROCESS),
-          Kernel::KnowsAnswer(SECCOMP_RET_USER_NOTIF),
-          ProbeMounts(),
-          capabilities.permitted,
+          Kernel::KnowsAnswer(SECCOMP_RET_USER_NOTIF), capabilities.permitted,
           Kernel::LastCapability()};
+}
+
+Namespace ProbeMounts() {
+  if (CanMount(CLONE_NEWNS)) return Namespace::kPrivileged;
+  return CanMount(CLONE_NEWUSER | CLONE_NEWNS) ? Namespace::kUser : Namespace::kNone;
 }
 
 }  // namespace Enforce

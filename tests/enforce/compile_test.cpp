@@ -34,7 +34,6 @@ Features NewKernel() {
   return {.landlock = 7,
           .seccomp = true,
           .notifies = true,
-          .mounts = Enforce::Namespace::kPrivileged,
           .capabilities = ~std::uint64_t{0},
           .lastCapability = 40};
 }

@@ -34,14 +34,14 @@ void WriteFeatures(const Features& features) {
             << (features.landlock == 0 ? "no" : "version " + std::to_string(features.landlock))
             << "\nfilters of system calls: " << YesOrNo(features.seccomp)
             << "\nfilters that ask a supervisor: " << YesOrNo(features.notifies)
-            << "\nmounts of one's own: " << TextOf(features.mounts) << '\n';
+            << "\nmounts of one's own: " << TextOf(Enforce::ProbeMounts()) << '\n';
 }
 
 Json ToJson(const Features& features) {
   return {{"landlock", features.landlock},
           {"seccomp", features.seccomp},
           {"seccompNotify", features.notifies},
-          {"mountNamespace", TextOf(features.mounts)}};
+          {"mountNamespace", TextOf(Enforce::ProbeMounts())}};
 }
 
 ExitCode ShowFeatures(const std::string& format) {

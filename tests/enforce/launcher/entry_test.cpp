@@ -89,7 +89,7 @@ TEST_P(Entry, LeavesNoneOfItsOwn) {
   Enforce::Plan plan = PlanOf(tree);
   plan.filter = FilterWithout({});
   plan.paths.push_back({tree / "kept", AllRights()});
-  if (Enforce::ProbeFeatures().mounts != Enforce::Namespace::kNone) {
+  if (Enforce::ProbeMounts() != Enforce::Namespace::kNone) {
     plan.masks = {{tree / "open", Enforce::MaskKind::kReadOnly}};
   }
   Launch launch{user, {"--plan", WritePlan(tree, plan)}, {ProbePath()}};

@@ -17,6 +17,7 @@ namespace {
 using Enforce::Features;
 using Enforce::Namespace;
 using Enforce::ProbeFeatures;
+using Enforce::ProbeMounts;
 
 std::string ContentOf(const std::string& path) {
   std::ifstream file(path);
@@ -57,34 +58,40 @@ Surroundings Look() {
 TEST(Features, AreProbedWithoutATrace) {
   const Surroundings before = Look();
   static_cast<void>(ProbeFeatures());
+  static_cast<void>(ProbeMounts());
   EXPECT_EQ(Look(), before);
   EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "no child is left";
 }
 
 // What a child process that is nobody finds.
-Features ProbeAsNobody() {
+struct Found {
+  Features features;
+  Namespace mounts = Namespace::kNone;
+};
+
+Found ProbeAsNobody() {
   int channel[2];
   EXPECT_EQ(pipe2(channel, O_CLOEXEC), 0);
   const pid_t child = fork();
   if (child == 0) {
     if (setresuid(65534, 65534, 65534) != 0) _exit(1);
-    const Features found = ProbeFeatures();
+    const Found found = {ProbeFeatures(), ProbeMounts()};
     _exit(write(channel[1], &found, sizeof(found)) == sizeof(found) ? 0 : 1);
   }
   close(channel[1]);
-  Features features;
-  EXPECT_EQ(read(channel[0], &features, sizeof(features)), sizeof(features));
+  Found found;
+  EXPECT_EQ(read(channel[0], &found, sizeof(found)), sizeof(found));
   close(channel[0]);
   waitpid(child, nullptr, 0);
-  return features;
+  return found;
 }
 
 TEST(Features, DependOnTheUser) {
   if (geteuid() != 0) GTEST_SKIP() << "needs root to be somebody else";
   const Features root = ProbeFeatures();
-  const Features nobody = ProbeAsNobody();
-  EXPECT_EQ(root.mounts, Namespace::kPrivileged);
-  EXPECT_NE(nobody.mounts, Namespace::kPrivileged);
+  const auto [nobody, mounts] = ProbeAsNobody();
+  EXPECT_EQ(ProbeMounts(), Namespace::kPrivileged);
+  EXPECT_NE(mounts, Namespace::kPrivileged);
   EXPECT_EQ(nobody.capabilities, 0);
   EXPECT_EQ(nobody.landlock, root.landlock);
   EXPECT_EQ(nobody.seccomp, root.seccomp);

@@ -26,7 +26,7 @@ class Masks : public testing::TestWithParam<User> {
   void SetUp() override {
     if (!CanBe(user)) GTEST_SKIP() << "only root can start somebody as root";
     if (Lacks()) GTEST_SKIP() << Lacks();
-    if (Enforce::ProbeFeatures().mounts == Enforce::Namespace::kNone) {
+    if (Enforce::ProbeMounts() == Enforce::Namespace::kNone) {
       GTEST_SKIP() << "this system gives nobody a mount namespace";
     }
   }

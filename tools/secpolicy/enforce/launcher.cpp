@@ -1,17 +1,15 @@
 #include "launcher.h"
 
 #include <fcntl.h>
-#include <linux/capability.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
-#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <filesystem>
-#include <iterator>
 
+#include "host/enforce/kernel.h"
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
@@ -19,6 +17,7 @@
 namespace SecPolicyCli {
 namespace {
 
+namespace Kernel = Enforce::Kernel;
 using LinuxHost::Descriptor;
 using LinuxHost::ThrowErrno;
 
@@ -54,13 +53,13 @@ Descriptor SealedFile(const std::string& bytes) {
 // Whoever is not root loses what a user namespace has given to it with the next execve, unless it
 // is told to be ambient. The launcher drops what the domain is not to have.
 void HandOnCapabilities() {
-  __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
-  __user_cap_data_struct data[_LINUX_CAPABILITY_U32S_3] = {};
-  if (syscall(SYS_capget, &header, data) != 0) ThrowErrno("cannot read capabilities");
-  for (auto& word : data) word.inheritable = word.permitted;
-  if (syscall(SYS_capset, &header, data) != 0) ThrowErrno("cannot keep capabilities");
-  for (unsigned int number = 0; number < 32 * std::size(data); ++number) {
-    if ((data[number / 32].permitted >> (number % 32) & 1) == 0) continue;
+  Kernel::Capabilities own;
+  if (Kernel::GetCapabilities(&own) != 0) ThrowErrno("cannot read capabilities");
+  own.inheritable = own.permitted;
+  if (Kernel::SetCapabilities(own) != 0) ThrowErrno("cannot keep capabilities");
+  const int last = Kernel::LastCapability();
+  for (int number = 0; number <= last; ++number) {
+    if (!Kernel::HasCapability(own.permitted, number)) continue;
     prctl(PR_CAP_AMBIENT, PR_CAP_AMBIENT_RAISE, number, 0, 0);
   }
 }
