@@ -26,12 +26,12 @@ _secpolicy_tardisks() {
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display run exec features why who-can words graph diff save history rollback label settings'
+  local verbs='boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings'
   local questions='read write exec list remove truncate make make-socket call use access enter create create-socket pass'
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
     word=${COMP_WORDS[index]}
-    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy || $word == --policy-from || $word == --for ]]; then
+    if [[ $word == --root || $word == --format || $word == --domain || $word == --disable || $word == --policy || $word == --policy-from || $word == --for || $word == --write ]]; then
       index=$((index + 1))
       [[ $word == --root ]] && root=${COMP_WORDS[index]}
     elif [[ $word == -* ]]; then
@@ -61,6 +61,8 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--best-effort --explain --root --help -h' -- "$current")
   elif [[ $verb == exec && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--best-effort --root --help -h' -- "$current")
+  elif [[ $verb == observe && $current == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--for --write --root --help -h' -- "$current")
   elif [[ $verb == features && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--for --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
@@ -104,9 +106,9 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W "installed $(_secpolicy_saved "$root")" -- "$current"; compgen -d -- "$current")
   elif [[ $verb == words ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W 'objects accesses capabilities transitions files checks calls sockets' -- "$current")
-  elif [[ $verb == features && $previous == --for ]] || [[ $verb == run && $positional -eq 0 && $current != -* ]]; then
+  elif [[ ($verb == features || $verb == observe) && $previous == --for ]] || [[ $verb == run && $positional -eq 0 && $current != -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_domains "$root")" -- "$current")
-  elif [[ $verb == run || $verb == exec ]]; then
+  elif [[ $verb == run || $verb == exec || $verb == observe ]]; then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == rollback ]] && ((positional == 0)); then

@@ -52,6 +52,15 @@ TEST(Assemble, AnswersEachNumber) {
   EXPECT_FALSE(program.secret);
 }
 
+TEST(Assemble, AsksASupervisor) {
+  const FilterProgram program = Assemble({{3, {Answer::kNoticed}}}, kArchitecture);
+  EXPECT_EQ(RefusalOf(program.instructions), "");
+  EXPECT_EQ(EnforceTest::Run(program.instructions, CallOf(3, {}, kArchitecture)),
+            SECCOMP_RET_USER_NOTIF);
+  EXPECT_EQ(Ask(program, 2), "ENOSYS");
+  EXPECT_EQ(Ask(program, 4), "ENOSYS");
+}
+
 TEST(Assemble, KnowsNoCallOfNobody) {
   const FilterProgram program = Assemble({}, kArchitecture);
   EXPECT_EQ(Ask(program, 0), "ENOSYS");

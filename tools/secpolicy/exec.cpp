@@ -4,7 +4,6 @@
 
 #include "command_line.h"
 #include "enforce/entry.h"
-#include "enforce/launcher.h"
 #include "enforce/transition.h"
 #include "query/ask.h"
 #include "verb.h"
@@ -44,6 +43,6 @@ const Verb kExec = {
     "Examples:\n"
     "  secpolicy exec -- /usr/sbin/sshd\n"
     "  ExecStart=/usr/sbin/secpolicy exec -- /usr/sbin/sshd     in a unit of systemd",
-    Define, OpenLauncher};
+    Define, PrepareEntry};
 
 }  // namespace SecPolicyCli

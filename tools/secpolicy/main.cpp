@@ -16,10 +16,10 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {&kBoot,   &kCheck,   &kLoad,     &kLoadEarly, &kRestore,
-                                  &kStatus, &kDisplay, &kRun,      &kExec,      &kFeatures,
-                                  &kWhy,    &kWhoCan,  &kWords,    &kGraph,     &kDiff,
-                                  &kSave,   &kHistory, &kRollback, &kLabel,     &kSettings};
+constexpr const Verb* kVerbs[] = {
+    &kBoot,  &kCheck, &kLoad,    &kLoadEarly, &kRestore,  &kStatus, &kDisplay,
+    &kRun,   &kExec,  &kObserve, &kFeatures,  &kWhy,      &kWhoCan, &kWords,
+    &kGraph, &kDiff,  &kSave,    &kHistory,   &kRollback, &kLabel,  &kSettings};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -32,6 +32,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r display                     look at what is installed now\n"
     "  secpolicy --root ./r run appDom -- /bin/sh       run a program in a domain\n"
     "  secpolicy --root ./r exec -- /usr/sbin/sshd      the same in the domain of its label\n"
+    "  secpolicy --root ./r observe -- /usr/bin/webd    which rules would this program need?\n"
     "  secpolicy --root ./r features --for appDom       what becomes of its rules on this kernel?\n"
     "  secpolicy --root ./r why sshDom read /etc/ssh    may it, and which rule says so?\n"
     "  secpolicy --root ./r who-can use cap_sys_boot    which domains may?\n"

@@ -6,7 +6,6 @@
 #include "command_line.h"
 #include "enforce/domain_plan.h"
 #include "enforce/entry.h"
-#include "enforce/launcher.h"
 #include "query/ask.h"
 #include "query/question.h"
 #include "verb.h"
@@ -55,8 +54,8 @@ const Verb kRun = {
     "installed rules of the domain grant, and nothing else. It is for who owns the state: root, "
     "and any\n"
     "user below a root of one's own (--root). A domain never gives rights that its user does not\n"
-    "have. A domain that is permissive or disabled is only\n"
-    "recorded.\n"
+    "have. In a domain that is permissive nothing is refused, and what its rules would refuse is\n"
+    "told once, on standard error and in the log; one that is disabled is only recorded.\n"
     "What this kernel cannot refuse is told with file and line before anything starts, and\n"
     "nothing is started then; --best-effort starts it all the same.\n"
     "\n"
@@ -67,6 +66,6 @@ const Verb kRun = {
     "  secpolicy run sshDom -- /usr/sbin/sshd\n"
     "  secpolicy run appDom -- cat /etc/shadow     is it refused?\n"
     "  secpolicy run appDom --explain              what is the kernel told?",
-    Define, OpenLauncher};
+    Define, PrepareEntry};
 
 }  // namespace SecPolicyCli

@@ -47,6 +47,7 @@ extern const Verb kLabel;
 extern const Verb kStatus;
 extern const Verb kRun;
 extern const Verb kExec;
+extern const Verb kObserve;
 extern const Verb kFeatures;
 extern const Verb kWhoCan;
 extern const Verb kWhy;

@@ -172,6 +172,7 @@ class Leaves {
   Exit ExitOf(const CallVerdict& verdict) {
     if (verdict.answer == Answer::kUnknown) return {std::nullopt, kUnknown};
     if (verdict.answer == Answer::kRefused) return {std::nullopt, kRefuse};
+    if (verdict.answer == Answer::kNoticed) return {std::nullopt, SECCOMP_RET_USER_NOTIF};
     if (verdict.answer == Answer::kAllowed && verdict.conditions.empty()) {
       return {std::nullopt, SECCOMP_RET_ALLOW};
     }

@@ -35,6 +35,7 @@ enum class Answer {
   kRefused,            // EPERM
   kAllowed,            // where all conditions hold, else EPERM
   kAllowedWithSecret,  // where the last argument is the secret, else EPERM; without conditions
+  kNoticed,            // as its supervisor says, whom the filter's listener tells of it
 };
 
 struct CallVerdict {

@@ -6,6 +6,8 @@
 
 namespace LinuxHost {
 
+void LogLine(const std::string& line) { LogInformation(line); }
+
 ShownLog::ShownLog() : before(std::exchange(CurrentLogUse().showsInformation, true)) {}
 
 ShownLog::~ShownLog() { CurrentLogUse().showsInformation = before; }

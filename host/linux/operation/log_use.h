@@ -1,8 +1,13 @@
 #pragma once
 
+#include <string>
+
 // What the command asks of the host's log. Each lasts as long as its object, and what was before
 // comes back.
 namespace LinuxHost {
+
+// Logs one information line, where those of the library go.
+void LogLine(const std::string& line);
 
 // Information lines are shown on standard error too, one a line, as they are logged.
 class ShownLog {

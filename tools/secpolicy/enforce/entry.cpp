@@ -6,6 +6,8 @@
 #include "domain_plan.h"
 #include "host/linux/operation/world_entry.h"
 #include "launcher.h"
+#include "observe/permissive.h"
+#include "observe/watch.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -34,6 +36,11 @@ void AddEntryOptions(Syntax& syntax, EntryOptions& options) {
                  "Start it although this kernel cannot refuse all that the rules do");
 }
 
+void PrepareEntry() {
+  OpenLauncher();
+  OpenProc();
+}
+
 ExitCode EnterDomain(const std::string& verb,
                      const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
                      const EntryOptions& options) {
@@ -44,6 +51,9 @@ ExitCode EnterDomain(const std::string& verb,
     if (!MaySurrender(verb, compiled, options)) return kNotConfined;
     LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
     std::cerr << std::flush;
+    if (compiled.plan.level == Policy::Level::kPermissive) {
+      return RunPermissive(verb, entry.domain, entry.command, access);
+    }
     StartConfined(compiled.plan, entry.command);
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"

@@ -17,14 +17,18 @@ struct EntryOptions {
 // Adds --best-effort to `syntax`.
 void AddEntryOptions(Syntax& syntax, EntryOptions& options);
 
+// What has to be done for an entry before the root is entered.
+void PrepareEntry();
+
 // What is to be started, and the name of the domain that it is started in.
 struct Entry {
   std::string domain;
   std::vector<std::string> command;
 };
 
-// Becomes the program of the entry that `find` finds. Returns only where it was not started, with
-// what to end with; why has been told then.
+// Becomes the program of the entry that `find` finds, or runs and watches it where the domain is
+// permissive. Returns only then, and where nothing was started, with what to end with; why has been
+// told.
 ExitCode EnterDomain(const std::string& verb,
                      const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
                      const EntryOptions& options);

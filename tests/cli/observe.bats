@@ -1,0 +1,157 @@
+# secpolicy observe, and run of permissive domains: what a program was seen to do becomes a policy by
+# which it runs, and what rules would refuse is told and not refused.
+
+load helper
+
+# A service that the example has no rules for: it keeps a journal and reads its settings.
+make_service() {
+  mkdir -p "$root/opt/journal/bin" "$root/srv/journal"
+  for name in mkdir rm mv; do ln -s busybox "$root/bin/$name"; done
+  echo 'lines=3' >"$root/opt/journal/settings"
+  cat >"$root/opt/journal/bin/journal" <<'SCRIPT'
+#!/bin/sh
+. /opt/journal/settings
+mkdir -p /srv/journal/old
+for line in $(cat /etc/services.conf | cut -d ' ' -f 1); do echo "$line" >>/srv/journal/new; done
+mv /srv/journal/new "/srv/journal/old/$lines"
+[ -z "$1" ] || cat "$1"
+SCRIPT
+  chmod +x "$root/opt/journal/bin/journal"
+}
+
+domain=/etc/zorvan/secpolicy/domains/journalDom
+
+secpolicy_in_time() {
+  run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" "$@"
+}
+
+# The steps of docs/enforcement.md, "From nothing to enforcing".
+@test "from nothing to enforcing" {
+  boot
+  make_service
+  secpolicy_in_time observe --write "$domain" -- /opt/journal/bin/journal
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: observe: "*" lines proposed in $domain" ]]
+  [[ $(head -n 1 "$root$domain") == "# Proposed from one run of /opt/journal/bin/journal" ]]
+  grep -qx -- '-s @start grant   # what every program needs to start' "$root$domain"
+  grep -qx -- '-a hostConfig read grant   # 1 file, first /etc/services.conf' "$root$domain"
+  grep -qx -- '-r /opt/journal/settings r   # first by /bin/busybox' "$root$domain"
+  grep -qx -- '-r /srv/journal w   # first by /bin/busybox' "$root$domain"
+
+  # Nothing leads into it yet.
+  echo '-d journalProgram journalDom exec grant' >>"$policy/domains/hostDom"
+  echo journalProgram >"$policy/objects/journal"
+  echo '/opt/journal/bin/journal journalProgram' >"$policy/fileLabels/journal"
+  secpolicy check --werror
+  exits 0
+  secpolicy load
+  exits 0
+
+  # The program has a label now, and the domain has no rule for it.
+  secpolicy settings enforcement journalDom permissive
+  secpolicy restore
+  rm -r "$root/srv/journal/old"
+  secpolicy_in_time exec -- /opt/journal/bin/journal /etc/ssh/host_key
+  exits 0
+  [[ $output == "not a real key"* ]]
+  [[ $stderr == "secpolicy: exec: journalDom would be refused: read /etc/ssh/host_key" ]]
+
+  secpolicy settings enforcement journalDom enforcing
+  secpolicy restore
+  rm -r "$root/srv/journal/old"
+  secpolicy_in_time exec -- /opt/journal/bin/journal
+  exits 0
+  grep -q sshd "$root/srv/journal/old/3"
+  secpolicy_in_time exec -- /opt/journal/bin/journal /etc/ssh/host_key
+  exits 1
+  [[ -z $output && $stderr == *"/etc/ssh/host_key': Permission denied"* ]]
+}
+
+@test "what an installed domain is granted is left out" {
+  boot
+  secpolicy_in_time observe --for monitorDom -- /bin/sh -c 'cat /opt/monitor/etc/agent.conf /var/lib/vms/demo/disk'
+  exits 0
+  [[ ${output##*$'\n'} == "-a vmDisk read grant   # 1 file, first /var/lib/vms/demo/disk" ]]
+  [[ $(grep -c '^-' <<<"$output") -eq 1 ]]
+  secpolicy observe --for monitordom -- /bin/sh
+  wrong_usage observe "observe: there is no domain 'monitordom'; did you mean 'monitorDom'?"
+}
+
+@test "ports and what binds them" {
+  boot
+  secpolicy_in_time observe -- /bin/sh -c 'nc 127.0.0.1 9 || true'
+  exits 0
+  shows "-p socket_family 2 grant   # 1 time, first by /bin/busybox"
+  shows "-p connect_port 9 grant   # 1 time, first by /bin/busybox"
+  mkdir "$root/dev" && : >"$root/dev/null"
+  local port=$((20000 + BASHPID % 20000))
+  secpolicy_in_time observe -- /bin/sh -c "nc -l -p $port >/out & until echo hello | nc 127.0.0.1 $port; do sleep 0.1; done; wait"
+  exits 0
+  [[ $(<"$root/out") == hello ]]
+  shows "-p bind_port $port grant   # 1 time, first by /bin/busybox"
+  shows "-p bind_port 0 grant   # 1 time, first by /bin/busybox"
+}
+
+@test "the exit status is that of the program" {
+  boot
+  secpolicy_in_time observe -- /bin/sh -c 'exit 5'
+  exits 5
+  secpolicy_in_time observe -- /bin/sh -c 'kill -9 $$'
+  exits 137
+  run -127 --separate-stderr "$SECPOLICY" --root "$root" observe -- /nowhere/program
+  says "secpolicy: observe: cannot start /nowhere/program: No such file or directory"
+  secpolicy observe -- /etc/services.conf
+  exits 126
+  says "secpolicy: observe: cannot start /etc/services.conf: Permission denied"
+}
+
+@test "a proposal never takes the place of a file" {
+  boot
+  secpolicy observe --write /etc/zorvan/secpolicy/domains/sshDom -- /bin/sh -c 'echo started'
+  exits 126
+  [[ -z $output && $stderr == "secpolicy: observe: cannot make /etc/zorvan/secpolicy/domains/sshDom: File exists" ]]
+  cmp "$policy/domains/sshDom" "$SOURCE/examples/host/etc/zorvan/secpolicy/domains/sshDom"
+}
+
+@test "a permissive domain is told once of all that it would be refused" {
+  boot
+  secpolicy settings enforcement monitorDom permissive
+  secpolicy restore
+  secpolicy_in_time run monitorDom -- /bin/sh -c 'for i in 1 2 3; do cat /var/lib/vms/demo/disk; done; nc 127.0.0.1 9; exit 4'
+  exits 4
+  [[ $(grep -c 'would be refused: read /var/lib/vms/demo/disk$' <<<"$stderr") -eq 1 ]]
+  says "secpolicy: run: monitorDom would be refused: pass connect_port 9"
+  [[ $(grep -c 'block of a disk' <<<"$output") -eq 3 ]]
+  grep -q 'monitorDom would be refused: pass connect_port 9$' "$root/run/secpolicy/kernel.log"
+}
+
+@test "a permissive domain is told of nothing that it is granted" {
+  boot
+  secpolicy settings enforcement monitorDom permissive
+  secpolicy restore
+  secpolicy_in_time run monitorDom -- /opt/monitor/bin/agent
+  exits 0
+  [[ -z $stderr && $(<"$root/opt/monitor/spool/machines") == demo ]]
+}
+
+@test "a disabled domain is only recorded" {
+  boot
+  secpolicy settings enforcement monitorDom disabled
+  secpolicy restore
+  secpolicy_in_time run monitorDom -- /bin/sh -c 'cat /var/lib/vms/demo/disk'
+  exits 0
+  [[ -z $stderr && $output == *"block of a disk" ]]
+}
+
+@test "when the supervisor is killed, noticed calls end with ENOSYS" {
+  boot
+  "$SECPOLICY" --root "$root" observe -- /bin/sh -c \
+    'echo $$ >/pid; while [ ! -e /go ]; do :; done; echo made >/after' 3>&- 2>/dev/null &
+  local supervisor=$!
+  until_true "[[ -s $root/pid ]]"
+  kill -9 "$supervisor"
+  wait "$supervisor" || true
+  touch "$root/go"
+  until_true "[[ ! -d /proc/$(<"$root/pid") ]]"
+  [[ ! -e $root/after ]]
+}

@@ -1,0 +1,187 @@
+// Hunts proposals by which a program would still be refused what it was seen to do, and proposals
+// that grant more than the directory or the set that they name.
+
+#include "observe/proposal.h"
+
+#include <gmock/gmock.h>
+
+#include <string>
+
+namespace {
+
+using Policy::CreationQuestion;
+using Policy::FileAccess;
+using Policy::FileQuestion;
+using Policy::InstalledDomain;
+using Policy::ParameterQuestion;
+using Policy::Permissions;
+using Policy::Rule;
+using Policy::RuleKind;
+using Policy::WordsQuestion;
+using SecPolicyCli::Observations;
+using SecPolicyCli::Propose;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+constexpr char kStart[] = "-s @start grant   # what every program needs to start";
+
+FileQuestion File(FileAccess access, const std::string& path, const std::string& label = "") {
+  return {.access = access, .path = path, .label = label, .labelIsBuiltIn = false};
+}
+
+CreationQuestion Making(const std::string& what, const std::string& path,
+                        const std::string& label = "") {
+  return {.kind = RuleKind::kFileCreation,
+          .what = what,
+          .path = path,
+          .directoryLabel = label,
+          .labelIsBuiltIn = false};
+}
+
+WordsQuestion Call(const std::string& name) {
+  return {.kind = RuleKind::kSyscall, .words = {name}};
+}
+
+ParameterQuestion Check(const std::string& check, const std::string& number) {
+  return {.check = check, .number = number};
+}
+
+Rule Path(const std::string& path, const std::string& letters) {
+  return {.kind = RuleKind::kFilePath, .words = {path}, .verdict = Permissions::Parse(letters)};
+}
+
+Observations Of(std::initializer_list<Policy::Question> questions) {
+  Observations observations;
+  for (const Policy::Question& each : questions) observations.Note(each, "/bin/prog");
+  return observations;
+}
+
+std::vector<std::string> ProposedFor(std::initializer_list<Policy::Question> questions,
+                                     const InstalledDomain& domain = {}) {
+  return Propose(Of(questions), domain);
+}
+
+TEST(Propose, GivesAProgramThatDoesNothingItsStart) {
+  EXPECT_THAT(ProposedFor({}), ElementsAre(kStart));
+}
+
+TEST(Propose, CountsAndNamesTheFirst) {
+  Observations observations;
+  EXPECT_TRUE(observations.Note(Call("socket"), "/usr/bin/nc"));
+  EXPECT_FALSE(observations.Note(Call("socket"), "/bin/other"));
+  EXPECT_THAT(Propose(observations, {}),
+              ElementsAre(kStart, "-s socket grant   # 2 times, first by /usr/bin/nc"));
+}
+
+TEST(Propose, TakesASetForManyOfItsCallsAndNotForFew) {
+  const auto few = ProposedFor({Call("bind"), Call("listen"), Call("accept"), Call("socket")});
+  EXPECT_THAT(few, Not(Contains(HasSubstr("@network"))));
+  EXPECT_EQ(few.size(), 5);
+  const auto many =
+      ProposedFor({Call("bind"), Call("listen"), Call("accept"), Call("socket"), Call("connect")});
+  EXPECT_THAT(
+      many,
+      ElementsAre(kStart, "-s @network grant   # 5 calls: bind listen accept socket connect"));
+}
+
+TEST(Propose, NeverTakesTheSetOfAnAdministrator) {
+  const auto lines = ProposedFor(
+      {Call("reboot"), Call("swapon"), Call("swapoff"), Call("acct"), Call("sethostname")});
+  EXPECT_THAT(lines, Not(Contains(HasSubstr("@privileged"))));
+  EXPECT_EQ(lines.size(), 6);
+}
+
+TEST(Propose, HasALineForTheFilesOfALabel) {
+  EXPECT_THAT(
+      ProposedFor(
+          {File(FileAccess::kRead, "/etc/b", "config"), File(FileAccess::kRead, "/etc/a", "config"),
+           File(FileAccess::kWrite, "/etc/a", "config"), Making("regular", "/spool/x", "spool")}),
+      ElementsAre(kStart, "-a config read grant   # 2 files, first /etc/b",
+                  "-a config write grant   # 1 file, first /etc/a",
+                  "-f spool spool regular grant   # 1 file, first /spool/x"));
+}
+
+TEST(Propose, TakesADirectoryForThreeFilesThatNeedTheSame) {
+  EXPECT_THAT(
+      ProposedFor({File(FileAccess::kRead, "/etc/a"), File(FileAccess::kRead, "/etc/b"),
+                   File(FileAccess::kWrite, "/etc/w")}),
+      ElementsAre(kStart, "-r /etc/a r   # first by /bin/prog",
+                  "-r /etc/b r   # first by /bin/prog", "-r /etc/w w   # first by /bin/prog"));
+  EXPECT_THAT(ProposedFor({File(FileAccess::kRead, "/etc/a"), File(FileAccess::kRead, "/etc/b"),
+                           File(FileAccess::kRead, "/etc/c"), File(FileAccess::kWrite, "/etc/w")}),
+              ElementsAre(kStart, "-r /etc r   # 3 files, first /etc/a",
+                          "-r /etc/w rw   # first by /bin/prog"));
+}
+
+TEST(Propose, NeverProposesTheRoot) {
+  EXPECT_THAT(
+      ProposedFor({File(FileAccess::kList, "/"), File(FileAccess::kRead, "/a"),
+                   File(FileAccess::kRead, "/b"), File(FileAccess::kRead, "/c")}),
+      ElementsAre(kStart, HasSubstr("-r /a r "), HasSubstr("-r /b r "), HasSubstr("-r /c r ")));
+}
+
+TEST(Propose, SpeaksOfWhatIsMadeByItsDirectory) {
+  EXPECT_THAT(
+      ProposedFor({Making("directory", "/work/new"), Making("regular", "/work/new/f"),
+                   File(FileAccess::kWrite, "/work/new/f"), File(FileAccess::kRead, "/work/new/f"),
+                   File(FileAccess::kRemove, "/work/new/f")}),
+      ElementsAre(kStart, "-r /work rw   # first by /bin/prog"));
+}
+
+TEST(Propose, SpeaksOfNumberedFilesByTheirDirectory) {
+  EXPECT_THAT(ProposedFor({File(FileAccess::kRead, "/proc/12/stat"),
+                           File(FileAccess::kWrite, "/dev/pts/3")}),
+              ElementsAre(kStart, HasSubstr("-r /dev/pts w "), HasSubstr("-r /proc r ")));
+}
+
+TEST(Propose, SpeaksOfAPathThatNoLineCanHoldByItsDirectory) {
+  EXPECT_THAT(
+      ProposedFor({File(FileAccess::kRead, "/opt/a b"), File(FileAccess::kRead, "/srv/#1/x")}),
+      ElementsAre(kStart, HasSubstr("-r /opt r "), HasSubstr("-r /srv r ")));
+}
+
+// The rule for the path is the nearest one and would refuse what the label grants.
+TEST(Propose, PutsNoPathInTheWayOfALabel) {
+  EXPECT_THAT(
+      ProposedFor({File(FileAccess::kRead, "/etc/a"), File(FileAccess::kRead, "/etc/b"),
+                   File(FileAccess::kRead, "/etc/c"), File(FileAccess::kWrite, "/etc/k", "key")}),
+      ElementsAre(kStart, HasSubstr("-a key write grant "), HasSubstr("-r /etc r "),
+                  HasSubstr("-r /etc/k rw ")));
+}
+
+TEST(Propose, LeavesOutWhatTheDomainIsGranted) {
+  InstalledDomain domain;
+  domain.rules = {
+      {.kind = RuleKind::kSyscall, .words = {"@start"}, .verdict = true},
+      {.kind = RuleKind::kSyscall, .words = {"socket"}, .verdict = true},
+      Path("/etc", "r"),
+  };
+  EXPECT_THAT(ProposedFor({Call("socket"), Call("bind"), File(FileAccess::kRead, "/etc/a"),
+                           File(FileAccess::kWrite, "/etc/a")},
+                          domain),
+              ElementsAre(HasSubstr("-s bind grant "), HasSubstr("-r /etc/a rw ")));
+}
+
+TEST(Propose, HasPortsFamiliesAndIdentitiesOfANewDomainOnly) {
+  const std::initializer_list<Policy::Question> asked = {
+      Check("socket_family", "2"), Check("socket_type", "1"),       Check("bind_port", "80"),
+      Check("bind_port", "0"),     Check("ioctl_request", "21505"), Check("set_uid", "33")};
+  EXPECT_THAT(ProposedFor(asked),
+              ElementsAre(kStart, HasSubstr("-p socket_family 2 grant "),
+                          HasSubstr("-p bind_port 80 grant "), HasSubstr("-p bind_port 0 grant "),
+                          HasSubstr("-p set_uid 33 grant ")));
+  InstalledDomain domain;
+  domain.rules = {{.kind = RuleKind::kSyscall, .words = {"@start"}, .verdict = true}};
+  EXPECT_THAT(ProposedFor(asked, domain), ElementsAre());
+}
+
+// Beside rules for ports no other protocol passes.
+TEST(Propose, HasNoPortsBesideDatagrams) {
+  EXPECT_THAT(ProposedFor({Check("socket_type", "2"), Check("connect_port", "53"),
+                           Check("connect_port", "443")}),
+              ElementsAre(kStart));
+}
+
+}  // namespace

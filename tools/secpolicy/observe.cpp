@@ -1,0 +1,148 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <iostream>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "command_line.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "installed/installed_policy.h"
+#include "observe/asked_rules.h"
+#include "observe/proposal.h"
+#include "observe/watch.h"
+#include "policy/call_set.h"
+#include "query/ask.h"
+#include "query/question.h"
+#include "text/format.h"
+#include "text/visible.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using LinuxHost::Descriptor;
+using LinuxHost::ThrowErrno;
+
+struct Options {
+  std::string domain;
+  std::string file;
+  std::vector<std::string> command;
+};
+
+// A proposal never takes the place of a policy file.
+Descriptor CreateFile(const std::string& file) {
+  if (file.empty()) return Descriptor(-1);
+  constexpr mode_t kMode = 0644;
+  Descriptor created(open(file.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
+  if (!created.IsOpen()) ThrowErrno("cannot make ", file);
+  return created;
+}
+
+void WriteFile(const std::string& file, const Descriptor& to, const std::string& text) {
+  std::size_t written = 0;
+  while (written < text.size()) {
+    const ssize_t count = write(to.Number(), text.data() + written, text.size() - written);
+    if (count < 0) ThrowErrno("cannot write ", file);
+    written += static_cast<std::size_t>(count);
+  }
+}
+
+// What every program does, and nothing can be learnt from.
+bool IsNoticed(std::string_view call) {
+  static const Policy::CallSet& start = *Policy::FindCallSet("@start");
+  return call == "openat" || !start.Has(call);
+}
+
+Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl& access,
+                     ExitCode& end) {
+  Observations observations;
+  const auto notice = [&](const Enforce::Attempt& attempt) {
+    if (!attempt.isStart) {
+      observations.Note(Policy::WordsQuestion{.kind = Policy::RuleKind::kSyscall,
+                                              .words = {std::string(attempt.call)}},
+                        attempt.program);
+    }
+    const std::string& program = attempt.isStart ? options.command.front() : attempt.program;
+    for (const Policy::Question& asked : attempt.asked) {
+      observations.Note(WithLabel(asked, access), program);
+    }
+  };
+  end = RunWatched("observe", options.command, IsNoticed, notice);
+  return observations;
+}
+
+std::string TextOf(const Options& options, const std::vector<std::string>& lines) {
+  std::string command;
+  for (const std::string& word : options.command) command += " " + Visible(word);
+  std::string text = "# Proposed from one run of" + command + "\n";
+  for (const std::string& line : lines) text += line + "\n";
+  return text;
+}
+
+ExitCode Propose(const Options& options) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  Policy::InstalledDomain domain;
+  if (!options.domain.empty()) {
+    auto installed = ReadInstalledDomain(options.domain, access);
+    if (!installed) RefuseDomain(options.domain, access);
+    domain = std::move(*installed);
+  }
+  const Descriptor file = CreateFile(options.file);
+  ExitCode end = kWell;
+  const Observations observations = Observe(options, access, end);
+  const std::vector<std::string> lines = SecPolicyCli::Propose(observations, domain);
+  const std::string text = TextOf(options, lines);
+  if (!file.IsOpen()) {
+    std::cout << text;
+    return end;
+  }
+  WriteFile(options.file, file, text);
+  std::cerr << "secpolicy: observe: " << CountOf(lines.size(), "line") << " proposed in "
+            << Visible(options.file) << std::endl;
+  return end;
+}
+
+ExitCode Start(const Options& options) {
+  try {
+    return Propose(options);
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    std::cerr << "secpolicy: observe: " << Visible(failure.what()) << std::endl;
+    return kNotConfined;
+  }
+}
+
+Action Define(Syntax& syntax) {
+  const auto options = std::make_shared<Options>();
+  syntax.AddOption("--for", options->domain, "Leave out what the rules of a domain grant already")
+      .NameValue("DOMAIN");
+  syntax.AddOption("--write", options->file, "Write the lines to a new file").NameValue("FILE");
+  syntax.AddList("CMD", options->command, "The program and its arguments, behind --").Require();
+  return [=] {
+    return Ask(
+        "observe", [=] { return Start(*options); }, kNotConfined);
+  };
+}
+
+}  // namespace
+
+const Verb kObserve = {
+    "observe", "Run a program, watch what it does, and propose the rules for it",
+    "Starts CMD without a domain, refuses nothing, and when it and all that it started have "
+    "ended,\n"
+    "prints the lines of a policy file by which a domain could have run it: system calls, checks,\n"
+    "capabilities, and files by their labels, where they have one, else by their paths. Behind\n"
+    "each line stands why it is there. A run shows only what it did: look at every line, and\n"
+    "let the domain be permissive for a while.\n"
+    "\n"
+    "Exit status: that of CMD; 126 when it could not be watched or started, 127 when there is no\n"
+    "such program, 2 for wrong usage.\n"
+    "\n"
+    "Examples:\n"
+    "  secpolicy observe --write /etc/zorvan/secpolicy/domains/webDom -- /usr/sbin/webd\n"
+    "  secpolicy observe --for webDom -- /usr/sbin/webd -t     what is still missing?",
+    Define, OpenProc};
+
+}  // namespace SecPolicyCli

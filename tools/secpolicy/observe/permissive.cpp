@@ -1,0 +1,56 @@
+#include "permissive.h"
+
+#include <iostream>
+
+#include "asked_rules.h"
+#include "host/enforce/supervise/asked.h"
+#include "host/linux/operation/log_use.h"
+#include "installed/installed_policy.h"
+#include "proposal.h"
+#include "query/question.h"
+#include "text/visible.h"
+#include "watch.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Policy::RuleKind;
+using Policy::WordsQuestion;
+
+Policy::Question AskCall(std::string_view call) {
+  return WordsQuestion{.kind = RuleKind::kSyscall, .words = {std::string(call)}};
+}
+
+// In one write, for the program may be writing lines, too.
+void TellRefused(const std::string& verb, const std::string& domain,
+                 const Policy::Question& question) {
+  const std::string line = domain + " would be refused: " + Visible(TextOf(question));
+  std::cerr << "secpolicy: " + verb + ": " + line + "\n" << std::flush;
+  LinuxHost::LogLine(line);
+}
+
+}  // namespace
+
+ExitCode RunPermissive(const std::string& verb, const std::string& name,
+                       const std::vector<std::string>& command,
+                       SecPolicy::TeskAccessInterfaceImpl& access) {
+  const auto domain = ReadInstalledDomain(name, access);
+  if (!domain) RefuseDomain(name, access);
+  Observations seen;
+  const auto judge = [&](const Policy::Question& question, const std::string& program) {
+    if (!seen.Note(question, program) || Decide(question, *domain).granted) return;
+    TellRefused(verb, name, question);
+  };
+  const auto isNoticed = [&](std::string_view call) {
+    return Enforce::AsksMore(call) || !Decide(AskCall(call), *domain).granted;
+  };
+  const auto notice = [&](const Enforce::Attempt& attempt) {
+    if (!attempt.isStart) judge(AskCall(attempt.call), attempt.program);
+    for (const Policy::Question& asked : attempt.asked) {
+      judge(WithLabel(asked, access), attempt.program);
+    }
+  };
+  return RunWatched(verb, command, isNoticed, notice);
+}
+
+}  // namespace SecPolicyCli

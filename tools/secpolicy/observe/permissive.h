@@ -1,0 +1,18 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "secpolicy/secpolicy.h"
+#include "verb.h"
+
+namespace SecPolicyCli {
+
+// Runs `command` for the verb `verb` as RunWatched does, refuses nothing, and tells once of
+// everything that the rules of the domain with the name `name` would refuse, here and in the log of
+// the host.
+ExitCode RunPermissive(const std::string& verb, const std::string& name,
+                       const std::vector<std::string>& command,
+                       SecPolicy::TeskAccessInterfaceImpl& access);
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,42 @@
+#include "watch.h"
+
+#include <fcntl.h>
+
+#include <cerrno>
+#include <cstring>
+#include <iostream>
+#include <utility>
+
+#include "braxo/lib/exception.h"
+#include "host/enforce/features.h"
+#include "text/visible.h"
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr int kNotFound = 127;
+
+int proc = -1;
+
+}  // namespace
+
+void OpenProc() { proc = open("/proc", O_PATH | O_DIRECTORY | O_CLOEXEC); }
+
+ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& command,
+                    std::function<bool(std::string_view call)> isNoticed,
+                    std::function<void(const Enforce::Attempt&)> notice) {
+  if (proc < 0) throw Braxo::Lib::BraxoException("programs cannot be watched without /proc");
+  if (!Enforce::ProbeFeatures().notifies) {
+    throw Braxo::Lib::BraxoException("this kernel has no filters that ask a supervisor");
+  }
+  std::cout << std::flush;
+  const Enforce::Supervision supervision = {
+      .procDirectory = proc, .isNoticed = std::move(isNoticed), .notice = std::move(notice)};
+  const Enforce::SupervisedEnd end = Enforce::Supervise(command, supervision);
+  if (end.startError == 0) return static_cast<ExitCode>(end.exitStatus);
+  std::cerr << "secpolicy: " << verb << ": cannot start " << Visible(command.front()) << ": "
+            << std::strerror(end.startError) << std::endl;
+  return end.startError == ENOENT ? static_cast<ExitCode>(kNotFound) : kNotConfined;
+}
+
+}  // namespace SecPolicyCli
