@@ -30,6 +30,13 @@ boot() {
   "$SECPOLICY" --root "$root" boot 2>"$BATS_TEST_TMPDIR/boot.err"
 }
 
+# needs_landlock: skips the test where the kernel cannot confine anybody.
+needs_landlock() {
+  local found
+  found=$("$SECPOLICY" features --format json | jq .features.landlock)
+  ((found >= 3)) || skip "this kernel's Landlock cannot refuse what a domain may not do (version $found)"
+}
+
 # exits STATUS: the latest command ended with it.
 exits() {
   [[ $status -eq $1 ]] && return

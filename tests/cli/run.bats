@@ -3,6 +3,11 @@
 
 load helper
 
+setup() {
+  needs_landlock
+  make_root
+}
+
 # in_domain DOMAIN WORDS: what the shell of the example makes of WORDS in the domain.
 in_domain() {
   secpolicy run "$1" -- /bin/sh -c "$2"
