@@ -123,9 +123,9 @@ TEST(PlanPaths, GivesANarrowerPathMore) {
 TEST(PlanPaths, TakesADirectoryApartWhereANarrowerPathHasLess) {
   MemoryTree files = Files({"/opt", "/opt/bin", "/opt/spool"}, {"/opt/f", "/opt/spool/s"});
   const PathPlan plan = PlanPaths(Domain({Path("/opt", "rx"), Path("/opt/spool", "r")}), {}, files);
-  EXPECT_THAT(plan.rights,
-              ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt/bin", Landlock::kExecute},
-                          PathRight{"/opt/f", Landlock::kExecute}));
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", kReading},
+                                       PathRight{"/opt/bin", Landlock::kExecute, true},
+                                       PathRight{"/opt/f", Landlock::kExecute, true}));
   EXPECT_EQ(HowOf(plan, 0),
             "narrowed: entries of /opt have different rights: those that are there at the start "
             "have theirs, new ones and the directory itself do not");
@@ -147,8 +147,8 @@ TEST(PlanPaths, LetsNobodyMakeWhatAMissingPathRefuses) {
   const PathPlan plan =
       PlanPaths(Domain({Path("/srv", "rw"), Path("/srv/private", "")}), {}, files);
   EXPECT_THAT(plan.rights,
-              ElementsAre(PathRight{"/srv/a", kReading | kWriting},
-                          PathRight{"/srv/f", (kReading | kWriting) & Landlock::kOfFiles}));
+              ElementsAre(PathRight{"/srv/a", kReading | kWriting, true},
+                          PathRight{"/srv/f", (kReading | kWriting) & Landlock::kOfFiles, true}));
 }
 
 TEST(PlanPaths, TellsOfAPathThatIsNotThere) {
@@ -172,8 +172,8 @@ TEST(PlanPaths, TakesADirectoryApartAroundALabelThatHasLess) {
   MemoryTree files = Files({"/etc", "/etc/ssh"}, {"/etc/ssh/key", "/etc/ssh/known", "/etc/hosts"});
   const std::vector<LabelledPath> places = {{"/etc", "config"}, {"/etc/ssh/key", "key"}};
   const PathPlan plan = PlanPaths(Domain({Object("config", "read")}), places, files);
-  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/etc/hosts", Landlock::kReadFile},
-                                       PathRight{"/etc/ssh/known", Landlock::kReadFile}));
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/etc/hosts", Landlock::kReadFile, true},
+                                       PathRight{"/etc/ssh/known", Landlock::kReadFile, true}));
 }
 
 TEST(PlanPaths, MakesWhatTheLabelOfADirectoryGrants) {
@@ -241,7 +241,7 @@ TEST(PlanPaths, NeitherReadsNorExecutesWhatEntersAnotherDomain) {
                 {{"/bin/other", "gate"}}, files);
   EXPECT_THAT(plan.rights,
               ElementsAre(PathRight{"/bin", Landlock::kReadDir},
-                          PathRight{"/bin/tool", Landlock::kReadFile | Landlock::kExecute}));
+                          PathRight{"/bin/tool", Landlock::kReadFile | Landlock::kExecute, true}));
   EXPECT_EQ(HowOf(plan, 1), "narrowed: only by \"secpolicy exec\"");
 }
 

@@ -352,14 +352,15 @@ class Planner {
     Lose(region, lost, "there is nothing at " + region.rule->words[0] + ", or only a link");
   }
 
-  void Give(const std::string& path, const Region& region, Rights given) {
+  void Give(const std::string& path, const Region& region, Rights given,
+            bool mayBeMissing = false) {
     if (given == 0) return;
     if (rights.size() == kMostPathRights) {
       Lose(region, given,
            "it takes more than " + std::to_string(kMostPathRights) + " rights to paths");
       return;
     }
-    rights.push_back({path, given});
+    rights.push_back({path, given, mayBeMissing});
   }
 
   // What is beneath the directory does not all have the rights: each entry gets them that does.
@@ -379,8 +380,9 @@ class Planner {
       if (node.children.contains(name)) continue;
       const std::string entry = Join(path, name);
       const FileKind kind = files.KindOf(entry);
-      if (kind == FileKind::kDirectory) Give(entry, region, apart);
-      if (kind == FileKind::kFile) Give(entry, region, apart & Landlock::kOfFiles);
+      // No rule names it, so it may come and go.
+      if (kind == FileKind::kDirectory) Give(entry, region, apart, true);
+      if (kind == FileKind::kFile) Give(entry, region, apart & Landlock::kOfFiles, true);
     }
   }
 
