@@ -4,6 +4,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <linux/fs.h>
 #include <linux/sched.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
@@ -133,6 +134,8 @@ constexpr std::uint64_t kValues[] = {0,
                                      0x5401,
                                      TIOCSTI,
                                      TIOCLINUX,
+                                     FS_IOC_SETFLAGS,
+                                     FS_IOC_FSSETXATTR,
                                      0x8901,
                                      0xffff,
                                      0x7fff'ffff,

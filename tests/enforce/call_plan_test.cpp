@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <linux/fs.h>
 #include <linux/prctl.h>
 #include <linux/sched.h>
 #include <linux/sockios.h>
@@ -274,8 +275,9 @@ TEST(PlanCalls, AnswersClone3AsUnknown) {
 
 // ---- Values that reach past the domain
 
-TEST(PlanCalls, RefusesTypingIntoTheTerminal) {
-  for (const std::uint64_t request : Numbers{TIOCSTI, TIOCLINUX}) {
+TEST(PlanCalls, RefusesRequestsThatReachPastTheRules) {
+  for (const std::uint64_t request :
+       Numbers{TIOCSTI, TIOCLINUX, FS_IOC_SETFLAGS, FS_IOC_FSSETXATTR}) {
     const std::string check = "-p ioctl_request " + std::to_string(request);
     EXPECT_EQ(Ask({"-s ioctl grant"}, "ioctl", {0, request}), "EPERM");
     EXPECT_EQ(Ask({"-s ioctl grant"}, "ioctl", {0, request | kHighBits}), "EPERM");
@@ -288,10 +290,12 @@ TEST(PlanCalls, RefusesTypingIntoTheTerminal) {
   EXPECT_EQ(Ask({"-s ioctl grant"}, "ioctl", {0, TIOCGWINSZ}), "allowed");
 }
 
-TEST(PlanCalls, TellsWhoWouldLetTheTerminalBeTypedInto) {
+TEST(PlanCalls, TellsWhoWouldGrantSuchRequests) {
   EXPECT_THAT(ToldOf({"-s ioctl grant", "-s kill grant"}),
               ElementsAre("narrowed: -s ioctl grant (ioctl: TIOCSTI is refused unless granted by "
-                          "itself; ioctl: TIOCLINUX is refused unless granted by itself)"));
+                          "itself; ioctl: TIOCLINUX is refused unless granted by itself; "
+                          "ioctl: FS_IOC_SETFLAGS is refused unless granted by itself; "
+                          "ioctl: FS_IOC_FSSETXATTR is refused unless granted by itself)"));
   EXPECT_THAT(
       ToldOf({"-s ioctl grant", "-p ioctl_request 0x5400 0x5412 grant",
               "-p ioctl_request 0x5413 grant", "-p ioctl_request 0x541c grant"}),

@@ -1,6 +1,7 @@
 #include "host/enforce/plan/call_plan.h"
 
 #include <fcntl.h>
+#include <linux/fs.h>
 #include <linux/prctl.h>
 #include <linux/sched.h>
 #include <linux/sockios.h>
@@ -84,7 +85,10 @@ struct DangerousValue {
 constexpr DangerousValue kDangerousValues[] = {
     {"ioctl_request", "ioctl", TIOCSTI, "TIOCSTI"},      // types into the terminal
     {"ioctl_request", "ioctl", TIOCLINUX, "TIOCLINUX"},  // pastes into the console
-    {"prctl_option", "prctl", PR_SET_MM, "PR_SET_MM"},   // says what program a process runs
+    // These change attributes of a file that is open for reading alone.
+    {"ioctl_request", "ioctl", FS_IOC_SETFLAGS, "FS_IOC_SETFLAGS"},
+    {"ioctl_request", "ioctl", FS_IOC_FSSETXATTR, "FS_IOC_FSSETXATTR"},
+    {"prctl_option", "prctl", PR_SET_MM, "PR_SET_MM"},  // says what program a process runs
 };
 
 // ---- clone_flags

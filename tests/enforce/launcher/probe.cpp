@@ -13,6 +13,8 @@
 #include <signal.h>
 #include <sys/capability.h>
 #include <sys/fsuid.h>
+#include <sys/inotify.h>
+#include <sys/ioctl.h>
 #include <sys/mman.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
@@ -331,6 +333,19 @@ long ReadMemory(const Words& words) {
   return size < 0 && errno == EFAULT ? 0 : size;
 }
 
+long WatchDirectory(const Words& words) {
+  return inotify_add_watch(inotify_init1(IN_CLOEXEC), words.First(), IN_ALL_EVENTS);
+}
+
+// Of a file that is open for reading alone.
+long SetFlags(const Words& words) {
+  int flags = 0;
+  const int file = open(words.First(), O_RDONLY);
+  if (file < 0 || ioctl(file, FS_IOC_GETFLAGS, &flags) != 0) return -1;
+  flags |= FS_NODUMP_FL;
+  return ioctl(file, FS_IOC_SETFLAGS, &flags);
+}
+
 long SetUserForFiles(const Words& words) {
   setfsuid(static_cast<uid_t>(words.Number()));
   errno = EPERM;
@@ -418,6 +433,8 @@ const NamedOperation kOperations[] = {
     {"rename", [](const Words& w) -> long { return rename(w.First(), w.Second()); }},
     {"exchange", [](const Words& w) -> long { return renameat2(AT_FDCWD, w.First(), AT_FDCWD, w.Second(), RENAME_EXCHANGE); }},
     {"link", [](const Words& w) -> long { return link(w.First(), w.Second()); }},
+    {"watch", WatchDirectory},
+    {"set-flags", SetFlags},
     {"list", [](const Words& w) -> long { return Close(open(w.First(), O_RDONLY | O_DIRECTORY)); }},
     {"chmod", [](const Words& w) -> long { return chmod(w.First(), 0755); }},
     {"chown", [](const Words& w) -> long { return chown(w.First(), geteuid(), getegid()); }},
