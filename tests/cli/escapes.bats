@@ -63,7 +63,7 @@ boot_as() {
   [[ -z $ESCAPE_AS ]] || chown -R "$ESCAPE_AS:$ESCAPE_AS" "$root"
   secpolicy boot
   exits 0
-  secpolicy settings enforcement openDom permissive
+  secpolicy settings enforcement openDom disabled
   exits 0
   secpolicy restore
   exits 0
