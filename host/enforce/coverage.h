@@ -11,7 +11,7 @@ namespace Enforce {
 enum class Fate {
   kEnforced,
   kNarrowed,        // the domain may do less than the rule says
-  kNotExpressible,  // the domain could do more than its rules say
+  kNotExpressible,  // the domain could do more than its rules say, or never what the rule is for
 };
 
 struct RuleFate {

@@ -17,6 +17,7 @@ setup_file() {
 }
 
 setup() {
+  needs_landlock
   [[ -z $ESCAPE_AS || $(id -u) -eq 0 ]] || skip "only root can become another user"
   is_machine=
   before=()

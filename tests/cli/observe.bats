@@ -3,6 +3,11 @@
 
 load helper
 
+setup() {
+  needs_landlock
+  make_root
+}
+
 # A service that the example has no rules for: it keeps a journal and reads its settings.
 make_service() {
   mkdir -p "$root/opt/journal/bin" "$root/srv/journal"

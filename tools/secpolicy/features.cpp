@@ -61,6 +61,7 @@ ExitCode ShowFates(const std::string& domain, const std::string& format) {
     std::cout << Json{{"schema", "secpolicy.features/1"},
                       {"features", ToJson(Enforce::ProbeFeatures())},
                       {"domain", domain},
+                      {"gaps", compiled.gaps},
                       {"rules", FatesToJson(compiled.fates)}}
                      .Text();
   } else {
@@ -90,7 +91,9 @@ const Verb kFeatures = {
     "\n"
     "  enforced          exactly\n"
     "  narrowed          the domain may do less than the rule says, and how\n"
-    "  notExpressible    it could do more: 'secpolicy run' starts nothing then\n"
+    "  notExpressible    it could do more, or could never do what the rule is for: 'secpolicy "
+    "run'\n"
+    "                    starts nothing then\n"
     "\n"
     "Exit status with --for: 0 all rules can be kept to, 1 some cannot.\n"
     "\n"
