@@ -1,9 +1,7 @@
 #include "host/enforce/compile.h"
 
 #include <algorithm>
-#include <array>
 #include <iterator>
-#include <sstream>
 #include <utility>
 
 #include "host/enforce/plan/call_plan.h"
@@ -11,7 +9,6 @@
 #include "host/enforce/plan/dump.h"
 #include "host/enforce/plan/net_plan.h"
 #include "host/enforce/plan/port_check.h"
-#include "policy/call_set.h"
 
 namespace Enforce {
 namespace {
@@ -52,12 +49,7 @@ void GiveUp(RuleFate* fate, const char* reason) {
 
 // Landlock lets signals through to what was started in the same entry alone.
 RuleFate WithScope(RuleFate fate) {
-  constexpr std::array kSending = {
-      "kill", "tkill", "tgkill", "rt_sigqueueinfo", "rt_tgsigqueueinfo", "pidfd_send_signal"};
-  const bool sends = fate.rule.Grants() && std::ranges::any_of(kSending, [&](const char* call) {
-                       return Policy::SpeaksOfCall(fate.rule.words[0], call);
-                     });
-  if (!sends) return fate;
+  if (!fate.rule.Grants() || !SpeaksOfSignals(fate.rule)) return fate;
   fate.fate = std::max(fate.fate, Fate::kNarrowed);
   fate.how += fate.how.empty() ? "" : "; ";
   fate.how += "signals reach only what was started with the same entry into the domain";

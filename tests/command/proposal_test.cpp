@@ -124,10 +124,10 @@ TEST(Propose, NeverProposesTheRoot) {
 
 TEST(Propose, SpeaksOfWhatIsMadeByItsDirectory) {
   EXPECT_THAT(
-      ProposedFor({Making("directory", "/work/new"), Making("regular", "/work/new/f"),
-                   File(FileAccess::kWrite, "/work/new/f"), File(FileAccess::kRead, "/work/new/f"),
-                   File(FileAccess::kRemove, "/work/new/f")}),
-      ElementsAre(kStart, "-r /work rw   # first by /bin/prog"));
+      ProposedFor({Making("directory", "/srv/new"), Making("regular", "/srv/new/f"),
+                   File(FileAccess::kWrite, "/srv/new/f"), File(FileAccess::kRead, "/srv/new/f"),
+                   File(FileAccess::kRemove, "/srv/new/f")}),
+      ElementsAre(kStart, "-r /srv rw   # first by /bin/prog"));
 }
 
 TEST(Propose, SpeaksOfNumberedFilesByTheirDirectory) {

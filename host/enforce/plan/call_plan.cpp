@@ -537,4 +537,11 @@ CallPlan PlanCalls(const Policy::InstalledDomain& domain) {
   }
 }
 
+bool SpeaksOfSignals(const Rule& rule) {
+  return std::ranges::any_of(kCheckedArguments, [&](const CheckedArgument& checked) {
+    return std::string_view(checked.check) == "kill_signal" &&
+           Policy::SpeaksOfCall(rule.words[0], checked.call);
+  });
+}
+
 }  // namespace Enforce

@@ -33,4 +33,7 @@ struct CallPlan {
 // Throws BraxoException for a rule whose words are no range.
 CallPlan PlanCalls(const Policy::InstalledDomain& domain);
 
+// True for a rule about system calls that speaks of one whose signal a check is about.
+bool SpeaksOfSignals(const Policy::Rule& rule);
+
 }  // namespace Enforce
