@@ -133,6 +133,14 @@ inline int OpenPlace(const char* path) {
   return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof(how)));
 }
 
+// The same for reading it. No way of opening it waits, and no terminal becomes this process's.
+inline int OpenForReading(const char* path) {
+  open_how how = {};
+  how.flags = O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  how.resolve = RESOLVE_NO_SYMLINKS;
+  return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof(how)));
+}
+
 // execve and execveat with `secret` where a filter looks for it. Return only when they fail.
 inline int Execute(const char* path, char* const* arguments, char* const* environment,
                    std::uint64_t secret) {

@@ -299,6 +299,36 @@ makes_only() {
   refuses EACCES read=/t/public/data
 }
 
+@test "11 a link to another program while a domain is entered by it" {
+  local _
+  # Each tells which program it is: the probe has no such operation, and the launcher a version.
+  cp "$programs/secpolicy-run" "$root/t/secret/program"
+  printf '%s\n' '-d public openDom exec grant' '-d secret silentDom exec grant' >>"$policy/domains/hostDom"
+  domain openDom
+  domain silentDom "${calls[@]}" '-r /t rx' '-s write revoke'
+  boot_as
+  ln -s /t/public/program "$root/t/one"
+  ln -s /t/secret/program "$root/t/other"
+  ln -s /t/public/program "$root/t/link"
+  secpolicy exec -- /t/one --version
+  [[ $output == "--version is no operation" ]]
+  secpolicy exec -- /t/other --version
+  [[ -z $output ]]
+  # Where it says its version it is not in its own domain.
+  secpolicy run openDom -- /t/other --version
+  [[ $output == "secpolicy-run "* ]]
+  in_background python3 -c '
+import itertools, os, sys
+os.chdir(sys.argv[1])
+for kind in itertools.cycle(("public", "secret")):
+    os.symlink(f"/t/{kind}/program", "new")
+    os.rename("new", "link")' "$root/t"
+  for _ in {1..30}; do
+    secpolicy exec -- /t/link --version
+    [[ -z $output || $output == "--version is no operation" ]]
+  done
+}
+
 @test "12 by the directory above" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t r'

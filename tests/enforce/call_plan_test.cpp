@@ -105,10 +105,21 @@ TEST(PlanCalls, LetsOneExecvePassWithASecret) {
   EXPECT_EQ(Ask(plan, "execveat"), "EPERM");
 }
 
-TEST(PlanCalls, NeedsNoSecretWhereExecveIsGranted) {
-  const CallPlan plan = PlanOf({"-s execve grant"});
+TEST(PlanCalls, NeedsNoSecretWhereBothAreGranted) {
+  const CallPlan plan = PlanOf({"-s execve grant", "-s execveat grant"});
   EXPECT_FALSE(plan.secret);
   EXPECT_EQ(Ask(plan, "execve"), "allowed");
+  EXPECT_EQ(Ask(plan, "execveat"), "allowed");
+}
+
+// The launcher executes a program by its descriptor, too.
+TEST(PlanCalls, LetsOneExecveatPassWhereExecveIsGranted) {
+  const Arguments guess = {0, 0, 0, 0, 0, 42};
+  CallPlan plan = PlanOf({"-s execve grant"});
+  ASSERT_TRUE(plan.secret);
+  SetSecret(plan.program.data(), *plan.secret, 42);
+  EXPECT_EQ(Ask(plan, "execve"), "allowed");
+  EXPECT_EQ(Ask(plan, "execveat", guess), "allowed");
   EXPECT_EQ(Ask(plan, "execveat"), "EPERM");
 }
 

@@ -62,6 +62,7 @@ TEST(Dump, ShowsWhatIsClosedBesides) {
       "3-9 11-0xffffffff or argument 2 & 255 in 1, and argument 1 in 0-1 3-9 11-0xffffffff or "
       "argument 3 in 0 6: socket\n"
       "allowed where argument 4 & 0x20000000 in 0: sendto\n"
+      "refused but to enter: execveat\n"
       "refused: all others\n"
       "narrowed: -s socket grant (socket: unix sockets are refused unless socket_family grants 1, "
       "as they reach whoever listens; socket: only TCP reaches the internet beside rules for "

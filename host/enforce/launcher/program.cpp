@@ -76,7 +76,7 @@ Program FindProgram(char* const* arguments, char* const* environment) {
 
 Program ProgramOf(int descriptor, char* const* arguments, char* const* environment) {
   const int flags = IsScript(descriptor) ? 0 : FD_CLOEXEC;
-  const std::string name = "descriptor " + std::to_string(descriptor);
+  const std::string name = arguments[0];
   if (fcntl(descriptor, F_SETFD, flags) != 0) RefuseForErrno("cannot execute " + name);
   return {name, descriptor, arguments, environment};
 }

@@ -7,7 +7,7 @@ namespace Enforce {
 
 // What is to be started.
 struct Program {
-  std::string path;
+  std::string path;     // or what it is called
   int descriptor = -1;  // of the program itself; without one it is what the path leads to
   char* const* arguments = nullptr;
   char* const* environment = nullptr;
@@ -17,9 +17,9 @@ struct Program {
 // Refuses (refuse.h) one that is not there or cannot be executed.
 Program FindProgram(char* const* arguments, char* const* environment);
 
-// The program that a descriptor stands for, whatever the first argument says. It is closed when the
-// program starts. Not so where it can be read and is a script: the interpreter opens it again, by
-// the descriptor, and so is given what was meant here.
+// The program that a descriptor stands for; the first argument is only its name. It is closed when
+// the program starts. Not so where it can be read and is a script: the interpreter opens it again,
+// by the descriptor, and so is given what was meant here.
 Program ProgramOf(int descriptor, char* const* arguments, char* const* environment);
 
 // Becomes the program, with `secret` where a filter looks for it. Refuses when that fails;

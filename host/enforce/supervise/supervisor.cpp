@@ -90,7 +90,16 @@ struct Word {
 
 void Tell(int channel, const Word& word) { static_cast<void>(!write(channel, &word, sizeof word)); }
 
-[[noreturn]] void BecomeProgram(const char* program, char* const* arguments,
+// By the path or, where one is open, the descriptor.
+void Execute(const char* path, int descriptor, char* const* arguments) {
+  if (descriptor < 0) {
+    execve(path, arguments, environ);
+  } else {
+    execveat(descriptor, "", arguments, environ, AT_EMPTY_PATH);
+  }
+}
+
+[[noreturn]] void BecomeProgram(const char* path, int program, char* const* arguments,
                                 std::vector<sock_filter>& filter, int channel,
                                 const sigset_t& signals) {
   sigprocmask(SIG_SETMASK, &signals, nullptr);
@@ -100,7 +109,7 @@ void Tell(int channel, const Word& word) { static_cast<void>(!write(channel, &wo
   }
   Tell(channel, {.listener = listener, .error = listener < 0 ? errno : 0});
   if (listener < 0) _exit(kSignalledStatus - 1);
-  execve(program, arguments, environ);
+  Execute(path, program, arguments);
   Tell(channel, {.listener = listener, .error = errno});
   _exit(kSignalledStatus - 1);
 }
@@ -246,7 +255,7 @@ FileDescriptor TakeListener(pid_t child, int number) {
 
 SupervisedEnd Supervise(const std::vector<std::string>& command, const Supervision& supervision) {
   std::vector<sock_filter> filter = FilterOf(supervision);
-  const std::string program = FindProgram(command.front());
+  const std::string path = FindProgram(command.front());
   std::vector<std::string> words = command;
   std::vector<char*> arguments;
   arguments.reserve(words.size() + 1);
@@ -261,7 +270,8 @@ SupervisedEnd Supervise(const std::vector<std::string>& command, const Supervisi
   const pid_t child = fork();
   if (child < 0) ThrowError("cannot start a process", errno);
   if (child == 0) {
-    BecomeProgram(program.c_str(), arguments.data(), filter, childsEnd.Number(), signals.Before());
+    BecomeProgram(path.c_str(), supervision.program, arguments.data(), filter, childsEnd.Number(),
+                  signals.Before());
   }
   childsEnd = {};
   Word word;

@@ -23,6 +23,7 @@ struct Attempt {
 
 struct Supervision {
   int procDirectory = -1;  // of the /proc of this process's own PID namespace
+  int program = -1;        // what to execute, closed on execution; else the command says what it is
 
   // Which calls are told. `write` never is, and so has to be said no to.
   std::function<bool(std::string_view call)> isNoticed;

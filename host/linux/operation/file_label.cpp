@@ -9,16 +9,37 @@
 #include "host/linux/files/security_attribute.h"
 
 namespace LinuxHost {
+namespace {
 
-std::optional<FileLabel> ReadLabel(const char* path) {
+// `get` reads the attribute that the file itself carries, as getxattr(2) does.
+template <class Get>
+std::optional<FileLabel> ReadLabelBy(Get get, const char* path) {
   const std::string attribute = LabelAttribute();
   const char* const name = attribute.c_str();
   FileLabel label;
-  if (lgetxattr(path, name, &label.id, sizeof label.id) >= 0) return label;
+  if (get(name, &label.id, sizeof label.id) >= 0) return label;
   if (errno != ENODATA) return std::nullopt;
   label.isInherited = true;
   if (ReadInherited(path, LastLink::kKept, name, &label.id, sizeof label.id) >= 0) return label;
   return std::nullopt;
+}
+
+}  // namespace
+
+std::optional<FileLabel> ReadLabel(const char* path) {
+  return ReadLabelBy(
+      [&](const char* name, void* value, std::size_t size) {
+        return lgetxattr(path, name, value, size);
+      },
+      path);
+}
+
+std::optional<FileLabel> ReadLabel(int file, const char* path) {
+  return ReadLabelBy(
+      [&](const char* name, void* value, std::size_t size) {
+        return fgetxattr(file, name, value, size);
+      },
+      path);
 }
 
 int ReplaceLabel(const char* path, std::uint32_t id) {

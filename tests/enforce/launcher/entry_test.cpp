@@ -419,7 +419,7 @@ TEST_P(Entry, AsksTheRulesAboutADescriptor) {
                       {},
                       {program.Number()}};
   EXPECT_THAT(RunLauncher(launch).errors,
-              StrEq("secpolicy-run: cannot execute descriptor " + program.Text() +
+              StrEq("secpolicy-run: cannot execute " + ProbePath() +
                     " in the domain testDom: Permission denied\n"));
 }
 

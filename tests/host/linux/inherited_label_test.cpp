@@ -66,6 +66,24 @@ class InheritedLabel : public ScratchRootTest {
   }
 };
 
+// What lies at the path by then carries another label.
+TEST_F(InheritedLabel, OfAnOpenFileIsItsOwn) {
+  EXPECT_EQ(Run([] {
+              const int file = open("tree/file", O_RDONLY);
+              Give("tree/file", 8, 0);
+              rename("tree/file", "tree/moved");
+              rename("elsewhere/file", "tree/file");
+              const auto label = LinuxHost::ReadLabel(file, "tree/file");
+              return label ? std::to_string(label->id) : strerrorname_np(errno);
+            }),
+            "8");
+  EXPECT_EQ(Run([] {
+              const auto label = LinuxHost::ReadLabel(open("tree/file", O_RDONLY), "tree/file");
+              return label ? std::to_string(label->id) : strerrorname_np(errno);
+            }),
+            "7");
+}
+
 TEST_F(InheritedLabel, IsThatOfTheNearestLabelledDirectory) {
   EXPECT_EQ(Run([] {
               const std::string before =

@@ -52,9 +52,9 @@ ExitCode EnterDomain(const std::string& verb,
     LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
     std::cerr << std::flush;
     if (compiled.plan.level == Policy::Level::kPermissive) {
-      return RunPermissive(verb, entry.domain, entry.command, access);
+      return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
     }
-    StartConfined(compiled.plan, entry.command);
+    StartConfined(compiled.plan, entry.command, entry.program);
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
               << std::endl;

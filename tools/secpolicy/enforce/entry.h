@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "command_line.h"
+#include "host/linux/common/descriptor.h"
 #include "secpolicy/secpolicy.h"
 #include "verb.h"
 
@@ -24,6 +25,7 @@ void PrepareEntry();
 struct Entry {
   std::string domain;
   std::vector<std::string> command;
+  LinuxHost::Descriptor program{-1};  // of what was judged; else the command says what it is
 };
 
 // Becomes the program of the entry that `find` finds, or runs and watches it where the domain is

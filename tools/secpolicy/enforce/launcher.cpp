@@ -29,6 +29,7 @@ int launcher = -1;
 std::vector<std::filesystem::path> Places() {
   std::error_code error;
   const auto directory = std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
+  if (error) return {};
   return {directory / kName, directory.parent_path() / SECPOLICY_LIBEXECDIR / kName};
 }
 
@@ -64,6 +65,11 @@ void HandOnCapabilities() {
   }
 }
 
+void HandOn(const Descriptor& program, std::vector<std::string>* words) {
+  if (fcntl(program.Number(), F_SETFD, 0) != 0) ThrowErrno("cannot hand on a program");
+  words->insert(words->end(), {"--program", std::to_string(program.Number())});
+}
+
 }  // namespace
 
 void OpenLauncher() {
@@ -73,7 +79,8 @@ void OpenLauncher() {
   }
 }
 
-void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command) {
+void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command,
+                   const Descriptor& program) {
   if (launcher < 0) {
     throw Braxo::Lib::BraxoException(
         "secpolicy-run, which confines programs, is neither beside this command nor where it is "
@@ -81,7 +88,9 @@ void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& co
   }
   if (geteuid() != 0) HandOnCapabilities();
   const Descriptor file = SealedFile(Enforce::Serialize(plan));
-  std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number()), "--"};
+  std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};
+  if (program.IsOpen()) HandOn(program, &words);
+  words.emplace_back("--");
   words.insert(words.end(), command.begin(), command.end());
   std::vector<char*> arguments;
   arguments.reserve(words.size() + 1);

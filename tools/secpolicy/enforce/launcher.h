@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "host/enforce/plan/plan.h"
+#include "host/linux/common/descriptor.h"
 
 namespace SecPolicyCli {
 
@@ -11,8 +12,9 @@ namespace SecPolicyCli {
 // it, StartConfined() throws.
 void OpenLauncher();
 
-// Becomes the program `command`, confined by `plan`. Returns only by throwing
-// Braxo::Lib::BraxoException.
-[[noreturn]] void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command);
+// Becomes the program `command`, confined by `plan`; where `program` is open, what that stands for,
+// by the name that the command begins with. Returns only by throwing Braxo::Lib::BraxoException.
+[[noreturn]] void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command,
+                                const LinuxHost::Descriptor& program);
 
 }  // namespace SecPolicyCli

@@ -7,11 +7,13 @@
 #include <filesystem>
 #include <string_view>
 #include <system_error>
+#include <utility>
 
+#include "host/linux/operation/file_label.h"
 #include "host/linux/operation/world_entry.h"
 #include "installed/installed_policy.h"
 #include "policy/decision.h"
-#include "query/question.h"
+#include "program_file.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -19,6 +21,7 @@ namespace {
 using Braxo::Lib::BraxoException;
 using Policy::Rule;
 using Policy::RuleKind;
+using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
 bool IsProgram(const std::filesystem::path& path) {
   std::error_code error;
@@ -40,31 +43,38 @@ std::string Find(const std::string& program) {
   throw BraxoException("there is no program '" + program + "' in PATH");
 }
 
-std::string Absolute(const std::string& path) {
-  std::error_code error;
-  const auto absolute = std::filesystem::absolute(path, error);
-  if (!error) return absolute;
-  throw BraxoException("cannot tell where " + path + " is: " + error.message());
-}
-
 Policy::InstalledDomain CallersDomain(SecPolicy::TeskAccessInterfaceImpl& access) {
   auto domain = Policy::ReadDomain(access, LinuxHost::DomainOfCaller());
   if (!domain) throw BraxoException("the domain of this process is gone");
   return std::move(*domain);
 }
 
-// By its absolute path.
-std::string DomainByExec(const std::string& program, SecPolicy::TeskAccessInterfaceImpl& access) {
+Policy::FileQuestion AskToExecute(const ProgramFile& program,
+                                  SecPolicy::TeskAccessInterfaceImpl& access) {
+  Policy::FileQuestion asked = {.access = Policy::FileAccess::kExecute,
+                                .path = program.path,
+                                .label = {},
+                                .labelIsBuiltIn = false};
+  const auto label = LinuxHost::ReadLabel(program.file.Number(), program.path.c_str());
+  if (!label) return asked;
+  try {
+    asked.label = access.GetLabel(label->id, TESKACCESS_LABEL_OBJECT);
+  } catch (const BraxoException&) {
+    return asked;
+  }
+  asked.labelIsBuiltIn = access.IsPredefinedLabel(asked.label, TESKACCESS_LABEL_OBJECT);
+  return asked;
+}
+
+std::string DomainByExec(const ProgramFile& program, SecPolicy::TeskAccessInterfaceImpl& access) {
   const Policy::InstalledDomain caller = CallersDomain(access);
-  const Question question = ReadQuestion({"exec", program}, access);
-  const auto& file = std::get<Policy::FileQuestion>(question.asked);
-  const Policy::Decision decision = Decide(file, caller);
-  if (!decision.IsAllowed()) {
-    throw BraxoException(caller.name + " may not execute " + file.path + ": 'secpolicy why " +
-                         caller.name + " exec " + file.path + "' says which rule would grant it");
+  const Policy::FileQuestion asked = AskToExecute(program, access);
+  if (!Decide(asked, caller).IsAllowed()) {
+    throw BraxoException(caller.name + " may not execute " + asked.path + ": 'secpolicy why " +
+                         caller.name + " exec " + asked.path + "' says which rule would grant it");
   }
   for (const Rule* const rule : RulesOf(caller, RuleKind::kDomainTransition)) {
-    if (rule->Grants() && rule->words[0] == file.label && rule->words[2] == "exec") {
+    if (rule->Grants() && rule->words[0] == asked.label && rule->words[2] == "exec") {
       return rule->words[1];
     }
   }
@@ -75,7 +85,14 @@ std::string DomainByExec(const std::string& program, SecPolicy::TeskAccessInterf
 
 Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access) {
   command.front() = Find(command.front());
-  return {DomainByExec(Absolute(command.front()), access), command};
+  ProgramFile program = OpenProgram(command.front());
+  Entry entry{.domain = DomainByExec(program, access), .command = std::move(command)};
+  if (IsScript(program)) {
+    entry.command.front() = program.path;
+  } else {
+    entry.program = std::move(program.file);
+  }
+  return entry;
 }
 
 }  // namespace SecPolicyCli

@@ -8,10 +8,10 @@
 
 namespace SecPolicyCli {
 
-// The domain that this process enters by executing `command`, and the command by the path that this
-// was judged by: its first word is a path or a name that is looked for in PATH. Throws
-// Braxo::Lib::BraxoException when there is no such program, and when its own domain may not execute
-// it.
+// The domain that this process enters by executing `command`, whose first word is a path or a name
+// that is looked for in PATH, and the very program that this was judged by; of a script its real
+// path. Throws Braxo::Lib::BraxoException when there is no such program, and when its own domain may
+// not execute it.
 Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access);
 
 }  // namespace SecPolicyCli

@@ -33,6 +33,7 @@ void TellRefused(const std::string& verb, const std::string& domain,
 
 ExitCode RunPermissive(const std::string& verb, const std::string& name,
                        const std::vector<std::string>& command,
+                       const LinuxHost::Descriptor& opened,
                        SecPolicy::TeskAccessInterfaceImpl& access) {
   const auto domain = ReadInstalledDomain(name, access);
   if (!domain) RefuseDomain(name, access);
@@ -50,7 +51,7 @@ ExitCode RunPermissive(const std::string& verb, const std::string& name,
       judge(WithLabel(asked, access), attempt.program);
     }
   };
-  return RunWatched(verb, command, isNoticed, notice);
+  return RunWatched(verb, command, isNoticed, notice, opened.Number());
 }
 
 }  // namespace SecPolicyCli

@@ -22,16 +22,20 @@ int proc = -1;
 
 void OpenProc() { proc = open("/proc", O_PATH | O_DIRECTORY | O_CLOEXEC); }
 
+int ProcDirectory() { return proc; }
+
 ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& command,
                     std::function<bool(std::string_view call)> isNoticed,
-                    std::function<void(const Enforce::Attempt&)> notice) {
+                    std::function<void(const Enforce::Attempt&)> notice, int program) {
   if (proc < 0) throw Braxo::Lib::BraxoException("programs cannot be watched without /proc");
   if (!Enforce::ProbeFeatures().notifies) {
     throw Braxo::Lib::BraxoException("this kernel has no filters that ask a supervisor");
   }
   std::cout << std::flush;
-  const Enforce::Supervision supervision = {
-      .procDirectory = proc, .isNoticed = std::move(isNoticed), .notice = std::move(notice)};
+  const Enforce::Supervision supervision = {.procDirectory = proc,
+                                            .program = program,
+                                            .isNoticed = std::move(isNoticed),
+                                            .notice = std::move(notice)};
   const Enforce::SupervisedEnd end = Enforce::Supervise(command, supervision);
   if (end.startError == 0) return static_cast<ExitCode>(end.exitStatus);
   std::cerr << "secpolicy: " << verb << ": cannot start " << Visible(command.front()) << ": "

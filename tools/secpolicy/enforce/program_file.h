@@ -1,0 +1,22 @@
+#pragma once
+
+#include <string>
+
+#include "host/linux/common/descriptor.h"
+
+namespace SecPolicyCli {
+
+// A program that was opened once, so that what is asked about is what is started.
+struct ProgramFile {
+  LinuxHost::Descriptor file;  // for reading, closed on execution
+  std::string path;            // that it was opened by: from the root on, without a link
+};
+
+// Opens the program that `path` leads to. Throws Braxo::Lib::BraxoException when there is none, or
+// this user may not read it: then nobody knows its label.
+ProgramFile OpenProgram(const std::string& path);
+
+// True for a script. Its interpreter opens it again, and so is told its path.
+bool IsScript(const ProgramFile& program);
+
+}  // namespace SecPolicyCli
