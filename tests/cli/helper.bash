@@ -10,7 +10,15 @@ setup() { make_root; }
 make_root() {
   root=$BATS_TEST_TMPDIR/root
   policy=$root/etc/zorvan/secpolicy
-  "$SOURCE/scripts/pack-example" "$root"
+  lay_out_example "$root"
+}
+
+# lay_out_example DIR: copies the example host, which is packed once for each file of tests.
+lay_out_example() {
+  local packed=$BATS_FILE_TMPDIR/example
+  [[ -d $packed ]] || "$SOURCE/scripts/pack-example" "$packed"
+  mkdir -p "$1"
+  cp -a "$packed/." "$1"
 }
 
 # boot_beside_copy: boots the example, with a copy of its policy in /new for the test to change.

@@ -8,7 +8,7 @@ setup() {
   [[ $EUID -eq 0 ]] || skip "only root can give rights away"
   root=$BATS_TEST_TMPDIR/root
   policy=$root/new
-  "$SOURCE/scripts/pack-example" "$root"
+  lay_out_example "$root"
   boot
   "$SECPOLICY" --root "$root" save good
   cp -r "$root/etc/zorvan/secpolicy" "$policy"

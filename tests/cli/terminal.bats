@@ -12,7 +12,7 @@ TURN=$'\xe2\x80\xae'
 setup() {
   root=$BATS_TEST_TMPDIR/root
   policy=$root/etc/zorvan/secpolicy
-  "$SOURCE/scripts/pack-example" "$root"
+  lay_out_example "$root"
   printf '%s\n' "o$ESCAPE" "o$SECOND" "o$BYTE" "o$TURN" >"$policy/objects/odd"
   printf '%s\n' "-r /x$ESCAPE r" "-r /x$SECOND r" "-r /x$BYTE r" "-r /x$TURN r" >"$policy/domains/d$SECOND"
   boot
