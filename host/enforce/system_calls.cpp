@@ -6,29 +6,17 @@
 #include <cstdlib>
 #include <vector>
 
+#include "policy/newer_call.h"
+
 namespace Enforce {
 namespace {
-
-// Newer than libseccomp may be. Numbers this high are the same on all architectures.
-struct NewerCall {
-  int number;
-  const char* name;
-};
-constexpr NewerCall kNewerCalls[] = {
-    {451, "cachestat"},         {452, "fchmodat2"},        {453, "map_shadow_stack"},
-    {454, "futex_wake"},        {455, "futex_wait"},       {456, "futex_requeue"},
-    {457, "statmount"},         {458, "listmount"},        {459, "lsm_get_self_attr"},
-    {460, "lsm_set_self_attr"}, {461, "lsm_list_modules"}, {462, "mseal"},
-    {463, "setxattrat"},        {464, "getxattrat"},       {465, "listxattrat"},
-    {466, "removexattrat"},     {467, "open_tree_attr"},   {468, "file_getattr"},
-    {469, "file_setattr"},      {470, "listns"},
-};
 
 constexpr int kLastNumber = 639;  // some 470 are in use, and they grow by a few a year
 
 std::string NewerName(int number) {
-  const auto* const call = std::ranges::find(kNewerCalls, number, &NewerCall::number);
-  return call == std::end(kNewerCalls) ? std::string() : call->name;
+  const auto calls = Policy::NewerCalls();
+  const auto call = std::ranges::find(calls, number, &Policy::NewerCall::number);
+  return call == calls.end() ? std::string() : std::string(call->name);
 }
 
 std::string ReadName(int number) {

@@ -12,6 +12,7 @@
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/label_table.h"
 #include "policy/call_set.h"
+#include "policy/newer_call.h"
 #include "policy/rule_kind.h"
 
 using Braxo::Misc::StrCat;
@@ -147,6 +148,9 @@ std::map<std::string, long> SystemCalls() {
   std::map<std::string, long> calls;
   AddSystemCalls(0, kLastNumber, calls);
   AddSystemCalls(kFirstForeign, kLastForeign, calls);
+  for (const Policy::NewerCall& newer : Policy::NewerCalls()) {
+    calls.emplace(newer.name, newer.number);
+  }
   long set = kFirstCallSet;
   for (const Policy::CallSet& each : Policy::CallSets()) calls.emplace(each.name, set++);
   return calls;
@@ -154,6 +158,7 @@ std::map<std::string, long> SystemCalls() {
 
 bool IsSystemCall(std::string_view word) {
   if (Policy::FindCallSet(word) != nullptr) return true;
+  if (std::ranges::count(Policy::NewerCalls(), word, &Policy::NewerCall::name) > 0) return true;
   return word.find('\0') == std::string_view::npos &&
          seccomp_syscall_resolve_name(std::string(word).c_str()) != __NR_SCMP_ERROR;
 }

@@ -8,6 +8,7 @@
 #include <sys/capability.h>
 
 #include "host/linux/state/host_state.h"
+#include "policy/call_set.h"
 #include "secpolicyhost/values.h"
 #include "state_directory.h"
 #include "support/message_of.h"
@@ -18,6 +19,7 @@ namespace {
 using LinuxHost::HostState;
 using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TeskAccess_KeywordType;
+using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::Pair;
 using ::testing::UnorderedElementsAre;
@@ -165,6 +167,21 @@ TEST_F(KeywordTables, KnowEverySystemCallThatTheyList) {
   // One that only other architectures have is a Linux system call, too.
   EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, "_newselect"), "");
   EXPECT_TRUE(calls.contains("_newselect"));
+}
+
+TEST_F(KeywordTables, HaveSystemCallsThatAreNewerThanTheLibrary) {
+  const auto calls = state.Keywords().All(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL);
+  EXPECT_THAT(calls, Contains(Pair("fchmodat2", 452)));
+  EXPECT_THAT(calls, Contains(Pair("statmount", 457)));
+  EXPECT_THAT(calls, Contains(Pair("listns", 470)));
+}
+
+TEST_F(KeywordTables, KnowEveryCallOfTheirSets) {
+  for (const Policy::CallSet& set : Policy::CallSets()) {
+    for (const std::string_view call : set.members) {
+      EXPECT_EQ(Refusal(TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL, std::string(call)), "");
+    }
+  }
 }
 
 TEST_F(KeywordTables, HaveSetsOfSystemCalls) {
