@@ -62,7 +62,7 @@ _secpolicy() {
   elif [[ $verb == exec && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--best-effort --root --help -h' -- "$current")
   elif [[ $verb == observe && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--for --write --root --help -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--write --root --help -h' -- "$current")
   elif [[ $verb == features && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--for --format --root --help -h' -- "$current")
   elif [[ $verb == check && $previous == --disable ]]; then
@@ -106,7 +106,7 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W "installed $(_secpolicy_saved "$root")" -- "$current"; compgen -d -- "$current")
   elif [[ $verb == words ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W 'objects accesses capabilities transitions files checks calls sockets' -- "$current")
-  elif [[ ($verb == features || $verb == observe) && $previous == --for ]] || [[ $verb == run && $positional -eq 0 && $current != -* ]]; then
+  elif [[ $verb == features && $previous == --for ]] || [[ ($verb == run || $verb == observe) && $positional -eq 0 && $current != -* && $previous != -- ]]; then
     mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_domains "$root")" -- "$current")
   elif [[ $verb == run || $verb == exec || $verb == observe ]]; then
     compopt -o filenames

@@ -74,12 +74,23 @@ secpolicy_in_time() {
 
 @test "what an installed domain is granted is left out" {
   boot
-  secpolicy_in_time observe --for monitorDom -- /bin/sh -c 'cat /opt/monitor/etc/agent.conf /var/lib/vms/demo/disk'
+  secpolicy_in_time observe monitorDom -- /bin/sh -c 'cat /opt/monitor/etc/agent.conf /var/lib/vms/demo/disk'
   exits 0
   [[ ${output##*$'\n'} == "-a vmDisk read grant   # 1 file, first /var/lib/vms/demo/disk" ]]
   [[ $(grep -c '^-' <<<"$output") -eq 1 ]]
-  secpolicy observe --for monitordom -- /bin/sh
+  secpolicy observe monitordom -- /bin/sh
   wrong_usage observe "observe: there is no domain 'monitordom'; did you mean 'monitorDom'?"
+}
+
+@test "what stands before -- is a domain, and what stands behind it a program" {
+  boot
+  secpolicy_in_time observe -- sh -c 'exit 3' --
+  exits 3
+  [[ ${output%%$'\n'*} == "# Proposed from one run of sh -c exit 3 --" ]]
+  secpolicy observe monitorDom
+  wrong_usage observe "observe: CMD is required, behind --"
+  secpolicy observe
+  wrong_usage observe "observe: CMD is required, behind --"
 }
 
 @test "ports and what binds them" {

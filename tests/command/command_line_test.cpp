@@ -32,6 +32,7 @@ struct Given {
   std::string wood;
   std::vector<std::string> coats;
   std::vector<std::string> walls;
+  std::size_t wordsBehindDashes = 0;
 };
 
 Given given;
@@ -49,6 +50,7 @@ const Verb kPaint = {
       syntax.AddFormat(given.format, "it", {"text", "json", "xml"});
       syntax.AddList("--coat", given.coats, "Coat");
       syntax.AddList("WALL", given.walls, "Walls").Require();
+      given.wordsBehindDashes = syntax.WordsBehindDashes();
       return [verbose = syntax.Verbose()] {
         given.isVerbose = verbose.IsGiven();
         return kFailed;
@@ -122,6 +124,18 @@ TEST_F(CommandLineTest, TakesWhatIsGiven) {
   EXPECT_EQ(given.format, "xml");
   EXPECT_THAT(given.coats, ElementsAre("a", "b"));
   EXPECT_THAT(given.walls, ElementsAre("north", "south"));
+}
+
+TEST_F(CommandLineTest, TellsWhatStandsBehindTheFirstDashes) {
+  EXPECT_EQ(Read({"paint", "north", "south"}), std::nullopt);
+  EXPECT_EQ(given.wordsBehindDashes, 0);
+  EXPECT_EQ(Read({"paint", "north", "--"}), std::nullopt);
+  EXPECT_EQ(given.wordsBehindDashes, 0);
+  EXPECT_EQ(Read({"paint", "--", "north", "south", "--", "--thick"}), std::nullopt);
+  EXPECT_EQ(given.wordsBehindDashes, 4);
+  EXPECT_THAT(given.walls, ElementsAre("north", "south", "--", "--thick"));
+  EXPECT_EQ(Read({"paint", "--", "north"}), std::nullopt);
+  EXPECT_EQ(given.wordsBehindDashes, 1);
 }
 
 TEST_F(CommandLineTest, TakesTheCommonOptionsBehindTheVerb) {

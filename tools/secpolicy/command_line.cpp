@@ -3,6 +3,8 @@
 #include <CLI/App.hpp>
 #include <CLI/Config.hpp>
 #include <CLI/Formatter.hpp>
+#include <algorithm>
+#include <string_view>
 
 #include "text/suggestion.h"
 #include "text/visible.h"
@@ -118,7 +120,7 @@ Action Syntax::AddKinds(std::span<const Kind> kinds) {
   for (const Kind& kind : kinds) {
     CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
     if (kind.help != nullptr) subcommand->footer(kind.help);
-    Syntax syntax(*subcommand);
+    Syntax syntax(*subcommand, behindDashes);
     subcommand->parse_complete_callback(
         [chosen, action = kind.define(syntax)] { *chosen = action; });
   }
@@ -147,13 +149,17 @@ void CommandLine::AddVerb(const Verb& added) {
   CLI::App* const subcommand = app->add_subcommand(added.name, added.summary);
   subcommand->preparse_callback([this, &added, subcommand](std::size_t /*rest*/) {
     subcommand->footer(added.help);
-    Syntax syntax(*subcommand);
+    Syntax syntax(*subcommand, wordsBehindDashes);
     action = added.define(syntax);
     verb = &added;
   });
 }
 
 std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {
+  const std::span<char*> words(argv, static_cast<std::size_t>(argc));
+  const auto dashes = std::ranges::find(words, std::string_view("--"));
+  wordsBehindDashes =
+      static_cast<std::size_t>(std::max<std::ptrdiff_t>(words.end() - dashes - 1, 0));
   try {
     app->parse(argc, argv);
     return std::nullopt;

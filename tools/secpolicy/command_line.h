@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <memory>
 #include <optional>
 #include <span>
@@ -55,7 +56,8 @@ struct Kind {
 // done: they become what is given, and stay as they are when nothing is.
 class Syntax {
  public:
-  explicit Syntax(CLI::App& verb) : app(verb) {}
+  Syntax(CLI::App& verb, std::size_t wordsBehindDashes)
+      : app(verb), behindDashes(wordsBehindDashes) {}
 
   Option AddFlag(const char* name, bool& value, const char* meaning);
 
@@ -75,8 +77,13 @@ class Syntax {
   // The option -v, which may stand anywhere.
   Option Verbose() const;
 
+  // How many words stand behind the first "--", by which arguments that may be left out are told
+  // from the words of a command.
+  std::size_t WordsBehindDashes() const { return behindDashes; }
+
  private:
   CLI::App& app;
+  const std::size_t behindDashes;
 };
 
 // What the command says about itself.
@@ -111,6 +118,7 @@ class CommandLine {
   CLI::Option* rootOption = nullptr;
   std::string root;
   bool verbose = false;
+  std::size_t wordsBehindDashes = 0;
   const Verb* verb = nullptr;
   Action action;
 };

@@ -4,6 +4,7 @@
 #include <iostream>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "command_line.h"
@@ -114,15 +115,25 @@ ExitCode Start(const Options& options) {
   }
 }
 
+// All that was given may stand behind "--": then there is no domain.
+void TellDomainFromCommand(Options& options, std::size_t wordsBehindDashes) {
+  if (!options.domain.empty() && options.command.size() < wordsBehindDashes) {
+    options.command.insert(options.command.begin(), std::exchange(options.domain, {}));
+  }
+  if (options.command.empty()) throw QuestionError("CMD is required, behind --");
+}
+
 Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  syntax.AddOption("--for", options->domain, "Leave out what the rules of a domain grant already")
-      .NameValue("DOMAIN");
+  syntax.AddOption("DOMAIN", options->domain, "Leave out what the rules of this domain grant");
+  syntax.AddList("CMD", options->command, "The program and its arguments, behind --");
   syntax.AddOption("--write", options->file, "Write the lines to a new file").NameValue("FILE");
-  syntax.AddList("CMD", options->command, "The program and its arguments, behind --").Require();
-  return [=] {
-    return Ask(
-        "observe", [=] { return Start(*options); }, kNotConfined);
+  return [=, wordsBehindDashes = syntax.WordsBehindDashes()] {
+    const auto start = [=] {
+      TellDomainFromCommand(*options, wordsBehindDashes);
+      return Start(*options);
+    };
+    return Ask("observe", start, kNotConfined);
   };
 }
 
@@ -134,15 +145,16 @@ const Verb kObserve = {
     "ended,\n"
     "prints the lines of a policy file by which a domain could have run it: system calls, checks,\n"
     "capabilities, and files by their labels, where they have one, else by their paths. Behind\n"
-    "each line stands why it is there. A run shows only what it did: look at every line, and\n"
-    "let the domain be permissive for a while.\n"
+    "each line stands why it is there. With DOMAIN, what its installed rules grant is left out.\n"
+    "A run shows only what it did: look at every line, and let the domain be permissive for a\n"
+    "while.\n"
     "\n"
     "Exit status: that of CMD; 126 when it could not be watched or started, 127 when there is no\n"
     "such program, 2 for wrong usage.\n"
     "\n"
     "Examples:\n"
     "  secpolicy observe --write /etc/zorvan/secpolicy/domains/webDom -- /usr/sbin/webd\n"
-    "  secpolicy observe --for webDom -- /usr/sbin/webd -t     what is still missing?",
+    "  secpolicy observe webDom -- /usr/sbin/webd -t     what is still missing?",
     Define, OpenProc};
 
 }  // namespace SecPolicyCli
