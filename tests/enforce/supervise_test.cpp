@@ -4,12 +4,17 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <linux/capability.h>
 #include <signal.h>
+#include <sys/prctl.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <filesystem>
+#include <fstream>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -22,7 +27,10 @@ namespace {
 using Enforce::Attempt;
 using Enforce::SupervisedEnd;
 using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
 using testing::Not;
+using testing::StartsWith;
 
 constexpr const char* kAccesses[] = {"read", "write", "execute", "list", "remove", "truncate"};
 
@@ -121,6 +129,106 @@ TEST_F(SuperviseTest, TellsProgramsWithTheirInterpreters) {
   EXPECT_THAT(asked, Contains("read " + Within("script")));
   EXPECT_THAT(asked, Contains("execute " + shell));
   EXPECT_THAT(calls, Contains("execve"));
+}
+
+// What only root can lay out.
+class PrivilegesTest : public SuperviseTest {
+ protected:
+  static constexpr uid_t kOther = 65534;
+
+  void SetUp() override {
+    if (geteuid() != 0) GTEST_SKIP() << "only root has capabilities to be told of";
+    chmod(directory.c_str(), 0755);
+  }
+
+  // Makes a file of another user.
+  void MakeOthers(const std::string& name, mode_t mode) {
+    std::ofstream(Within(name)) << "text\n";
+    Give(name, kOther, mode);
+  }
+
+  // Without the modes that a change of owners takes away.
+  void Give(const std::string& name, uid_t user, mode_t mode) {
+    ASSERT_EQ(chown(Within(name).c_str(), user, user), 0);
+    ASSERT_EQ(chmod(Within(name).c_str(), mode), 0);
+  }
+
+  // The capabilities that the script was told to take.
+  std::vector<std::string> Taken(const std::string& script) {
+    asked.clear();
+    Shell(script);
+    std::set<std::string> taken;
+    for (const std::string& each : asked) {
+      if (each.starts_with("cap_")) taken.insert(each);
+    }
+    return {taken.begin(), taken.end()};
+  }
+};
+
+TEST_F(PrivilegesTest, TellsModesThatRootOverrides) {
+  MakeOthers("open", 0644);
+  MakeOthers("closed", 0600);
+  std::filesystem::create_directory(Within("sub"));
+  std::ofstream(Within("sub/own")) << "text\n";
+  EXPECT_THAT(Taken("cat open"), IsEmpty());
+  EXPECT_THAT(Taken("cat closed"), ElementsAre("cap_dac_read_search"));
+  EXPECT_THAT(Taken("echo more >>open"), ElementsAre("cap_dac_override"));
+  EXPECT_THAT(Taken("cat sub/own; ls sub; echo >sub/new; rm sub/new"), IsEmpty());
+  Give("sub", kOther, 0755);
+  EXPECT_THAT(Taken("cat sub/own; ls sub"), IsEmpty());
+  EXPECT_THAT(Taken("echo >sub/new"), ElementsAre("cap_dac_override"));
+  EXPECT_THAT(Taken("rm sub/new"), ElementsAre("cap_dac_override"));
+  Give("sub", kOther, 0700);
+  EXPECT_THAT(Taken("cat sub/own"), ElementsAre("cap_dac_read_search"));
+  EXPECT_THAT(Taken("ls sub"), ElementsAre("cap_dac_read_search"));
+  EXPECT_THAT(Taken("cd sub"), ElementsAre("cap_dac_read_search"));
+}
+
+TEST_F(PrivilegesTest, LooksAtDirectoriesOnTheWayAndNotAboveWhereItIs) {
+  std::filesystem::create_directories(Within("closed/sub"));
+  std::ofstream(Within("closed/sub/file")) << "text\n";
+  Give("closed", kOther, 0700);
+  EXPECT_THAT(Taken("cat closed/sub/file"), ElementsAre("cap_dac_read_search"));
+  std::filesystem::current_path(Within("closed/sub"));
+  asked.clear();
+  Watch({"/bin/cat", "file"});
+  std::filesystem::current_path("/");
+  EXPECT_THAT(asked, Contains("read " + Within("closed/sub/file")));
+  EXPECT_THAT(asked, Not(Contains(StartsWith("cap_"))));
+}
+
+TEST_F(PrivilegesTest, TellsWhatOnlyOwnersMay) {
+  MakeOthers("others", 0666);
+  std::ofstream(Within("own")) << "text\n";
+  EXPECT_THAT(Taken("chmod 600 own; touch -d 2001-01-01 own; chown 0:0 own"), IsEmpty());
+  EXPECT_THAT(Taken("chmod 666 others"), ElementsAre("cap_fowner"));
+  EXPECT_THAT(Taken("touch -d 2001-01-01 others"), ElementsAre("cap_fowner"));
+  EXPECT_THAT(Taken("touch others"), IsEmpty());
+  EXPECT_THAT(Taken("chown 65534 own"), ElementsAre("cap_chown"));
+  std::filesystem::create_directory(Within("sticky"));
+  Give("sticky", 1, 01777);
+  MakeOthers("sticky/others", 0644);
+  EXPECT_THAT(Taken("rm -f sticky/others"), ElementsAre("cap_fowner"));
+}
+
+TEST_F(PrivilegesTest, TellsSignalsAndLimits) {
+  EXPECT_THAT(Taken("sleep 5 & kill $!"), IsEmpty());
+  EXPECT_THAT(Taken("setpriv --reuid 65534 --clear-groups sleep 5 & sleep 0.3; kill $!"),
+              ElementsAre("cap_kill", "cap_setgid", "cap_setuid"));
+  EXPECT_THAT(Taken("ulimit -n 100; ulimit -S -n 50"), IsEmpty());
+  const bool mayRaise = prctl(PR_CAPBSET_READ, CAP_SYS_RESOURCE, 0, 0, 0) == 1;
+  const std::vector<std::string> taken = Taken("ulimit -n 100; ulimit -n 200");
+  EXPECT_EQ(!taken.empty(), mayRaise);
+}
+
+TEST_F(PrivilegesTest, TellsNobodyElseOfAny) {
+  MakeOthers("closed", 0600);
+  const std::string script = "cd " + directory + "; cat closed; chmod 777 closed; kill -0 1";
+  Watch({"/bin/sh", "-c", "exec setpriv --reuid 1 --clear-groups /bin/sh -c '" + script + "'"});
+  EXPECT_THAT(asked, Contains("read " + Within("closed")));
+  EXPECT_THAT(asked, Not(Contains("cap_dac_read_search")));
+  EXPECT_THAT(asked, Not(Contains("cap_fowner")));
+  EXPECT_THAT(asked, Not(Contains("cap_kill")));
 }
 
 TEST_F(SuperviseTest, EntersWithoutAnExecveOfItsOwn) {

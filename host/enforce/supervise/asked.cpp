@@ -15,6 +15,8 @@
 #include <map>
 #include <string>
 
+#include "host/enforce/supervise/inquiry.h"
+#include "host/enforce/supervise/privileges.h"
 #include "host/enforce/system_calls.h"
 
 namespace Enforce {
@@ -29,45 +31,6 @@ constexpr int kFirstOpenPort = 1024;
 // How often a script may be the interpreter of a script.
 constexpr int kMostInterpreters = 4;
 
-// One call and what it asks, as it is found out.
-class Inquiry {
- public:
-  Inquiry(const seccomp_data& asking, const Caller& from) : call(asking), caller(from) {}
-
-  std::uint64_t Address(int argument) const { return call.args[argument]; }
-  int Number(int argument) const { return static_cast<int>(call.args[argument]); }
-  std::uint32_t Word(int argument) const { return static_cast<std::uint32_t>(call.args[argument]); }
-  const Caller& From() const { return caller; }
-
-  std::optional<Place> PlaceOf(int directory, int argument, LastLink lastLink) const {
-    const auto path = caller.ReadText(call.args[argument]);
-    return path ? caller.Resolve(directory, *path, lastLink) : std::nullopt;
-  }
-
-  void AskFile(FileAccess access, const std::string& path) {
-    asked.emplace_back(
-        Policy::FileQuestion{.access = access, .path = path, .label = {}, .labelIsBuiltIn = false});
-  }
-  void AskMaking(RuleKind kind, const char* what, const std::string& path) {
-    asked.emplace_back(Policy::CreationQuestion{
-        .kind = kind, .what = what, .path = path, .directoryLabel = {}, .labelIsBuiltIn = false});
-  }
-  void AskCheck(const char* check, std::uint32_t value) {
-    asked.emplace_back(Policy::ParameterQuestion{.check = check, .number = std::to_string(value)});
-  }
-  void AskCapability(const char* name) {
-    if (!caller.IsRoot()) return;
-    asked.emplace_back(Policy::WordsQuestion{.kind = RuleKind::kCapability, .words = {name}});
-  }
-
-  std::vector<Policy::Question> Take() && { return std::move(asked); }
-
- private:
-  const seccomp_data& call;
-  const Caller& caller;
-  std::vector<Policy::Question> asked;
-};
-
 // ---- Files
 
 const char* KindOf(mode_t mode) {
@@ -80,17 +43,35 @@ const char* KindOf(mode_t mode) {
 }
 
 void Make(Inquiry& inquiry, const std::optional<Place>& place, const char* kind) {
-  if (place && !place->Exists()) inquiry.AskMaking(RuleKind::kFileCreation, kind, place->path);
+  if (!place || place->Exists()) return;
+  inquiry.AskMaking(RuleKind::kFileCreation, kind, place->path);
+  AskEntry(inquiry, *place);
 }
 
 void Remove(Inquiry& inquiry, const std::optional<Place>& place) {
-  if (place && place->Exists()) inquiry.AskFile(FileAccess::kRemove, place->path);
+  if (!place || !place->Exists()) return;
+  inquiry.AskFile(FileAccess::kRemove, place->path);
+  AskEntry(inquiry, *place);
 }
 
-void AskAccess(Inquiry& inquiry, const std::string& path, int flags) {
+void Truncate(Inquiry& inquiry, const std::optional<Place>& place) {
+  if (!place || !place->Exists()) return;
+  inquiry.AskFile(FileAccess::kTruncate, place->path);
+  AskUse(inquiry, *place, W_OK);
+}
+
+void AskAccess(Inquiry& inquiry, const Place& place, int flags) {
   const int mode = flags & O_ACCMODE;
-  if (mode != O_WRONLY) inquiry.AskFile(FileAccess::kRead, path);
-  if (mode != O_RDONLY) inquiry.AskFile(FileAccess::kWrite, path);
+  if (mode != O_WRONLY) inquiry.AskFile(FileAccess::kRead, place.path);
+  if (mode != O_RDONLY) inquiry.AskFile(FileAccess::kWrite, place.path);
+  if (!place.Exists()) return;
+  if (mode != O_WRONLY) AskUse(inquiry, place, R_OK);
+  if (mode != O_RDONLY) AskUse(inquiry, place, W_OK);
+}
+
+void List(Inquiry& inquiry, const Place& directory) {
+  inquiry.AskFile(FileAccess::kList, directory.path);
+  AskUse(inquiry, directory, R_OK);
 }
 
 void Open(Inquiry& inquiry, int directory, int path, int flags) {
@@ -103,13 +84,11 @@ void Open(Inquiry& inquiry, int directory, int path, int flags) {
   if ((flags & O_TMPFILE) == O_TMPFILE) {
     return inquiry.AskMaking(RuleKind::kFileCreation, "regular", place->path + "/unnamed");
   }
-  if (place->IsDirectory()) return inquiry.AskFile(FileAccess::kList, place->path);
+  if (place->IsDirectory()) return List(inquiry, *place);
   if (!place->Exists() && (flags & O_CREAT) == 0) return;
   Make(inquiry, place, "regular");
-  AskAccess(inquiry, place->path, flags);
-  if (place->Exists() && (flags & O_TRUNC) != 0) {
-    inquiry.AskFile(FileAccess::kTruncate, place->path);
-  }
+  AskAccess(inquiry, *place, flags);
+  if ((flags & O_TRUNC) != 0) Truncate(inquiry, place);
 }
 
 void OpenByStructure(Inquiry& inquiry) {
@@ -124,6 +103,7 @@ void Rename(Inquiry& inquiry, const std::optional<Place>& from, const std::optio
   Remove(inquiry, from);
   Remove(inquiry, to);
   inquiry.AskMaking(RuleKind::kFileCreation, KindOf(from->mode), to->path);
+  AskEntry(inquiry, *to);
   if ((flags & RENAME_EXCHANGE) == 0 || !to->Exists()) return;
   inquiry.AskMaking(RuleKind::kFileCreation, KindOf(to->mode), from->path);
 }
@@ -134,7 +114,6 @@ void Link(Inquiry& inquiry, const std::optional<Place>& from, const std::optiona
 
 void MakeNode(Inquiry& inquiry, const std::optional<Place>& place, mode_t mode) {
   if (!place || place->Exists()) return;
-  if (S_ISCHR(mode) || S_ISBLK(mode)) inquiry.AskCapability("cap_mknod");
   if (S_ISSOCK(mode)) {
     return inquiry.AskMaking(RuleKind::kUnixSocketCreation, "stream", place->path);
   }
@@ -191,6 +170,7 @@ void Execute(Inquiry& inquiry, std::optional<Place> program) {
     if (!program || !program->Exists() || !S_ISREG(program->mode)) return;
     inquiry.AskFile(FileAccess::kExecute, program->path);
     inquiry.AskFile(FileAccess::kRead, program->path);
+    AskUse(inquiry, *program, X_OK);
     const std::string interpreter = InterpreterOf(*program, inquiry.From());
     if (interpreter.empty()) return;
     program = inquiry.From().Resolve(AT_FDCWD, interpreter, LastLink::kFollowed);
@@ -255,6 +235,13 @@ void BindLocal(Inquiry& inquiry, int socket, const std::string& path) {
   if (!place || place->Exists()) return;
   inquiry.AskMaking(RuleKind::kUnixSocketCreation, SocketKind(OptionOf(socket, SO_TYPE)),
                     place->path);
+  AskEntry(inquiry, *place);
+}
+
+// What a socket is once more when it is used, since some are only made.
+void AskType(Inquiry& inquiry, const FileDescriptor& socket) {
+  const int type = socket.IsOpen() ? OptionOf(socket.Number(), SO_TYPE) : -1;
+  if (type >= 0) inquiry.AskCheck("socket_type", static_cast<std::uint32_t>(type));
 }
 
 void Bind(Inquiry& inquiry) {
@@ -263,6 +250,7 @@ void Bind(Inquiry& inquiry) {
   if (!address || !socket.IsOpen()) return;
   if (address->family == AF_UNIX) return BindLocal(inquiry, socket.Number(), address->path);
   if (!IsInternet(address->family)) return;
+  AskType(inquiry, socket);
   inquiry.AskCheck("bind_port", address->port);
   if (address->port != 0 && address->port < kFirstOpenPort) {
     inquiry.AskCapability("cap_net_bind_service");
@@ -281,6 +269,7 @@ void ReachLocal(Inquiry& inquiry, const std::string& path) {
     const auto place = inquiry.From().Resolve(AT_FDCWD, path, LastLink::kFollowed);
     if (!place || !place->Exists()) return;
     inquiry.AskFile(FileAccess::kWrite, place->path);
+    AskUse(inquiry, *place, W_OK);
   }
   inquiry.AskCheck("socket_family", AF_UNIX);
 }
@@ -290,7 +279,9 @@ void Reach(Inquiry& inquiry, std::uint64_t location, std::size_t size) {
   const auto address = ReadAddress(inquiry.From(), location, size);
   if (!address) return;
   if (address->family == AF_UNIX) return ReachLocal(inquiry, address->path);
-  if (IsInternet(address->family)) inquiry.AskCheck("connect_port", address->port);
+  if (!IsInternet(address->family)) return;
+  AskType(inquiry, inquiry.From().Share(inquiry.Number(0)));
+  inquiry.AskCheck("connect_port", address->port);
 }
 
 void SendMessage(Inquiry& inquiry) {
@@ -307,7 +298,6 @@ void MakeSocket(Inquiry& inquiry) {
   if (inquiry.Word(0) == AF_UNIX) return;
   inquiry.AskCheck("socket_family", inquiry.Word(0));
   inquiry.AskCheck("socket_type", type);
-  if (type == SOCK_RAW || inquiry.Word(0) == AF_PACKET) inquiry.AskCapability("cap_net_raw");
 }
 
 void MakeSocketPair(Inquiry& inquiry) {
@@ -317,26 +307,23 @@ void MakeSocketPair(Inquiry& inquiry) {
 
 // ---- Identities
 
-// The first `count` arguments are identities; -1 leaves one as it is, and 0 is root's own.
-void TakeIdentities(Inquiry& inquiry, int count, const char* check, const char* capability) {
-  bool isOthers = false;
+// The first `count` arguments are identities; -1 leaves one as it is.
+template <int count>
+void Check(Inquiry& inquiry, const char* check) {
   for (int argument = 0; argument < count; ++argument) {
     const std::uint32_t identity = inquiry.Word(argument);
-    if (identity == std::numeric_limits<std::uint32_t>::max()) continue;
-    inquiry.AskCheck(check, identity);
-    isOthers = isOthers || identity != 0;
+    if (identity != std::numeric_limits<std::uint32_t>::max()) inquiry.AskCheck(check, identity);
   }
-  if (isOthers) inquiry.AskCapability(capability);
 }
 
 template <int count>
 void TakeUsers(Inquiry& inquiry) {
-  TakeIdentities(inquiry, count, "set_uid", "cap_setuid");
+  Check<count>(inquiry, "set_uid");
 }
 
 template <int count>
 void TakeGroups(Inquiry& inquiry) {
-  TakeIdentities(inquiry, count, "set_gid", "cap_setgid");
+  Check<count>(inquiry, "set_gid");
 }
 
 // ---- The calls
@@ -346,9 +333,10 @@ void CheckSignal(Inquiry& inquiry) {
   inquiry.AskCheck("kill_signal", inquiry.Word(argument));
 }
 
-void Chown(Inquiry& inquiry) { inquiry.AskCapability("cap_chown"); }
-void SetTime(Inquiry& inquiry) { inquiry.AskCapability("cap_sys_time"); }
-void Mount(Inquiry& inquiry) { inquiry.AskCapability("cap_sys_admin"); }
+void ChangeDirectory(Inquiry& inquiry) {
+  const auto place = inquiry.PlaceOf(AT_FDCWD, 0, LastLink::kFollowed);
+  if (place && place->Exists()) AskUse(inquiry, *place, X_OK);
+}
 
 using Reader = void (*)(Inquiry&);
 
@@ -358,22 +346,16 @@ const std::map<std::string_view, Reader>& Readers() {
   constexpr auto kFollowed = LastLink::kFollowed;
   using I = Inquiry;
   static const std::map<std::string_view, Reader> readers = {
-      {"adjtimex", SetTime},
       {"bind", Bind},
-      {"chown", Chown},
-      {"chroot", [](I& i) { i.AskCapability("cap_sys_chroot"); }},
-      {"clock_settime", SetTime},
+      {"chdir", ChangeDirectory},
       {"clone", [](I& i) { i.AskCheck("clone_flags", i.Word(0)); }},
       {"connect", [](I& i) { Reach(i, i.Address(1), i.Word(2)); }},
       {"creat", [](I& i) { Open(i, kHere, 0, O_CREAT | O_WRONLY | O_TRUNC); }},
       {"execve", [](I& i) { Execute(i, i.PlaceOf(kHere, 0, kFollowed)); }},
       {"execveat", ExecuteAt},
-      {"fchown", Chown},
-      {"fchownat", Chown},
       {"ftruncate", TruncateOpen},
       {"ioctl", [](I& i) { i.AskCheck("ioctl_request", i.Word(1)); }},
       {"kill", CheckSignal<1>},
-      {"lchown", Chown},
       {"link", [](I& i) { Link(i, i.PlaceOf(kHere, 0, kKept), i.PlaceOf(kHere, 1, kKept)); }},
       {"linkat",
        [](I& i) { Link(i, i.PlaceOf(i.Number(0), 1, kKept), i.PlaceOf(i.Number(2), 3, kKept)); }},
@@ -382,14 +364,11 @@ const std::map<std::string_view, Reader>& Readers() {
       {"mkdirat", [](I& i) { Make(i, i.PlaceOf(i.Number(0), 1, kKept), "directory"); }},
       {"mknod", [](I& i) { MakeNode(i, i.PlaceOf(kHere, 0, kKept), i.Word(1)); }},
       {"mknodat", [](I& i) { MakeNode(i, i.PlaceOf(i.Number(0), 1, kKept), i.Word(2)); }},
-      {"mount", Mount},
       {"open", [](I& i) { Open(i, kHere, 0, i.Number(1)); }},
       {"openat", [](I& i) { Open(i, i.Number(0), 1, i.Number(2)); }},
       {"openat2", OpenByStructure},
       {"pidfd_send_signal", CheckSignal<1>},
-      {"pivot_root", Mount},
       {"prctl", [](I& i) { i.AskCheck("prctl_option", i.Word(0)); }},
-      {"reboot", [](I& i) { i.AskCapability("cap_sys_boot"); }},
       {"rename",
        [](I& i) { Rename(i, i.PlaceOf(kHere, 0, kKept), i.PlaceOf(kHere, 1, kKept), 0); }},
       {"renameat",
@@ -403,18 +382,16 @@ const std::map<std::string_view, Reader>& Readers() {
       {"rmdir", [](I& i) { Remove(i, i.PlaceOf(kHere, 0, kKept)); }},
       {"rt_sigqueueinfo", CheckSignal<1>},
       {"rt_tgsigqueueinfo", CheckSignal<2>},
+      {"sendmmsg", SendMessage},  // its messages begin as those of sendmsg do
       {"sendmsg", SendMessage},
       {"sendto", [](I& i) { Reach(i, i.Address(4), i.Word(5)); }},
       {"setfsgid", TakeGroups<1>},
       {"setfsuid", TakeUsers<1>},
       {"setgid", TakeGroups<1>},
-      {"setgroups", [](I& i) { i.AskCapability("cap_setgid"); }},
-      {"sethostname", Mount},
       {"setregid", TakeGroups<2>},
       {"setresgid", TakeGroups<3>},
       {"setresuid", TakeUsers<3>},
       {"setreuid", TakeUsers<2>},
-      {"settimeofday", SetTime},
       {"setuid", TakeUsers<1>},
       {"socket", MakeSocket},
       {"socketpair", MakeSocketPair},
@@ -422,12 +399,7 @@ const std::map<std::string_view, Reader>& Readers() {
       {"symlinkat", [](I& i) { Make(i, i.PlaceOf(i.Number(1), 2, kKept), "symlink"); }},
       {"tgkill", CheckSignal<2>},
       {"tkill", CheckSignal<1>},
-      {"truncate",
-       [](I& i) {
-         const auto place = i.PlaceOf(kHere, 0, kFollowed);
-         if (place && place->Exists()) i.AskFile(FileAccess::kTruncate, place->path);
-       }},
-      {"umount2", Mount},
+      {"truncate", [](I& i) { Truncate(i, i.PlaceOf(kHere, 0, kFollowed)); }},
       {"unlink", [](I& i) { Remove(i, i.PlaceOf(kHere, 0, kKept)); }},
       {"unlinkat", [](I& i) { Remove(i, i.PlaceOf(i.Number(0), 1, kKept)); }},
       {"unshare", [](I& i) { i.AskCheck("clone_flags", i.Word(0)); }},
@@ -437,13 +409,14 @@ const std::map<std::string_view, Reader>& Readers() {
 
 }  // namespace
 
-bool AsksMore(std::string_view call) { return Readers().contains(call); }
+bool AsksMore(std::string_view call) { return Readers().contains(call) || TakesCapability(call); }
 
 std::vector<Policy::Question> AskedBy(const seccomp_data& call, const Caller& caller) {
-  const auto reader = Readers().find(NameOf(call.nr));
-  if (reader == Readers().end()) return {};
+  const std::string_view name = NameOf(call.nr);
   Inquiry inquiry(call, caller);
-  reader->second(inquiry);
+  const auto reader = Readers().find(name);
+  if (reader != Readers().end()) reader->second(inquiry);
+  AskCapabilities(inquiry, name);
   return std::move(inquiry).Take();
 }
 

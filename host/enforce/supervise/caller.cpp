@@ -9,6 +9,7 @@
 #include <array>
 #include <climits>
 #include <cstdlib>
+#include <sstream>
 #include <string_view>
 
 namespace Enforce {
@@ -37,7 +38,25 @@ std::string WithoutTrailingSlashes(std::string path) {
   return path;
 }
 
+// What stands behind a name of /proc/PID/status, up to the end of the line.
+std::string FactOf(const std::string& status, const std::string& name) {
+  const std::size_t line = ("\n" + status).find("\n" + name);
+  if (line == std::string::npos) return "";
+  const std::size_t place = line + name.size();
+  return status.substr(place, status.find('\n', place) - place);
+}
+
+bool ReadIdentity(const std::string& text, Identity* identity) {
+  std::istringstream numbers(text);
+  numbers >> identity->real >> identity->effective >> identity->saved >> identity->ofFiles;
+  return !numbers.fail();
+}
+
 }  // namespace
+
+bool Credentials::IsMember(gid_t number) const {
+  return number == group.ofFiles || std::ranges::count(moreGroups, number) > 0;
+}
 
 bool Caller::Read(std::uint64_t address, void* destination, std::size_t size) const {
   const iovec local = {destination, size};
@@ -67,10 +86,12 @@ std::optional<Place> Caller::Resolve(int directory, const std::string& path,
   const FileDescriptor root(openat(proc, FileOf("root").c_str(), O_PATH | O_CLOEXEC | O_DIRECTORY));
   if (!root.IsOpen() || path.empty()) return std::nullopt;
   std::string sought = path;
+  std::string base = "/";
   if (!path.starts_with('/')) {
-    const auto base = directory == AT_FDCWD ? ReadLink("cwd") : PathOf(directory);
-    if (!base) return std::nullopt;
-    sought = Join(Within(ReadLink("root").value_or("/"), *base), path);
+    const auto start = directory == AT_FDCWD ? ReadLink("cwd") : PathOf(directory);
+    if (!start) return std::nullopt;
+    base = *start;
+    sought = Join(Within(ReadLink("root").value_or("/"), base), path);
   }
   const Caller self(proc, getpid());
   FileDescriptor file = OpenWithin(root.Number(), sought, lastLink);
@@ -78,7 +99,12 @@ std::optional<Place> Caller::Resolve(int directory, const std::string& path,
     struct stat facts = {};
     const auto real = self.PathOf(file.Number());
     if (!real || fstat(file.Number(), &facts) != 0) return std::nullopt;
-    return Place{.path = *real, .file = std::move(file), .mode = facts.st_mode};
+    return Place{.path = *real,
+                 .file = std::move(file),
+                 .base = base,
+                 .mode = facts.st_mode,
+                 .owner = facts.st_uid,
+                 .group = facts.st_gid};
   }
   sought = WithoutTrailingSlashes(sought);
   const std::size_t slash = sought.rfind('/');
@@ -86,7 +112,7 @@ std::optional<Place> Caller::Resolve(int directory, const std::string& path,
       OpenWithin(root.Number(), sought.substr(0, slash + 1), LastLink::kFollowed);
   const auto real = above.IsOpen() ? self.PathOf(above.Number()) : std::nullopt;
   if (!real) return std::nullopt;
-  return Place{.path = Join(*real, sought.substr(slash + 1)), .file = {}, .mode = 0};
+  return Place{.path = Join(*real, sought.substr(slash + 1)), .file = {}, .base = base};
 }
 
 std::optional<std::string> Caller::PathOf(int number) const {
@@ -104,9 +130,19 @@ FileDescriptor Caller::OpenForReading(const Place& place) const {
   return FileDescriptor(openat(proc, name.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
 }
 
-bool Caller::IsRoot() const {
-  struct stat facts = {};
-  return fstatat(proc, std::to_string(thread).c_str(), &facts, 0) == 0 && facts.st_uid == 0;
+std::optional<Credentials> Caller::ActsAs() const {
+  const std::string status = ReadStatus();
+  Credentials found;
+  if (!ReadIdentity(FactOf(status, "Uid:"), &found.user)) return std::nullopt;
+  if (!ReadIdentity(FactOf(status, "Gid:"), &found.group)) return std::nullopt;
+  std::istringstream groups(FactOf(status, "Groups:"));
+  for (gid_t group = 0; groups >> group;) found.moreGroups.push_back(group);
+  constexpr int kHexadecimal = 16;
+  const bool isHere = ReadLink("ns/user") == Other(getpid()).ReadLink("ns/user");
+  if (isHere) {
+    found.capabilities = std::strtoull(FactOf(status, "CapEff:").c_str(), nullptr, kHexadecimal);
+  }
+  return found;
 }
 
 std::string Caller::Program() const { return ReadLink("exe").value_or(""); }
@@ -122,17 +158,23 @@ std::optional<std::string> Caller::ReadLink(const std::string& name) const {
   return std::string(target.data(), static_cast<std::size_t>(size));
 }
 
+std::string Caller::ReadStatus() const {
+  const FileDescriptor file(openat(proc, FileOf("status").c_str(), O_RDONLY | O_CLOEXEC));
+  std::string text;
+  std::array<char, 4096> piece = {};
+  ssize_t size = 0;
+  while (file.IsOpen() && (size = read(file.Number(), piece.data(), piece.size())) > 0) {
+    text.append(piece.data(), static_cast<std::size_t>(size));
+  }
+  return text;
+}
+
 // The kernel takes descriptors from processes, and tells of threads.
 pid_t Caller::Process() const {
-  const FileDescriptor status(openat(proc, FileOf("status").c_str(), O_RDONLY | O_CLOEXEC));
-  std::array<char, 1024> text = {};
-  if (!status.IsOpen() || read(status.Number(), text.data(), text.size() - 1) <= 0) return thread;
-  constexpr std::string_view kName = "Tgid:";
-  const std::string_view facts(text.data());
-  const std::size_t place = facts.find(kName);
-  if (place == std::string_view::npos) return thread;
   constexpr int kDecimal = 10;
-  return static_cast<pid_t>(std::strtol(facts.data() + place + kName.size(), nullptr, kDecimal));
+  const std::string process = FactOf(ReadStatus(), "Tgid:");
+  if (process.empty()) return thread;
+  return static_cast<pid_t>(std::strtol(process.c_str(), nullptr, kDecimal));
 }
 
 }  // namespace Enforce

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "host/enforce/supervise/file_descriptor.h"
 
@@ -17,13 +18,40 @@ struct Place {
   std::string
       path;  // the real one; of what is not there, the real one of its directory and the name
   FileDescriptor file;  // O_PATH; none where nothing is there
+  std::string base;     // a directory that is entered already, from which the path was looked for
   mode_t mode = 0;      // as of stat(2), where something is
+  uid_t owner = 0;
+  gid_t group = 0;
 
   bool Exists() const { return file.IsOpen(); }
   bool IsDirectory() const { return Exists() && S_ISDIR(mode); }
 };
 
 enum class LastLink { kFollowed, kKept };
+
+// The numbers of a user or group, as the supervisor's user namespace has them.
+struct Identity {
+  std::uint32_t real = 0;
+  std::uint32_t effective = 0;
+  std::uint32_t saved = 0;
+  std::uint32_t ofFiles = 0;  // as which files are used
+
+  // True for those that can be taken on without a capability.
+  bool Has(std::uint32_t number) const {
+    return number == real || number == effective || number == saved;
+  }
+};
+
+// As whom a thread acts.
+struct Credentials {
+  Identity user;
+  Identity group;
+  std::vector<gid_t> moreGroups;
+  std::uint64_t capabilities = 0;  // in effect, a bit each; none in a user namespace of its own
+
+  // True for a group as a member of which files are used.
+  bool IsMember(gid_t number) const;
+};
 
 // A thread that waits in a system call, as its supervisor sees it. It lives on and may be killed
 // meanwhile: what is told counts only when the call still waits afterwards.
@@ -52,8 +80,14 @@ class Caller {
   // A descriptor for reading what `place` is; none when that fails.
   FileDescriptor OpenForReading(const Place& place) const;
 
-  // True when its effective user is root.
-  bool IsRoot() const;
+  // As whom it acts; nothing when it is gone.
+  std::optional<Credentials> ActsAs() const;
+
+  // Another thread, by its number for the supervisor.
+  Caller Other(pid_t other) const { return {proc, other}; }
+
+  // The process that the thread is of.
+  pid_t Process() const;
 
   // The path of the program that it runs; empty when it cannot be told.
   std::string Program() const;
@@ -61,7 +95,7 @@ class Caller {
  private:
   std::string FileOf(const std::string& name) const;
   std::optional<std::string> ReadLink(const std::string& name) const;
-  pid_t Process() const;
+  std::string ReadStatus() const;
 
   int proc;
   pid_t thread;
