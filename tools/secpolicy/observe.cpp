@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "command_line.h"
+#include "host/enforce/supervise/asked.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "installed/installed_policy.h"
@@ -51,10 +52,20 @@ void WriteFile(const std::string& file, const Descriptor& to, const std::string&
   }
 }
 
-// What every program does, and nothing can be learnt from.
+// Not what every program does and nothing can be learnt from.
 bool IsNoticed(std::string_view call) {
   static const Policy::CallSet& start = *Policy::FindCallSet("@start");
-  return call == "openat" || !start.Has(call);
+  return Enforce::AsksMore(call) || !start.Has(call);
+}
+
+// A socket that is only made says nothing of what it is for: programs try out what there is, and a
+// pair reaches nobody else.
+bool IsOnlyTried(const Enforce::Attempt& attempt, const Policy::Question& question) {
+  const auto* const asked = std::get_if<Policy::ParameterQuestion>(&question);
+  if (asked == nullptr) return false;
+  const bool isPair = attempt.call == "socketpair";
+  return (isPair && asked->check == "socket_family") ||
+         ((isPair || attempt.call == "socket") && asked->check == "socket_type");
 }
 
 Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl& access,
@@ -68,6 +79,7 @@ Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl&
     }
     const std::string& program = attempt.isStart ? options.command.front() : attempt.program;
     for (const Policy::Question& asked : attempt.asked) {
+      if (IsOnlyTried(attempt, asked)) continue;
       observations.Note(WithLabel(asked, access), program);
     }
   };

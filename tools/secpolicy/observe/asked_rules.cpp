@@ -72,6 +72,20 @@ Policy::Question WithLabel(Policy::Question question, SecPolicy::TeskAccessInter
   return question;
 }
 
+std::optional<Policy::WordsQuestion> WiderCapability(const Policy::WordsQuestion& asked) {
+  if (asked.kind != RuleKind::kCapability || asked.words[0] != "cap_dac_read_search") {
+    return std::nullopt;
+  }
+  return Policy::WordsQuestion{.kind = asked.kind, .words = {"cap_dac_override"}};
+}
+
+bool IsGranted(const Policy::Question& question, const Policy::InstalledDomain& domain) {
+  if (Decide(question, domain).granted) return true;
+  const auto* const asked = std::get_if<Policy::WordsQuestion>(&question);
+  const auto wider = asked == nullptr ? std::nullopt : WiderCapability(*asked);
+  return wider && Decide(*wider, domain).granted;
+}
+
 std::string TextOf(const Policy::Question& question) { return std::visit(Wording(), question); }
 
 std::string DirectoryOf(const std::string& path) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "policy/decision.h"
@@ -10,6 +11,13 @@ namespace SecPolicyCli {
 // The question with the label of its file, or of the directory that it is made in; a file that is
 // not there yet has that of its directory. Other questions are as they were.
 Policy::Question WithLabel(Policy::Question question, SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The question about a capability that does what the one that is asked about is for, too; nothing
+// where there is none.
+std::optional<Policy::WordsQuestion> WiderCapability(const Policy::WordsQuestion& asked);
+
+// True when rules grant it, or a wider capability.
+bool IsGranted(const Policy::Question& question, const Policy::InstalledDomain& domain);
 
 // The question as 'why' is asked it: "read /etc/shadow".
 std::string TextOf(const Policy::Question& question);

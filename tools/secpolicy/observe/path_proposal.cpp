@@ -131,6 +131,10 @@ void Add(Needs& needs, const Wanted& wanted, const std::string& program) {
   if (need.program.empty()) need.program = program;
 }
 
+// What lies right below the root has nothing to do with what lies beside it: /etc holds the secrets
+// of all services.
+bool IsForMany(const std::string& directory) { return directory.rfind('/') == 0; }
+
 // Many files of one directory that need the same become their directory.
 Needs Generalised(const Needs& needs) {
   std::map<std::pair<std::string, unsigned int>, std::vector<std::string>> alike;
@@ -140,7 +144,7 @@ Needs Generalised(const Needs& needs) {
   Needs result = needs;
   for (const auto& [key, files] : alike) {
     const auto& [directory, bits] = key;
-    if (directory == "/" || files.size() < kManyFiles) continue;
+    if (IsForMany(directory) || files.size() < kManyFiles) continue;
     const std::string& program = needs.at(files.front()).program;
     for (const std::string& file : files) result.erase(file);
     Need& need = result[directory];

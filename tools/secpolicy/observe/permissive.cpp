@@ -32,14 +32,13 @@ void TellRefused(const std::string& verb, const std::string& domain,
 }  // namespace
 
 ExitCode RunPermissive(const std::string& verb, const std::string& name,
-                       const std::vector<std::string>& command,
-                       const LinuxHost::Descriptor& opened,
+                       const std::vector<std::string>& command, const LinuxHost::Descriptor& opened,
                        SecPolicy::TeskAccessInterfaceImpl& access) {
   const auto domain = ReadInstalledDomain(name, access);
   if (!domain) RefuseDomain(name, access);
   Observations seen;
   const auto judge = [&](const Policy::Question& question, const std::string& program) {
-    if (!seen.Note(question, program) || Decide(question, *domain).granted) return;
+    if (!seen.Note(question, program) || IsGranted(question, *domain)) return;
     TellRefused(verb, name, question);
   };
   const auto isNoticed = [&](std::string_view call) {

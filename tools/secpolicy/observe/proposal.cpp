@@ -1,5 +1,7 @@
 #include "proposal.h"
 
+#include <sys/socket.h>
+
 #include <algorithm>
 #include <set>
 #include <string_view>
@@ -40,10 +42,6 @@ Rule Granting(RuleKind kind, const std::array<std::string, Policy::kMaxRuleWords
 
 std::string TimesAndFirst(unsigned int count, const std::string& program) {
   return CountOf(count, "time") + ", first by " + program;
-}
-
-bool IsGranted(const Policy::Question& question, const InstalledDomain& domain) {
-  return Decide(question, domain).granted;
 }
 
 // ---- System calls
@@ -122,10 +120,15 @@ void ProposeCapabilities(Rules& rules, const Observations& observations,
   for (const Observed& each : observations.All()) {
     const auto* const asked = std::get_if<WordsQuestion>(&each.question);
     if (asked == nullptr || asked->kind != RuleKind::kCapability) continue;
-    if (IsGranted(each.question, domain)) continue;
+    const auto wider = WiderCapability(*asked);
+    if (IsGranted(each.question, domain) || (wider && observations.Has(*wider))) continue;
     rules.push_back({.rule = Granting(RuleKind::kCapability, asked->words),
                      .reason = TimesAndFirst(each.count, each.program)});
   }
+}
+
+bool HasCall(const Observations& observations, const char* call) {
+  return observations.Has(WordsQuestion{.kind = RuleKind::kSyscall, .words = {call}});
 }
 
 bool IsPort(const std::string& check) { return check.ends_with("_port"); }
@@ -142,16 +145,28 @@ bool HasDatagrams(const Observations& observations) {
   });
 }
 
+// A pair of local sockets takes their family, and beside a rule for that each local service could
+// be reached: without rules for families it takes none.
+bool HasPairsAlone(const Observations& observations) {
+  const ParameterQuestion local = {.check = "socket_family", .number = std::to_string(AF_UNIX)};
+  return HasCall(observations, "socketpair") && !observations.Has(local);
+}
+
+// True where a rule for the value would refuse the program what it was seen to do.
+bool IsInTheWay(const std::string& check, const Observations& observations) {
+  if (IsPort(check)) return HasDatagrams(observations);  // beside ports there is TCP alone
+  if (check == "socket_family") return HasPairsAlone(observations);
+  return check == "set_gid" && HasCall(observations, "setgroups");  // its groups are not seen
+}
+
 // A check that is open to an installed domain stays so. To wait at the kernel's choice of a port
 // is asked by all who wait, and takes a line only beside other ports.
 void ProposeChecks(Rules& rules, const Observations& observations, const InstalledDomain& domain) {
   const bool isNew = domain.rules.empty();
-  const bool hasDatagrams = HasDatagrams(observations);
   for (const Observed& each : observations.All()) {
     const auto* const asked = std::get_if<ParameterQuestion>(&each.question);
     if (asked == nullptr || !IsProposed(asked->check)) continue;
-    // Beside rules for ports there is TCP and nothing else.
-    if (IsPort(asked->check) && hasDatagrams) continue;
+    if (IsInTheWay(asked->check, observations)) continue;
     const Policy::Decision decision = Decide(each.question, domain);
     if (decision.granted && !(isNew && decision.isOpen)) continue;
     rules.push_back({.rule = Granting(RuleKind::kParameterCheck, {asked->check, asked->number}),
@@ -225,6 +240,10 @@ std::string LineOf(const ProposedRule& proposed) {
 }
 
 }  // namespace
+
+bool Observations::Has(const Policy::Question& question) const {
+  return places.contains(TextOf(question));
+}
 
 bool Observations::Note(const Policy::Question& question, const std::string& program) {
   const auto [place, isNew] = places.emplace(TextOf(question), all.size());

@@ -21,6 +21,9 @@ class Observations {
   // True for what was not noted before. The question has the label of its file.
   bool Note(const Policy::Question& question, const std::string& program);
 
+  // True for what was noted.
+  bool Has(const Policy::Question& question) const;
+
   const std::vector<Observed>& All() const { return all; }
 
  private:
