@@ -70,7 +70,7 @@ _secpolicy() {
       duplicate-rule editor-copy installed-only long-line missing-path nul-byte relative-path skipped-entry
       star-in-path tab two-labels unreachable-domain untyped-entries unused-object' -- "$current")
   elif [[ $verb == check && $current == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--fresh --format --werror --disable --root --help -h' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W '--fresh --format --stdin --errors-only --only --max --werror --disable --root --help -h' -- "$current")
   elif [[ $verb == save && $current == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--force --root --help -h' -- "$current")
   elif [[ $verb == boot && $previous == --policy-from ]]; then

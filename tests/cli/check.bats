@@ -105,7 +105,7 @@ fileLabels/zz:3 [unknown-word]" ]]
   (cd "$policy/domains" && seq -f 'x%04.0f' 3000 | xargs touch)
   secpolicy check
   exits 1
-  [[ $(grep -c 'bad-name' <<<"$output") -eq 1 ]]
+  [[ $(grep -c '\[bad-name\]' <<<"$output") -eq 1 ]]
   shows "$shown/domains/x0503: error: cannot create domain 'x0503': all 511 domains are in use [bad-name]"
   shows "    hint: neither is there room for 2497 files after this one"
 }
@@ -457,7 +457,7 @@ END
   fits_schema check
   jq -e --argjson line "$(wc -l <"$policy/domains/appDom")" '
     .schema == "secpolicy.check/1" and .errors == 1 and .warnings == 1 and (.problems | length) == 2 and
-    .problems[1] == {file: "/etc/zorvan/secpolicy/domains/appDom", line: $line, column: 4,
+    .problems[0] == {file: "/etc/zorvan/secpolicy/domains/appDom", line: $line, column: 4,
       length: 4, source: "-s reed grant", severity: "error", code: "unknown-word",
       message: "unknown system call '"'reed'"'", hint: "did you mean '"'read'"'?"}' <<<"$output"
 }
@@ -602,7 +602,7 @@ END
 @test "a directory that is not there" {
   secpolicy check /no/such
   exits 1
-  [[ $stderr == "secpolicy: check: there is no directory /no/such below this root. Name the directory of the policy, or the root that it is in (--root DIR)." ]]
+  [[ $stderr == "secpolicy: check: there is no policy at /no/such below this root. Name the directory of the policy or a file in it, or the root that it is in (--root DIR)." ]]
 }
 
 @test "the mistake of the broken example shows from the output alone" {
@@ -642,4 +642,99 @@ END
   sed -i /mmap/d "$policy/domains/appDom"
   secpolicy check
   [[ $output != *cannot-start* ]]
+}
+
+# many_problems: a policy with eleven problems, two of them errors, in two files.
+many_problems() {
+  add fileLabels/base "/one sshKey" "/two sshKey" "/three sshKey" "/four sshKey" "/five sshKey"
+  add domains/sshDom "-r /six r" "-r /seven r" "-r /eight r" "-r /nine r" "-s opne grant" "-s raed grant"
+}
+
+@test "errors come before warnings, either in the order of a load, and a long list ends with a tally" {
+  many_problems
+  secpolicy check --fresh
+  exits 1
+  [[ $(grep -oE '^/[^ ]* (error|warning): ' <<<"$output" | cut -d' ' -f2 | uniq) == $'error:\nwarning:' ]]
+  [[ $output == *$'\n\n     2 error   unknown-word '* ]]
+  local summary=${stderr##*$'\n'}
+  secpolicy check --fresh --disable missing-path
+  exits 1
+  [[ $output != *"error   unknown-word"* && $output != *missing-path* ]]
+  [[ $summary == *" warnings" ]]
+}
+
+@test "--errors-only, --only and --max choose what is shown, and all counts" {
+  many_problems
+  secpolicy check --fresh --errors-only
+  exits 1
+  [[ $(grep -c '^/.*\[unknown-word\]$' <<<"$output") -eq 2 && $output != *'[missing-path]'* ]]
+  local summary=${stderr##*$'\n'}
+  [[ $summary == "secpolicy: check: 2 errors, "*" warnings; 2 shown" ]]
+  secpolicy check --fresh --only missing-path --max 3
+  exits 1
+  [[ $(grep -c '^/.*\[missing-path\]$' <<<"$output") -eq 3 && $output != *'[unknown-word]'* ]]
+  ends_with "${summary/; 2/; 3}"
+  secpolicy check --fresh --max 0 --format json
+  exits 1
+  [[ $(jq -c '[.errors, .tally["unknown-word"], .problems]' <<<"$output") == '[2,2,[]]' ]]
+  fits_schema check
+}
+
+@test "a wrong --max, --only or --stdin is wrong usage, and told" {
+  secpolicy check --max many
+  wrong_usage check "--max: 'many' is not a number"
+  secpolicy check --only nothing
+  wrong_usage check "--only: there is no problem 'nothing'"
+  secpolicy check --stdin
+  exits 1
+  ends_with "secpolicy: check: name the file that standard input holds the content of."
+}
+
+@test "one file is checked beside the others, and only its problems count" {
+  add domains/sshDom "-s opne grant"
+  add domains/hostDom "-s raed grant"
+  secpolicy check "$shown/domains/sshDom"
+  exits 1
+  shows "$shown/domains/sshDom:$(wc -l <"$policy/domains/sshDom"):4: error: unknown system call 'opne' [unknown-word]"
+  ends_with "secpolicy: check: 1 error, 0 warnings"
+  secpolicy check "$shown/objects/base"
+  exits 0
+  ends_with "secpolicy: check: no problems"
+}
+
+@test "a file of early boot is checked with the whole policy" {
+  local file
+  file=$(find "$policy/early/domains" -type f | head -n 1)
+  echo "-s opne grant" >>"$file"
+  secpolicy check "$shown/early/domains/${file##*/}"
+  exits 1
+  ends_with "secpolicy: check: 1 error, 0 warnings"
+}
+
+@test "what standard input holds takes the place of the file, and the file stays as it is" {
+  local before
+  before=$(sha256sum "$policy/domains/sshDom")
+  run --separate-stderr "$SECPOLICY" --root "$root" check --stdin "$shown/domains/sshDom" <<<"-s opne grant"
+  exits 1
+  shows "$shown/domains/sshDom:1:4: error: unknown system call 'opne' [unknown-word]"
+  [[ $(sha256sum "$policy/domains/sshDom") == "$before" ]]
+}
+
+@test "a file that no load reads, and one that is in no policy, are refused" {
+  touch "$policy/README" "$root/alone"
+  secpolicy check "$shown/README"
+  exits 1
+  ends_with "secpolicy: check: a load does not read $shown/README: it is in none of the directories of a policy."
+  secpolicy check /alone
+  exits 1
+  ends_with "secpolicy: check: there is no policy at /alone below this root. Name the directory of the policy or a file in it, or the root that it is in (--root DIR)."
+}
+
+@test "ranges that are written otherwise and capabilities without their prefix get a hint" {
+  add domains/sshDom "-p bind_port 8000-9000 grant" "-c net_raw grant" "-p bind_port 9000 8000 grant"
+  secpolicy check
+  exits 1
+  shows "    hint: a range is two words: 8000 9000"
+  shows "    hint: did you mean 'cap_net_raw'?"
+  shows "    hint: the smaller number comes first: 8000 9000"
 }

@@ -19,6 +19,7 @@ using SecPolicyCli::Code;
 using SecPolicyCli::CodeOf;
 using SecPolicyCli::Diagnostic;
 using SecPolicyCli::DiagnosticList;
+using SecPolicyCli::Selection;
 using SecPolicyCli::Severity;
 using SecPolicyCli::SourceFile;
 namespace Codes = SecPolicyCli::Codes;
@@ -59,7 +60,7 @@ Diagnostic Problem(const Code& code, const std::string& file, unsigned int line,
   return problem;
 }
 
-TEST(DiagnosticList, SortsByFilesAsTheyCameLineAndColumn) {
+TEST(DiagnosticList, SortsErrorsFirstThenByFilesAsTheyCameLineAndColumn) {
   DiagnosticList list({});
   list.BeginFile("/z");
   list.Add(Problem(Codes::kTab, "/a", 1, 1));
@@ -68,13 +69,45 @@ TEST(DiagnosticList, SortsByFilesAsTheyCameLineAndColumn) {
   list.Add(Problem(Codes::kTab, "/z", 2, 3));
   list.Add(Problem(Codes::kGrantWord, "/z", 2, 3));
   list.Sort();
+  list.Select({});
   std::vector<std::string> places;
-  for (const Diagnostic& problem : list.All()) {
+  for (const Diagnostic& problem : list.Shown()) {
     places.push_back(problem.file + ":" + std::to_string(problem.line) + ":" +
                      std::to_string(problem.column) + " " + problem.code->name);
   }
-  EXPECT_THAT(places, ElementsAre("/z:2:3 tab", "/z:2:3 grant-word", "/z:2:9 tab", "/z:10:1 tab",
+  EXPECT_THAT(places, ElementsAre("/z:2:3 grant-word", "/z:2:3 tab", "/z:2:9 tab", "/z:10:1 tab",
                                   "/a:1:1 tab"));
+}
+
+TEST(DiagnosticList, CountsAlsoWhatIsNotShown) {
+  DiagnosticList list({});
+  list.Add(Problem(Codes::kTab, "/a", 1, 1));
+  list.Add(Problem(Codes::kGrantWord, "/a", 2, 1));
+  list.Add(Problem(Codes::kTab, "/b", 1, 1));
+  list.Sort();
+  const auto shown = [&](const Selection& selection) {
+    list.Select(selection);
+    return list.Shown().size();
+  };
+  EXPECT_EQ(shown({}), 3U);
+  EXPECT_EQ(shown({.errorsOnly = true, .codes = {}}), 1U);
+  EXPECT_EQ(shown({.codes = {"tab"}}), 2U);
+  EXPECT_EQ(shown({.codes = {"tab"}, .most = 1}), 1U);
+  EXPECT_EQ(shown({.codes = {}, .most = 0}), 0U);
+  EXPECT_EQ(list.Count(Severity::kWarning), 2U);
+  EXPECT_THAT(list.Tally(),
+              ElementsAre(std::pair(&Codes::kGrantWord, 1U), std::pair(&Codes::kTab, 2U)));
+}
+
+TEST(DiagnosticList, KeepsOneFile) {
+  DiagnosticList list({});
+  list.Add(Problem(Codes::kTab, "/a", 1, 1));
+  list.Add(Problem(Codes::kGrantWord, "/b", 2, 1));
+  EXPECT_TRUE(list.Knows("/a"));
+  EXPECT_FALSE(list.Knows("/c"));
+  list.KeepFile("/b");
+  EXPECT_EQ(list.Count(), 1U);
+  EXPECT_EQ(list.Count(Severity::kError), 1U);
 }
 
 TEST(DiagnosticList, LeavesOutUnwantedWarningsButNoErrors) {
@@ -137,8 +170,9 @@ TEST_F(SourceFileTest, TellsBytesThatTheLibraryReadsOtherwise) {
   for (const auto& [text, problems] : table) {
     DiagnosticList list({});
     Write(text).CheckBytes(list);
+    list.Select({});
     std::vector<std::string> found;
-    for (const Diagnostic& problem : list.All()) {
+    for (const Diagnostic& problem : list.Shown()) {
       found.push_back(std::string(problem.code->name) + " " + std::to_string(problem.line) + ":" +
                       std::to_string(problem.column));
     }

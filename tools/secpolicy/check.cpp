@@ -1,17 +1,23 @@
+#include <algorithm>
 #include <filesystem>
+#include <fstream>
 #include <iostream>
+#include <iterator>
 #include <map>
+#include <memory>
+#include <optional>
 #include <string>
+#include <system_error>
 #include <vector>
 
 #include "check/check_run.h"
 #include "check/report_format.h"
 #include "command_line.h"
 #include "ending.h"
+#include "host/linux/common/host_error.h"
 #include "host/linux/operation/policy_load.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
-#include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
 #include "verb.h"
@@ -25,10 +31,21 @@ const std::map<std::string, Write> kFormats = {
     {"text", WriteText}, {"json", WriteJson}, {"sarif", WriteSarif}};
 
 struct Options {
+  std::string path = SecPolicy::kPolicyRoot;
   bool fresh = false;
   bool warningsAreErrors = false;
+  bool fromStandardInput = false;
+  bool errorsOnly = false;
+  std::string most;
   std::string format;
+  std::vector<std::string> wanted;
   std::vector<std::string> unwanted;
+};
+
+// What is checked: a policy directory, and the one file in it that is asked about, if any.
+struct Subject {
+  std::string dir;
+  std::string file;
 };
 
 void AddNames(const std::string& dir, const std::string& prefix, std::vector<std::string>& names) {
@@ -64,28 +81,103 @@ void CheckPolicy(CheckRun& run, const std::string& root) {
   CheckUse(run, domains);
 }
 
-ExitCode Check(const std::string& dir, const Options& options) {
-  if (!File_IsDirectory(dir.c_str())) {
-    return Refuse("check", "there is no directory " + dir +
-                               " below this root. Name the directory of the policy, or the root "
-                               "that it is in (--root DIR).");
+bool HoldsDomains(const std::filesystem::path& dir) {
+  return File_IsDirectory((dir / SecPolicy::kDomainsDir).c_str());
+}
+
+// The policy directory that the file belongs to; that of early boot is part of the one above it.
+std::optional<Subject> FindPolicyOf(const std::filesystem::path& file) {
+  std::filesystem::path dir = file.parent_path();
+  while (!HoldsDomains(dir)) {
+    if (!dir.has_relative_path()) return std::nullopt;
+    dir = dir.parent_path();
+  }
+  if (dir.filename() == SecPolicy::kEarlyDir && HoldsDomains(dir.parent_path())) {
+    dir = dir.parent_path();
+  }
+  return Subject{.dir = dir, .file = file};
+}
+
+std::optional<Subject> FindSubject(const std::string& path) {
+  if (File_IsDirectory(path.c_str())) return Subject{.dir = path, .file = ""};
+  std::error_code error;
+  if (!std::filesystem::is_regular_file(path, error)) return std::nullopt;
+  return FindPolicyOf(std::filesystem::absolute(path).lexically_normal());
+}
+
+// Takes what standard input holds for the content of `file`.
+void TakeStandardInput(CheckRun& run, const std::string& file) {
+  const std::string content = run.scratch.DirectoryPath() + "/content";
+  std::ofstream output(content, std::ios::binary);
+  std::copy(std::istreambuf_iterator<char>(std::cin), {}, std::ostreambuf_iterator<char>(output));
+  output.flush();
+  if (!output) LinuxHost::ThrowErrno("cannot write ", content);
+  run.contents.emplace(file, content);
+}
+
+Selection SelectionOf(const Options& options) {
+  Selection selection;
+  selection.errorsOnly = options.errorsOnly;
+  selection.codes.insert(options.wanted.begin(), options.wanted.end());
+  if (!options.most.empty()) selection.most = std::stoul(options.most);
+  return selection;
+}
+
+std::string DescribeFound(const DiagnosticList& diagnostics) {
+  if (diagnostics.Count() == 0) return "no problems";
+  const std::size_t shown = diagnostics.Shown().size();
+  return CountOf(diagnostics.Count(Severity::kError), "error") + ", " +
+         CountOf(diagnostics.Count(Severity::kWarning), "warning") +
+         (shown < diagnostics.Count() ? "; " + std::to_string(shown) + " shown" : "");
+}
+
+ExitCode Check(const Options& options) {
+  const std::optional<Subject> subject = FindSubject(options.path);
+  if (!subject) {
+    return Refuse("check", "there is no policy at " + options.path +
+                               " below this root. Name the directory of the policy or a file in "
+                               "it, or the root that it is in (--root DIR).");
+  }
+  if (options.fromStandardInput && subject->file.empty()) {
+    return Refuse("check", "name the file that standard input holds the content of.");
   }
   CheckRun run(options.fresh, options.unwanted);
+  if (options.fromStandardInput) TakeStandardInput(run, subject->file);
   LinuxHost::PolicyTransaction load(LinuxHost::CurrentState());
-  HideOldDomains(load, dir);
-  CheckPolicy(run, dir);
+  HideOldDomains(load, subject->dir);
+  CheckPolicy(run, subject->dir);
+  if (!subject->file.empty()) {
+    if (!run.diagnostics.Knows(subject->file)) {
+      return Refuse("check", "a load does not read " + subject->file +
+                                 ": it is in none of the directories of a policy.");
+    }
+    run.diagnostics.KeepFile(subject->file);
+  }
   run.diagnostics.Sort();
+  run.diagnostics.Select(SelectionOf(options));
   run.diagnostics.against = run.scratch.IsCopy() ? "installed" : "boot";
   kFormats.at(options.format)(run.diagnostics, std::cout);
 
-  const std::size_t errors = run.diagnostics.Count(Severity::kError);
-  const std::size_t warnings = run.diagnostics.Count(Severity::kWarning);
   const std::string why = run.scratch.WhyNoCopy();
-  Summarize("check", (errors + warnings == 0
-                          ? "no problems"
-                          : CountOf(errors, "error") + ", " + CountOf(warnings, "warning")) +
+  Summarize("check", DescribeFound(run.diagnostics) +
                          (why.empty() ? "" : "; checked as after a boot, since " + why));
-  return errors > 0 || (options.warningsAreErrors && warnings > 0) ? kFailed : kWell;
+  const Severity leastWrong = options.warningsAreErrors ? Severity::kWarning : Severity::kError;
+  const bool isWrong =
+      run.diagnostics.Count(Severity::kError) > 0 || run.diagnostics.Count(leastWrong) > 0;
+  return isWrong ? kFailed : kWell;
+}
+
+std::string CheckCodeName(const std::string& name) {
+  for (const Code* code : AllCodes()) {
+    if (code->name == name) return "";
+  }
+  return "there is no problem '" + name + "'";
+}
+
+std::string CheckNumber(const std::string& word) {
+  const bool isNumber = !word.empty() && word.size() < 10 &&
+                        word.find_first_not_of("0123456789") == std::string::npos;
+  return isNumber ? "" : "'" + word + "' is not a number";
 }
 
 std::string CheckWarningName(const std::string& name) {
@@ -99,15 +191,27 @@ std::string CheckWarningName(const std::string& name) {
 
 Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  const auto dir = AddPolicyDir(syntax, SecPolicy::kPolicyRoot);
+  syntax
+      .AddOption("DIR", options->path,
+                 "The policy directory, or a file in it, as seen from the root")
+      .ShowDefault();
   syntax.AddFlag("--fresh", options->fresh,
                  "Check as after a boot, whatever is installed on this host now");
   syntax.AddFormat(options->format, "the problems", {"text", "json", "sarif"});
+  syntax.AddFlag("--stdin", options->fromStandardInput,
+                 "Take standard input for the content of the file");
+  syntax.AddFlag("--errors-only", options->errorsOnly, "Show no warnings");
+  syntax.AddList("--only", options->wanted, "Show only this problem; may be given repeatedly")
+      .Check(CheckCodeName)
+      .NameValue("CODE");
+  syntax.AddOption("--max", options->most, "Show at most so many problems")
+      .Check(CheckNumber)
+      .NameValue("N");
   syntax.AddFlag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
   syntax.AddList("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
       .Check(CheckWarningName)
       .NameValue("CODE");
-  return [dir, options] { return Check(*dir, *options); };
+  return [options] { return Check(*options); };
 }
 
 }  // namespace
@@ -116,14 +220,17 @@ const Verb kCheck = {
     "check", "Look for every problem of the policy files, and change nothing",
     "Reads the whole policy as a load would, against a copy of what is installed, and prints "
     "every\n"
-    "problem with its file, line and column: what a load refuses (errors), and what it accepts\n"
-    "although it can hardly be meant (warnings). Needs no privilege. Exit status: 0 no errors,\n"
-    "1 errors, or with --werror warnings.\n"
+    "problem with its file, line and column: what a load refuses (errors), and then what it\n"
+    "accepts although it can hardly be meant (warnings). Of a file, tells its problems alone.\n"
+    "Needs no privilege. Exit status: 0 no errors, 1 errors, or with --werror warnings, whether\n"
+    "they are shown or not.\n"
     "\n"
     "Examples:\n"
     "  secpolicy check                            the host's policy\n"
     "  secpolicy check --fresh ./my-policy        a directory, as if on a newly booted host\n"
     "  secpolicy check --werror --disable missing-path\n"
+    "  secpolicy check --errors-only --max 20     what to mend first\n"
+    "  secpolicy check ./my-policy/domains/webDom one file, beside the others\n"
     "  secpolicy check --format sarif >check.sarif",
     Define};
 

@@ -88,7 +88,9 @@ std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
   for (const auto& [path, name] : names) {
     run.diagnostics.BeginFile(path);
     try {
-      const SourceFile& file = run.files.emplace_back(path);
+      const auto content = run.contents.find(path);
+      const SourceFile& file =
+          run.files.emplace_back(path, content == run.contents.end() ? path : content->second);
       CheckName(run, file, name);
       file.CheckBytes(run.diagnostics);
       opened.push_back({&file, name});

@@ -37,6 +37,7 @@ struct CheckRun {
   SecPolicy::TeskAccessInterfaceImpl access;
   DiagnosticList diagnostics;
   std::deque<SourceFile> files;
+  std::map<std::string, std::string> contents;  // where that of a file lies, if in another one
   std::map<Policy::WordKind, Vocabulary> vocabularies;  // for hints; those that were asked
 
   // What the files say of each other.

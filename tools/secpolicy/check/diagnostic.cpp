@@ -144,13 +144,40 @@ void DiagnosticList::Add(Diagnostic diagnostic) {
   diagnostics.push_back(std::move(diagnostic));
 }
 
+void DiagnosticList::KeepFile(const std::string& file) {
+  std::erase_if(diagnostics, [&](const Diagnostic& diagnostic) { return diagnostic.file != file; });
+}
+
 void DiagnosticList::Sort() {
   const auto place = [this](const Diagnostic& diagnostic) {
-    return std::tuple(fileOrder.at(diagnostic.file), diagnostic.line, diagnostic.column);
+    return std::tuple(diagnostic.code->severity, fileOrder.at(diagnostic.file), diagnostic.line,
+                      diagnostic.column);
   };
   std::stable_sort(
       diagnostics.begin(), diagnostics.end(),
       [&](const Diagnostic& one, const Diagnostic& other) { return place(one) < place(other); });
+}
+
+void DiagnosticList::Select(const Selection& selection) {
+  shown.clear();
+  for (const Diagnostic& diagnostic : diagnostics) {
+    if (shown.size() == selection.most) return;
+    const Code& code = *diagnostic.code;
+    if (selection.errorsOnly && code.severity != Severity::kError) continue;
+    if (!selection.codes.empty() && !selection.codes.contains(code.name)) continue;
+    shown.push_back(diagnostic);
+  }
+}
+
+std::vector<std::pair<const Code*, std::size_t>> DiagnosticList::Tally() const {
+  std::vector<std::pair<const Code*, std::size_t>> tally;
+  for (const Code* code : AllCodes()) {
+    const auto count =
+        std::count_if(diagnostics.begin(), diagnostics.end(),
+                      [&](const Diagnostic& diagnostic) { return diagnostic.code == code; });
+    if (count > 0) tally.emplace_back(code, static_cast<std::size_t>(count));
+  }
+  return tally;
 }
 
 std::size_t DiagnosticList::Count(Severity severity) const {

@@ -1,10 +1,12 @@
 #pragma once
 
 #include <cstddef>
+#include <limits>
 #include <map>
 #include <set>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "secpolicy/observed/policy_observer.h"
@@ -84,6 +86,13 @@ struct Diagnostic {
   std::string source;  // the bytes of the line
 };
 
+// Which of the problems are shown.
+struct Selection {
+  bool errorsOnly = false;
+  std::set<std::string> codes;  // by name; empty: all
+  std::size_t most = std::numeric_limits<std::size_t>::max();
+};
+
 // The problems of one check.
 class DiagnosticList {
  public:
@@ -95,11 +104,26 @@ class DiagnosticList {
 
   void Add(Diagnostic diagnostic);
 
-  // Brings the problems into the order of files, lines and columns.
+  bool Knows(const std::string& file) const { return fileOrder.contains(file); }
+
+  // Forgets the problems of all other files.
+  void KeepFile(const std::string& file);
+
+  // Brings the problems into their order: errors before warnings, and either by file, line and
+  // column.
   void Sort();
 
-  const std::vector<Diagnostic>& All() const { return diagnostics; }
+  // Chooses those that are shown. The others count.
+  void Select(const Selection& selection);
+
+  // What the latest selection chose; nothing before the first.
+  const std::vector<Diagnostic>& Shown() const { return shown; }
+
   std::size_t Count(Severity severity) const;
+  std::size_t Count() const { return diagnostics.size(); }
+
+  // How many there are of each kind, errors first and then in order of name.
+  std::vector<std::pair<const Code*, std::size_t>> Tally() const;
 
   // What the policy was checked against, in reports: what is "installed", or as after a "boot".
   std::string against = "boot";
@@ -108,6 +132,7 @@ class DiagnosticList {
   std::set<std::string> unwanted;
   std::map<std::string, std::size_t> fileOrder;
   std::vector<Diagnostic> diagnostics;
+  std::vector<Diagnostic> shown;
 };
 
 }  // namespace SecPolicyCli

@@ -36,6 +36,23 @@ bool IsNumber(const std::string& word) {
   }
 }
 
+bool IsReversed(const std::string& first, const std::string& second) {
+  if (second.empty()) return false;
+  return Policy::ParseParameterRange(first, "").first >
+         Policy::ParseParameterRange(second, "").first;
+}
+
+// How a range is written of which both ends stand in one word.
+std::string HintForRange(const std::string& word) {
+  const std::size_t end = word.find_first_of("-:.");
+  const std::size_t begin = word.find_last_of("-:.");
+  if (end == std::string::npos) return "";
+  const std::string first = word.substr(0, end);
+  const std::string last = word.substr(begin + 1);
+  if (!IsNumber(first) || !IsNumber(last)) return "";
+  return "a range is two words: " + first + " " + last;
+}
+
 // The check of one domain's file.
 class DomainCheck {
  public:
@@ -183,9 +200,14 @@ class DomainCheck {
     constexpr std::size_t kFirstNumber = 2;
     const auto& [line, domainId, domainName, check, first, second, grant] = rule;
     if (!IsNumber(first)) {
-      run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, kFirstNumber, refusal));
+      run.diagnostics.Add(
+          file.AtWord(Codes::kParameterConflict, line, kFirstNumber, refusal, HintForRange(first)));
     } else if (!second.empty() && !IsNumber(second)) {
       run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, kFirstNumber + 1, refusal));
+    } else if (IsReversed(first, second)) {
+      run.diagnostics.Add(file.AtWords(Codes::kParameterConflict, line, kFirstNumber,
+                                       kFirstNumber + 1, refusal,
+                                       "the smaller number comes first: " + second + " " + first));
     } else {
       Add(Codes::kParameterConflict, line, file.Lines().at(line), refusal);
     }

@@ -23,11 +23,14 @@ Json ToJson(const Diagnostic& diagnostic) {
 
 void WriteJson(const DiagnosticList& diagnostics, std::ostream& output) {
   Json problems = Json::Array();
-  for (const Diagnostic& diagnostic : diagnostics.All()) problems.Append(ToJson(diagnostic));
+  for (const Diagnostic& diagnostic : diagnostics.Shown()) problems.Append(ToJson(diagnostic));
+  Json tally = Json::Object();
+  for (const auto& [code, count] : diagnostics.Tally()) tally[code->name] = count;
   const Json report = {{"schema", "secpolicy.check/1"},
                        {"against", diagnostics.against},
                        {"errors", diagnostics.Count(Severity::kError)},
                        {"warnings", diagnostics.Count(Severity::kWarning)},
+                       {"tally", tally},
                        {"problems", problems}};
   output << report.Text();
 }

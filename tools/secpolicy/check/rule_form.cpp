@@ -36,7 +36,11 @@ std::string AskFor(const std::string& nearest) {
 }
 
 std::string Suggest(CheckRun& run, WordKind kind, const std::string& word) {
-  return AskFor(VocabularyOf(run, kind).Nearest(word));
+  constexpr char kCapabilityPrefix[] = "cap_";
+  Vocabulary& table = VocabularyOf(run, kind);
+  const std::string nearest = table.Nearest(word);
+  if (!nearest.empty() || kind != kCapability) return AskFor(nearest);
+  return AskFor(table.Nearest(kCapabilityPrefix + word));
 }
 
 // A short table is told as a whole when no word of it is near.

@@ -77,7 +77,7 @@ Json Result(const Diagnostic& diagnostic) {
 
 void WriteSarif(const DiagnosticList& diagnostics, std::ostream& output) {
   Json results = Json::Array();
-  for (const Diagnostic& diagnostic : diagnostics.All()) results.Append(Result(diagnostic));
+  for (const Diagnostic& diagnostic : diagnostics.Shown()) results.Append(Result(diagnostic));
   const Json driver = {{"name", "secpolicy"}, {"version", SECPOLICY_VERSION}, {"rules", Rules()}};
   const Json run = {
       {"tool", {{"driver", driver}}}, {"columnKind", "unicodeCodePoints"}, {"results", results}};

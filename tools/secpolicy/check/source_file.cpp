@@ -38,11 +38,12 @@ SourceFile::Words ToWords(std::queue<std::string>& queue) {
 
 }  // namespace
 
-SourceFile::SourceFile(const std::string& filePath) : path(filePath) {
+SourceFile::SourceFile(const std::string& filePath, const std::string& contentPath)
+    : path(filePath) {
   std::map<unsigned int, std::queue<std::string>> parsed;
-  SecPolicy::ParseFile(path, parsed);
+  SecPolicy::ParseFile(contentPath, parsed);
   for (auto& [number, words] : parsed) lines.emplace(number, ToWords(words));
-  texts = ReadLines(path);
+  texts = ReadLines(contentPath);
 }
 
 Diagnostic SourceFile::About(const Code& code, std::string message, std::string hint) const {

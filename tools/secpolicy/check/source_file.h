@@ -16,8 +16,10 @@ class SourceFile {
  public:
   using Words = std::vector<std::string>;
 
-  // Reads the file. Throws BraxoException, in the library's words, when it cannot be opened.
-  explicit SourceFile(const std::string& filePath);
+  // Reads the file, whose content may lie in another one. Throws BraxoException, in the library's
+  // words, when that cannot be opened.
+  explicit SourceFile(const std::string& filePath) : SourceFile(filePath, filePath) {}
+  SourceFile(const std::string& filePath, const std::string& contentPath);
 
   const std::string& Path() const { return path; }
 

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <iomanip>
 #include <string>
 #include <string_view>
 
@@ -11,6 +12,9 @@ namespace {
 // Of a long line, what is shown before and in all.
 constexpr std::size_t kShownBefore = 60;
 constexpr std::size_t kShownWidth = 100;
+
+// What fits a screen needs no overview.
+constexpr std::size_t kFewProblems = 10;
 
 // The line, and below it a mark under the characters that the problem is about.
 void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
@@ -31,10 +35,20 @@ void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
   output << "    " << excerpt << "\n    " << marks << '\n';
 }
 
+void WriteTally(const DiagnosticList& diagnostics, std::ostream& output) {
+  if (diagnostics.Count() <= kFewProblems) return;
+  output << '\n';
+  for (const auto& [code, count] : diagnostics.Tally()) {
+    output << std::setw(6) << count << ' ' << std::left << std::setw(8)
+           << SeverityName(code->severity) << std::setw(20) << code->name << std::right
+           << code->summary << '\n';
+  }
+}
+
 }  // namespace
 
 void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
-  for (const Diagnostic& diagnostic : diagnostics.All()) {
+  for (const Diagnostic& diagnostic : diagnostics.Shown()) {
     output << Visible(diagnostic.file) << ':';
     if (diagnostic.line > 0) output << diagnostic.line << ':' << diagnostic.column << ':';
     output << ' ' << SeverityName(diagnostic.code->severity) << ": " << Visible(diagnostic.message)
@@ -42,6 +56,7 @@ void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
     if (diagnostic.line > 0) WriteExcerpt(diagnostic, output);
     if (!diagnostic.hint.empty()) output << "    hint: " << Visible(diagnostic.hint) << '\n';
   }
+  WriteTally(diagnostics, output);
 }
 
 }  // namespace SecPolicyCli
