@@ -104,7 +104,7 @@ load_broken() {
   everything >"$BATS_TEST_TMPDIR/before"
   load_whole
   exits 1
-  ends_with "secpolicy: load: There were some problems encountered in setting the policy (3 errors above); nothing was installed"
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 problem above); nothing was installed"
   everything | diff "$BATS_TEST_TMPDIR/before" -
   local told=${stderr%$'\n'*}
   secpolicy load /new
@@ -126,7 +126,7 @@ load_broken() {
   load_broken
   exits 1
   says "Error: Unable to label /var/lib/vms/demo/settings: Input/output error"
-  ends_with "secpolicy: load: failed (1 error above); nothing was installed"
+  ends_with "secpolicy: load: failed (1 problem above); nothing was installed"
   everything | diff "$BATS_TEST_TMPDIR/before" -
   # The same failure leaves a plain load without that label alone.
   run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load /new
@@ -166,7 +166,7 @@ END
   break_labels fail settings
   load_broken
   exits 1
-  ends_with "secpolicy: load: failed (1 error above); nothing was installed"
+  ends_with "secpolicy: load: failed (1 problem above); nothing was installed"
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 

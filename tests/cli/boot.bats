@@ -81,12 +81,12 @@ load helper
   rm -r "$policy/early/domains"
   secpolicy boot
   exits 1
-  diff - <(sed '/^installed now: /s/[0-9]\+/N/g' <<<"$stderr") <<'END'
+  diff - <(sed '/^installed now: /s/[0-9]\+/N/g' <<<"$stderr") <<END
 Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
-/etc/zorvan/secpolicy/early/domains: 1 error
-'secpolicy check /etc/zorvan/secpolicy' shows the lines, and what may be meant
+$policy/early/domains: 1 error
+'secpolicy --root $root check /etc/zorvan/secpolicy' shows the lines, and what may be meant
 installed now: N domains, N rules, N objects
-secpolicy: boot: failed (1 error above)
+secpolicy: boot: failed (1 problem above)
 END
 }
 
@@ -113,8 +113,8 @@ all" ]]
   echo "-s no_such_call grant" >>"$policy/domains/hostDom"
   secpolicy boot
   exits 1
-  says "/etc/zorvan/secpolicy/early/domains/hostDom: 1 error"
-  says "/etc/zorvan/secpolicy/domains/hostDom: 1 error"
+  says "$policy/early/domains/hostDom: 1 error"
+  says "$policy/domains/hostDom: 1 error"
 }
 
 # ---- What a boot does to files

@@ -7,7 +7,8 @@ load helper
 setup() {
   make_root
   boot
-  shown=/etc/zorvan/secpolicy
+  inside=/etc/zorvan/secpolicy
+  shown=$root$inside
 }
 
 # add FILE LINE...: appends the lines to the policy file, and keeps the number of the last one.
@@ -170,20 +171,20 @@ fileLabels/zz:3 [unknown-word]" ]]
 
 @test "unreadable" {
   rm -r "$policy/fileLabels"
-  finds "$shown/fileLabels: error: Unable to open policy directory $shown/fileLabels [unreadable]"
+  finds "$shown/fileLabels: error: Unable to open policy directory $inside/fileLabels [unreadable]"
 }
 
 @test "unreadable, of a file in place of a directory, and of a directory that may not be opened" {
   rm -r "$policy/fileLabels"
   touch "$policy/fileLabels"
-  finds "$shown/fileLabels: error: Unable to open policy directory $shown/fileLabels [unreadable]"
+  finds "$shown/fileLabels: error: Unable to open policy directory $inside/fileLabels [unreadable]"
   chmod 000 "$policy/objects"
   # With all its rights the superuser may open any directory.
   local bound=()
   [[ $EUID -ne 0 ]] || bound=(setpriv "--bounding-set=-dac_override,-dac_read_search" --inh-caps=-all)
   run --separate-stderr "${bound[@]}" "$SECPOLICY" --root "$root" check
   exits 1
-  shows "$shown/objects: error: Unable to open policy directory $shown/objects [unreadable]"
+  shows "$shown/objects: error: Unable to open policy directory $inside/objects [unreadable]"
 }
 
 @test "carriage-return" {
@@ -202,7 +203,7 @@ fileLabels/zz:3 [unknown-word]" ]]
   local first
   first=$(grep -n '^sshKey\b' "$policy/objects/base" | cut -d: -f1)
   add objects/base "sshKey"
-  warns "$shown/objects/base:$number:1: warning: 'sshKey' is declared in line $first of $shown/objects/base already [duplicate-object]"
+  warns "$shown/objects/base:$number:1: warning: 'sshKey' is declared in line $first of $inside/objects/base already [duplicate-object]"
 }
 
 @test "duplicate-rule, the letters of paths in any order" {
@@ -341,16 +342,16 @@ END
 
 @test "no-tardisk" {
   echo "-E monitorImage monitorDom" >"$policy/tardisks/late"
-  finds "$shown/tardisks/late: error: No backing tardisk for policy file $shown/tardisks/late [no-tardisk]"
+  finds "$shown/tardisks/late: error: No backing tardisk for policy file $inside/tardisks/late [no-tardisk]"
   secpolicy load
   exits 1
-  says "Error: No backing tardisk for policy file $shown/tardisks/late"
+  says "Error: No backing tardisk for policy file $inside/tardisks/late"
 }
 
 @test "tardisk-entry, among the policies and among the tardisks" {
   mkdir "$policy/tardisks/inner" "$root/tardisks/inner"
   finds "$shown/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
-  shows "/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
+  shows "$root/tardisks/inner: error: this is a directory: a load skips it [tardisk-entry]"
   secpolicy load
   exits 1
   says "Error: Skipping directory inner"
@@ -362,7 +363,7 @@ END
   mkdir "$root/copy/tardisks/inner"
   secpolicy check /copy
   exits 0
-  shows "/copy/tardisks/inner: warning: this is a directory: a load skips it [skipped-entry]"
+  shows "$root/copy/tardisks/inner: warning: this is a directory: a load skips it [skipped-entry]"
 }
 
 @test "nul-byte" {
@@ -410,10 +411,10 @@ END
   echo "/etc/services.conf sshKey" >"$policy/fileLabels/one"
   echo "/etc/services.conf vmDisk" >"$policy/fileLabels/two"
   echo "/etc/other.conf sshKey" >"$policy/fileLabels/x"
-  warns "$shown/fileLabels/two:1:20: warning: this label replaces 'sshKey' of line 1 of $shown/fileLabels/one [two-labels]"
-  shows "$shown/fileLabels/x:1:17: warning: this label replaces 'vmDisk' of line 1 of $shown/fileLabels/two: /etc/services.conf is the same file [two-labels]"
+  warns "$shown/fileLabels/two:1:20: warning: this label replaces 'sshKey' of line 1 of $inside/fileLabels/one [two-labels]"
+  shows "$shown/fileLabels/x:1:17: warning: this label replaces 'vmDisk' of line 1 of $inside/fileLabels/two: /etc/services.conf is the same file [two-labels]"
   echo "/etc/* hostConfig" >"$policy/fileLabels/y"
-  warns "$shown/fileLabels/x:1:17: warning: this label does not stay: line 1 of $shown/fileLabels/y gives the whole tree 'hostConfig' [two-labels]"
+  warns "$shown/fileLabels/x:1:17: warning: this label does not stay: line 1 of $inside/fileLabels/y gives the whole tree 'hostConfig' [two-labels]"
 }
 
 @test "unreachable-domain, also of domains that enter each other" {
@@ -455,9 +456,9 @@ END
   secpolicy check --format json
   exits 1
   fits_schema check
-  jq -e --argjson line "$(wc -l <"$policy/domains/appDom")" '
+  jq -e --arg policy "$policy" --argjson line "$(wc -l <"$policy/domains/appDom")" '
     .schema == "secpolicy.check/1" and .errors == 1 and .warnings == 1 and (.problems | length) == 2 and
-    .problems[0] == {file: "/etc/zorvan/secpolicy/domains/appDom", line: $line, column: 4,
+    .problems[0] == {file: ($policy + "/domains/appDom"), line: $line, column: 4,
       length: 4, source: "-s reed grant", severity: "error", code: "unknown-word",
       message: "unknown system call '"'reed'"'", hint: "did you mean '"'read'"'?"}' <<<"$output"
 }
@@ -488,8 +489,9 @@ END
   jq -e --argjson line "$number" '.runs[0].results[] | select(.ruleId == "unknown-word") |
     .locations[0].physicalLocation.region |
     .startLine == $line and .startColumn == 4 and .endColumn == 8' <<<"$output"
-  jq -e '.runs[0].results | map(.locations[0].physicalLocation.artifactLocation.uri) |
-    index("file:///etc/zorvan/secpolicy/domains/odd%20name%25") != null' <<<"$output"
+  jq -e --arg policy "$policy" '.runs[0].results |
+    map(.locations[0].physicalLocation.artifactLocation.uri) |
+    index("file://" + $policy + "/domains/odd%20name%25") != null' <<<"$output"
 }
 
 @test "control characters of a file do not reach the terminal" {
@@ -693,11 +695,11 @@ many_problems() {
 @test "one file is checked beside the others, and only its problems count" {
   add domains/sshDom "-s opne grant"
   add domains/hostDom "-s raed grant"
-  secpolicy check "$shown/domains/sshDom"
+  secpolicy check "$inside/domains/sshDom"
   exits 1
   shows "$shown/domains/sshDom:$(wc -l <"$policy/domains/sshDom"):4: error: unknown system call 'opne' [unknown-word]"
   ends_with "secpolicy: check: 1 error, 0 warnings"
-  secpolicy check "$shown/objects/base"
+  secpolicy check "$inside/objects/base"
   exits 0
   ends_with "secpolicy: check: no problems"
 }
@@ -706,7 +708,7 @@ many_problems() {
   local file
   file=$(find "$policy/early/domains" -type f | head -n 1)
   echo "-s opne grant" >>"$file"
-  secpolicy check "$shown/early/domains/${file##*/}"
+  secpolicy check "$inside/early/domains/${file##*/}"
   exits 1
   ends_with "secpolicy: check: 1 error, 0 warnings"
 }
@@ -714,7 +716,7 @@ many_problems() {
 @test "what standard input holds takes the place of the file, and the file stays as it is" {
   local before
   before=$(sha256sum "$policy/domains/sshDom")
-  run --separate-stderr "$SECPOLICY" --root "$root" check --stdin "$shown/domains/sshDom" <<<"-s opne grant"
+  run --separate-stderr "$SECPOLICY" --root "$root" check --stdin "$inside/domains/sshDom" <<<"-s opne grant"
   exits 1
   shows "$shown/domains/sshDom:1:4: error: unknown system call 'opne' [unknown-word]"
   [[ $(sha256sum "$policy/domains/sshDom") == "$before" ]]
@@ -722,9 +724,9 @@ many_problems() {
 
 @test "a file that no load reads, and one that is in no policy, are refused" {
   touch "$policy/README" "$root/alone"
-  secpolicy check "$shown/README"
+  secpolicy check "$inside/README"
   exits 1
-  ends_with "secpolicy: check: a load does not read $shown/README: it is in none of the directories of a policy."
+  ends_with "secpolicy: check: a load does not read $inside/README: it is in none of the directories of a policy."
   secpolicy check /alone
   exits 1
   ends_with "secpolicy: check: there is no policy at /alone below this root. Name the directory of the policy or a file in it, or the root that it is in (--root DIR)."

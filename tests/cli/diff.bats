@@ -136,7 +136,7 @@ END
   exits 2
   [[ -z $output ]]
   says "Error: Error in parsing policy for domain: appDom: $(wc -l <"$policy/domains/appDom") : unknown system call 'no_such_call'"
-  ends_with "secpolicy: diff: the policy in /new has errors (above), so it was not compared. 'secpolicy check /new' shows every one with its place."
+  ends_with "secpolicy: diff: the policy in /new has errors (above), so it was not compared. 'secpolicy --root $root check /new' shows every one with its place."
 }
 
 @test "what there is not" {
@@ -145,11 +145,11 @@ END
   [[ $stderr == "secpolicy: diff: there is no directory /no/such below this root. Name a policy directory, a saved state, or 'installed'." ]]
   secpolicy diff nosuch installed
   exits 2
-  [[ $stderr == "secpolicy: diff: there is no saved state 'nosuch', and no such directory. 'secpolicy history' lists what is saved; 'installed' is what is installed now." ]]
+  [[ $stderr == "secpolicy: diff: there is no saved state 'nosuch', and no such directory. 'secpolicy --root $root history' lists what is saved; 'installed' is what is installed now." ]]
   rm "$root/run/secpolicy/"*
   secpolicy diff installed /new
   exits 2
-  [[ $stderr == "secpolicy: diff: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy boot' first." ]]
+  [[ $stderr == "secpolicy: diff: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]
   [[ ! -e $root/run/secpolicy/host.db ]]
 }
 

@@ -59,7 +59,7 @@ load helper
   rm -r "$root/tardisks"
   secpolicy display
   exits 1
-  ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' first."
+  ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
 }
 
 # late_tardisk: an image that came after the boot, with a label that no object has.
@@ -140,7 +140,7 @@ END
   secpolicy display --format json
   exits 1
   [[ -z $output ]]
-  ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' first."
+  ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
   secpolicy display --format xml
   wrong_usage display "--format: xml not in {text,json}"
 }

@@ -64,7 +64,7 @@ on_a_terminal() {
   secpolicy label get /etc/new /no/such /opt
   exits 1
   [[ $output == "/opt: unlabeled" ]]
-  [[ $stderr == "Error: /etc/new: has no label; 'secpolicy boot' gives every file its first one
+  [[ $stderr == "Error: /etc/new: has no label; 'secpolicy --root $root boot' gives every file its first one
 Error: /no/such: No such file or directory
 secpolicy: label get: failed (2 errors above)" ]]
 }
@@ -146,7 +146,7 @@ secpolicy: label get: failed (2 errors above)" ]]
   [[ $stderr == "secpolicy: label set: there is no object label 'sshKye'. Did you mean 'sshKey'?" ]]
   secpolicy label set entirelyDifferent /etc
   exits 1
-  [[ $stderr == "secpolicy: label set: there is no object label 'entirelyDifferent'. 'secpolicy display' shows all labels" ]]
+  [[ $stderr == "secpolicy: label set: there is no object label 'entirelyDifferent'. 'secpolicy --root $root display' shows all labels" ]]
   secpolicy label set /etc sshKey
   exits 1
   [[ $stderr == "secpolicy: label set: there is no object label '/etc'. The label comes first: secpolicy label set sshKey /etc" ]]
@@ -159,7 +159,7 @@ secpolicy: label get: failed (2 errors above)" ]]
   touch "$root/etc/new"
   secpolicy label set sshKey /etc/new /no/such /opt
   exits 1
-  [[ $stderr == "Error: Unable to set file label (sshKey) for file /etc/new: No data available: it has no label; 'secpolicy boot' gives every file its first one
+  [[ $stderr == "Error: Unable to set file label (sshKey) for file /etc/new: No data available: it has no label; 'secpolicy --root $root boot' gives every file its first one
 Error: Unable to set file label (sshKey) for file /no/such: No such file or directory
 secpolicy: label set: failed (2 errors above)" ]]
   [[ $(the_label /opt) == sshKey ]]
@@ -190,7 +190,7 @@ secpolicy: label set: failed (2 errors above)" ]]
 /opt/monitor/bin/agent: has vmDisk, the policy says monitorProgram ($labels/monitor:$bin)
 /opt/monitor/etc/new: has no label, the policy says monitorConfig ($labels/monitor:$etc)
 /opt/monitor/etc: has no label, the policy says monitorConfig ($labels/monitor:$etc)" ]]
-  [[ $stderr =~ ^"secpolicy: label verify: 4 of "[0-9]+" files differ from the policy. 'secpolicy label relabel' gives the policy's labels again"$ ]]
+  [[ $stderr =~ ^"secpolicy: label verify: 4 of "[0-9]+" files differ from the policy. 'secpolicy --root $root label relabel' gives the policy's labels again"$ ]]
   [[ $(the_label /etc/ssh/host_key) == hostConfig ]]
 }
 
@@ -220,7 +220,7 @@ secpolicy: label verify: failed (1 error above)" ]]
   touch "$root/etc/new"
   secpolicy label verify /etc/new
   exits 1
-  ends_with "secpolicy: label verify: 1 of 1 file differs from the policy. 'secpolicy boot' gives every file its first label"
+  ends_with "secpolicy: label verify: 1 of 1 file differs from the policy. 'secpolicy --root $root boot' gives every file its first label"
 }
 
 @test "verify, relabel and load agree on trees, later lines, hard links and links" {
@@ -316,8 +316,8 @@ END
   says "Error: $labels/monitor:$((last - 3)) : /etc/services.conf: Not a directory"
   says "Error: $labels/monitor:$((last - 2)) : : No such file or directory"
   says "Error: $labels/monitor:$((last - 1)) : Invalid label (appDom) for file /etc"
-  says "Error: /opt/monitor/bin: has no label; 'secpolicy boot' gives every file its first one"
-  says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy boot' gives every file its first one"
+  says "Error: /opt/monitor/bin: has no label; 'secpolicy --root $root boot' gives every file its first one"
+  says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy --root $root boot' gives every file its first one"
   ends_with "secpolicy: label relabel: failed (8 errors above)"
   [[ $(the_label /opt/monitor/bin/agent) == monitorProgram ]]
 }
@@ -403,7 +403,7 @@ END
   for kind in "get /etc" "set sshKey /etc" verify relabel; do
     secpolicy label $kind
     exits 1
-    [[ $stderr == "secpolicy: label ${kind%% *}: nothing is installed below this root, so there are no labels. Run 'secpolicy boot' first, or name the root that was booted (--root DIR)." ]]
+    [[ $stderr == "secpolicy: label ${kind%% *}: nothing is installed below this root, so there are no labels. Run 'secpolicy --root $root boot' first, or name the root that was booted (--root DIR)." ]]
   done
   [[ ! -e $root/run/secpolicy ]]
 }

@@ -43,7 +43,7 @@ load helper
   says "Error: Error in parsing policy for domain: appDom: $line : unknown system call 'no_such_call'"
   says "Error: Error in parsing the policy for some domains"
   says "Error: Failure in domain policy"
-  ends_with "secpolicy: load: There were some problems encountered in setting the policy (3 errors above)"
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 problem above)"
   secpolicy display "$(domain_id sshDom)"
   shows "-c cap_net_raw grant"
 }
@@ -123,10 +123,10 @@ load helper
   secpolicy load-early
   exits 1
   [[ $stderr =~ ^"Error: Unable to open policy directory /etc/zorvan/secpolicy/early/domains
-/etc/zorvan/secpolicy/early/domains: 1 error
-'secpolicy check /etc/zorvan/secpolicy' shows the lines, and what may be meant
+$policy/early/domains: 1 error
+'secpolicy --root $root check /etc/zorvan/secpolicy' shows the lines, and what may be meant
 installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
-secpolicy: load-early: failed (1 error above); nothing was removed: 1 domain and "[0-9]+" rules that no file has"$ ]]
+secpolicy: load-early: failed (1 problem above); nothing was removed: 1 domain and "[0-9]+" rules that no file has"$ ]]
 }
 
 @test "two loads at once both end well" {
@@ -162,12 +162,12 @@ secpolicy: load-early: failed (1 error above); nothing was removed: 1 domain and
   echo "/no/such/either hostConfig" >>"$policy/fileLabels/monitor"
   secpolicy load
   exits 1
-  [[ $(grep -e '^/' -e '^installed' <<<"$stderr") =~ ^"$(cat <<'END'
-/etc/zorvan/secpolicy/domains/appDom: 1 error
-/etc/zorvan/secpolicy/domains/plugins/cache: 1 error
-/etc/zorvan/secpolicy/fileLabels/base: 1 error
-/etc/zorvan/secpolicy/fileLabels/monitor: 2 errors
-/etc/zorvan/secpolicy/objects/base: 1 error
+  [[ $(grep -e '^/' -e '^installed' <<<"$stderr") =~ ^"$(cat <<END
+$policy/domains/appDom: 1 error
+$policy/domains/plugins/cache: 1 error
+$policy/fileLabels/base: 1 error
+$policy/fileLabels/monitor: 2 errors
+$policy/objects/base: 1 error
 END
 )"$'\n'"installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects"$ ]]
 }
@@ -178,8 +178,8 @@ END
   cp "$policy/tardisks/monitor" "$policy/tardisks/other"
   secpolicy load
   exits 1
-  says "/etc/zorvan/secpolicy/domains/appDom: 1 error"
-  says "/etc/zorvan/secpolicy/tardisks/other: 1 error"
+  says "$policy/domains/appDom: 1 error"
+  says "$policy/tardisks/other: 1 error"
 }
 
 @test "--timing prints each phase of a load to standard output" {
@@ -320,7 +320,7 @@ END
   echo "-s no_such_call grant" >>"$policy/domains/appDom"
   secpolicy load
   exits 1
-  ends_with "secpolicy: load: There were some problems encountered in setting the policy (3 errors above); nothing was removed: 1 rule that no file has"
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 problem above); nothing was removed: 1 rule that no file has"
   secpolicy why sshDom call listen
   exits 0
 }

@@ -113,12 +113,12 @@ State: 8 RefCount: 0 WorldRefCount: 0 defaultDom: 0
   for verb in "why sshDom read /etc" "who-can read /etc" graph; do
     run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" $verb
     exits 1
-    ends_with "secpolicy: ${verb%% *}: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy boot' first."
+    ends_with "secpolicy: ${verb%% *}: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $BATS_TEST_TMPDIR/empty boot' first."
     [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
   done
   run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" status
   exits 1
-  ends_with "secpolicy: status: no policy is loaded. 'secpolicy load' loads one"
+  ends_with "secpolicy: status: no policy is loaded. 'secpolicy --root $BATS_TEST_TMPDIR/empty boot' loads one"
   [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
 }
 

@@ -84,10 +84,10 @@ not_confined() {
 @test "without a state nothing is started" {
   secpolicy run monitorDom -- /bin/sh
   exits 126
-  [[ -z $output && $stderr == *"run 'secpolicy boot' first"* ]]
+  [[ -z $output && $stderr == *"run 'secpolicy --root $root boot' first"* ]]
   secpolicy exec -- /bin/sh
   exits 126
-  [[ -z $output && $stderr == *"run 'secpolicy boot' first"* ]]
+  [[ -z $output && $stderr == *"run 'secpolicy --root $root boot' first"* ]]
 }
 
 @test "a permissive domain refuses nothing" {
@@ -164,7 +164,7 @@ END
   secpolicy restore
   secpolicy exec -- /opt/monitor/bin/agent
   not_confined exec
-  [[ $stderr == *"hostDom may not execute /opt/monitor/bin/agent: 'secpolicy why hostDom exec /opt/monitor/bin/agent' says which rule would grant it"* ]]
+  [[ $stderr == *"hostDom may not execute /opt/monitor/bin/agent: 'secpolicy --root $root why hostDom exec /opt/monitor/bin/agent' says which rule would grant it"* ]]
 }
 
 @test "features tells what becomes of every rule" {
@@ -255,7 +255,7 @@ END
   [[ $(jq -c .worlds <<<"$output") == "[{\"id\":$world,\"domain\":\"monitorDom\",\"level\":\"enforcing\"}]" ]]
   secpolicy settings enforcement monitorDom permissive
   secpolicy restore
-  says "still at the level of the entry: 1 world; 'secpolicy status' lists each, and a new start takes the new level"
+  says "still at the level of the entry: 1 world; 'secpolicy --root $root status' lists each, and a new start takes the new level"
   secpolicy status
   shows "             $world monitorDom enforcing, now permissive"
   kill "$world"

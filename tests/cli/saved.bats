@@ -11,7 +11,7 @@ setup() {
 # What is installed, without the numbers of objects.
 installed() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed 's/^\([A-Za-z]*\) ([0-9]*)$/\1/'; }
 
-no_state() { echo "secpolicy: $1: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy boot' first."; }
+no_state() { echo "secpolicy: $1: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."; }
 
 @test "what was saved comes back" {
   secpolicy settings enforcement appDom permissive
@@ -35,7 +35,7 @@ no_state() { echo "secpolicy: $1: nothing is installed below this root. Name the
   secpolicy rollback good
   exits 0
   [[ -z $output ]]
-  [[ $stderr == "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy label verify' compares them with the policy" ]]
+  [[ $stderr == "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy --root $root label verify' compares them with the policy" ]]
   installed | diff "$BATS_TEST_TMPDIR/before" -
   secpolicy diff good installed
   exits 0
@@ -101,7 +101,7 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   secpolicy rollback good
   exits 0
   says "secpolicy: rollback: this rollback cannot be recorded for 'status': Unable to use the host state /run/secpolicy/host.db: no"
-  ends_with "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy label verify' compares them with the policy"
+  ends_with "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy --root $root label verify' compares them with the policy"
   secpolicy diff good installed
   exits 0
 }
@@ -153,7 +153,7 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
 @test "what there is not" {
   secpolicy rollback good
   exits 1
-  [[ $stderr == "secpolicy: rollback: there is no saved state 'good'. 'secpolicy history' lists what is saved." ]]
+  [[ $stderr == "secpolicy: rollback: there is no saved state 'good'. 'secpolicy --root $root history' lists what is saved." ]]
   secpolicy save good
   rm "$root/run/secpolicy/"*
   secpolicy save other

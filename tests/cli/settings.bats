@@ -27,7 +27,7 @@ nothing_is_stored() {
   # shellcheck disable=SC2086
   secpolicy settings $1
   exits 1
-  [[ $stderr == "secpolicy: settings: nothing is stored for $1. Store something with 'secpolicy settings $1 $2'." ]]
+  [[ $stderr == "secpolicy: settings: nothing is stored for $1. Store something with 'secpolicy --root $root settings $1 $2'." ]]
 }
 
 @test "a level that the host does not know is refused" {

@@ -47,7 +47,7 @@ rules_of() {
   "$SECPOLICY" --root "$root" load 2>"$BATS_TEST_TMPDIR/load.err" || true
   secpolicy status
   exits 1
-  [[ $stderr == "secpolicy: status: the latest load did not end well. 'secpolicy check' shows every problem of the files" ]]
+  [[ $stderr == "secpolicy: status: the latest load did not end well. 'secpolicy --root $root check' shows every problem of the files" ]]
   shows "policy       loaded"
   [[ $output =~ latest\ load\ \ load\ from\ /etc/zorvan/secpolicy\ at\ [0-9:\ -]+UTC:\ failed,\ [0-9]+\ errors ]]
   while IFS= read -r message; do
@@ -94,7 +94,7 @@ rules_of() {
 @test "status before anything was loaded" {
   secpolicy status
   exits 1
-  [[ $stderr == "secpolicy: status: no policy is loaded. 'secpolicy load' loads one" ]]
+  [[ $stderr == "secpolicy: status: no policy is loaded. 'secpolicy --root $root boot' loads one" ]]
   shows "policy       not loaded"
   shows "latest load  none by this command"
   shows "domains      1: 1 permissive (hostDom)"

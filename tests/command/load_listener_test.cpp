@@ -27,6 +27,15 @@ TEST(LoadListener, CountsProblemsByFile) {
   EXPECT_THAT(listener.Problems(), IsEmpty());
   for (const char* file : {"/b", "/a", "/b"}) listener.OnProblem({.file = file});
   EXPECT_THAT(listener.Problems(), ElementsAre(Pair("/a", 1), Pair("/b", 2)));
+  EXPECT_EQ(listener.CountProblems(), 3u);
+}
+
+TEST(LoadListener, CountsAFileWithoutItsLabelAsAProblemAndAnEchoAsNone) {
+  LoadListener listener;
+  listener.OnLabelFailure("Unable to label /a");
+  listener.OnError("Failure in file labels");
+  EXPECT_EQ(listener.CountProblems(), 1u);
+  EXPECT_EQ(listener.Count(), 2u);
 }
 
 TEST(LoadListener, NamesThePhases) {

@@ -31,8 +31,8 @@ std::string CheckDomainId(const std::string& text) {
 std::string Advise() {
   if (File_IsDirectory(SecPolicy::kTardiskImagesDir)) return AdviseOnPrivilege();
   return std::string("There is no directory ") + SecPolicy::kTardiskImagesDir +
-         " below this root: name the root that was booted (--root DIR), or run 'secpolicy boot' "
-         "first.";
+         " below this root: name the root that was booted (--root DIR), or run " + Call("boot") +
+         " first.";
 }
 
 // Throws the library's own failure where there is no directory of tardisks: nothing was booted.

@@ -4,6 +4,7 @@
 #include <iostream>
 
 #include "error_list.h"
+#include "root.h"
 #include "text/format.h"
 #include "text/visible.h"
 
@@ -45,7 +46,8 @@ ExitCode Refuse(const std::string& verb, const std::string& why) {
 ExitCode RefuseWithoutState(const std::string& verb) {
   return Refuse(verb,
                 "nothing is installed below this root. Name the root that was booted (--root "
-                "DIR), or run 'secpolicy boot' first.");
+                "DIR), or run " +
+                    Call("boot") + " first.");
 }
 
 }  // namespace SecPolicyCli

@@ -23,8 +23,8 @@ void TellOfOlderLevels() {
     if (world.level && domain && *world.level != domain->level) ++count;
   }
   if (count == 0) return;
-  std::cerr << "still at the level of the entry: " << CountOf(count, "world")
-            << "; 'secpolicy status' lists each, and a new start takes the new level" << std::endl;
+  std::cerr << "still at the level of the entry: " << CountOf(count, "world") << "; "
+            << Call("status") << " lists each, and a new start takes the new level" << std::endl;
 }
 
 Action Define(Syntax&) {

@@ -29,14 +29,14 @@ void PutBack(const std::string& name) {
 ExitCode RollBack(const std::string& name) {
   if (LinuxHost::IsStateMissing()) return RefuseWithoutState("rollback");
   if (!IsSaved(name)) {
-    return Refuse("rollback", "there is no saved state '" + name +
-                                  "'. 'secpolicy history' lists what is saved.");
+    return Refuse("rollback", "there is no saved state '" + name + "'. " + Call("history") +
+                                  " lists what is saved.");
   }
   return CallLibrary(
       "rollback", [&](ErrorList&) { PutBack(name); }, AdviseOnPrivilege,
       [] {
-        return "done; files keep the labels that they have, and 'secpolicy label verify' compares "
-               "them with the policy";
+        return "done; files keep the labels that they have, and " + Call("label verify") +
+               " compares them with the policy";
       });
 }
 

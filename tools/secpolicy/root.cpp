@@ -3,8 +3,12 @@
 #include <sched.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <cctype>
 #include <cerrno>
+#include <cstring>
 #include <fstream>
+#include <optional>
 
 #include "host/linux/common/host_error.h"
 
@@ -13,7 +17,8 @@ namespace {
 
 using LinuxHost::ThrowErrno;
 
-bool rootEntered = false;
+// As it was given; nothing while none was entered.
+std::optional<std::string> enteredRoot;
 
 void WriteProcFile(const char* path, const std::string& text) {
   std::ofstream file(path);
@@ -34,6 +39,13 @@ void EnterUserNamespace() {
   WriteProcFile("/proc/self/gid_map", group + " " + group + " 1");
 }
 
+// A word of a command line that a shell takes as it is.
+bool IsPlainWord(const std::string& word) {
+  return std::ranges::all_of(word, [](unsigned char letter) {
+    return std::isalnum(letter) != 0 || std::strchr("/._-+:@%,=", letter) != nullptr;
+  });
+}
+
 bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
 
 }  // namespace
@@ -45,11 +57,25 @@ void EnterRoot(const std::string& directory) {
     EnterUserNamespace();
     if (!MakeRoot()) ThrowErrno("cannot enter the root ", directory);
   }
-  rootEntered = true;
+  enteredRoot = directory;
+}
+
+std::string Call(const std::string& words) {
+  std::string root;
+  if (enteredRoot) {
+    const char* const quote = IsPlainWord(*enteredRoot) ? "" : "\"";
+    root = "--root " + (quote + *enteredRoot) + quote + " ";
+  }
+  return "'secpolicy " + root + words + "'";
+}
+
+std::string OutsidePath(const std::string& path) {
+  if (!enteredRoot) return path;
+  return (*enteredRoot + "/").append(path, path.starts_with('/') ? 1 : 0);
 }
 
 std::string AdviseOnPrivilege() {
-  if (rootEntered || geteuid() == 0) return "";
+  if (enteredRoot || geteuid() == 0) return "";
   return "You are not root: run it as root, or give --root DIR to work below a directory of yours.";
 }
 

@@ -9,6 +9,13 @@ namespace SecPolicyCli {
 // own. Throws Braxo::Lib::BraxoException when that cannot be done.
 void EnterRoot(const std::string& directory);
 
+// How this command is called with `words` for the root that was entered, in quotes:
+// "'secpolicy --root DIR boot'".
+std::string Call(const std::string& words);
+
+// The path by which a file below the root that was entered is known to whom the command is for.
+std::string OutsidePath(const std::string& path);
+
 // What to try after a failure that the rights of the user can explain; nothing for root and for
 // who has entered a root.
 std::string AdviseOnPrivilege();

@@ -46,9 +46,11 @@ constexpr Setting kSettingKinds[] = {
 ExitCode Show(const Setting& setting, const std::string& key) {
   const auto value = setting.find(key);
   if (!value) {
-    return Refuse("settings", std::string("nothing is stored for ") + setting.name + " " + key +
-                                  ". Store something with 'secpolicy settings " + setting.name +
-                                  " " + key + " " + setting.value + "'.");
+    return Refuse(
+        "settings",
+        std::string("nothing is stored for ") + setting.name + " " + key +
+            ". Store something with " +
+            Call(std::string("settings ") + setting.name + " " + key + " " + setting.value) + ".");
   }
   return CallLibrary(
       "settings", [&](ErrorList&) { std::cout << *value << std::endl; }, AdviseOnPrivilege);

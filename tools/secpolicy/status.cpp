@@ -13,6 +13,7 @@
 #include "host/linux/operation/world_entry.h"
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
+#include "root.h"
 #include "scratch/scratch_state.h"
 #include "text/format.h"
 #include "text/visible.h"
@@ -191,12 +192,15 @@ void WriteJson(const Status& status) {
   std::cout << screen.Text();
 }
 
-ExitCode EndWith(const Status& status) {
+ExitCode EndWith(const Status& status, bool isBooted) {
   const bool problems = status.HasProblems();
   std::string text = "the policy is loaded";
-  if (!status.IsLoaded()) text = "no policy is loaded. 'secpolicy load' loads one";
+  if (!status.IsLoaded()) {
+    text = "no policy is loaded. " + Call(isBooted ? "load" : "boot") + " loads one";
+  }
   if (problems) {
-    text = "the latest load did not end well. 'secpolicy check' shows every problem of the files";
+    text =
+        "the latest load did not end well. " + Call("check") + " shows every problem of the files";
   }
   Summarize("status", text);
   return problems || !status.IsLoaded() ? kFailed : kWell;
@@ -206,12 +210,13 @@ Action Define(Syntax& syntax) {
   const auto format = std::make_shared<std::string>();
   syntax.AddFormat(*format, "it", {"text", "json"});
   return [format] {
+    const bool isBooted = !LinuxHost::IsStateMissing();
     // The host would make a state of its own.
     std::optional<ScratchState> scratch;
-    if (LinuxHost::IsStateMissing()) scratch.emplace(true);
+    if (!isBooted) scratch.emplace(true);
     const Status status = ReadStatus();
     (*format == "json" ? WriteJson : WriteText)(status);
-    return EndWith(status);
+    return EndWith(status, isBooted);
   };
 }
 

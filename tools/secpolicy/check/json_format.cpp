@@ -1,11 +1,12 @@
 #include "json.h"
 #include "report_format.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
 
 Json ToJson(const Diagnostic& diagnostic) {
-  Json json = {{"file", diagnostic.file}};
+  Json json = {{"file", OutsidePath(diagnostic.file)}};
   if (diagnostic.line > 0) {
     json["line"] = diagnostic.line;
     json["column"] = diagnostic.column;

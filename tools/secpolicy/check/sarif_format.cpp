@@ -3,6 +3,7 @@
 
 #include "json.h"
 #include "report_format.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -51,7 +52,7 @@ Json Rules() {
 }
 
 Json Location(const Diagnostic& diagnostic) {
-  Json physical = {{"artifactLocation", {{"uri", ToUri(diagnostic.file)}}}};
+  Json physical = {{"artifactLocation", {{"uri", ToUri(OutsidePath(diagnostic.file))}}}};
   if (diagnostic.line > 0) {
     physical["region"] = {{"startLine", diagnostic.line},
                           {"startColumn", diagnostic.column},

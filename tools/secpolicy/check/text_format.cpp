@@ -4,6 +4,7 @@
 #include <string_view>
 
 #include "report_format.h"
+#include "root.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -49,7 +50,7 @@ void WriteTally(const DiagnosticList& diagnostics, std::ostream& output) {
 
 void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
   for (const Diagnostic& diagnostic : diagnostics.Shown()) {
-    output << Visible(diagnostic.file) << ':';
+    output << Visible(OutsidePath(diagnostic.file)) << ':';
     if (diagnostic.line > 0) output << diagnostic.line << ':' << diagnostic.column << ':';
     output << ' ' << SeverityName(diagnostic.code->severity) << ": " << Visible(diagnostic.message)
            << " [" << diagnostic.code->name << "]\n";

@@ -1,4 +1,5 @@
 #include "check_run.h"
+#include "root.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -19,7 +20,7 @@ void CheckNeededDomain(CheckRun& run, const std::string& dir, const std::string&
                                    : "there is no domain '" + name +
                                          "', which every host needs: a load stops without it, "
                                          "before tardisks and file labels";
-  diagnostic.hint = "an empty file " + dir + "/" + name + " defines it";
+  diagnostic.hint = "an empty file " + OutsidePath(dir + "/" + name) + " defines it";
   run.diagnostics.Add(std::move(diagnostic));
 }
 

@@ -5,6 +5,7 @@
 #include "compare/policy_directory.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
+#include "root.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_state.h"
 
@@ -22,8 +23,8 @@ Side ReadDirectory(const std::string& dir) {
   WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir));
   if (!written.isClean) {
     throw std::runtime_error("the policy in " + dir +
-                             " has errors (above), so it was not compared. 'secpolicy check " +
-                             dir + "' shows every one with its place.");
+                             " has errors (above), so it was not compared. " +
+                             Call("check " + dir) + " shows every one with its place.");
   }
   return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
 }
@@ -35,17 +36,18 @@ Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::Co
 Side ReadInstalled() {
   if (LinuxHost::IsStateMissing()) {
     throw std::runtime_error(
-        "nothing is installed below this root. Name the root that was booted (--root DIR), or run "
-        "'secpolicy boot' first.");
+        "nothing is installed below this root. Name the root that was booted (--root DIR), or "
+        "run " +
+        Call("boot") + " first.");
   }
   return ReadStateOf(kInstalled, LinuxHost::StatePath(), LinuxHost::CopyOf::kState);
 }
 
 Side ReadSaved(const std::string& name) {
   if (!IsSaved(name)) {
-    throw std::runtime_error("there is no saved state '" + name +
-                             "', and no such directory. 'secpolicy history' lists what is saved; "
-                             "'installed' is what is installed now.");
+    throw std::runtime_error("there is no saved state '" + name + "', and no such directory. " +
+                             Call("history") +
+                             " lists what is saved; 'installed' is what is installed now.");
   }
   return ReadStateOf(name, SavedStatePath(name), LinuxHost::CopyOf::kSavedState);
 }

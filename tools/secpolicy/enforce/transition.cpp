@@ -14,6 +14,7 @@
 #include "installed/installed_policy.h"
 #include "policy/decision.h"
 #include "program_file.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -70,8 +71,9 @@ std::string DomainByExec(const ProgramFile& program, SecPolicy::TeskAccessInterf
   const Policy::InstalledDomain caller = CallersDomain(access);
   const Policy::FileQuestion asked = AskToExecute(program, access);
   if (!Decide(asked, caller).IsAllowed()) {
-    throw BraxoException(caller.name + " may not execute " + asked.path + ": 'secpolicy why " +
-                         caller.name + " exec " + asked.path + "' says which rule would grant it");
+    throw BraxoException(caller.name + " may not execute " + asked.path + ": " +
+                         Call("why " + caller.name + " exec " + asked.path) +
+                         " says which rule would grant it");
   }
   for (const Rule* const rule : RulesOf(caller, RuleKind::kDomainTransition)) {
     if (rule->Grants() && rule->words[0] == asked.label && rule->words[2] == "exec") {

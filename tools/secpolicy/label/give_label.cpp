@@ -4,6 +4,7 @@
 
 #include "host/linux/operation/label_index.h"
 #include "label_actions.h"
+#include "root.h"
 #include "secpolicy/observed/policy_lines.h"
 #include "text/suggestion.h"
 
@@ -25,7 +26,7 @@ using Braxo::Lib::BraxoException;
     labels.push_back(name);
   }
   const std::string nearest = NearestWord(label, labels);
-  throw BraxoException(problem + (nearest.empty() ? ". 'secpolicy display' shows all labels"
+  throw BraxoException(problem + (nearest.empty() ? ". " + Call("display") + " shows all labels"
                                                   : ". Did you mean '" + nearest + "'?"));
 }
 

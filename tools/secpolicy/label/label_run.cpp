@@ -5,6 +5,7 @@
 #include <iostream>
 
 #include "braxo/misc/strcat.h"
+#include "root.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -38,7 +39,7 @@ std::string LabelRun::NameOf(std::uint32_t id) {
 
 std::string WhyNoLabel(int error) {
   if (error != ENODATA) return std::strerror(error);
-  return "has no label; 'secpolicy boot' gives every file its first one";
+  return "has no label; " + Call("boot") + " gives every file its first one";
 }
 
 }  // namespace SecPolicyCli

@@ -4,6 +4,7 @@
 #include "host/linux/operation/file_label.h"
 #include "label_actions.h"
 #include "label_plan.h"
+#include "root.h"
 #include "text/format.h"
 
 namespace SecPolicyCli {
@@ -31,8 +32,8 @@ std::string VerifyLabels(LabelRun& run, const std::string& dir,
     throw Braxo::Lib::BraxoException(StrCat(
         different, " of ", CountOf(files, "file"), different == 1 ? " differs" : " differ",
         " from the policy. ",
-        different == withoutLabel ? "'secpolicy boot' gives every file its first label"
-                                  : "'secpolicy label relabel' gives the policy's labels again"));
+        different == withoutLabel ? Call("boot") + " gives every file its first label"
+                                  : Call("label relabel") + " gives the policy's labels again"));
   }
   if (files == 0) return "done (the policy names no file there)";
   return StrCat("done (", CountOf(files, "file"), ", all as the policy says)");

@@ -32,6 +32,17 @@ void LoadListener::OnError(const std::string& message) {
   if (forward) forward(message);
 }
 
+void LoadListener::OnLabelFailure(const std::string& message) {
+  ++labelFailures;
+  OnError(message);
+}
+
+std::size_t LoadListener::CountProblems() const {
+  std::size_t count = labelFailures;
+  for (const auto& [file, ofFile] : problems) count += ofFile;
+  return count;
+}
+
 void LoadListener::OnPathRule(const TeskCtl::Security::TeskAccess_FilePathAccessRule& rule) {
   if (transaction != nullptr) transaction->SetLine(rule.line);
 }

@@ -31,6 +31,12 @@ class LoadListener : public ErrorList {
   // The number of problems of each policy file and directory.
   const std::map<std::string, std::size_t>& Problems() const { return problems; }
 
+  // A file that did not get its label, which no policy file is to blame for.
+  void OnLabelFailure(const std::string& message);
+
+  // How many problems there are: the library sums up each in further errors.
+  std::size_t CountProblems() const;
+
   // Where rules and labels are written, but for the rules that are in the file of their domain.
   const std::vector<LinuxHost::RuleOrigin>& Rules() const { return rules; }
   const std::vector<LinuxHost::LabelOrigin>& Labels() const { return labels; }
@@ -46,6 +52,7 @@ class LoadListener : public ErrorList {
  private:
   LinuxHost::PolicyTransaction* transaction = nullptr;
   std::map<std::string, std::size_t> problems;
+  std::size_t labelFailures = 0;
   std::vector<LinuxHost::RuleOrigin> rules;
   std::vector<LinuxHost::LabelOrigin> labels;
   std::string missingDomain;

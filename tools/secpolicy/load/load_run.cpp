@@ -230,7 +230,7 @@ class LoadRun {
                       const std::vector<LinuxHost::LabelFailure>& failures) {
     for (const auto& [path, error] : failures) {
       const std::string message = what + path + ": " + std::strerror(error);
-      listener.OnError(message);
+      listener.OnLabelFailure(message);
       SecPolicy::SecpolicyError(message);
     }
   }
@@ -266,6 +266,13 @@ class LoadRun {
             .errors = onlyThrown ? std::vector<std::string>{failure} : listener.Messages()};
   }
 
+  std::string DescribeErrors() const {
+    const std::size_t problems = listener.CountProblems();
+    if (problems > 0) return " (" + CountOf(problems, "problem") + " above)";
+    if (listener.Count() == 0) return "";
+    return " (" + CountOf(listener.Count(), "error") + " above)";
+  }
+
   // A domain without a file is named only where all else was removed: worlds run in it.
   void WriteStayingDomains() const {
     for (const std::string& domain : ending.staying.domains) {
@@ -290,7 +297,7 @@ class LoadRun {
     if (!isInstalled) Attempt([&] { RecordUndone(Ending()); });
     WriteProblems();
     std::string summary = failure.empty() ? "failed" : failure;
-    if (listener.Count() > 0) summary += " (" + CountOf(listener.Count(), "error") + " above)";
+    summary += DescribeErrors();
     if (isInstalled) {
       if (!request.dryRun) {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });

@@ -5,6 +5,7 @@
 #include "ending.h"
 #include "host/linux/operation/policy_count.h"
 #include "host/linux/operation/state_use.h"
+#include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
 #include "text/visible.h"
@@ -27,12 +28,12 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
   if (problems.empty()) return "";
   std::string text;
   for (const auto& [file, count] : problems) {
-    text += Visible(file) + ": " + CountOf(count, "error") + "\n";
+    text += Visible(OutsidePath(file)) + ": " + CountOf(count, "error") + "\n";
   }
   // A check of the policy looks at the early policy in it too.
   const bool isEarly = policyDir == SecPolicy::kEarlyPolicyRoot;
-  return text + "'secpolicy check " + Visible(isEarly ? SecPolicy::kPolicyRoot : policyDir) +
-         "' shows the lines, and what may be meant\n";
+  return text + Visible(Call("check " + (isEarly ? SecPolicy::kPolicyRoot : policyDir))) +
+         " shows the lines, and what may be meant\n";
 }
 
 std::string CountInstalled() {
