@@ -30,7 +30,7 @@ secpolicy_in_time() {
   run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" "$@"
 }
 
-# The steps of docs/enforcement.md, "From nothing to enforcing".
+# The steps of docs/enforcement.md, "A service in five minutes".
 @test "from nothing to enforcing" {
   boot
   make_service
@@ -157,6 +157,24 @@ secpolicy_in_time() {
   secpolicy_in_time run monitorDom -- /bin/sh -c 'cat /var/lib/vms/demo/disk'
   exits 0
   [[ -z $stderr && $output == *"block of a disk" ]]
+}
+
+@test "when the supervisor of a permissive domain is killed, nothing more can be done there" {
+  boot
+  secpolicy settings enforcement monitorDom permissive
+  secpolicy restore
+  "$SECPOLICY" --root "$root" run monitorDom -- /bin/sh -c \
+    'cat /var/lib/vms/demo/disk >/seen; echo $$ >/pid; while [ ! -e /go ]; do :; done; read -r line </etc/ssh/host_key; echo "$line" >/after' \
+    3>&- 2>/dev/null &
+  local supervisor=$!
+  until_true "[[ -s $root/pid ]]"
+  # It could read what its rules refuse, as long as somebody told of it.
+  grep -q 'block of a disk' "$root/seen"
+  kill -9 "$supervisor"
+  wait "$supervisor" || true
+  touch "$root/go"
+  until_true "[[ ! -d /proc/$(<"$root/pid") ]]"
+  [[ ! -e $root/after ]]
 }
 
 @test "when the supervisor is killed, noticed calls end with ENOSYS" {

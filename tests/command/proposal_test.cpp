@@ -142,6 +142,18 @@ TEST(Propose, SpeaksOfWhatIsMadeByItsDirectory) {
       ElementsAre(kStart, "-r /srv rw   # first by /bin/prog"));
 }
 
+// Who writes to the state may do all.
+TEST(Propose, TellsOfRulesThatReachThePolicy) {
+  EXPECT_THAT(ProposedFor({Making("regular", "/run/prog.pid"), Making("regular", "/srv/x"),
+                           File(FileAccess::kWrite, "/run/secpolicy/host.db"),
+                           File(FileAccess::kRead, "/etc/zorvan/secpolicy/objects/base"),
+                           File(FileAccess::kWrite, "/etc/zorvan/settings")}),
+              ElementsAre(kStart, "-r /etc/zorvan/secpolicy/objects/base r   # first by /bin/prog",
+                          "-r /etc/zorvan/settings w   # first by /bin/prog",
+                          "-r /run w   # first by /bin/prog; the policy can be changed with it",
+                          "-r /srv w   # first by /bin/prog"));
+}
+
 TEST(Propose, SpeaksOfNumberedFilesByTheirDirectory) {
   EXPECT_THAT(ProposedFor({File(FileAccess::kRead, "/proc/12/stat"),
                            File(FileAccess::kWrite, "/dev/pts/3")}),

@@ -10,6 +10,8 @@
 #include <variant>
 
 #include "asked_rules.h"
+#include "host/linux/operation/state_use.h"
+#include "secpolicy/policy_root.h"
 #include "text/format.h"
 
 namespace SecPolicyCli {
@@ -176,9 +178,24 @@ void Put(InstalledDomain& domain, const Rule& rule) {
   domain.rules.push_back(rule);
 }
 
-std::string ReasonOf(const Need& need) {
-  if (need.files.empty()) return "first by " + need.program;
-  return CountOf(need.files.size(), "file") + ", first " + need.files.front();
+// True for a rule by which the domain may change what it is held to: the policy, or the state that
+// is made of it.
+bool ReachesThePolicy(const Rule& rule) {
+  if (!rule.Permits().Has(Permission::kWrite)) return false;
+  const std::string& path = rule.words[0];
+  const std::string places[] = {SecPolicy::kPolicyRoot, DirectoryOf(LinuxHost::StatePath()),
+                                DirectoryOf(LinuxHost::SettingsPath())};
+  return std::ranges::any_of(places, [&](const std::string& place) {
+    return place == path || IsWithin(path, place) || IsWithin(place, path);
+  });
+}
+
+std::string ReasonOf(const Need& need, const Rule& rule) {
+  std::string reason = need.files.empty()
+                           ? "first by " + need.program
+                           : CountOf(need.files.size(), "file") + ", first " + need.files.front();
+  if (ReachesThePolicy(rule)) reason += "; the policy can be changed with it";
+  return reason;
 }
 
 // A narrower rule repeats what the wider one permits: one that took something away would be kept to
@@ -191,7 +208,7 @@ std::vector<ProposedRule> RulesFor(const Needs& needs, const InstalledDomain& do
     const Permissions wanted = Both(need.permissions, permitted);
     if (wanted == permitted) continue;
     const Rule rule = {.kind = RuleKind::kFilePath, .words = {path}, .verdict = wanted};
-    rules.push_back({.rule = rule, .reason = ReasonOf(need)});
+    rules.push_back({.rule = rule, .reason = ReasonOf(need, rule)});
     Put(candidate, rule);
   }
   return rules;
