@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <string_view>
 #include <utility>
 
 #include "host/enforce/plan/call_plan.h"
@@ -9,6 +10,7 @@
 #include "host/enforce/plan/dump.h"
 #include "host/enforce/plan/net_plan.h"
 #include "host/enforce/plan/port_check.h"
+#include "policy/call_set.h"
 
 namespace Enforce {
 namespace {
@@ -54,6 +56,39 @@ RuleFate WithScope(RuleFate fate) {
   fate.how += fate.how.empty() ? "" : "; ";
   fate.how += "signals reach only what was started with the same entry into the domain";
   return fate;
+}
+
+// By which those that are confined ask their broker.
+constexpr const char* kAskingCalls[] = {"pipe2", "sendmsg"};
+
+bool LeadsElsewhere(const Rule& rule, const std::string& domain) {
+  return rule.kind == RuleKind::kDomainTransition && rule.Grants() && rule.words[2] == "exec" &&
+         rule.words[1] != domain;
+}
+
+bool IsCallGranted(const std::vector<RuleFate>& fates, std::string_view call) {
+  bool isGranted = false;
+  for (const RuleFate& fate : fates) {
+    const bool isAsked =
+        fate.rule.kind == RuleKind::kSyscall && Policy::SpeaksOfCall(fate.rule.words[0], call);
+    if (isAsked && !fate.rule.Grants()) return false;
+    isGranted = isGranted || isAsked;
+  }
+  return isGranted;
+}
+
+bool MayAskBroker(const std::vector<RuleFate>& fates) {
+  return std::ranges::all_of(kAskingCalls,
+                             [&](const char* call) { return IsCallGranted(fates, call); });
+}
+
+// A way into another domain is for those who are outside, too.
+void TellOfBroker(const std::string& domain, std::vector<RuleFate>* fates) {
+  if (MayAskBroker(*fates)) return;
+  for (RuleFate& fate : *fates) {
+    if (!LeadsElsewhere(fate.rule, domain)) continue;
+    fate.how += " from outside of the domain, as asking from within takes -s pipe2 and sendmsg";
+  }
 }
 
 struct Parts {
@@ -123,6 +158,7 @@ CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surround
     if (rule.kind == RuleKind::kSyscall && plan.isScoped) fate = WithScope(std::move(fate));
     compiled.fates.push_back(std::move(fate));
   }
+  TellOfBroker(domain.name, &compiled.fates);
   return compiled;
 }
 
@@ -135,6 +171,14 @@ std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
 
 bool KeepsAllRules(const CompiledPlan& compiled) {
   return compiled.gaps.empty() && NotExpressible(compiled.fates).empty();
+}
+
+bool KeepsBroker(const CompiledPlan& compiled) {
+  const auto leadsElsewhere = [&](const RuleFate& fate) {
+    return LeadsElsewhere(fate.rule, compiled.plan.domain);
+  };
+  return compiled.plan.level == Policy::Level::kEnforcing &&
+         std::ranges::any_of(compiled.fates, leadsElsewhere) && MayAskBroker(compiled.fates);
 }
 
 std::string Explain(const InstalledDomain& domain, const Surroundings& surroundings) {

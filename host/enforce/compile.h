@@ -35,6 +35,10 @@ std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates);
 // True where the domain can do no more than its rules say.
 bool KeepsAllRules(const CompiledPlan& compiled);
 
+// True where those that it confines need somebody outside who starts programs for them, and can
+// ask: in an enforcing domain from which another is entered by exec.
+bool KeepsBroker(const CompiledPlan& compiled);
+
 // The same plan for people: what the kernel is told, and what becomes of the rules.
 std::string Explain(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
 

@@ -124,22 +124,20 @@ inline int LastCapability() {
 
 // ---- Files and programs
 
-// Refuses a path of which any part is a link. A descriptor that stands for the place and can do
-// nothing with it, closed on execution.
-inline int OpenPlace(const char* path) {
+// Refuses a path of which any part is a link. `flags` are those of open(2); the descriptor is
+// closed on execution.
+inline int OpenWithoutLinks(const char* path, int flags) {
   open_how how = {};
-  how.flags = O_PATH | O_CLOEXEC;
+  how.flags = static_cast<std::uint64_t>(flags | O_CLOEXEC);
   how.resolve = RESOLVE_NO_SYMLINKS;
   return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof(how)));
 }
 
-// The same for reading it. No way of opening it waits, and no terminal becomes this process's.
-inline int OpenForReading(const char* path) {
-  open_how how = {};
-  how.flags = O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  how.resolve = RESOLVE_NO_SYMLINKS;
-  return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof(how)));
-}
+// A descriptor that stands for the place and can do nothing with it.
+inline int OpenPlace(const char* path) { return OpenWithoutLinks(path, O_PATH); }
+
+// No way of opening a file waits, and no terminal becomes this process's.
+inline constexpr int kForReading = O_RDONLY | O_NONBLOCK | O_NOCTTY;
 
 // execve and execveat with `secret` where a filter looks for it. Return only when they fail.
 inline int Execute(const char* path, char* const* arguments, char* const* environment,

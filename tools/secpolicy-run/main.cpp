@@ -1,6 +1,7 @@
 #include <sys/auxv.h>
 #include <unistd.h>
 
+#include "host/enforce/launcher/ask.h"
 #include "host/enforce/launcher/enter.h"
 #include "host/enforce/launcher/plan_source.h"
 #include "host/enforce/launcher/refuse.h"
@@ -17,6 +18,7 @@ namespace {
         "u-s,g-s)");
   }
   const Options options = ReadOptions(arguments);
+  if (options.asks) Enforce::AskBroker(Enforce::FindProgram(options.command, environ));
   Enforce::Plan plan = Enforce::ReadPlan(options.plan);
   const Enforce::Program program =
       options.program ? Enforce::ProgramOf(*options.program, options.command, environ)

@@ -16,12 +16,16 @@ using Enforce::Refuse;
 
 constexpr std::string_view kHelp =
     "Usage: secpolicy-run --plan PLAN [--program FD] [--keep-fd FD]... -- COMMAND [ARGUMENT...]\n"
+    "       secpolicy-run --ask -- COMMAND [ARGUMENT...]\n"
     "Starts a command, confined to what a plan lets its domain do. 'secpolicy run' makes the plan\n"
     "and starts this program.\n"
     "\n"
     "  --plan PLAN     the plan: a file, or the number of a descriptor\n"
     "  --program FD    execute what this descriptor stands for; COMMAND is only its name\n"
     "  --keep-fd FD    leave this descriptor open, beside the first three\n"
+    "  --ask           from within a domain: let its broker start the command in the domain that "
+    "the\n"
+    "                  label of its file leads to\n"
     "  --help          print this text\n"
     "  --version       print the version\n"
     "\n"
@@ -71,7 +75,9 @@ class Words {
 void Take(const std::string& option, Words& words, Options* options) {
   if (option == "--help") Print(kHelp);
   if (option == "--version") Print(kVersion);
-  if (option == "--plan") {
+  if (option == "--ask") {
+    options->asks = true;
+  } else if (option == "--plan") {
     options->plan = words.TakeValueOf(option);
   } else if (option == "--program") {
     options->program = words.TakeDescriptorOf(option);
@@ -93,7 +99,10 @@ Options ReadOptions(char** arguments) {
     isAtCommand = word == "--";
     if (!isAtCommand) Take(word, words, &options);
   }
-  if (options.plan.empty()) RefuseUsage("no plan is named");
+  const bool isToEnter =
+      !options.plan.empty() || options.program || !options.keptDescriptors.empty();
+  if (options.asks && isToEnter) RefuseUsage("--ask takes no other option");
+  if (!options.asks && options.plan.empty()) RefuseUsage("no plan is named");
   if (words.IsAtEnd()) RefuseUsage("no command is named");
   options.command = words.Rest();
   return options;

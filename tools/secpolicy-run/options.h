@@ -7,6 +7,7 @@
 namespace SecPolicyRun {
 
 struct Options {
+  bool asks = false;  // a broker, which needs no plan
   std::string plan;
   std::optional<int> program;  // its descriptor
   std::vector<int> keptDescriptors;

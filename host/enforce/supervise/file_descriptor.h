@@ -25,6 +25,9 @@ class FileDescriptor {
   bool IsOpen() const { return number >= 0; }
   int Number() const { return number; }
 
+  // The number, whose owner is the caller from now on.
+  int Release() { return std::exchange(number, -1); }
+
  private:
   int number = -1;
 };

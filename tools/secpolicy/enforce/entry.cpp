@@ -3,6 +3,7 @@
 #include <exception>
 #include <iostream>
 
+#include "broker.h"
 #include "domain_plan.h"
 #include "host/linux/operation/world_entry.h"
 #include "launcher.h"
@@ -54,7 +55,7 @@ ExitCode EnterDomain(const std::string& verb,
     if (compiled.plan.level == Policy::Level::kPermissive) {
       return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
     }
-    StartConfined(compiled.plan, entry.command, entry.program);
+    StartConfined(compiled.plan, entry, KeepBroker(compiled));
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
               << std::endl;

@@ -7,8 +7,12 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <filesystem>
+#include <set>
+#include <utility>
 
+#include "host/enforce/broker/message.h"
 #include "host/enforce/kernel.h"
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/descriptor.h"
@@ -65,9 +69,44 @@ void HandOnCapabilities() {
   }
 }
 
-void HandOn(const Descriptor& program, std::vector<std::string>* words) {
-  if (fcntl(program.Number(), F_SETFD, 0) != 0) ThrowErrno("cannot hand on a program");
-  words->insert(words->end(), {"--program", std::to_string(program.Number())});
+[[noreturn]] void ThrowNoLauncher() {
+  throw Braxo::Lib::BraxoException(
+      "secpolicy-run, which confines programs, is neither beside this command nor where it is "
+      "installed: install secpolicy again");
+}
+
+// The descriptor `number` stays open when another program is executed.
+void HandOn(int number, const char* option, std::vector<std::string>* words) {
+  if (fcntl(number, F_SETFD, 0) != 0) ThrowErrno("cannot hand on a descriptor");
+  words->insert(words->end(), {option, std::to_string(number)});
+}
+
+std::string NameOf(const std::string& variable) { return variable.substr(0, variable.find('=')); }
+
+// Those of this process, with others in place of those that have the same names.
+std::vector<std::string> EnvironmentWith(std::vector<std::string> variables) {
+  std::set<std::string> names = {Enforce::kBrokerVariable};
+  for (const std::string& variable : variables) names.insert(NameOf(variable));
+  for (char* const* variable = environ; *variable != nullptr; ++variable) {
+    if (!names.contains(NameOf(*variable))) variables.emplace_back(*variable);
+  }
+  return variables;
+}
+
+std::vector<char*> Pointers(std::vector<std::string>& words) {
+  std::vector<char*> pointers;
+  pointers.reserve(words.size() + 1);
+  for (std::string& word : words) pointers.push_back(word.data());
+  pointers.push_back(nullptr);
+  return pointers;
+}
+
+// Where neither a program nor a shell is likely to put another.
+int MoveAway(int descriptor) {
+  constexpr int kLowest = 100;
+  const int number = fcntl(descriptor, F_DUPFD, kLowest);
+  if (number < 0) ThrowErrno("cannot hand on a descriptor");
+  return number;
 }
 
 }  // namespace
@@ -79,24 +118,34 @@ void OpenLauncher() {
   }
 }
 
-void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command,
-                   const Descriptor& program) {
-  if (launcher < 0) {
-    throw Braxo::Lib::BraxoException(
-        "secpolicy-run, which confines programs, is neither beside this command nor where it is "
-        "installed: install secpolicy again");
-  }
+void StartConfined(const Enforce::Plan& plan, const Entry& entry,
+                   const Enforce::FileDescriptor& broker) {
+  if (launcher < 0) ThrowNoLauncher();
   if (geteuid() != 0) HandOnCapabilities();
   const Descriptor file = SealedFile(Enforce::Serialize(plan));
   std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};
-  if (program.IsOpen()) HandOn(program, &words);
+  std::vector<std::string> variables = entry.environment;
+  if (entry.program.IsOpen()) HandOn(entry.program.Number(), "--program", &words);
+  if (broker.IsOpen()) {
+    const int number = MoveAway(broker.Number());
+    HandOn(number, "--keep-fd", &words);
+    variables.push_back(std::string(Enforce::kBrokerVariable) + "=" + std::to_string(number));
+  }
   words.emplace_back("--");
+  words.insert(words.end(), entry.command.begin(), entry.command.end());
+  variables = EnvironmentWith(std::move(variables));
+  execveat(launcher, "", Pointers(words).data(), Pointers(variables).data(), AT_EMPTY_PATH);
+  ThrowErrno("cannot start secpolicy-run");
+}
+
+bool HasBroker() { return std::getenv(Enforce::kBrokerVariable) != nullptr; }
+
+// By its path: not every domain that executes programs does so by descriptors.
+void AskBroker(const std::vector<std::string>& command) {
+  if (launcher < 0) ThrowNoLauncher();
+  std::vector<std::string> words = {kName, "--ask", "--"};
   words.insert(words.end(), command.begin(), command.end());
-  std::vector<char*> arguments;
-  arguments.reserve(words.size() + 1);
-  for (std::string& word : words) arguments.push_back(word.data());
-  arguments.push_back(nullptr);
-  execveat(launcher, "", arguments.data(), environ, AT_EMPTY_PATH);
+  for (const auto& place : Places()) execv(place.c_str(), Pointers(words).data());
   ThrowErrno("cannot start secpolicy-run");
 }
 

@@ -3,8 +3,9 @@
 #include <string>
 #include <vector>
 
+#include "enforce/entry.h"
 #include "host/enforce/plan/plan.h"
-#include "host/linux/common/descriptor.h"
+#include "host/enforce/supervise/file_descriptor.h"
 
 namespace SecPolicyCli {
 
@@ -12,9 +13,16 @@ namespace SecPolicyCli {
 // it, StartConfined() throws.
 void OpenLauncher();
 
-// Becomes the program `command`, confined by `plan`; where `program` is open, what that stands for,
-// by the name that the command begins with. Returns only by throwing Braxo::Lib::BraxoException.
-[[noreturn]] void StartConfined(const Enforce::Plan& plan, const std::vector<std::string>& command,
-                                const LinuxHost::Descriptor& program);
+// Becomes the program of the entry, confined by `plan`; where a broker is kept, it is told to ask
+// at this descriptor. Returns only by throwing Braxo::Lib::BraxoException.
+[[noreturn]] void StartConfined(const Enforce::Plan& plan, const Entry& entry,
+                                const Enforce::FileDescriptor& broker);
+
+// True where this process is confined and has a broker to ask.
+bool HasBroker();
+
+// Becomes the launcher, which asks the broker to start `command`. Throws
+// Braxo::Lib::BraxoException when it cannot be started.
+[[noreturn]] void AskBroker(const std::vector<std::string>& command);
 
 }  // namespace SecPolicyCli

@@ -6,13 +6,16 @@
 #include <string_view>
 #include <system_error>
 
+#include "host/enforce/broker/seen_file.h"
 #include "host/enforce/kernel.h"
 #include "host/linux/common/host_error.h"
+#include "observe/watch.h"
 
 namespace SecPolicyCli {
 
 using Braxo::Lib::BraxoException;
 using LinuxHost::Descriptor;
+namespace Kernel = Enforce::Kernel;
 
 ProgramFile OpenProgram(const std::string& path) {
   std::error_code error;
@@ -20,9 +23,17 @@ ProgramFile OpenProgram(const std::string& path) {
   if (error) throw BraxoException("there is no program " + path + ": " + error.message());
   if (!std::filesystem::is_regular_file(real, error)) throw BraxoException(real + " is no program");
   // Whoever puts a link in its way from here on stops it.
-  Descriptor file(Enforce::Kernel::OpenForReading(real.c_str()));
+  Descriptor file(Kernel::OpenWithoutLinks(real.c_str(), Kernel::kForReading));
   if (!file.IsOpen()) LinuxHost::ThrowErrno("cannot open the program ", real);
   return {.file = std::move(file), .path = real};
+}
+
+ProgramFile SeeProgram(int received) {
+  Enforce::SeenFile seen = Enforce::SeeAgain(received, ProcDirectory(), Kernel::kForReading);
+  if (!seen.file.IsOpen()) {
+    throw BraxoException("there is no program " + seen.path + ", or it may not be read");
+  }
+  return {.file = Descriptor(seen.file.Release()), .path = std::move(seen.path)};
 }
 
 bool IsScript(const ProgramFile& program) {

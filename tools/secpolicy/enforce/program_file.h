@@ -16,6 +16,10 @@ struct ProgramFile {
 // this user may not read it: then nobody knows its label.
 ProgramFile OpenProgram(const std::string& path);
 
+// The program that somebody else has opened, as this process sees it. Throws
+// Braxo::Lib::BraxoException where it sees no such program.
+ProgramFile SeeProgram(int received);
+
 // True for a script. Its interpreter opens it again, and so is told its path.
 bool IsScript(const ProgramFile& program);
 

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
+#include <optional>
 #include <string_view>
 #include <system_error>
 #include <utility>
@@ -67,8 +68,10 @@ Policy::FileQuestion AskToExecute(const ProgramFile& program,
   return asked;
 }
 
-std::string DomainByExec(const ProgramFile& program, SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain caller = CallersDomain(access);
+// The domain that its label leads to from the domain of the caller; nothing where it stays there.
+std::optional<std::string> DomainByExec(const ProgramFile& program,
+                                        const Policy::InstalledDomain& caller,
+                                        SecPolicy::TeskAccessInterfaceImpl& access) {
   const Policy::FileQuestion asked = AskToExecute(program, access);
   if (!Decide(asked, caller).IsAllowed()) {
     throw BraxoException(caller.name + " may not execute " + asked.path + ": " +
@@ -76,11 +79,22 @@ std::string DomainByExec(const ProgramFile& program, SecPolicy::TeskAccessInterf
                          " says which rule would grant it");
   }
   for (const Rule* const rule : RulesOf(caller, RuleKind::kDomainTransition)) {
-    if (rule->Grants() && rule->words[0] == asked.label && rule->words[2] == "exec") {
-      return rule->words[1];
-    }
+    const bool isWayIn =
+        rule->Grants() && rule->words[0] == asked.label && rule->words[2] == "exec";
+    if (isWayIn && rule->words[1] != caller.name) return rule->words[1];
   }
-  return caller.name;
+  return std::nullopt;
+}
+
+// A script is executed by its real path, as its interpreter opens it by that.
+Entry EntryOf(std::string domain, std::vector<std::string> command, ProgramFile program) {
+  Entry entry{.domain = std::move(domain), .command = std::move(command)};
+  if (IsScript(program)) {
+    entry.command.front() = program.path;
+  } else {
+    entry.program = std::move(program.file);
+  }
+  return entry;
 }
 
 }  // namespace
@@ -88,12 +102,25 @@ std::string DomainByExec(const ProgramFile& program, SecPolicy::TeskAccessInterf
 Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access) {
   command.front() = Find(command.front());
   ProgramFile program = OpenProgram(command.front());
-  Entry entry{.domain = DomainByExec(program, access), .command = std::move(command)};
-  if (IsScript(program)) {
-    entry.command.front() = program.path;
-  } else {
-    entry.program = std::move(program.file);
+  const Policy::InstalledDomain caller = CallersDomain(access);
+  const auto domain = DomainByExec(program, caller, access);
+  return EntryOf(domain.value_or(caller.name), std::move(command), std::move(program));
+}
+
+Entry EntryByBroker(const Enforce::AskedEntry& asked, const DomainReference& asker,
+                    SecPolicy::TeskAccessInterfaceImpl& access) {
+  const auto caller = Policy::ReadDomain(access, asker.id);
+  if (!caller || caller->name != asker.name) {
+    throw BraxoException("the domain of this process is gone");
   }
+  ProgramFile program = SeeProgram(asked.program.Number());
+  const auto domain = DomainByExec(program, *caller, access);
+  if (!domain) {
+    throw BraxoException("no rule leads from " + caller->name + " to another domain by " +
+                         program.path + ", and what stays in the domain needs no broker");
+  }
+  Entry entry = EntryOf(*domain, asked.request.command, std::move(program));
+  entry.environment = asked.request.environment;
   return entry;
 }
 

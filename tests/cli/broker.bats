@@ -1,0 +1,241 @@
+# Programs that are confined and start others in another domain by the broker that is kept for them:
+# what they get, and what they are told where they get nothing. Hunts for a way to more than the -d
+# rules of the domain that asks.
+#
+# ESCAPE_AS is the number of an ordinary user whose programs ask, when root starts this.
+
+load helper
+
+setup_file() {
+  export programs=$BATS_FILE_TMPDIR/programs
+  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
+  mkdir "$programs"
+  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$PROBE" "$programs"
+}
+
+# /t/public is what askDom reads; /t/secret is what takes secretDom, which /t/secret/program enters.
+setup() {
+  needs_landlock
+  [[ -z $ESCAPE_AS || $(id -u) -eq 0 ]] || skip "only root can become another user"
+  as=()
+  [[ -z $ESCAPE_AS ]] || as=(setpriv --reuid "$ESCAPE_AS" --regid "$ESCAPE_AS" --clear-groups)
+  root=$BATS_TEST_TMPDIR/root
+  policy=$root/etc/zorvan/secpolicy
+  mkdir -p "$policy"/{objects,domains/plugins,fileLabels,early/domains} "$root"/{tardisks,t/{public,secret}}
+  chmod 755 "$BATS_TEST_TMPDIR"
+  cp "$PROBE" "$root/probe"
+  cp "$programs/secpolicy-run" "$root/ask"
+  for place in public secret; do
+    echo content >"$root/t/$place/file"
+    cp "$PROBE" "$root/t/$place/program"
+  done
+  printf '%s\n' public secret >"$policy/objects/all"
+  printf '/t/%s/* %s\n' public public secret secret >"$policy/fileLabels/all"
+  for name in globalVMDom ioFilterDom appDom daemonFrameworkDom; do : >"$policy/domains/$name"; done
+  echo '-s @start grant' >"$policy/domains/hostDom"
+  domain askDom "${asking[@]}" '-d secret secretDom exec grant'
+  domain secretDom "${calls[@]}" '-r /t/secret rwx'
+}
+
+calls=('-s @start grant' '-s @file grant' '-s @io grant' '-s @process grant' '-s @signal grant' '-s @clock grant')
+asking=("${calls[@]}" '-s sendmsg grant' '-r /ask rx' '-r /probe rx' '-r /t/public rx')
+
+# domain NAME RULE...
+domain() {
+  printf '%s\n' "${@:2}" >"$policy/domains/$1"
+}
+
+boot_as() {
+  [[ -z $ESCAPE_AS ]] || chown -R "$ESCAPE_AS:$ESCAPE_AS" "$root"
+  secpolicy boot
+  exits 0
+}
+
+secpolicy() {
+  run --separate-stderr "${as[@]}" "$programs/secpolicy" --root "$root" "$@"
+}
+
+# asks WORD...: from within askDom.
+asks() {
+  secpolicy run askDom -- /ask --ask -- "$@"
+}
+
+@test "a program enters the domain that its label leads to, from within another" {
+  boot_as
+  secpolicy run askDom -- /probe read=/t/secret/file run=/t/secret/program read=/t/public/file
+  answers 0 'read=/t/secret/file EACCES' 'run=/t/secret/program EACCES' 'read=/t/public/file ok'
+  asks /t/secret/program read=/t/secret/file read=/t/public/file write=/t/secret/file
+  answers 0 'read=/t/secret/file ok' 'read=/t/public/file EACCES' 'write=/t/secret/file ok'
+}
+
+@test "a script is started by its interpreter, with its arguments" {
+  # shellcheck disable=SC2016
+  printf '#!/t/secret/program read=/t/secret/file\n' >"$root/t/secret/script"
+  chmod +x "$root/t/secret/script"
+  ln -s secret/script "$root/t/link"
+  boot_as
+  asks /t/link read=/t/public/file
+  answers 0 'read=/t/secret/file ok' '/t/secret/script is no operation' 'read=/t/public/file EACCES'
+}
+
+@test "a program is found by PATH, from the working directory, and gets its name" {
+  boot_as
+  local who=("${as[@]}")
+  as=("${who[@]}" env PATH=/t/public:/t/secret)
+  asks program read=/t/secret/file
+  exits 126
+  [[ $stderr == *"no rule leads from askDom to another domain by /t/public/program, and what stays in the domain needs no broker; nothing was started" ]]
+  as=("${who[@]}" env PATH=/nowhere:/t/secret)
+  asks program read=/t/secret/file
+  answers 0 'read=/t/secret/file ok'
+  as=("${who[@]}")
+  asks t/secret/program read=t/secret/file
+  answers 0 'read=t/secret/file ok'
+  run -127 --separate-stderr "${as[@]}" "$programs/secpolicy" --root "$root" run askDom -- /ask --ask -- /nowhere/program
+  [[ $stderr == "secpolicy-run: there is no program /nowhere/program" ]]
+}
+
+# waits: somebody has to do with a program that waits for ever.
+waits() {
+  grep -qsaF wait-for=/t/secret/never /proc/[0-9]*/cmdline
+}
+
+@test "the exit status is that of the program, and it gets the signals of who asked" {
+  cp "$programs/secpolicy-run" "$root/t/secret/run"
+  boot_as
+  asks /t/secret/run --plan nothing -- true
+  exits 126
+  [[ $stderr == "secpolicy-run: cannot open the plan nothing: "* ]]
+  asks /t/secret/program wait-for=/t/secret/file read=/t/secret/file
+  answers 0 'wait-for=/t/secret/file ok' 'read=/t/secret/file ok'
+  local signal process status
+  for signal in TERM KILL; do
+    "${as[@]}" "$programs/secpolicy" --root "$root" run askDom -- /ask --ask -- \
+      /t/secret/program getppid wait-for=/t/secret/never >"$BATS_TEST_TMPDIR/$signal" 3>&- &
+    process=$!
+    until_true '[[ $(cat "$BATS_TEST_TMPDIR/$signal") == getppid* ]]'
+    waits
+    kill -s "$signal" "$process"
+    status=0
+    wait "$process" || status=$?
+    [[ $status -eq $((128 + $(kill -l "$signal"))) ]]
+    until_true '! waits'
+  done
+}
+
+@test "the program has the environment of who entered the first domain, but for the terminal" {
+  cp /bin/busybox "$root/t/public"
+  cp /bin/busybox "$root/t/secret"
+  boot_as
+  as+=(env -i "PATH=$PATH" TERM=outside HELLO=outside SECPOLICY_BROKER=7)
+  secpolicy run askDom -- /t/public/busybox env TERM=inside LANG=/etc LC_ALL=C HELLO=inside LD_PRELOAD=/t/public/file \
+    SECPOLICY_HOST_STATE=/t/public/state PATH=/t/public BASH_ENV=/t/public/file /ask --ask -- /t/secret/busybox env
+  exits 0
+  output=$(sort <<<"$output")
+  answers 0 HELLO=outside LC_ALL=C "PATH=$PATH" TERM=inside
+}
+
+# Attacks by who may say to the broker what it likes are in tests/enforce/broker_test.cpp.
+@test "another program in its place while it is asked for" {
+  # Of shells, what runs beside them reads this.
+  mkdir "$root/dev"
+  : >"$root/dev/null"
+  cp /bin/busybox "$root/t/public"
+  cp "$root/ask" "$root/t/secret/version"
+  domain askDom "${asking[@]}" '-r /t/public rwx' '-r /dev/null r' '-d secret secretDom exec grant'
+  domain secretDom "${calls[@]}" '-r /t rx'
+  boot_as
+  # It may make links in /t/public, to what leads to the other domain and to what does not.
+  # shellcheck disable=SC2016
+  secpolicy run askDom -- /t/public/busybox sh -c '
+    cd /t/public
+    ( while :; do ln -sf /t/secret/version link; ln -sf /t/public/program link; done ) 2>&- &
+    for tens in 0 1 2; do
+      for _ in 0 1 2 3 4 5 6 7 8 9; do /ask --ask -- ./link --version; done
+    done
+    kill $!'
+  # The probe would say that this is no operation.
+  [[ $output == *"secpolicy-run "* && $output != *"no operation"* ]]
+  [[ $stderr == *"no rule leads from askDom to another domain by /t/public/program"* ]]
+}
+
+@test "what is not to be entered is refused" {
+  domain otherDom "${calls[@]}"
+  printf '%s\n' '-d secret secretDom exec grant' >>"$policy/domains/otherDom"
+  domain revokingDom "${asking[@]}" '-d secret secretDom exec grant' '-a secret execute revoke'
+  boot_as
+  asks /probe
+  exits 126
+  [[ $stderr == *"no rule leads from askDom to another domain by /probe, "*"nothing was started" ]]
+  asks /t/secret/file
+  exits 126
+  [[ $stderr == *"cannot execute /t/secret/file"* ]]
+  secpolicy run revokingDom -- /ask --ask -- /t/secret/program read=/t/secret/file
+  exits 126
+  [[ $stderr == *"revokingDom may not execute /t/secret/program: 'secpolicy --root $root why revokingDom exec /t/secret/program' says"* ]]
+  # It may say the same of a file that 'why' does.
+  secpolicy why revokingDom exec /t/secret/program
+  exits 1
+  secpolicy why askDom exec /t/secret/program
+  exits 0
+  secpolicy why askDom enter secretDom
+  exits 0
+}
+
+@test "without the calls that it takes, and where nothing is confined, there is no broker" {
+  domain dumbDom "${calls[@]}" '-r /ask rx' '-d secret secretDom exec grant'
+  domain openDom "${asking[@]}" '-d secret secretDom exec grant'
+  domain staysDom "${asking[@]}"
+  boot_as
+  secpolicy settings enforcement openDom disabled
+  secpolicy restore
+  local name
+  for name in dumbDom openDom staysDom; do
+    secpolicy run "$name" -- /ask --ask -- /t/secret/program read=/t/secret/file
+    exits 126
+    [[ -z $output && $stderr == "secpolicy-run: there is no broker to ask: "* ]]
+  done
+  secpolicy features --for dumbDom
+  [[ $output == *"-d secret secretDom exec grant (only by \"secpolicy exec\" from outside of the domain, as asking from within takes -s pipe2 and sendmsg)"* ]]
+  secpolicy features --for askDom
+  [[ $output == *"-d secret secretDom exec grant (only by \"secpolicy exec\")"* ]]
+}
+
+@test "the new program is a world of its own domain, and so are those that it asks for" {
+  domain secretDom "${asking[@]}" '-r /t/secret rx' '-r /t/public/program rx' '-d public publicDom exec grant'
+  domain publicDom "${calls[@]}" '-r /t/public rx'
+  boot_as
+  asks /ask --ask
+  exits 126
+  cp "$root/ask" "$root/t/secret/ask"
+  asks /t/secret/ask --ask -- /t/public/program read=/t/public/file read=/t/secret/file
+  answers 0 'read=/t/public/file ok' 'read=/t/secret/file EACCES'
+  # By a way that askDom itself does not have.
+  asks /t/public/program read=/t/public/file
+  exits 126
+}
+
+@test "the command asks, too, where its domain may run it" {
+  [[ -z $SANITIZER ]] || skip "the runtime of the sanitizers makes calls of its own"
+  local file
+  mkdir -p "$root"/{proc,opt}
+  cp "$programs/secpolicy" "$programs/secpolicy-run" "$root/opt"
+  for file in $(ldd "$SECPOLICY" | grep -o '/[^ ]*'); do install -D "$file" "$root$file"; done
+  domain askDom "${asking[@]}" '-s @memory grant' '-d secret secretDom exec grant' \
+    '-r /opt rx' '-r /lib rx' '-r /lib64 rx' '-r /proc r'
+  boot_as
+  # It looks for the launcher beside itself.
+  local options=(--mount)
+  [[ $(id -u) -eq 0 ]] || options+=(--map-current-user --keep-caps)
+  # shellcheck disable=SC2016
+  as=(unshare "${options[@]}" sh -c 'mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}")
+  secpolicy run askDom -- /opt/secpolicy exec -- /t/secret/program read=/t/secret/file read=/t/public/file
+  answers 0 'read=/t/secret/file ok' 'read=/t/public/file EACCES'
+  secpolicy run askDom -- /opt/secpolicy exec -- /probe getppid
+  exits 126
+  [[ $stderr == *"no rule leads from askDom to another domain by /probe, "* ]]
+  rm "$root/opt/secpolicy-run"
+  secpolicy run askDom -- /opt/secpolicy exec -- /t/secret/program getppid
+  exits 126
+  [[ $stderr == "secpolicy: exec: secpolicy-run, which confines programs, is neither beside "*"; nothing was started" ]]
+}
