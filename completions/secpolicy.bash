@@ -26,7 +26,7 @@ _secpolicy_tardisks() {
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings'
+  local verbs='help init new explain boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings'
   local questions='read write exec list remove truncate make make-socket call use access enter create create-socket pass'
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
@@ -93,6 +93,15 @@ _secpolicy() {
     mapfile -t COMPREPLY < <(compgen -W '--root --verbose --help --version -v -h' -- "$current")
   elif [[ -z $verb ]]; then
     mapfile -t COMPREPLY < <(compgen -W "$verbs" -- "$current")
+  elif [[ $verb == help ]] && ((positional == 0)); then
+    mapfile -t COMPREPLY < <(compgen -W "$verbs" -- "$current")
+  elif [[ $verb == new && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'domain' -- "$current")
+  elif [[ $verb == explain ]] && ((positional == 0)); then
+    mapfile -t COMPREPLY < <(compgen -W "$("$(type -P secpolicy)" explain 2>/dev/null | cut -d' ' -f1)" -- "$current")
+  elif [[ $verb == init ]] && ((positional == 0)); then
+    compopt -o filenames
+    mapfile -t COMPREPLY < <(compgen -d -- "$current")
   elif [[ $verb == check || $verb == load || $verb == load-early ]] && ((positional == 0)); then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -d -- "$current")

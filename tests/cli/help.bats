@@ -5,7 +5,7 @@ load helper
 @test "--help shows every verb and the exit status" {
   run --separate-stderr "$SECPOLICY" --help
   exits 0
-  for verb in boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings; do
+  for verb in init new explain boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings; do
     [[ $output == *"  $verb "* ]]
     [[ $output == *"secpolicy --root ./r $verb"* ]]
   done
@@ -13,7 +13,7 @@ load helper
 }
 
 @test "--help of every verb has an example" {
-  for verb in boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings; do
+  for verb in init new explain boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings; do
     run --separate-stderr "$SECPOLICY" "$verb" --help
     exits 0
     [[ $output == *"Example"*"secpolicy "*"$verb"* ]]
@@ -39,8 +39,27 @@ load helper
   [[ $output =~ ^secpolicy\ [0-9]+\.[0-9]+\.[0-9]+$ ]]
 }
 
-@test "no verb, an unknown verb and an unknown option are wrong usage" {
+@test "the command alone and help show the verbs by group, and help VERB explains one" {
   run --separate-stderr "$SECPOLICY"
+  exits 0
+  local all=$output
+  [[ $all == *$'\n\nWrite a policy:\n  init '*$'\n\nInstall it:\n  boot '*$'\n\nGo back:\n  save '* ]]
+  for words in help --help; do
+    run --separate-stderr "$SECPOLICY" $words
+    exits 0
+    [[ $output == "$all" ]]
+  done
+  run --separate-stderr "$SECPOLICY" why --help
+  local one=$output
+  run --separate-stderr "$SECPOLICY" help why
+  exits 0
+  [[ $output == "$one" ]]
+  run --separate-stderr "$SECPOLICY" help nothing
+  wrong_usage "" "there is no verb or option 'nothing'"
+}
+
+@test "no verb, an unknown verb and an unknown option are wrong usage" {
+  secpolicy
   wrong_usage "" "A subcommand is required"
   run --separate-stderr "$SECPOLICY" lod
   wrong_usage "" "there is no verb or option 'lod'; did you mean 'load'?"
@@ -82,8 +101,8 @@ load helper
 
 @test "every verb is in the manual page and in both completions" {
   local verbs
-  verbs=$("$SECPOLICY" --help | sed -n '/^Subcommands:/,/^$/s/^  \([a-z-]*\) .*/\1/p')
-  [[ $(wc -w <<<"$verbs") -ge 6 ]]
+  verbs=$("$SECPOLICY" --help | sed -n '/^Write a policy:/,/^A first session/s/^  \([a-z-]*\) .*/\1/p')
+  [[ $(wc -w <<<"$verbs") -ge 24 ]]
   for verb in $verbs; do
     grep -q "^.It Cm $verb" "$SOURCE/docs/man/secpolicy.8"
     grep -q "verbs=.*\<$verb\>" "$SOURCE/completions/secpolicy.bash"

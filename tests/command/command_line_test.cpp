@@ -75,7 +75,7 @@ const Verb kCarve = {
     },
 };
 
-constexpr const Verb* kVerbs[] = {&kPaint, &kCarve};
+const SecPolicyCli::VerbGroup kVerbs[] = {{"Work", {&kPaint, &kCarve}}};
 
 class CommandLineTest : public testing::Test {
  protected:
@@ -166,7 +166,7 @@ TEST_F(CommandLineTest, RefusesWhatItDoesNotUnderstand) {
       {{"pant", "north"}, "there is no verb or option 'pant'; did you mean 'paint'?", "secpolicy"},
       {{"xyzzy"}, "there is no verb or option 'xyzzy'", "secpolicy"},
       {{"--rot", "/r"}, "there is no verb or option '--rot'", "secpolicy"},
-      {{}, "A subcommand is required", "secpolicy"},
+      {{"-v"}, "A subcommand is required", "secpolicy"},
       {{"carve"}, "A subcommand is required: one of bowl, spoon", "secpolicy carve"},
       {{"carve", "bowl"}, "WOOD is required", "secpolicy carve"},
       {{"paint"}, "WALL is required", "secpolicy paint"},

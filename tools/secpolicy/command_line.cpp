@@ -56,6 +56,18 @@ std::string JoinChoices(const std::vector<std::string>& choices) {
   return text;
 }
 
+// "help" and nothing at all ask for the list of verbs, "help VERB" for what "VERB --help" tells.
+std::vector<std::string> Unabbreviated(std::span<char*> words, const CLI::App& app) {
+  std::vector<std::string> plain(words.begin() + 1, words.end());
+  if (plain.empty() || plain == std::vector<std::string>{"help"}) return {"--help"};
+  if (plain.front() == "help") {
+    plain.erase(plain.begin());
+    const std::vector<std::string> verbs = VerbNames(app);
+    if (std::ranges::find(verbs, plain.front()) != verbs.end()) plain.emplace_back("--help");
+  }
+  return plain;
+}
+
 }  // namespace
 
 Option& Option::Require(bool isRequired) {
@@ -129,7 +141,7 @@ Action Syntax::AddKinds(std::span<const Kind> kinds) {
 
 Option Syntax::Verbose() const { return Option(*app.get_parent()->get_option("--verbose")); }
 
-CommandLine::CommandLine(const Description& description, std::span<const Verb* const> verbs)
+CommandLine::CommandLine(const Description& description, std::span<const VerbGroup> groups)
     : app(std::make_unique<CLI::App>(description.about, "secpolicy")) {
   app->require_subcommand(1);
   app->fallthrough();
@@ -139,14 +151,17 @@ CommandLine::CommandLine(const Description& description, std::span<const Verb* c
   rootOption = app->add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
                    ->type_name("DIR");
   app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
-  for (const Verb* each : verbs) AddVerb(*each);
+  for (const VerbGroup& group : groups) {
+    for (const Verb* each : group.verbs) AddVerb(*each, group.name);
+  }
 }
 
 CommandLine::~CommandLine() = default;
 
 // Only the verb that is asked for gets its options: to define them all would slow every start.
-void CommandLine::AddVerb(const Verb& added) {
+void CommandLine::AddVerb(const Verb& added, const char* group) {
   CLI::App* const subcommand = app->add_subcommand(added.name, added.summary);
+  subcommand->group(group);
   subcommand->preparse_callback([this, &added, subcommand](std::size_t /*rest*/) {
     subcommand->footer(added.help);
     Syntax syntax(*subcommand, wordsBehindDashes);
@@ -161,7 +176,9 @@ std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {
   wordsBehindDashes =
       static_cast<std::size_t>(std::max<std::ptrdiff_t>(words.end() - dashes - 1, 0));
   try {
-    app->parse(argc, argv);
+    std::vector<std::string> plain = Unabbreviated(words, *app);
+    std::ranges::reverse(plain);  // as the parser wants them
+    app->parse(std::move(plain));
     return std::nullopt;
   } catch (const CLI::ParseError& error) {
     return app->exit(error) == 0 ? kWell : kUsage;

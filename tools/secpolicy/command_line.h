@@ -86,6 +86,12 @@ class Syntax {
   const std::size_t behindDashes;
 };
 
+// Verbs that are for one thing, and its name in the list of verbs.
+struct VerbGroup {
+  const char* name;
+  std::vector<const Verb*> verbs;
+};
+
 // What the command says about itself.
 struct Description {
   const char* about;
@@ -96,7 +102,7 @@ struct Description {
 // The command line as a whole.
 class CommandLine {
  public:
-  CommandLine(const Description& description, std::span<const Verb* const> verbs);
+  CommandLine(const Description& description, std::span<const VerbGroup> groups);
   CommandLine(const CommandLine&) = delete;
   CommandLine& operator=(const CommandLine&) = delete;
   ~CommandLine();
@@ -112,7 +118,7 @@ class CommandLine {
   ExitCode Act() const { return action(); }
 
  private:
-  void AddVerb(const Verb& added);
+  void AddVerb(const Verb& added, const char* group);
 
   std::unique_ptr<CLI::App> app;
   CLI::Option* rootOption = nullptr;

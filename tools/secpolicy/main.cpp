@@ -16,16 +16,21 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr const Verb* kVerbs[] = {
-    &kBoot,  &kCheck, &kLoad,    &kLoadEarly, &kRestore,  &kStatus, &kDisplay,
-    &kRun,   &kExec,  &kObserve, &kFeatures,  &kWhy,      &kWhoCan, &kWords,
-    &kGraph, &kDiff,  &kSave,    &kHistory,   &kRollback, &kLabel,  &kSettings};
+const VerbGroup kVerbs[] = {
+    {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords}},
+    {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
+    {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff}},
+    {"Ask about it", {&kWhy, &kWhoCan, &kFeatures}},
+    {"Run programs in it", {&kRun, &kExec, &kObserve}},
+    {"Go back", {&kSave, &kHistory, &kRollback}}};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
 
 constexpr char kFooter[] =
     "A first session, as an ordinary user, on a root of your own:\n"
+    "  secpolicy --root ./r init                        write a first policy, to begin with\n"
+    "  secpolicy --root ./r new domain webDom           and a domain for what you want to confine\n"
     "  secpolicy --root ./r boot                        unpack the tardisks and install the "
     "policy\n"
     "  secpolicy --root ./r status                      is it loaded, and did it go well?\n"
@@ -39,6 +44,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r words calls                 what can stand behind -s?\n"
     "  secpolicy --root ./r graph --format svg >g.svg   the domains and their transitions\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
+    "  secpolicy --root ./r explain unknown-word        what does this one mean?\n"
     "  secpolicy --root ./r load --plan                 what would a load change?\n"
     "  secpolicy --root ./r load -v                     install it again after an edit, and watch\n"
     "  secpolicy --root ./r load-early                  install only what early boot needs\n"
@@ -51,7 +57,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r settings enforcement appDom permissive\n"
     "  secpolicy --root ./r restore                     apply the stored level\n"
     "\n"
-    "'secpolicy VERB --help' explains one verb. The files are described in secpolicy(5).\n"
+    "'secpolicy help VERB' explains one verb. The files are described in secpolicy(5).\n"
     "\n"
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";

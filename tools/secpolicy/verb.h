@@ -31,6 +31,9 @@ struct Verb {
   void (*prepare)() = nullptr;
 };
 
+extern const Verb kInit;
+extern const Verb kNew;
+extern const Verb kExplain;
 extern const Verb kBoot;
 extern const Verb kCheck;
 extern const Verb kLoad;

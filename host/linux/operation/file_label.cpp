@@ -27,19 +27,15 @@ std::optional<FileLabel> ReadLabelBy(Get get, const char* path) {
 }  // namespace
 
 std::optional<FileLabel> ReadLabel(const char* path) {
-  return ReadLabelBy(
-      [&](const char* name, void* value, std::size_t size) {
-        return lgetxattr(path, name, value, size);
-      },
-      path);
+  return ReadLabelBy([&](const char* name, void* value,
+                         std::size_t size) { return lgetxattr(path, name, value, size); },
+                     path);
 }
 
 std::optional<FileLabel> ReadLabel(int file, const char* path) {
-  return ReadLabelBy(
-      [&](const char* name, void* value, std::size_t size) {
-        return fgetxattr(file, name, value, size);
-      },
-      path);
+  return ReadLabelBy([&](const char* name, void* value,
+                         std::size_t size) { return fgetxattr(file, name, value, size); },
+                     path);
 }
 
 int ReplaceLabel(const char* path, std::uint32_t id) {

@@ -14,7 +14,8 @@ struct FileLabel {
 // be read. Links on the way to the file are followed, the last one is not.
 std::optional<FileLabel> ReadLabel(const char* path);
 
-// The same for the open file that lies at `path`, so that no other file's label is read in its place.
+// The same for the open file that lies at `path`, so that no other file's label is read in its
+// place.
 std::optional<FileLabel> ReadLabel(int file, const char* path);
 
 // Gives the file at `path` the label `id` in place of the one it has, be that its own or inherited;

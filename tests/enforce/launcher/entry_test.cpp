@@ -418,9 +418,8 @@ TEST_P(Entry, AsksTheRulesAboutADescriptor) {
                       {ProbePath()},
                       {},
                       {program.Number()}};
-  EXPECT_THAT(RunLauncher(launch).errors,
-              StrEq("secpolicy-run: cannot execute " + ProbePath() +
-                    " in the domain testDom: Permission denied\n"));
+  EXPECT_THAT(RunLauncher(launch).errors, StrEq("secpolicy-run: cannot execute " + ProbePath() +
+                                                " in the domain testDom: Permission denied\n"));
 }
 
 void WriteScript(const std::string& path, const std::string& interpreter) {

@@ -20,6 +20,7 @@
 #include "load/load_listener.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
+#include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "secpolicy/secpolicy.h"
@@ -55,6 +56,17 @@ std::vector<std::string> DefinedDomains(const LoadStep& step) {
   AddNames(step.directory + "/" + SecPolicy::kDomainsDir, "", names);
   if (step.kind == LoadKind::kFull) {
     AddNames(SecPolicy::kPartnerDomainsDir, SecPolicy::kPartnerPrefix, names);
+  }
+  return names;
+}
+
+// The domain that the library has missed, and the others that it would have come to.
+std::vector<std::string> NeededDomainsWithout(const std::string& policyDir,
+                                              const std::string& missing) {
+  std::vector<std::string> names;
+  for (const std::string name : SecPolicy::kNeededDomains) {
+    const bool hasFile = std::filesystem::exists(DomainFile(name, policyDir));
+    if (name == missing || !hasFile) names.push_back(name);
   }
   return names;
 }
@@ -321,9 +333,8 @@ class LoadRun {
       RecordUndone(record);
     });
     WriteProblems();
-    Summarize(request.verb, "stopped: there is no domain " + missing +
-                                ", so nothing was installed. Put a policy file named " + missing +
-                                " into " + request.policyDir + "/domains and run it again.");
+    Summarize(request.verb,
+              DescribeStop(NeededDomainsWithout(request.policyDir, missing), request.policyDir));
     _exit(kStopped);
   }
 

@@ -36,6 +36,18 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
          " shows the lines, and what may be meant\n";
 }
 
+std::string DescribeStop(const std::vector<std::string>& missing, const std::string& policyDir) {
+  std::string names = missing.front();
+  for (std::size_t index = 1; index < missing.size(); ++index) {
+    names += (index + 1 < missing.size() ? ", " : " and ") + missing[index];
+  }
+  const bool isOne = missing.size() == 1;
+  return std::string("stopped: there ") + (isOne ? "is no domain " : "are no domains ") + names +
+         ", so nothing was installed. Put " +
+         (isOne ? "a policy file named " + names : "policy files of these names") + " into " +
+         policyDir + "/domains and run it again.";
+}
+
 std::string CountInstalled() {
   const LinuxHost::PolicyCount count = LinuxHost::CountPolicy(LinuxHost::CurrentState());
   return CountOf(count.domains, "domain") + ", " + CountOf(count.rules, "rule") + ", " +

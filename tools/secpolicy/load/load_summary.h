@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <map>
 #include <string>
+#include <vector>
 
 #include "host/linux/operation/policy_load.h"
 
@@ -12,6 +13,10 @@ namespace SecPolicyCli {
 // see the lines; nothing when there are none.
 std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
                              const std::string& policyDir);
+
+// What the summary of a load says that stopped since there are no domains `missing`, which are one
+// at least.
+std::string DescribeStop(const std::vector<std::string>& missing, const std::string& policyDir);
 
 // How much is installed now: "9 domains, 137 rules, 17 objects". Throws what the host throws.
 std::string CountInstalled();
