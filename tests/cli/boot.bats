@@ -65,7 +65,7 @@ load helper
   secpolicy boot
   exits 3
   says "Error: Failed to fetch domainID for global VM Domain"
-  ends_with "secpolicy: boot: stopped: there is no domain globalVMDom, so nothing was installed. Put a policy file named globalVMDom into /etc/zorvan/secpolicy/domains and run it again."
+  ends_with "secpolicy: boot: stopped: there are no domains globalVMDom, ioFilterDom, appDom and daemonFrameworkDom, so nothing was installed. Put policy files of these names into /etc/zorvan/secpolicy/domains and run it again."
 }
 
 @test "boot of a root without an early policy ends well and tells it under -v" {
