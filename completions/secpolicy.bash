@@ -128,7 +128,7 @@ _secpolicy() {
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $verb == settings && -z $kind ]]; then
-    mapfile -t COMPREPLY < <(compgen -W 'option enforcement' -- "$current")
+    mapfile -t COMPREPLY < <(compgen -W 'list unset option enforcement' -- "$current")
   elif [[ $kind == option ]] && ((positional == 0)); then
     mapfile -t COMPREPLY < <(compgen -W '/UserVars/CheckAccessTemplateEnabled' -- "$current")
   elif [[ $kind == enforcement ]] && ((positional == 1)); then

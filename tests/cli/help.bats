@@ -71,7 +71,7 @@ load helper
   run --separate-stderr "$SECPOLICY" load a b
   wrong_usage load "The following argument was not expected: b"
   run --separate-stderr "$SECPOLICY" settings
-  wrong_usage settings "A subcommand is required: one of option, enforcement"
+  wrong_usage settings "A subcommand is required: one of list, unset, option, enforcement"
   run --separate-stderr "$SECPOLICY" settings enforcement
   wrong_usage settings "DOMAIN is required"
   run --separate-stderr "$SECPOLICY" --root

@@ -16,7 +16,7 @@ load helper
   secpolicy settings enforcement appDom permissive
   secpolicy restore
   exits 0
-  [[ $stderr == "secpolicy: restore: done" ]]
+  [[ $output == "appDom: enforcing -> permissive" && $stderr == "secpolicy: restore: done (1 level changed)" ]]
   secpolicy display
   shows "Domain Name: appDom Domain ID :$(domain_id appDom) Enforcement Level: permissive"
   shows "Domain Name: sshDom Domain ID :$(domain_id sshDom) Enforcement Level: enforcing"
@@ -142,4 +142,53 @@ kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 
   [[ $output == *newLabel* ]]
   secpolicy diff installed /new
   [[ $(sqlite3 "$root/var/lib/secpolicy/config.db" 'SELECT * FROM label_number') == "$before" ]]
+}
+
+@test "list prints what is stored as the words that store it" {
+  secpolicy settings list
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: settings list: done" ]]
+  secpolicy settings option /Net/HostName "a b"
+  secpolicy settings option /UserVars/CheckAccessTemplateEnabled 1
+  secpolicy settings enforcement sshDom disabled
+  secpolicy settings enforcement appDom permissive
+  secpolicy settings list
+  answers 0 "option /Net/HostName a b" "option /UserVars/CheckAccessTemplateEnabled 1" \
+    "enforcement appDom permissive" "enforcement sshDom disabled"
+  secpolicy settings list --format json
+  exits 0
+  fits_schema settings
+  jq -e '.option == {"/Net/HostName": "a b", "/UserVars/CheckAccessTemplateEnabled": 1} and
+    .enforcement == {appDom: "permissive", sshDom: "disabled"}' <<<"$output"
+}
+
+@test "unset forgets one setting, and says when there is none" {
+  secpolicy settings option /Net/HostName name
+  secpolicy settings enforcement appDom permissive
+  secpolicy settings unset enforcement appDom
+  exits 0
+  secpolicy settings unset option /Net/HostName
+  exits 0
+  secpolicy settings list
+  exits 0
+  [[ -z $output ]]
+  secpolicy settings unset enforcement appDom
+  exits 1
+  ends_with "secpolicy: settings unset: nothing is stored for enforcement appDom"
+  secpolicy settings unset level appDom
+  wrong_usage settings "KIND: 'level' is no kind of setting: option or enforcement"
+}
+
+@test "a level is stored for no domain that an installed policy lacks" {
+  secpolicy settings enforcement notYet permissive
+  exits 0
+  boot
+  secpolicy settings enforcement sshDmo permissive
+  exits 1
+  ends_with "secpolicy: settings: there is no domain 'sshDmo', so nothing was stored. Did you mean 'sshDom'?"
+  secpolicy settings enforcement another permissive
+  exits 1
+  ends_with "secpolicy: settings: there is no domain 'another', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
+  secpolicy settings list
+  answers 0 "enforcement notYet permissive"
 }

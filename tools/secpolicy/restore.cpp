@@ -1,5 +1,8 @@
 #include <iostream>
+#include <map>
+#include <vector>
 
+#include "braxo/lib/exception.h"
 #include "ending.h"
 #include "error_list.h"
 #include "host/linux/operation/state_use.h"
@@ -9,6 +12,7 @@
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/secpolicy.h"
 #include "text/format.h"
+#include "text/visible.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -27,22 +31,54 @@ void TellOfOlderLevels() {
             << Call("status") << " lists each, and a new start takes the new level" << std::endl;
 }
 
-Action Define(Syntax&) {
-  return [] {
-    const ExitCode end = CallLibrary(
-        "restore", [](ErrorList& errors) { SecPolicy::RestoreDomainEnforcement(errors); },
-        AdviseOnPrivilege);
-    if (end == kWell) TellOfOlderLevels();
-    return end;
-  };
+// None of a state that cannot be read, which the library tells.
+std::vector<Policy::InstalledDomain> ListDomains() {
+  try {
+    SecPolicy::TeskAccessInterfaceImpl access;
+    return Policy::ListDomains(access);
+  } catch (const Braxo::Lib::BraxoException&) {
+    return {};
+  }
 }
+
+// Writes a line for each domain that has another level than it had in `before`, and returns how
+// many there are.
+std::size_t TellOfChanges(const std::vector<Policy::InstalledDomain>& before) {
+  std::map<unsigned int, Policy::Level> levels;
+  for (const Policy::InstalledDomain& domain : before) levels.emplace(domain.id, domain.level);
+  std::size_t count = 0;
+  for (const Policy::InstalledDomain& domain : ListDomains()) {
+    const auto had = levels.find(domain.id);
+    if (had == levels.end() || had->second == domain.level) continue;
+    std::cout << Visible(domain.name) << ": " << Policy::TextOf(had->second) << " -> "
+              << Policy::TextOf(domain.level) << '\n';
+    ++count;
+  }
+  return count;
+}
+
+ExitCode Restore() {
+  std::size_t changed = 0;
+  const ExitCode end = CallLibrary(
+      "restore",
+      [&](ErrorList& errors) {
+        const auto before = ListDomains();
+        SecPolicy::RestoreDomainEnforcement(errors);
+        changed = TellOfChanges(before);
+      },
+      AdviseOnPrivilege, [&] { return "done (" + CountOf(changed, "level") + " changed)"; });
+  if (end == kWell) TellOfOlderLevels();
+  return end;
+}
+
+Action Define(Syntax&) { return Restore; }
 
 }  // namespace
 
 const Verb kRestore = {
     "restore", "Give every domain its stored enforcement level",
     "Walks the installed domains and gives each the level that 'settings enforcement' stored for\n"
-    "it. A domain without a stored level keeps the one it has.\n"
+    "it. A domain without a stored level keeps the one it has. Prints each level that changes.\n"
     "\n"
     "Example:\n"
     "  secpolicy settings enforcement appDom permissive\n"

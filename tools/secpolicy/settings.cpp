@@ -1,11 +1,20 @@
 #include "host/linux/operation/settings.h"
 
+#include <algorithm>
 #include <iostream>
+#include <iterator>
 #include <variant>
 
+#include "braxo/lib/exception.h"
 #include "command_line.h"
 #include "ending.h"
+#include "host/linux/operation/state_use.h"
+#include "json.h"
+#include "policy/installed_policy.h"
 #include "root.h"
+#include "secpolicy/secpolicy.h"
+#include "text/suggestion.h"
+#include "text/visible.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -21,26 +30,51 @@ struct Setting {
   const char* valueMeaning;
   std::optional<std::string> (*find)(const std::string& key);
   void (*store)(const std::string& key, const std::string& value);
+  bool (*remove)(const std::string& key);
 };
+
+std::string TextOf(const LinuxHost::OptionValue& value) {
+  if (const long* number = std::get_if<long>(&value)) return std::to_string(*number);
+  return std::get<std::string>(value);
+}
 
 std::optional<std::string> FindOption(const std::string& path) {
   const auto value = LinuxHost::FindWantedOption(path);
   if (!value) return std::nullopt;
-  if (const long* number = std::get_if<long>(&*value)) return std::to_string(*number);
-  return std::get<std::string>(*value);
+  return TextOf(*value);
 }
 
 void StoreOption(const std::string& path, const std::string& value) {
   LinuxHost::StoreWantedOption(path, LinuxHost::ParseOptionValue(value));
 }
 
+// A level may be stored for a domain that a boot is to bring, but hardly for one that none brought.
+void StoreEnforcement(const std::string& domain, const std::string& level) {
+  if (!LinuxHost::IsStateMissing()) {
+    SecPolicy::TeskAccessInterfaceImpl access;
+    std::vector<std::string> names;
+    for (const Policy::InstalledDomain& installed : Policy::ListDomains(access)) {
+      names.push_back(installed.name);
+    }
+    if (std::ranges::find(names, domain) == names.end()) {
+      const std::string nearest = NearestWord(domain, names);
+      throw Braxo::Lib::BraxoException(
+          "there is no domain '" + domain + "', so nothing was stored. " +
+          (nearest.empty() ? Call("status") + " counts those that there are"
+                           : "Did you mean '" + nearest + "'?"));
+    }
+  }
+  LinuxHost::StoreWantedEnforcement(domain, level);
+}
+
 constexpr Setting kSettingKinds[] = {
     {"option", "An advanced option of the host", "PATH",
      "The option, such as /UserVars/CheckAccessTemplateEnabled", "VALUE",
-     "What to store: a whole number, or any other text", FindOption, StoreOption},
+     "What to store: a whole number, or any other text", FindOption, StoreOption,
+     LinuxHost::RemoveWantedOption},
     {"enforcement", "The level that 'restore' gives a domain", "DOMAIN", "The name of the domain",
      "LEVEL", "What to store: enforcing, permissive or disabled", LinuxHost::FindWantedEnforcement,
-     LinuxHost::StoreWantedEnforcement},
+     StoreEnforcement, LinuxHost::RemoveWantedEnforcement},
 };
 
 ExitCode Show(const Setting& setting, const std::string& key) {
@@ -71,8 +105,79 @@ Action DefineSetting(const Setting& setting, Syntax& syntax) {
   };
 }
 
+ExitCode Unset(const std::string& kind, const std::string& key) {
+  const auto setting = std::ranges::find(kSettingKinds, kind, &Setting::name);
+  return CallLibrary(
+      "settings unset",
+      [&](ErrorList&) {
+        if (setting->remove(key)) return;
+        throw Braxo::Lib::BraxoException("nothing is stored for " + kind + " " + key);
+      },
+      AdviseOnPrivilege);
+}
+
+std::string CheckSettingKind(const std::string& kind) {
+  if (std::ranges::find(kSettingKinds, kind, &Setting::name) != std::end(kSettingKinds)) return "";
+  return "'" + kind + "' is no kind of setting: option or enforcement";
+}
+
+Action DefineUnset(Syntax& syntax) {
+  const auto kind = std::make_shared<std::string>();
+  const auto key = std::make_shared<std::string>();
+  syntax.AddOption("KIND", *kind, "option or enforcement").Check(CheckSettingKind).Require();
+  syntax.AddOption("KEY", *key, "The path of the option, or the name of the domain").Require();
+  return [=] { return Unset(*kind, *key); };
+}
+
+void ListAsText() {
+  for (const auto& [path, value] : LinuxHost::ListWantedOptions()) {
+    std::cout << "option " << Visible(path) << ' ' << Visible(TextOf(value)) << '\n';
+  }
+  for (const auto& [domain, level] : LinuxHost::ListWantedEnforcement()) {
+    std::cout << "enforcement " << Visible(domain) << ' ' << level << '\n';
+  }
+}
+
+void ListAsJson() {
+  Json options = Json::Object();
+  for (const auto& option : LinuxHost::ListWantedOptions()) {
+    std::visit([&](const auto& value) { options[option.first] = value; }, option.second);
+  }
+  Json levels = Json::Object();
+  for (const auto& [domain, level] : LinuxHost::ListWantedEnforcement()) levels[domain] = level;
+  const Json list = {
+      {"schema", "secpolicy.settings/1"}, {"option", options}, {"enforcement", levels}};
+  std::cout << list.Text();
+}
+
+Action DefineList(Syntax& syntax) {
+  const auto format = std::make_shared<std::string>();
+  syntax.AddFormat(*format, "them", {"text", "json"});
+  return [format] {
+    return CallLibrary(
+        "settings list", [&](ErrorList&) { (*format == "json" ? ListAsJson : ListAsText)(); },
+        AdviseOnPrivilege);
+  };
+}
+
+const Kind kList = {"list", "Print all that is stored",
+                    "Prints each setting as the words that store it.\n"
+                    "\n"
+                    "Examples:\n"
+                    "  secpolicy settings list\n"
+                    "  secpolicy settings list --format json | jq .enforcement",
+                    DefineList};
+
+const Kind kUnset = {
+    "unset", "Forget a setting",
+    "Forgets what is stored. What was applied stays as it is until the next boot.\n"
+    "\n"
+    "Example:\n"
+    "  secpolicy settings unset enforcement appDom",
+    DefineUnset};
+
 Action Define(Syntax& syntax) {
-  std::vector<Kind> kinds;
+  std::vector<Kind> kinds = {kList, kUnset};
   for (const Setting& setting : kSettingKinds) {
     kinds.push_back({setting.name, setting.summary, nullptr,
                      [&setting](Syntax& kind) { return DefineSetting(setting, kind); }});
@@ -84,9 +189,11 @@ Action Define(Syntax& syntax) {
 
 const Verb kSettings = {
     "settings", "Read or store what the host is wanted to do",
-    "Without a value prints what is stored; with one, stores it for the next load or restore.\n"
+    "Without a value prints what is stored; with one, stores it for the next load or restore. A\n"
+    "level is stored for a domain that is installed, and before the first boot for any.\n"
     "\n"
     "Examples:\n"
+    "  secpolicy settings list                               what is stored?\n"
     "  secpolicy settings enforcement appDom                 which level is stored?\n"
     "  secpolicy settings enforcement appDom permissive      store one; 'restore' applies it\n"
     "  secpolicy settings option /UserVars/CheckAccessTemplateEnabled 1\n"

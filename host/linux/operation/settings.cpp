@@ -51,6 +51,17 @@ void StoreWantedOption(const std::string& path, const OptionValue& value) {
   ConfigDatabase::Current().StoreOption(path, value);
 }
 
+std::map<std::string, OptionValue> ListWantedOptions() {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  if (database == nullptr) return {};
+  return database->ListOptions();
+}
+
+bool RemoveWantedOption(const std::string& path) {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  return database != nullptr && database->RemoveOption(path);
+}
+
 std::optional<std::string> FindWantedEnforcement(const std::string& domain) {
   ConfigDatabase* database = ConfigDatabase::Find();
   if (database == nullptr) return std::nullopt;
@@ -64,6 +75,17 @@ void StoreWantedEnforcement(const std::string& domain, const std::string& level)
                                    ": use enforcing, permissive or disabled"));
   }
   ConfigDatabase::Current().StoreValue(DomainSettings(domain), kLevelKey, word);
+}
+
+std::map<std::string, std::string> ListWantedEnforcement() {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  if (database == nullptr) return {};
+  return database->ListValues(DomainSettings(""), kLevelKey);
+}
+
+bool RemoveWantedEnforcement(const std::string& domain) {
+  ConfigDatabase* database = ConfigDatabase::Find();
+  return database != nullptr && database->RemoveValue(DomainSettings(domain), kLevelKey);
 }
 
 bool WasEnforcementApplied(const std::string& domain) {

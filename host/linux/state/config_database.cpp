@@ -88,6 +88,24 @@ void ConfigDatabase::StoreOption(const std::string& path, const OptionValue& val
   std::visit(replace, value);
 }
 
+std::map<std::string, OptionValue> ConfigDatabase::ListOptions() {
+  std::map<std::string, OptionValue> options;
+  Rows rows = store.Select("SELECT path, typeof(value) = 'integer', value FROM advanced_option");
+  while (rows.Next()) {
+    OptionValue& value = options[rows.Text(0)];
+    if (rows.Integer(1) != 0) {
+      value = static_cast<long>(rows.Integer(2));
+    } else {
+      value = rows.Text(2);
+    }
+  }
+  return options;
+}
+
+bool ConfigDatabase::RemoveOption(const std::string& path) {
+  return store.Run("DELETE FROM advanced_option WHERE path = ?1", path) > 0;
+}
+
 bool ConfigDatabase::HasObject(const ConfigStoreObjectId& id) {
   Rows rows = store.Select(
       "SELECT 1 FROM object_value"
@@ -110,6 +128,24 @@ void ConfigDatabase::StoreValue(const ConfigStoreObjectId& id, const std::string
                                 const std::string& value) {
   store.Run("INSERT OR REPLACE INTO object_value VALUES(?1, ?2, ?3, ?4, ?5, ?6)", id.Component(0),
             id.Component(1), id.Component(2), id.Component(3), key, value);
+}
+
+std::map<std::string, std::string> ConfigDatabase::ListValues(const ConfigStoreObjectId& id,
+                                                              const std::string& key) {
+  std::map<std::string, std::string> values;
+  Rows rows = store.Select(
+      "SELECT fourth, value FROM object_value"
+      " WHERE first = ?1 AND second = ?2 AND third = ?3 AND key = ?4",
+      id.Component(0), id.Component(1), id.Component(2), key);
+  while (rows.Next()) values.emplace(rows.Text(0), rows.Text(1));
+  return values;
+}
+
+bool ConfigDatabase::RemoveValue(const ConfigStoreObjectId& id, const std::string& key) {
+  return store.Run(
+             "DELETE FROM object_value"
+             " WHERE first = ?1 AND second = ?2 AND third = ?3 AND fourth = ?4 AND key = ?5",
+             id.Component(0), id.Component(1), id.Component(2), id.Component(3), key) > 0;
 }
 
 bool ConfigDatabase::BootStatus(const ConfigStoreObjectId& id) {

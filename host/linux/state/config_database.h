@@ -34,6 +34,10 @@ class ConfigDatabase {
 
   std::optional<OptionValue> FindOption(const std::string& path);
   void StoreOption(const std::string& path, const OptionValue& value);
+  std::map<std::string, OptionValue> ListOptions();
+
+  // False when there was none.
+  bool RemoveOption(const std::string& path);
 
   // True when any key of the object is stored.
   bool HasObject(const OrinConfigStore::ConfigStoreObjectId& id);
@@ -41,6 +45,14 @@ class ConfigDatabase {
                                        const std::string& key);
   void StoreValue(const OrinConfigStore::ConfigStoreObjectId& id, const std::string& key,
                   const std::string& value);
+
+  // The values of `key` of all objects whose first three components are those of `id`, by the
+  // fourth.
+  std::map<std::string, std::string> ListValues(const OrinConfigStore::ConfigStoreObjectId& id,
+                                                const std::string& key);
+
+  // False when there was none.
+  bool RemoveValue(const OrinConfigStore::ConfigStoreObjectId& id, const std::string& key);
 
   // Whether the object was applied in this boot.
   bool BootStatus(const OrinConfigStore::ConfigStoreObjectId& id);
