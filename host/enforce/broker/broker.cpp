@@ -12,13 +12,13 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <cstring>
 #include <optional>
 #include <utility>
 #include <vector>
 
 #include "braxo/lib/exception.h"
+#include "host/enforce/launcher/number.h"
 
 namespace Enforce {
 namespace {
@@ -113,8 +113,8 @@ void CloseInherited(int procDirectory) {
   DIR* const directory = list < 0 ? nullptr : fdopendir(list);
   if (directory == nullptr) return;
   while (const dirent* const entry = readdir(directory)) {
-    const int number = std::atoi(entry->d_name);
-    if (number > STDERR_FILENO && fcntl(number, F_GETFD) == 0) close(number);
+    const auto number = ReadNumber(entry->d_name);
+    if (number && *number > STDERR_FILENO && fcntl(*number, F_GETFD) == 0) close(*number);
   }
   closedir(directory);
 }
@@ -125,7 +125,7 @@ class Broker {
  public:
   Broker(const Brokerage& told, FileDescriptor here) : brokerage(told), socket(std::move(here)) {
     // Or children would vanish without a word.
-    signal(SIGCHLD, SIG_DFL);
+    static_cast<void>(signal(SIGCHLD, SIG_DFL));
     sigset_t held;
     sigfillset(&held);
     sigprocmask(SIG_SETMASK, &held, &signalsBefore);

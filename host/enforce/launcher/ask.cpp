@@ -100,7 +100,7 @@ void HandOnSignals(int end) {
   action.sa_sigaction = HandOn;
   action.sa_flags = SA_SIGINFO | SA_RESTART;
   for (const int signal : kHandedOn) sigaction(signal, &action, nullptr);
-  std::signal(SIGPIPE, SIG_IGN);
+  static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
 }
 
 EntryAnswer AwaitAnswer(int answers) {
