@@ -8,14 +8,14 @@
 #include <linux/capability.h>
 
 #include "enforce/domain_of.h"
+#include "policy/capability.h"
 
 namespace EnforceTest {
 namespace {
 
-using Enforce::CapabilityName;
-using Enforce::CapabilityNumber;
 using Enforce::CapabilityPlan;
 using Enforce::PlanCapabilities;
+using Policy::CapabilityNumber;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
@@ -43,8 +43,7 @@ TEST(CapabilityNumber, IsLinuxs) {
   EXPECT_EQ(CapabilityNumber("cap_checkpoint_restore"), CAP_CHECKPOINT_RESTORE);
   EXPECT_EQ(CapabilityNumber("cap_of_nobody"), std::nullopt);
   EXPECT_EQ(CapabilityNumber(""), std::nullopt);
-  EXPECT_EQ(CapabilityName(CAP_SETFCAP), "cap_setfcap");
-  EXPECT_EQ(CapabilityName(CAP_CHECKPOINT_RESTORE + 1), "");
+  EXPECT_EQ(Policy::Capabilities().size(), CAP_CHECKPOINT_RESTORE + 1);
 }
 
 TEST(PlanCapabilities, KeepsWhatOneGrantsAndNoneRevokes) {

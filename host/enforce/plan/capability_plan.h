@@ -1,20 +1,12 @@
 #pragma once
 
 #include <cstdint>
-#include <optional>
-#include <string_view>
 #include <vector>
 
 #include "host/enforce/coverage.h"
 #include "policy/installed_policy.h"
 
 namespace Enforce {
-
-// The number that Linux has for a capability ("cap_chown" is 0); nothing when there is none.
-std::optional<unsigned int> CapabilityNumber(std::string_view name);
-
-// The name of the capability that has this number; empty when there is none.
-std::string_view CapabilityName(unsigned int number);
 
 struct CapabilityPlan {
   std::uint64_t kept = 0;       // a bit for each capability, by Linux's numbers; all others go

@@ -9,6 +9,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/system_calls.h"
+#include "policy/capability.h"
 
 using Braxo::Misc::StrCat;
 
@@ -101,8 +102,9 @@ std::string Dump(const CallPlan& plan) {
 
 std::string Dump(const CapabilityPlan& plan) {
   std::string text = "capabilities:";
-  for (unsigned int number = 0; !CapabilityName(number).empty(); ++number) {
-    if ((plan.kept >> number & 1) != 0) text += StrCat(" ", CapabilityName(number));
+  const auto names = Policy::Capabilities();
+  for (std::size_t number = 0; number < names.size(); ++number) {
+    if ((plan.kept >> number & 1) != 0) text += StrCat(" ", names[number]);
   }
   if (plan.kept == 0) text += " none";
   return StrCat(text, "\n", Dump(plan.fates));

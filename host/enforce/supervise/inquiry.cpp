@@ -1,6 +1,6 @@
 #include "host/enforce/supervise/inquiry.h"
 
-#include "host/enforce/plan/capability_plan.h"
+#include "policy/capability.h"
 
 namespace Enforce {
 
@@ -29,7 +29,7 @@ void Inquiry::AskCheck(const char* check, std::uint32_t value) {
 }
 
 void Inquiry::AskCapability(const char* name) {
-  const std::uint64_t bit = std::uint64_t{1} << CapabilityNumber(name).value();
+  const std::uint64_t bit = std::uint64_t{1} << Policy::CapabilityNumber(name).value();
   if ((Actor().capabilities & bit) == 0) return;
   asked.emplace_back(Policy::WordsQuestion{.kind = Policy::RuleKind::kCapability, .words = {name}});
 }

@@ -1,5 +1,6 @@
 #include "host/linux/state/keyword_tables.h"
 
+#include <linux/capability.h>
 #include <seccomp.h>
 
 #include <algorithm>
@@ -7,11 +8,13 @@
 #include <cerrno>
 #include <cstdlib>
 #include <span>
+#include <vector>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/state/domain_table.h"
 #include "host/linux/state/label_table.h"
 #include "policy/call_set.h"
+#include "policy/capability.h"
 #include "policy/newer_call.h"
 #include "policy/rule_kind.h"
 
@@ -24,49 +27,28 @@ namespace {
 // The words of a table in the order of their identifiers, from 0.
 using Words = std::span<const std::string>;
 
-// The first nineteen have numbers in the runtime interface, which is older than the others.
+// These have the first numbers in the runtime interface, which is older than the others.
+constexpr std::array kOldestCapabilities = {
+    CAP_CHOWN,      CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH, CAP_FOWNER,     CAP_FSETID,
+    CAP_KILL,       CAP_SETGID,       CAP_SETUID,          CAP_SETPCAP,    CAP_NET_BIND_SERVICE,
+    CAP_NET_ADMIN,  CAP_NET_RAW,      CAP_IPC_LOCK,        CAP_SYS_MODULE, CAP_SYS_RAWIO,
+    CAP_SYS_CHROOT, CAP_SYS_PTRACE,   CAP_SYS_ADMIN,       CAP_SYS_BOOT};
+
+std::vector<std::string> ListCapabilities() {
+  const auto names = Policy::Capabilities();
+  std::vector<std::string> words;
+  words.reserve(names.size());
+  for (const int number : kOldestCapabilities) {
+    words.emplace_back(names[static_cast<std::size_t>(number)]);
+  }
+  for (const std::string_view name : names) {
+    if (std::ranges::find(words, name) == words.end()) words.emplace_back(name);
+  }
+  return words;
+}
+
 Words CapabilityWords() {
-  static const std::array<std::string, 41> words = {"cap_chown",
-                                                    "cap_dac_override",
-                                                    "cap_dac_read_search",
-                                                    "cap_fowner",
-                                                    "cap_fsetid",
-                                                    "cap_kill",
-                                                    "cap_setgid",
-                                                    "cap_setuid",
-                                                    "cap_setpcap",
-                                                    "cap_net_bind_service",
-                                                    "cap_net_admin",
-                                                    "cap_net_raw",
-                                                    "cap_ipc_lock",
-                                                    "cap_sys_module",
-                                                    "cap_sys_rawio",
-                                                    "cap_sys_chroot",
-                                                    "cap_sys_ptrace",
-                                                    "cap_sys_admin",
-                                                    "cap_sys_boot",
-                                                    "cap_linux_immutable",
-                                                    "cap_net_broadcast",
-                                                    "cap_ipc_owner",
-                                                    "cap_sys_pacct",
-                                                    "cap_sys_nice",
-                                                    "cap_sys_resource",
-                                                    "cap_sys_time",
-                                                    "cap_sys_tty_config",
-                                                    "cap_mknod",
-                                                    "cap_lease",
-                                                    "cap_audit_write",
-                                                    "cap_audit_control",
-                                                    "cap_setfcap",
-                                                    "cap_mac_override",
-                                                    "cap_mac_admin",
-                                                    "cap_syslog",
-                                                    "cap_wake_alarm",
-                                                    "cap_block_suspend",
-                                                    "cap_audit_read",
-                                                    "cap_perfmon",
-                                                    "cap_bpf",
-                                                    "cap_checkpoint_restore"};
+  static const std::vector<std::string> words = ListCapabilities();
   return words;
 }
 
