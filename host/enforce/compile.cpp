@@ -1,15 +1,17 @@
 #include "host/enforce/compile.h"
 
+#include <linux/capability.h>
+
 #include <algorithm>
 #include <iterator>
 #include <string_view>
 #include <utility>
 
+#include "host/enforce/kernel.h"
 #include "host/enforce/plan/call_plan.h"
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/dump.h"
 #include "host/enforce/plan/net_plan.h"
-#include "host/enforce/plan/port_check.h"
 #include "policy/call_set.h"
 
 namespace Enforce {
@@ -27,35 +29,30 @@ constexpr char kWithoutLandlock[] =
     "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)";
 constexpr char kWithoutSeccomp[] = "this kernel filters no system calls";
 
-// The fates of one plan, which are in the order of the domain's rules.
-class FateList {
- public:
-  explicit FateList(std::vector<RuleFate> list) : fates(std::move(list)) {}
+// Who has one of these takes a mask away, gets past it by a handle, or may list the empty place
+// that is in its stead.
+constexpr std::uint64_t kPastMasks =
+    1U << CAP_SYS_ADMIN | 1U << CAP_DAC_READ_SEARCH | 1U << CAP_DAC_OVERRIDE;
 
-  RuleFate Take() { return std::move(fates.at(next++)); }
-
- private:
-  std::vector<RuleFate> fates;
-  std::size_t next = 0;
-};
+bool IsAboutCalls(RuleKind kind) {
+  return kind == RuleKind::kSyscall || kind == RuleKind::kParameterCheck;
+}
 
 bool IsAboutFiles(RuleKind kind) {
   return kind == RuleKind::kFilePath || kind == RuleKind::kObjectAccess ||
          kind == RuleKind::kFileCreation || kind == RuleKind::kUnixSocketCreation;
 }
 
-void GiveUp(RuleFate* fate, const char* reason) {
-  fate->fate = Fate::kNotExpressible;
-  fate->how = reason;
+void GiveUp(RuleFate& fate, const char* reason) {
+  fate.fate = Fate::kNotExpressible;
+  fate.how = reason;
 }
 
 // Landlock lets signals through to what was started in the same entry alone.
-RuleFate WithScope(RuleFate fate) {
-  if (!fate.rule.Grants() || !SpeaksOfSignals(fate.rule)) return fate;
-  fate.fate = std::max(fate.fate, Fate::kNarrowed);
-  fate.how += fate.how.empty() ? "" : "; ";
-  fate.how += "signals reach only what was started with the same entry into the domain";
-  return fate;
+void NarrowToScope(RuleFate& fate) {
+  if (fate.rule.kind != RuleKind::kSyscall || !fate.rule.Grants()) return;
+  if (!SpeaksOfSignals(fate.rule)) return;
+  Narrow(fate, "signals reach only what was started with the same entry into the domain");
 }
 
 // By which those that are confined ask their broker.
@@ -100,66 +97,82 @@ struct Parts {
 
 Parts PlanParts(const InstalledDomain& domain, const Surroundings& surroundings) {
   const Features& features = surroundings.features;
-  return {.paths = PlanPaths(domain, surroundings.places, surroundings.files),
+  CapabilityPlan capabilities = PlanCapabilities(
+      domain, features.capabilities, static_cast<unsigned int>(features.lastCapability));
+  const bool mayMask = (capabilities.kept & kPastMasks) == 0;
+  return {.paths = PlanPaths(domain, surroundings.places, surroundings.files, mayMask),
           .calls = PlanCalls(domain),
-          .capabilities = PlanCapabilities(domain, features.capabilities,
-                                           static_cast<unsigned int>(features.lastCapability)),
+          .capabilities = std::move(capabilities),
           .net = PlanNet(domain, features.landlock)};
+}
+
+bool HasLandlock(const Features& features) { return features.landlock >= kNeededLandlock; }
+
+bool IsScoped(const Features& features) { return features.landlock >= Kernel::kScopesVersion; }
+
+std::vector<std::string> GapsOf(const Features& features) {
+  std::vector<std::string> gaps;
+  if (!HasLandlock(features)) gaps.emplace_back(kWithoutLandlock);
+  if (!features.seccomp) gaps.emplace_back(kWithoutSeccomp);
+  return gaps;
+}
+
+// In the order of the rules.
+std::vector<RuleFate> FatesOf(const Parts& parts, const Features& features) {
+  std::vector<RuleFate> fates;
+  for (const auto* const part :
+       {&parts.paths.fates, &parts.calls.fates, &parts.capabilities.fates, &parts.net.fates}) {
+    fates.insert(fates.end(), part->begin(), part->end());
+  }
+  std::ranges::sort(fates, {}, &RuleFate::place);
+  for (RuleFate& fate : fates) {
+    const RuleKind kind = fate.rule.kind;
+    if (IsAboutFiles(kind) && !HasLandlock(features)) GiveUp(fate, kWithoutLandlock);
+    if (IsAboutCalls(kind) && !features.seccomp) GiveUp(fate, kWithoutSeccomp);
+    if (IsScoped(features)) NarrowToScope(fate);
+  }
+  return fates;
+}
+
+// What of a plan about files this version of Landlock has.
+void TakeFiles(PathPlan& paths, int landlock, Plan* plan) {
+  plan->handledFiles = Landlock::AllRights(landlock);
+  for (PathRight& right : paths.rights) {
+    right.rights &= plan->handledFiles;
+    if (right.rights != 0) plan->paths.push_back(std::move(right));
+  }
+  plan->masks = std::move(paths.masks);
+}
+
+void TakePorts(NetPlan& net, Plan* plan) {
+  plan->bindsChecked = net.bind.isHandled;
+  plan->connectsChecked = net.connect.isHandled;
+  plan->bindPorts = std::move(net.bind.ports);
+  plan->connectPorts = std::move(net.connect.ports);
+}
+
+CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts parts) {
+  CompiledPlan compiled;
+  compiled.fates = FatesOf(parts, features);
+  TellOfBroker(domain.name, &compiled.fates);
+  compiled.gaps = GapsOf(features);
+  Plan& plan = compiled.plan;
+  plan.domain = domain.name;
+  plan.domainId = domain.id;
+  plan.level = domain.level;
+  if (HasLandlock(features)) TakeFiles(parts.paths, features.landlock, &plan);
+  TakePorts(parts.net, &plan);
+  plan.isScoped = IsScoped(features);
+  plan.capabilities = parts.capabilities.kept;
+  plan.filter = std::move(parts.calls.program);
+  plan.secret = parts.calls.secret;
+  return compiled;
 }
 
 }  // namespace
 
 CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surroundings) {
-  const Features& features = surroundings.features;
-  const bool hasLandlock = features.landlock >= kNeededLandlock;
-  auto [paths, calls, capabilities, net] = PlanParts(domain, surroundings);
-
-  CompiledPlan compiled;
-  Plan& plan = compiled.plan;
-  plan.domain = domain.name;
-  plan.domainId = domain.id;
-  plan.level = domain.level;
-  plan.handledFiles = hasLandlock ? Landlock::AllRights(features.landlock) : 0;
-  for (PathRight& right : paths.rights) {
-    right.rights &= plan.handledFiles;
-    if (right.rights != 0) plan.paths.push_back(std::move(right));
-  }
-  plan.bindsChecked = net.bind.isHandled;
-  plan.connectsChecked = net.connect.isHandled;
-  plan.bindPorts = std::move(net.bind.ports);
-  plan.connectPorts = std::move(net.connect.ports);
-  plan.isScoped = features.landlock >= 6;
-  plan.capabilities = capabilities.kept;
-  plan.filter = std::move(calls.program);
-  plan.secret = calls.secret;
-
-  if (!hasLandlock) compiled.gaps.emplace_back(kWithoutLandlock);
-  if (!features.seccomp) compiled.gaps.emplace_back(kWithoutSeccomp);
-
-  FateList pathFates(std::move(paths.fates));
-  FateList callFates(std::move(calls.fates));
-  FateList capabilityFates(std::move(capabilities.fates));
-  FateList netFates(std::move(net.fates));
-  for (const Rule& rule : domain.rules) {
-    RuleFate fate;
-    if (rule.kind == RuleKind::kCapability) {
-      fate = capabilityFates.Take();
-    } else if (rule.kind == RuleKind::kSyscall) {
-      fate = callFates.Take();
-    } else if (rule.kind == RuleKind::kParameterCheck) {
-      fate = IsPortCheck(rule.words[0]) ? netFates.Take() : callFates.Take();
-    } else {
-      fate = pathFates.Take();
-    }
-    const bool isAboutCalls =
-        rule.kind == RuleKind::kSyscall || rule.kind == RuleKind::kParameterCheck;
-    if (IsAboutFiles(rule.kind) && !hasLandlock) GiveUp(&fate, kWithoutLandlock);
-    if (isAboutCalls && !features.seccomp) GiveUp(&fate, kWithoutSeccomp);
-    if (rule.kind == RuleKind::kSyscall && plan.isScoped) fate = WithScope(std::move(fate));
-    compiled.fates.push_back(std::move(fate));
-  }
-  TellOfBroker(domain.name, &compiled.fates);
-  return compiled;
+  return Join(domain, surroundings.features, PlanParts(domain, surroundings));
 }
 
 std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
@@ -181,9 +194,20 @@ bool KeepsBroker(const CompiledPlan& compiled) {
          std::ranges::any_of(compiled.fates, leadsElsewhere) && MayAskBroker(compiled.fates);
 }
 
+std::vector<std::string> CoverageOf(const CompiledPlan& compiled) {
+  std::vector<std::string> lines;
+  for (const std::string& gap : compiled.gaps) lines.push_back(LineOfGap(gap));
+  for (const RuleFate& fate : compiled.fates) lines.push_back(LineOf(fate));
+  return lines;
+}
+
 std::string Explain(const InstalledDomain& domain, const Surroundings& surroundings) {
-  const Parts parts = PlanParts(domain, surroundings);
-  return Dump(parts.paths) + Dump(parts.net) + Dump(parts.capabilities) + Dump(parts.calls);
+  Parts parts = PlanParts(domain, surroundings);
+  std::string text =
+      Dump(parts.paths) + Dump(parts.net) + Dump(parts.capabilities) + Dump(parts.calls);
+  const CompiledPlan compiled = Join(domain, surroundings.features, std::move(parts));
+  for (const std::string& line : CoverageOf(compiled)) text += line + "\n";
+  return text;
 }
 
 }  // namespace Enforce

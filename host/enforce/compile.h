@@ -39,7 +39,11 @@ bool KeepsAllRules(const CompiledPlan& compiled);
 // ask: in an enforcing domain from which another is entered by exec.
 bool KeepsBroker(const CompiledPlan& compiled);
 
-// The same plan for people: what the kernel is told, and what becomes of the rules.
+// For people, a line each: what cannot be refused although no rule is about it, and then what
+// becomes of the rules.
+std::vector<std::string> CoverageOf(const CompiledPlan& compiled);
+
+// The same plan for people: what the kernel is told, and then CoverageOf().
 std::string Explain(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
 
 }  // namespace Enforce

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstddef>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -17,10 +19,23 @@ enum class Fate {
 struct RuleFate {
   Policy::Rule rule;
   Fate fate = Fate::kEnforced;
-  std::string how;  // what differs, for people; empty when nothing does
+  std::string how = {};   // what differs, for people; empty when nothing does
+  std::size_t place = 0;  // of the rule among those of its domain
 };
+
+// Where the rule stands among the rules that it is one of.
+std::size_t PlaceOf(const Policy::Rule& rule, std::span<const Policy::Rule> rules);
+
+// Makes the fate narrowed, unless it is worse, for this reason besides.
+void Narrow(RuleFate& fate, const std::string& reason);
 
 // "enforced", "narrowed" or "notExpressible".
 const char* TextOf(Fate fate);
+
+// A line for people: "narrowed: FILE:LINE: RULE (how it differs)".
+std::string LineOf(const RuleFate& fate);
+
+// A line for people about what cannot be refused although no rule is about it.
+std::string LineOfGap(const std::string& gap);
 
 }  // namespace Enforce

@@ -9,6 +9,7 @@
 #include <cerrno>
 
 #include "host/enforce/kernel.h"
+#include "host/enforce/mount_namespace.h"
 
 namespace Enforce {
 namespace {
@@ -18,19 +19,22 @@ bool MayMount() {
   return mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 || errno == EINVAL;
 }
 
-// True when a child process could make namespaces of these kinds and change mounts in them: some
-// systems give a user namespace that has no rights.
-bool CanMount(int namespaces) {
+// True when a child process does it well.
+template <class Action>
+bool Succeeds(Action action) {
   const pid_t child = fork();
   if (child < 0) return false;
-  if (child == 0) {
-    _exit(unshare(namespaces) == 0 && MayMount() ? 0 : 1);
-  }
+  if (child == 0) _exit(action() ? 0 : 1);
   int status = -1;
   while (waitpid(child, &status, 0) < 0) {
     if (errno != EINTR) return false;
   }
   return WIFEXITED(status) && WEXITSTATUS(status) == 0;
+}
+
+// With namespaces of these kinds: some systems give a user namespace that has no rights.
+bool CanMount(int namespaces) {
+  return Succeeds([namespaces] { return unshare(namespaces) == 0 && MayMount(); });
 }
 
 }  // namespace
@@ -47,6 +51,10 @@ Features ProbeFeatures() {
 Namespace ProbeMounts() {
   if (CanMount(CLONE_NEWNS)) return Namespace::kPrivileged;
   return CanMount(CLONE_NEWUSER | CLONE_NEWNS) ? Namespace::kUser : Namespace::kNone;
+}
+
+bool CanMask() {
+  return Succeeds([] { return EnterMountNamespace() == nullptr; });
 }
 
 }  // namespace Enforce

@@ -26,4 +26,7 @@ enum class Namespace {
 // Tries that out in child processes, for which it waits, and changes nothing for the caller.
 Namespace ProbeMounts();
 
+// True where this process could lay masks over files, for itself alone. Tries that out likewise.
+bool CanMask();
+
 }  // namespace Enforce

@@ -131,8 +131,7 @@ void Read(Reader& reader, PathRight* right) {
 
 void Read(Reader& reader, Mask* mask) {
   mask->path = reader.TakeText();
-  mask->kind =
-      static_cast<MaskKind>(reader.TakeUpTo(static_cast<std::uint8_t>(MaskKind::kReadOnly)));
+  mask->kind = static_cast<MaskKind>(reader.TakeUpTo(static_cast<std::uint8_t>(MaskKind::kNoExec)));
 }
 
 // The shortest way to write down a value that begins with a text.

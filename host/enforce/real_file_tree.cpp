@@ -9,6 +9,8 @@
 
 #include <memory>
 
+#include "host/enforce/features.h"
+
 namespace Enforce {
 namespace {
 
@@ -57,6 +59,11 @@ std::optional<std::vector<std::string>> RealFileTree::List(const std::string& di
     if (names.size() > most) return std::nullopt;
   }
   return names;
+}
+
+bool RealFileTree::CanMask() {
+  if (!canMask) canMask = Enforce::CanMask();
+  return *canMask;
 }
 
 }  // namespace Enforce

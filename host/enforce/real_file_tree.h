@@ -1,5 +1,7 @@
 #pragma once
 
+#include <optional>
+
 #include "host/enforce/plan/path_plan.h"
 
 namespace Enforce {
@@ -10,6 +12,10 @@ class RealFileTree : public FileTree {
   FileKind KindOf(const std::string& path) override;
   std::optional<std::vector<std::string>> List(const std::string& directory,
                                                std::size_t most) override;
+  bool CanMask() override;
+
+ private:
+  std::optional<bool> canMask;
 };
 
 }  // namespace Enforce

@@ -70,10 +70,11 @@ boot_as() {
   exits 0
 }
 
-# inside COMMAND...: with the processes of the machine below the root, for the command alone.
+# inside COMMAND...: below a root that is a mount point, with the processes of the machine, for the command
+# alone.
 inside() {
   # shellcheck disable=SC2016
-  "${before[@]}" "${namespace[@]}" sh -c 'mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}" "$@"
+  "${before[@]}" "${namespace[@]}" sh -c 'mount --bind "$0" "$0" && mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}" "$@"
 }
 
 # on_machine COMMAND...: where the root is that of a machine, with the programs of this one.
@@ -354,6 +355,54 @@ for kind in itertools.cycle(("public", "secret")):
   gets narrowDom ok list=/t/public create=/t/public/created
 }
 
+# too_many: entries of /t, so that it is not taken apart.
+too_many() {
+  touch "$root"/t/entry{1..65}
+}
+
+# is_masked PLACE: narrowDom is kept from /t/secret by a mask, which is shown as PLACE.
+is_masked() {
+  secpolicy run narrowDom --explain
+  exits 0
+  shows "$1"
+}
+
+@test "13 all that may be done above a part that is hidden" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
+  domain wideDom "${calls[@]}" '-r /t rwx'
+  boot_as
+  is_masked "hidden by a mount: /t/secret"
+  refuses EACCES run=/t/secret/program map-executable=/t/secret/program write=/t/secret/file read=/t/secret/file list=/t/secret create=/t/secret/new
+  gets narrowDom EBUSY rmdir=/t/secret rename=/t/secret,/t/moved rename=/t/public,/t/secret exchange=/t/public,/t/secret
+  gets narrowDom ok run=/t/public/program write=/t/public/file list=/t create=/t/new rename=/t/public,/t/other
+}
+
+@test "13 executing in a part that is masked" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret rw'
+  domain wideDom "${calls[@]}" '-r /t rwx'
+  boot_as
+  is_masked "mounted so that nothing is executed: /t/secret"
+  refuses "EACCES|EPERM" run=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program run=/proc/self/root/t/secret/program
+  gets narrowDom ok run=/t/public/program read=/t/secret/file write=/t/secret/file create=/t/secret/new
+}
+
+@test "13 files of a label that is not granted, hidden one by one" {
+  only_root
+  too_many
+  echo content >"$root/t/key"
+  mkdir "$root/dev"
+  mknod "$root/dev/null" c 1 3
+  domain narrowDom "${calls[@]}" '-a public read grant' '-a public list grant' '-a public write grant'
+  domain wideDom "${calls[@]}" '-a public read grant' '-a secret read grant' '-a secret write grant'
+  printf '/t/* public\n/t/key secret\n/t/secret/* secret\n' >"$policy/fileLabels/all"
+  boot_as
+  is_masked "hidden by a mount: /t/key"
+  refuses EACCES read=/t/key write=/t/key read=/t/secret/file
+  gets narrowDom ok read=/t/entry1 list=/t read=/t/public/file
+}
+
 mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_mount grant' '-s mount_setattr grant')
 
 @test "14 mounts over and around a narrower part" {
@@ -367,6 +416,42 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   gets narrowDom EPERM set-mount=/proc "${acts[@]}"
   gets wideDom EPERM "${acts[@]}"
   gets openDom ok set-mount=/proc "${acts[@]}"
+}
+
+@test "14 mounts over and around a part that is masked" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' "${mounting[@]}"
+  boot_as
+  is_masked "hidden by a mount: /t/secret"
+  local acts=(unmount=/t/secret remount=/t/secret set-mount=/t/secret "move-mount=/t/secret,/t/public" "bind-mount=/t/public,/t/secret")
+  gets narrowDom EPERM "${acts[@]}"
+  gets narrowDom EACCES read=/t/secret/file
+  # Where nothing is refused, and these rights are there, all that is no mount yet can be one.
+  ! is_root || gets openDom ok bind-mount=/t/public,/t/secret remount=/t/secret set-mount=/t/secret unmount=/t/secret
+}
+
+@test "14 a part that a domain with these rights could uncover is not masked" {
+  only_root
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' "${mounting[@]}" '-c cap_sys_admin grant'
+  boot_as
+  secpolicy run narrowDom --explain
+  exits 0
+  [[ $output != *"hidden by a mount"* ]]
+  gets narrowDom EACCES read=/t/secret/file read-in-clone=/t,secret/file read-in-one-mount=/t,secret/file read=/t/entry1
+}
+
+@test "15 uncovering a masked part in a user namespace of its own" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' '-s unshare grant' "${mounting[@]}" '-p clone_flags 0x10020000 grant'
+  boot_as
+  as_machine
+  is_masked "hidden by a mount: /t/secret"
+  tries narrowDom unshare-user unmount=/t/secret remount=/t/secret set-mount=/t/secret bind-mount=/t/public,/t/secret read=/t/secret/file
+  answers 0 'unshare-user ok' 'unmount=/t/secret EINVAL' 'remount=/t/secret EPERM' 'set-mount=/t/secret EPERM' \
+    'bind-mount=/t/public,/t/secret EPERM' 'read=/t/secret/file EACCES'
+  tries openDom unshare-user bind-mount=/t/public,/t/secret unmount=/t/secret read=/t/secret/file
+  answers 0 'unshare-user ok' 'bind-mount=/t/public,/t/secret ok' 'unmount=/t/secret ok' 'read=/t/secret/file ok'
 }
 
 @test "15 mounting in a user namespace of its own" {
@@ -758,6 +843,17 @@ reaches() {
   shows "run=/t/public/script ok"
 }
 
+@test "42 executing what is masked as it enters another domain" {
+  too_many
+  local rules=('-r /t rx')
+  domain narrowDom "${calls[@]}" "${rules[@]}" '-d secret openDom exec grant'
+  domain wideDom "${calls[@]}" "${rules[@]}"
+  boot_as
+  is_masked "mounted so that nothing is executed: /t/secret"
+  refuses "EACCES|EPERM" run=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program
+  gets narrowDom ok run=/t/public/program list=/t
+}
+
 # ---- What others hold
 
 @test "44 the memory of others" {
@@ -846,6 +942,35 @@ reaches() {
   boot_as
   gets narrowDom EACCES read-in-clone=/t,secret/file read-in-clone=/t/secret,file read-in-clone=/,t/secret/file
   gets openDom ok read-in-clone=/t,secret/file read-in-clone=/t/secret,file
+}
+
+@test "51 a copy of the mounts without the masks" {
+  too_many
+  local part=('-r /t rw' '-r /t/secret' '-s unshare grant' '-s open_tree grant' '-p clone_flags 0x10020000 grant')
+  domain narrowDom "${calls[@]}" "${part[@]}"
+  boot_as
+  as_machine
+  is_masked "hidden by a mount: /t/secret"
+  gets narrowDom EPERM read-in-clone=/t,secret/file read-in-one-mount=/t,secret/file
+  # It may copy mounts in a namespace of its own, and the masks with them.
+  tries narrowDom unshare-user read-in-clone=/t,secret/file read-in-clone=/t,public/file read-in-one-mount=/t,secret/file
+  answers 0 'unshare-user ok' 'read-in-clone=/t,secret/file EACCES' 'read-in-clone=/t,public/file ok' 'read-in-one-mount=/t,secret/file EINVAL'
+  tries openDom unshare-user read-in-clone=/t,secret/file read-in-one-mount=/t,secret/file
+  answers 0 'unshare-user ok' 'read-in-clone=/t,secret/file ok' 'read-in-one-mount=/t,secret/file ok'
+}
+
+@test "53 a directory from before the masks" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
+  boot_as
+  is_masked "hidden by a mount: /t/secret"
+  exec 7<&0 <"$root/t"
+  tries narrowDom read=/t/public/file
+  exits 126
+  [[ $stderr == "secpolicy-run: descriptor 0 is a directory, which leads past the masks of the domain; start the program without it" ]]
+  gets openDom ok read=/t/public/file
+  exec <&7 7<&-
+  gets narrowDom ok read=/t/public/file
 }
 
 @test "52 a link in place of a rule's path" {

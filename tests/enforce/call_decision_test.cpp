@@ -268,7 +268,7 @@ TEST(PlanCalls, HasAFateForEachRule) {
       }
     }
     std::vector<std::string> told;
-    for (const auto& [rule, fate, how] : PlanCalls(domain).fates) {
+    for (const auto& [rule, fate, how, place] : PlanCalls(domain).fates) {
       told.push_back(rule.Text());
       EXPECT_EQ(how.empty(), fate == Enforce::Fate::kEnforced) << rule.Text();
       EXPECT_TRUE(rule.Grants() || fate == Enforce::Fate::kEnforced) << rule.Text();

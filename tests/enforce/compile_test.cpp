@@ -17,8 +17,10 @@ using Enforce::Features;
 using Enforce::FileKind;
 using ::testing::Each;
 using ::testing::ElementsAre;
+using ::testing::EndsWith;
 using ::testing::Field;
 using ::testing::IsEmpty;
+using ::testing::SizeIs;
 
 // Every path is a directory without entries.
 class EmptyDirectories : public Enforce::FileTree {
@@ -28,6 +30,7 @@ class EmptyDirectories : public Enforce::FileTree {
                                                std::size_t /*most*/) override {
     return std::vector<std::string>();
   }
+  bool CanMask() override { return true; }
 };
 
 Features NewKernel() {
@@ -128,6 +131,48 @@ TEST(Compile, TellsWhatAKernelWithoutFiltersCannotRefuse) {
   features.seccomp = false;
   const CompiledPlan compiled = CompileOn(features, {"-s read grant", "-p set_uid 7 grant"});
   EXPECT_THAT(compiled.fates, Each(Field(&Enforce::RuleFate::fate, Fate::kNotExpressible)));
+}
+
+TEST(Compile, ShowsPeopleWhatBecomesOfAllRules) {
+  EmptyDirectories files;
+  Features features = NewKernel();
+  features.seccomp = false;
+  const Enforce::Surroundings surroundings{.features = features, .places = {}, .files = files};
+  auto domain = DomainOf({"-s kill grant", "-c cap_chown grant", "-r /srv r"});
+  domain.rules[2].origin = {.file = "/etc/policy/testDom", .line = 7};
+  const std::string lines =
+      "notExpressible: files and calls beyond the rules (this kernel filters no system calls)\n"
+      "notExpressible: -s kill grant (this kernel filters no system calls; signals reach only what "
+      "was started with the same entry into the domain)\n"
+      "enforced: -c cap_chown grant\n"
+      "enforced: /etc/policy/testDom:7: -r /srv r\n";
+  std::string shown;
+  const CompiledPlan compiled = Compile(domain, surroundings);
+  for (const std::string& line : CoverageOf(compiled)) shown += line + "\n";
+  EXPECT_EQ(shown, lines);
+  EXPECT_THAT(Explain(domain, surroundings), EndsWith("\nrefused: all others\n" + lines));
+}
+
+// Every path is a directory with too many entries to list.
+class CrowdedDirectories : public EmptyDirectories {
+ public:
+  std::optional<std::vector<std::string>> List(const std::string& /*directory*/,
+                                               std::size_t /*most*/) override {
+    return std::nullopt;
+  }
+};
+
+TEST(Compile, MasksNothingThatTheDomainCouldUncover) {
+  CrowdedDirectories files;
+  const Features features = NewKernel();
+  const auto masksBeside = [&](const std::string& line) {
+    const auto domain = DomainOf({"-r /srv r", "-r /srv/private", line});
+    return Compile(domain, {.features = features, .places = {}, .files = files}).plan.masks;
+  };
+  EXPECT_THAT(masksBeside("-c cap_chown grant"), SizeIs(1));
+  for (const char* capability : {"cap_sys_admin", "cap_dac_read_search", "cap_dac_override"}) {
+    EXPECT_THAT(masksBeside(std::string("-c ") + capability + " grant"), IsEmpty()) << capability;
+  }
 }
 
 }  // namespace

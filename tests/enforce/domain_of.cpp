@@ -36,7 +36,7 @@ Policy::InstalledDomain DomainOf(const std::vector<std::string>& lines) {
 
 std::vector<std::string> Told(const std::vector<Enforce::RuleFate>& fates) {
   std::vector<std::string> told;
-  for (const auto& [rule, fate, how] : fates) {
+  for (const auto& [rule, fate, how, place] : fates) {
     if (fate == Enforce::Fate::kEnforced && how.empty()) continue;
     told.push_back(std::string(TextOf(fate)) + ": " + rule.Text() + " (" + how + ")");
   }

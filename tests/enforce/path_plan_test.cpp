@@ -8,6 +8,7 @@
 
 #include <map>
 #include <random>
+#include <set>
 
 #include "policy/decision.h"
 
@@ -17,6 +18,8 @@ namespace {
 using Enforce::Fate;
 using Enforce::FileKind;
 using Enforce::LabelledPath;
+using Enforce::Mask;
+using Enforce::MaskKind;
 using Enforce::PathPlan;
 using Enforce::PathRight;
 using Policy::FileAccess;
@@ -25,6 +28,7 @@ using Policy::Rule;
 using Policy::RuleKind;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::SizeIs;
 namespace Landlock = Enforce::Landlock;
 
 // ---- Files in memory
@@ -44,15 +48,19 @@ class MemoryTree : public Enforce::FileTree {
         names.push_back(path.substr(path.rfind('/') + 1));
       }
     }
-    if (names.size() > most) return std::nullopt;
+    if (names.size() > most || crowded.contains(directory)) return std::nullopt;
     return names;
   }
+
+  bool CanMask() override { return canMask; }
 
   static std::string ParentOf(const std::string& path) {
     return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));
   }
 
   std::map<std::string, FileKind> kinds = {{"/", FileKind::kDirectory}};
+  std::set<std::string> crowded;  // with too many entries to list
+  bool canMask = true;
 };
 
 MemoryTree Files(std::initializer_list<const char*> directories,
@@ -74,6 +82,11 @@ Rule RuleOf(RuleKind kind, const decltype(Rule::words)& words, bool grant = true
 
 Rule Object(const char* label, const char* access, bool grant = true) {
   return RuleOf(RuleKind::kObjectAccess, {label, access}, grant);
+}
+
+PathPlan PlanPaths(const InstalledDomain& domain, const std::vector<LabelledPath>& places,
+                   MemoryTree& files) {
+  return Enforce::PlanPaths(domain, places, files, true);
 }
 
 InstalledDomain Domain(std::vector<Rule> rules) {
@@ -100,8 +113,7 @@ TEST(PlanPaths, GivesADirectoryToEverythingBeneath) {
   MemoryTree files = Files({"/srv", "/srv/a"}, {"/srv/a/f"});
   const PathPlan plan = PlanPaths(Domain({Path("/srv", "rw")}), {}, files);
   EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/srv", kReading | kWriting}));
-  EXPECT_EQ(HowOf(plan, 0),
-            "narrowed: removing /srv takes the right to remove from the directory above it");
+  EXPECT_EQ(HowOf(plan, 0), "enforced");
 }
 
 TEST(PlanPaths, GivesAFileOnlyWhatFitsIt) {
@@ -116,8 +128,7 @@ TEST(PlanPaths, GivesANarrowerPathMore) {
   EXPECT_THAT(plan.rights,
               ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt/spool", kWriting}));
   EXPECT_EQ(HowOf(plan, 0), "enforced");
-  EXPECT_EQ(HowOf(plan, 1),
-            "narrowed: removing /opt/spool takes the right to remove from the directory above it");
+  EXPECT_EQ(HowOf(plan, 1), "enforced");
 }
 
 TEST(PlanPaths, TakesADirectoryApartWhereANarrowerPathHasLess) {
@@ -132,15 +143,157 @@ TEST(PlanPaths, TakesADirectoryApartWhereANarrowerPathHasLess) {
   EXPECT_EQ(HowOf(plan, 1), "enforced");
 }
 
-TEST(PlanPaths, LeavesALargeDirectoryThatItWouldHaveToTakeApart) {
-  MemoryTree files = Files({"/opt", "/opt/spool"}, {});
-  for (std::size_t count = 0; count < Enforce::kMostSiblings; ++count) {
-    files.kinds["/opt/" + std::to_string(count)] = FileKind::kFile;
+// ---- Directories with too many entries to take them apart
+
+// A directory /opt with more entries than that.
+MemoryTree Crowd(std::initializer_list<const char*> directories,
+                 std::initializer_list<const char*> files) {
+  MemoryTree tree = Files(directories, files);
+  tree.kinds["/opt"] = FileKind::kDirectory;
+  for (std::size_t count = 0; count <= Enforce::kMostSiblings; ++count) {
+    tree.kinds["/opt/" + std::to_string(count)] = FileKind::kFile;
   }
-  const PathPlan plan = PlanPaths(Domain({Path("/opt", "rx"), Path("/opt/spool", "r")}), {}, files);
-  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", kReading}));
-  EXPECT_EQ(HowOf(plan, 0), "narrowed: /opt has more than 64 entries, and some have other rights");
+  return tree;
 }
+
+constexpr char kTooMany[] = "narrowed: /opt has more than 64 entries, and some have other rights";
+
+TEST(PlanPaths, ListsDirectoriesUpToSomeNumberOfEntries) {
+  MemoryTree files = Crowd({"/opt/spool"}, {});
+  files.kinds.erase("/opt/0");
+  files.kinds.erase("/opt/1");
+  const InstalledDomain domain = Domain({Path("/opt", "rx"), Path("/opt/spool", "r")});
+  EXPECT_THAT(PlanPaths(domain, {}, files).masks, IsEmpty());
+  files.kinds["/opt/0"] = FileKind::kFile;
+  EXPECT_THAT(PlanPaths(domain, {}, files).masks, SizeIs(1));
+}
+
+TEST(PlanPaths, MountsWhatIsNotExecuted) {
+  MemoryTree files = Crowd({"/opt/spool"}, {});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "rx"), Path("/opt/spool", "r")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt", Landlock::kExecute}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/spool", MaskKind::kNoExec}));
+  EXPECT_EQ(HowOf(plan, 0), "enforced");
+  EXPECT_EQ(HowOf(plan, 1),
+            "narrowed: /opt/spool is mounted so that nothing there is executed, libraries neither");
+}
+
+TEST(PlanPaths, HidesWhereNothingIsGranted) {
+  MemoryTree files = Crowd({"/opt/spool", "/opt/spool/inner"}, {});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "rwx"), Path("/opt/spool", "")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", kReading | kWriting | Landlock::kExecute}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/spool", MaskKind::kHidden}));
+  EXPECT_EQ(HowOf(plan, 0), "enforced");
+  EXPECT_EQ(HowOf(plan, 1), "enforced");
+}
+
+TEST(PlanPaths, MasksNothingThatCannotBe) {
+  const InstalledDomain domain = Domain({Path("/opt", "rx"), Path("/opt/spool", "r")});
+  MemoryTree files = Crowd({"/opt/spool"}, {});
+  PathPlan plan = Enforce::PlanPaths(domain, {}, files, false);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", kReading}));
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+  files.canMask = false;
+  plan = PlanPaths(domain, {}, files);
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+// No mount keeps from writing to a fifo.
+TEST(PlanPaths, MasksNothingThatIsOnlyWrittenLess) {
+  MemoryTree files = Crowd({"/opt/spool"}, {});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/opt", "rwx"), Path("/opt/spool", "rx")}), {}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", kReading | Landlock::kExecute}));
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+TEST(PlanPaths, MasksForTheRightsForWhichItHelps) {
+  MemoryTree files = Crowd({"/opt/bin", "/opt/spool"}, {});
+  const PathPlan plan = PlanPaths(
+      Domain({Path("/opt", "rwx"), Path("/opt/bin", "rx"), Path("/opt/spool", "rw")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", kReading}, PathRight{"/opt", Landlock::kExecute},
+                          PathRight{"/opt/spool", kWriting}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/spool", MaskKind::kNoExec}));
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+TEST(PlanPaths, MasksNoFileThatARuleNames) {
+  MemoryTree files = Crowd({"/dev"}, {"/opt/secret", "/dev/null"});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "r"), Path("/opt/secret", "")}), {}, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", Landlock::kReadDir}));
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+TEST(PlanPaths, HidesFilesByTheirLabelWhereThereIsADeviceForIt) {
+  MemoryTree files = Crowd({"/dev"}, {"/opt/secret", "/dev/null"});
+  const InstalledDomain domain = Domain({Object("config", "read")});
+  const std::vector<LabelledPath> places = {{"/opt", "config"}, {"/opt/secret", "secret"}};
+  PathPlan plan = PlanPaths(domain, places, files);
+  EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", Landlock::kReadFile}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/secret", MaskKind::kHidden}));
+  files.kinds.erase("/dev/null");
+  plan = PlanPaths(domain, places, files);
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_THAT(plan.masks, IsEmpty());
+}
+
+// Where nothing is executed it may be read, as its rules say.
+TEST(PlanPaths, MountsWhatEntersAnotherDomain) {
+  MemoryTree files = Crowd({}, {"/opt/other"});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/opt", "rx"),
+                        RuleOf(RuleKind::kDomainTransition, {"gate", "otherDom", "exec"})}),
+                {{"/opt/other", "gate"}}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", Landlock::kReadDir},
+                          PathRight{"/opt", Landlock::kReadFile | Landlock::kExecute}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/other", MaskKind::kNoExec}));
+}
+
+TEST(PlanPaths, LetsNobodyMakeWhatAMissingPathRefusesInACrowd) {
+  MemoryTree files = Crowd({}, {});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/opt", "rw"), Path("/opt/private", "")}), {}, files);
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+// Or it would be made anew.
+TEST(PlanPaths, LetsNobodyMoveTheWayToAPathThatIsMasked) {
+  MemoryTree files = Crowd({"/opt/way", "/opt/way/private"}, {});
+  const PathPlan plan =
+      PlanPaths(Domain({Path("/opt", "rw"), Path("/opt/way/private", "")}), {}, files);
+  EXPECT_THAT(plan.rights,
+              ElementsAre(PathRight{"/opt", (kReading | kWriting) & ~Landlock::kRemoveDir}));
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/way/private", MaskKind::kHidden}));
+}
+
+TEST(PlanPaths, LaysNoMoreMasksThanSome) {
+  MemoryTree files = Crowd({}, {});
+  std::vector<LabelledPath> places = {{"/opt", "config"}};
+  for (std::size_t count = 0; count < Enforce::kMostMasks; ++count) {
+    places.push_back({"/opt/d" + std::to_string(count), "secret"});
+    files.kinds[places.back().path] = FileKind::kDirectory;
+  }
+  const InstalledDomain domain = Domain({Object("config", "read")});
+  EXPECT_THAT(PlanPaths(domain, places, files).masks, SizeIs(Enforce::kMostMasks));
+  places.push_back({"/opt/last", "secret"});
+  files.kinds["/opt/last"] = FileKind::kDirectory;
+  const PathPlan plan = PlanPaths(domain, places, files);
+  EXPECT_THAT(plan.masks, IsEmpty());
+  EXPECT_THAT(plan.rights, IsEmpty());
+  EXPECT_EQ(HowOf(plan, 0), kTooMany);
+}
+
+// ---- What is missing, and labels
 
 TEST(PlanPaths, LetsNobodyMakeWhatAMissingPathRefuses) {
   MemoryTree files = Files({"/srv", "/srv/a"}, {"/srv/f"});
@@ -289,6 +442,7 @@ void AddEntries(World& world, const std::string& directory, int depth, Chance& c
     world.files.kinds[path] = isDirectory ? FileKind::kDirectory : FileKind::kFile;
     world.labels[path] =
         chance.Below(4) == 0 ? chance.Of(kLabels) : world.labels[MemoryTree::ParentOf(path)];
+    if (isDirectory && chance.Below(3) == 0) world.files.crowded.insert(path);
     if (isDirectory) AddEntries(world, path, depth + 1, chance);
   }
 }
@@ -320,6 +474,8 @@ World RandomWorld(unsigned int seed) {
   Chance chance(seed);
   World world;
   world.labels["/"] = chance.Of(kLabels);
+  if (chance.Below(3) == 0) world.files.crowded.insert("/");
+  if (chance.Below(2) == 0) world.files.kinds["/dev/null"] = FileKind::kFile;
   AddEntries(world, "/", 0, chance);
   for (const auto& [path, label] : world.labels) {
     const bool isPlace = path == "/" || world.labels[MemoryTree::ParentOf(path)] != label;
@@ -337,12 +493,29 @@ World RandomWorld(unsigned int seed) {
   return world;
 }
 
-bool IsGiven(const PathPlan& plan, std::string path, std::uint64_t right) {
-  for (;; path = MemoryTree::ParentOf(path)) {
+bool IsAtOrBelow(const std::string& path, const std::string& above) {
+  return path == above || path.starts_with(above == "/" ? above : above + "/");
+}
+
+// A mask is also an entry that nobody can remove.
+bool IsTakenByMask(const PathPlan& plan, const std::string& path, std::uint64_t right) {
+  constexpr std::uint64_t kRemoving = Landlock::kRemoveFile | Landlock::kRemoveDir;
+  return std::ranges::any_of(plan.masks, [&](const Mask& mask) {
+    if (!IsAtOrBelow(path, mask.path)) return false;
+    if (mask.kind == MaskKind::kHidden || right == Landlock::kExecute) return true;
+    return mask.path == path && (right & kRemoving) != 0;
+  });
+}
+
+// `path` is what is acted on, `place` where the kernel asks for the right.
+bool IsGiven(const PathPlan& plan, const std::string& path, std::string place,
+             std::uint64_t right) {
+  if (IsTakenByMask(plan, path, right)) return false;
+  for (;; place = MemoryTree::ParentOf(place)) {
     for (const PathRight& given : plan.rights) {
-      if (given.path == path && (given.rights & right) != 0) return true;
+      if (given.path == place && (given.rights & right) != 0) return true;
     }
-    if (path == "/") return false;
+    if (place == "/") return false;
   }
 }
 
@@ -366,24 +539,26 @@ class RandomPaths {
   }
 
   std::size_t Kept() const { return kept; }
+  std::size_t Masks() const { return plan.masks.size(); }
 
  private:
   void CheckFile(const std::string& path, const std::string& label) {
     const bool isDirectory = world.files.kinds[path] == FileKind::kDirectory;
-    const auto ask = [&](FileAccess access, const std::string& at, std::uint64_t right) {
-      Compare(Policy::FileQuestion{.access = access, .path = path, .label = label}, at, right);
+    const auto ask = [&](FileAccess access, std::uint64_t right) {
+      Compare(Policy::FileQuestion{.access = access, .path = path, .label = label}, path, path,
+              right);
     };
-    if (path != "/")
-      ask(FileAccess::kRemove, MemoryTree::ParentOf(path),
-          isDirectory ? Landlock::kRemoveDir : Landlock::kRemoveFile);
+    if (path != "/") {
+      CheckRemoval(path, label, isDirectory ? Landlock::kRemoveDir : Landlock::kRemoveFile);
+    }
     if (!isDirectory) {
-      ask(FileAccess::kRead, path, Landlock::kReadFile);
-      ask(FileAccess::kWrite, path, Landlock::kWriteFile);
-      ask(FileAccess::kExecute, path, Landlock::kExecute);
-      ask(FileAccess::kTruncate, path, Landlock::kTruncate);
+      ask(FileAccess::kRead, Landlock::kReadFile);
+      ask(FileAccess::kWrite, Landlock::kWriteFile);
+      ask(FileAccess::kExecute, Landlock::kExecute);
+      ask(FileAccess::kTruncate, Landlock::kTruncate);
       return;
     }
-    ask(FileAccess::kList, path, Landlock::kReadDir);
+    ask(FileAccess::kList, Landlock::kReadDir);
     for (const char* name : {"new", "e", "z"}) {
       const std::string made = (path == "/" ? "" : path) + "/" + name;
       for (const auto& [what, right] :
@@ -391,14 +566,28 @@ class RandomPaths {
             std::pair("symlink", Landlock::kMakeSym), std::pair("fifo", Landlock::kMakeFifo),
             std::pair("char_device", Landlock::kMakeChar)}) {
         Compare(Policy::CreationQuestion{.what = what, .path = made, .directoryLabel = label}, path,
-                right);
+                path, right);
       }
     }
   }
 
-  void Compare(const Policy::Question& question, const std::string& path, std::uint64_t right) {
+  // The directory above has to have the right as well. Where its rules do not grant it, that is
+  // told of no rule.
+  void CheckRemoval(const std::string& path, const std::string& label, std::uint64_t right) {
+    const std::string above = MemoryTree::ParentOf(path);
+    const auto question = [](const std::string& of, const std::string& itsLabel) {
+      return Policy::FileQuestion{.access = FileAccess::kRemove, .path = of, .label = itsLabel};
+    };
+    const bool isGiven = IsGiven(plan, path, above, right);
+    const auto ofAbove = Decide(question(above, world.labels.at(above)), world.domain);
+    if (!isGiven && (!ofAbove.granted || IsTold(plan, ofAbove))) return;
+    Compare(question(path, label), path, above, right);
+  }
+
+  void Compare(const Policy::Question& question, const std::string& path, const std::string& place,
+               std::uint64_t right) {
     const Policy::Decision decision = Decide(question, world.domain);
-    const bool isGiven = IsGiven(plan, path, right);
+    const bool isGiven = IsGiven(plan, path, place, right);
     if (isGiven == decision.granted) {
       kept += isGiven ? 1 : 0;
       return;
@@ -417,12 +606,15 @@ class RandomPaths {
 
 TEST(PlanPaths, GivesNothingThatTheDecisionRefuses) {
   std::size_t kept = 0;
+  std::size_t masks = 0;
   for (unsigned int seed = 0; seed < 2000 && !HasFailure(); ++seed) {
     RandomPaths paths(seed);
     paths.Check();
     kept += paths.Kept();
+    masks += paths.Masks();
   }
   EXPECT_GT(kept, 20'000U);
+  EXPECT_GT(masks, 200U);
 }
 
 }  // namespace

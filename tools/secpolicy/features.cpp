@@ -65,8 +65,7 @@ ExitCode ShowFates(const std::string& domain, const std::string& format) {
                       {"rules", FatesToJson(compiled.fates)}}
                      .Text();
   } else {
-    for (const auto& gap : compiled.gaps) std::cout << GapText(gap) << '\n';
-    for (const auto& fate : compiled.fates) std::cout << Visible(FateText(fate)) << '\n';
+    for (const std::string& line : CoverageOf(compiled)) std::cout << Visible(line) << '\n';
   }
   return KeepsAllRules(compiled) ? kWell : kFailed;
 }

@@ -66,10 +66,11 @@ std::uint64_t FilterCalls(Plan* plan) {
 void Enter(Plan plan, const Program& program, std::vector<int> keptDescriptors) {
   if (plan.level != Policy::Level::kEnforcing) Start(program, 0, "");
   if (program.descriptor >= 0) keptDescriptors.push_back(program.descriptor);
-  CloseAllBut(std::move(keptDescriptors));
+  CloseAllBut(keptDescriptors);
+  keptDescriptors.insert(keptDescriptors.end(), {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO});
   // Asked first: in a user namespace of one's own one has them all.
   const std::uint64_t kept = plan.capabilities & OwnCapabilities();
-  ApplyMasks(plan.masks);
+  ApplyMasks(plan.masks, keptDescriptors);
   const int ruleset = PrepareRuleset(plan);
   const std::string surroundings = " in the domain " + plan.domain;
   KeepCapabilities(kept);

@@ -1,17 +1,18 @@
 #include "host/enforce/launcher/masking.h"
 
 #include <fcntl.h>
-#include <sched.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <climits>
 #include <cstdint>
 #include <string>
 
 #include "host/enforce/kernel.h"
 #include "host/enforce/launcher/refuse.h"
+#include "host/enforce/mount_namespace.h"
 
 namespace Enforce {
 namespace {
@@ -20,38 +21,6 @@ constexpr std::uint64_t kNothingAllowed =
     MOUNT_ATTR_RDONLY | MOUNT_ATTR_NOEXEC | MOUNT_ATTR_NODEV | MOUNT_ATTR_NOSUID;
 
 [[noreturn]] void RefuseMask(const Mask& mask) { RefuseForErrno("cannot mask " + mask.path); }
-
-void WriteSetting(const char* path, const std::string& value) {
-  const int file = open(path, O_WRONLY | O_CLOEXEC);
-  if (file < 0 || write(file, value.data(), value.size()) < 0) {
-    RefuseForErrno(std::string("cannot write ") + path);
-  }
-  close(file);
-}
-
-// Users and groups have the same numbers inside; those that are not this process's have none.
-void MapOwnIdentity(uid_t user, gid_t group) {
-  const auto sameNumber = [](unsigned int number) {
-    return std::to_string(number) + " " + std::to_string(number) + " 1";
-  };
-  WriteSetting("/proc/self/uid_map", sameNumber(user));
-  WriteSetting("/proc/self/setgroups", "deny");
-  WriteSetting("/proc/self/gid_map", sameNumber(group));
-}
-
-// Mounts are copied, those that were shared so that nothing goes back.
-void EnterMountNamespace() {
-  const uid_t user = geteuid();
-  const gid_t group = getegid();
-  if (unshare(CLONE_NEWNS) == 0) {
-    if (mount(nullptr, "/", nullptr, MS_REC | MS_SLAVE, nullptr) == 0) return;
-    RefuseForErrno("cannot keep masks from the rest of the system; is the root a mount point?");
-  }
-  if (unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0) {
-    RefuseForErrno("cannot mask paths without being root where user namespaces are forbidden");
-  }
-  MapOwnIdentity(user, group);
-}
 
 // A directory in which there is nothing, and that nobody may look into.
 int MakeEmptyDirectory() {
@@ -79,24 +48,23 @@ int CloneWithout(int place, const char* path, std::uint64_t attributes) {
 }
 
 // A device is no device any more where devices are not allowed, and cannot be opened.
+int CloneNullDevice() {
+  struct stat status = {};
+  if (stat("/dev/null", &status) != 0) return -1;
+  if (S_ISCHR(status.st_mode)) return CloneWithout(AT_FDCWD, "/dev/null", kNothingAllowed);
+  errno = ENODEV;
+  return -1;
+}
+
 int MakeHiding(int place) {
   struct stat status = {};
   if (fstat(place, &status) != 0) return -1;
-  if (S_ISDIR(status.st_mode)) return MakeEmptyDirectory();
-  return CloneWithout(AT_FDCWD, "/dev/null", kNothingAllowed);
+  return S_ISDIR(status.st_mode) ? MakeEmptyDirectory() : CloneNullDevice();
 }
 
 // What is to lie over the place, not yet anywhere.
 int MakeTree(MaskKind kind, int place) {
-  switch (kind) {
-    case MaskKind::kHidden:
-      return MakeHiding(place);
-    case MaskKind::kNoExec:
-      return CloneWithout(place, "", MOUNT_ATTR_NOEXEC);
-    case MaskKind::kReadOnly:
-      break;
-  }
-  return CloneWithout(place, "", MOUNT_ATTR_RDONLY);
+  return kind == MaskKind::kHidden ? MakeHiding(place) : CloneWithout(place, "", MOUNT_ATTR_NOEXEC);
 }
 
 void Apply(const Mask& mask) {
@@ -116,12 +84,21 @@ std::string WorkingDirectory() {
   return path;
 }
 
+// What was opened before lies beneath the masks, with all that a directory leads to.
+void RequireNoDirectory(int descriptor) {
+  struct stat status = {};
+  if (fstat(descriptor, &status) != 0 || !S_ISDIR(status.st_mode)) return;
+  Refuse("descriptor " + std::to_string(descriptor) +
+         " is a directory, which leads past the masks of the domain; start the program without it");
+}
+
 }  // namespace
 
-void ApplyMasks(const std::vector<Mask>& masks) {
+void ApplyMasks(const std::vector<Mask>& masks, const std::vector<int>& descriptors) {
   if (masks.empty()) return;
+  for (const int descriptor : descriptors) RequireNoDirectory(descriptor);
   const std::string directory = WorkingDirectory();
-  EnterMountNamespace();
+  if (const char* const failed = EnterMountNamespace()) RefuseForErrno(failed);
   for (const Mask& mask : masks) Apply(mask);
   // Entered again: one that is masked now would still be the one beneath the mask.
   if (chdir(directory.c_str()) != 0) RefuseForErrno("cannot stay in the directory " + directory);

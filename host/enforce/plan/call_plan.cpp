@@ -19,6 +19,7 @@
 #include <utility>
 
 #include "braxo/misc/strcat.h"
+#include "host/enforce/plan/call_remarks.h"
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/system_calls.h"
 #include "policy/call_set.h"
@@ -145,52 +146,6 @@ ValueSet SetOf(std::initializer_list<std::uint32_t> values) {
   for (const std::uint32_t value : values) set = set.With(Single(value));
   return set;
 }
-
-// ---- What is told of rules
-
-// Why rules are less than they say, each reason once with the calls that it is about.
-class Remarks {
- public:
-  void Add(const Rule& rule, const std::string& reason, const std::string& call = {}) {
-    auto& reasons = remarks[&rule];
-    auto known = std::ranges::find(reasons, reason, &Remark::reason);
-    if (known == reasons.end()) known = reasons.insert(known, Remark{reason, {}});
-    if (!call.empty()) known->calls.insert(call);
-  }
-
-  // The domain can do more than the rule says.
-  void Surrender(const Rule& rule, const std::string& reason) {
-    Add(rule, reason);
-    surrendered.insert(&rule);
-  }
-
-  RuleFate FateOf(const Rule& rule) const {
-    const auto known = remarks.find(&rule);
-    if (known == remarks.end()) return {rule, Fate::kEnforced, {}};
-    std::string how;
-    for (const Remark& remark : known->second) {
-      how += how.empty() ? "" : "; ";
-      how += TextOf(remark);
-    }
-    const Fate fate = surrendered.contains(&rule) ? Fate::kNotExpressible : Fate::kNarrowed;
-    return {.rule = rule, .fate = fate, .how = std::move(how)};
-  }
-
- private:
-  struct Remark {
-    std::string reason;
-    std::set<std::string> calls;
-  };
-
-  static std::string TextOf(const Remark& remark) {
-    std::string calls;
-    for (const std::string& call : remark.calls) calls += (calls.empty() ? "" : ", ") + call;
-    return calls.empty() ? remark.reason : StrCat(calls, ": ", remark.reason);
-  }
-
-  std::map<const Rule*, std::vector<Remark>> remarks;
-  std::set<const Rule*> surrendered;
-};
 
 // ---- The plan
 
@@ -508,7 +463,9 @@ class CallPlanner {
     plan.program = std::move(program.instructions);
     plan.secret = program.secret;
     for (const Rule& rule : domain.rules) {
-      if (IsOfThePlan(rule)) plan.fates.push_back(remarks.FateOf(rule));
+      if (!IsOfThePlan(rule)) continue;
+      plan.fates.push_back(remarks.FateOf(rule));
+      plan.fates.back().place = PlaceOf(rule, domain.rules);
     }
     return plan;
   }
@@ -522,7 +479,7 @@ class CallPlanner {
   std::vector<const Rule*> callRules;
   std::map<int, CallVerdict> verdicts;
   std::map<std::string, Check> checks;
-  Remarks remarks;
+  CallRemarks remarks;
 };
 
 }  // namespace

@@ -28,11 +28,12 @@ std::uint64_t GrantedBy(const std::vector<const Rule*>& rules) {
 }
 
 RuleFate FateOf(const Rule& rule, std::uint64_t lost, std::uint64_t known) {
+  RuleFate fate{.rule = rule};
   const std::uint64_t bit = BitOf(rule);
   const bool isKnown = (bit & known) != 0;
-  if (!rule.Grants() || (isKnown && (bit & lost) == 0)) return {rule, Fate::kEnforced, {}};
-  return {rule, Fate::kNarrowed,
-          StrCat(isKnown ? "this user has not " : "this kernel has no ", rule.words[0])};
+  if (!rule.Grants() || (isKnown && (bit & lost) == 0)) return fate;
+  Narrow(fate, StrCat(isKnown ? "this user has not " : "this kernel has no ", rule.words[0]));
+  return fate;
 }
 
 }  // namespace
@@ -45,6 +46,7 @@ CapabilityPlan PlanCapabilities(const Policy::InstalledDomain& domain, std::uint
   CapabilityPlan plan{granted & known & callers, {}};
   for (const Rule* const rule : rules) {
     plan.fates.push_back(FateOf(*rule, granted & ~plan.kept, known));
+    plan.fates.back().place = PlaceOf(*rule, domain.rules);
   }
   return plan;
 }

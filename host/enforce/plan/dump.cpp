@@ -76,16 +76,11 @@ std::string TextOf(const char* name, const PortPlan& plan) {
   return text + "\n";
 }
 
-}  // namespace
-
-std::string Dump(const std::vector<RuleFate>& fates) {
-  std::string text;
-  for (const auto& [rule, fate, how] : fates) {
-    text += StrCat(TextOf(fate), ": ", rule.Text());
-    text += how.empty() ? "\n" : StrCat(" (", how, ")\n");
-  }
-  return text;
+const char* TextOf(MaskKind kind) {
+  return kind == MaskKind::kHidden ? "hidden by a mount" : "mounted so that nothing is executed";
 }
+
+}  // namespace
 
 std::string Dump(const CallPlan& plan) {
   std::map<CallVerdict, std::vector<std::string_view>> calls;
@@ -97,7 +92,7 @@ std::string Dump(const CallPlan& plan) {
     text += StrCat(TextOf(verdict), ": ",
                    Join(names, " ", [](std::string_view name) { return std::string(name); }), "\n");
   }
-  return StrCat(text, "refused: all others\n", Dump(plan.fates));
+  return text + "refused: all others\n";
 }
 
 std::string Dump(const CapabilityPlan& plan) {
@@ -107,11 +102,11 @@ std::string Dump(const CapabilityPlan& plan) {
     if ((plan.kept >> number & 1) != 0) text += StrCat(" ", names[number]);
   }
   if (plan.kept == 0) text += " none";
-  return StrCat(text, "\n", Dump(plan.fates));
+  return text + "\n";
 }
 
 std::string Dump(const NetPlan& plan) {
-  return TextOf(kBindPort, plan.bind) + TextOf(kConnectPort, plan.connect) + Dump(plan.fates);
+  return TextOf(kBindPort, plan.bind) + TextOf(kConnectPort, plan.connect);
 }
 
 std::string Dump(const PathPlan& plan) {
@@ -123,7 +118,8 @@ std::string Dump(const PathPlan& plan) {
     }
     text += '\n';
   }
-  return text + Dump(plan.fates);
+  for (const Mask& mask : plan.masks) text += StrCat(TextOf(mask.kind), ": ", mask.path, "\n");
+  return text;
 }
 
 }  // namespace Enforce

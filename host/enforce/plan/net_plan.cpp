@@ -61,6 +61,7 @@ NetPlan PlanNet(const Policy::InstalledDomain& domain, int landlockAbi) {
   for (const Rule& rule : domain.rules) {
     if (rule.kind != Policy::RuleKind::kParameterCheck || !IsPortCheck(rule.words[0])) continue;
     plan.fates.push_back(FateOf(rule, rule.words[0] == kBindPort ? bind : connect));
+    plan.fates.back().place = PlaceOf(rule, domain.rules);
   }
   return plan;
 }

@@ -1,132 +1,19 @@
 #include "host/enforce/plan/path_plan.h"
 
-#include <sys/socket.h>
-
 #include <algorithm>
-#include <array>
 #include <map>
 #include <memory>
-#include <span>
+#include <optional>
 #include <utility>
 
-#include "host/enforce/plan/value_set.h"
+#include "host/enforce/plan/file_rules.h"
 
 namespace Enforce {
 namespace {
 
 using Policy::InstalledDomain;
-using Policy::Permission;
-using Policy::Permissions;
 using Policy::Rule;
 using Policy::RuleKind;
-using Rights = std::uint64_t;
-
-// These change which entries a directory has, so they also concern what is there already.
-constexpr Rights kEntryRights = Landlock::kRemoveFile | Landlock::kRemoveDir | Landlock::kRefer;
-
-// ---- What the rules say
-
-enum class Verdict { kNone, kGrants, kRefuses };
-
-Verdict Join(Verdict one, Verdict other) {
-  if (one == Verdict::kRefuses || other == Verdict::kRefuses) return Verdict::kRefuses;
-  return one == Verdict::kNone ? other : one;
-}
-
-struct AccessRow {
-  const char* word;  // of rules about labels
-  Permission permission;
-  Rights rights;
-};
-
-constexpr std::array<AccessRow, 6> kAccesses = {{
-    {"read", Permission::kRead, Landlock::kReadFile},
-    {"write", Permission::kWrite, Landlock::kWriteFile | Landlock::kIoctlDev},
-    {"execute", Permission::kExecute, Landlock::kExecute},
-    {"list", Permission::kRead, Landlock::kReadDir},
-    {"remove", Permission::kWrite, kEntryRights},
-    {"truncate", Permission::kWrite, Landlock::kTruncate},
-}};
-
-struct CreationRow {
-  RuleKind kind;
-  const char* word;
-  Rights rights;
-  bool byPath;  // writing to a directory makes them
-};
-
-constexpr std::array<CreationRow, 9> kCreations = {{
-    {RuleKind::kFileCreation, "regular", Landlock::kMakeReg, true},
-    {RuleKind::kFileCreation, "directory", Landlock::kMakeDir, true},
-    {RuleKind::kFileCreation, "symlink", Landlock::kMakeSym, true},
-    {RuleKind::kFileCreation, "fifo", Landlock::kMakeFifo, true},
-    {RuleKind::kFileCreation, "char_device", Landlock::kMakeChar, false},
-    {RuleKind::kFileCreation, "block_device", Landlock::kMakeBlock, false},
-    {RuleKind::kUnixSocketCreation, "stream", Landlock::kMakeSock, true},
-    {RuleKind::kUnixSocketCreation, "dgram", Landlock::kMakeSock, true},
-    {RuleKind::kUnixSocketCreation, "seqpacket", Landlock::kMakeSock, true},
-}};
-constexpr std::size_t kFirstSocketKind = 6;
-
-// What rules say of everything that has one label.
-struct LabelRules {
-  std::array<Verdict, kAccesses.size()> accesses = {};
-  std::array<Verdict, kCreations.size()> creations = {};
-  bool isTransition = false;  // executing it enters another domain
-};
-
-using RulesByLabel = std::map<std::string, LabelRules, std::less<>>;
-
-void NoteCreation(const Rule& rule, LabelRules& label) {
-  const std::string& word = rule.words[rule.kind == RuleKind::kFileCreation ? 2 : 1];
-  for (std::size_t index = 0; index < kCreations.size(); ++index) {
-    if (kCreations[index].kind != rule.kind || kCreations[index].word != word) continue;
-    // Each is about another new label: one that grants is enough.
-    Verdict& verdict = label.creations[index];
-    if (rule.Grants() || verdict == Verdict::kNone) {
-      verdict = rule.Grants() ? Verdict::kGrants : Verdict::kRefuses;
-    }
-  }
-}
-
-void NoteAccess(const Rule& rule, LabelRules& label) {
-  for (std::size_t index = 0; index < kAccesses.size(); ++index) {
-    if (kAccesses[index].word != rule.words[1]) continue;
-    label.accesses[index] =
-        Join(label.accesses[index], rule.Grants() ? Verdict::kGrants : Verdict::kRefuses);
-  }
-}
-
-// What is refused to any label.
-LabelRules WorstOf(const RulesByLabel& labels) {
-  LabelRules worst;
-  for (const auto& [name, label] : labels) {
-    worst.isTransition = worst.isTransition || label.isTransition;
-    for (std::size_t index = 0; index < kAccesses.size(); ++index) {
-      if (label.accesses[index] == Verdict::kRefuses) worst.accesses[index] = Verdict::kRefuses;
-    }
-    for (std::size_t index = 0; index < kCreations.size(); ++index) {
-      if (label.creations[index] == Verdict::kRefuses) worst.creations[index] = Verdict::kRefuses;
-    }
-  }
-  return worst;
-}
-
-RulesByLabel ReadLabelRules(const InstalledDomain& domain) {
-  RulesByLabel labels;
-  for (const Rule& rule : domain.rules) {
-    const std::string& label = rule.words[0];
-    if (rule.kind == RuleKind::kObjectAccess) NoteAccess(rule, labels[label]);
-    if (rule.kind == RuleKind::kFileCreation || rule.kind == RuleKind::kUnixSocketCreation) {
-      NoteCreation(rule, labels[label]);
-    }
-    const bool isWayIn = rule.kind == RuleKind::kDomainTransition && rule.Grants() &&
-                         rule.words[2] == "exec" && rule.words[1] != domain.name;
-    if (isWayIn) labels[label].isTransition = true;
-  }
-  labels[std::string(kUnknownLabel)] = WorstOf(labels);
-  return labels;
-}
 
 // ---- The tree of places where rights may change
 
@@ -160,14 +47,6 @@ Node TreeOf(const InstalledDomain& domain, const std::vector<LabelledPath>& plac
   return root;
 }
 
-// What decides over a file: the rule about its path, and its label.
-struct Region {
-  const Rule* rule = nullptr;
-  std::string_view label;
-
-  auto operator<=>(const Region&) const = default;
-};
-
 Region RegionOf(const Node& node, Region above) {
   if (node.rule != nullptr) above.rule = node.rule;
   if (node.label) above.label = *node.label;
@@ -182,120 +61,33 @@ std::string Join(const std::string& directory, const std::string& name) {
 
 class Planner {
  public:
-  Planner(const InstalledDomain& planned, const std::vector<LabelledPath>& places, FileTree& tree)
+  Planner(const InstalledDomain& planned, const std::vector<LabelledPath>& places, FileTree& tree,
+          bool masksCount)
       : domain(planned),
         files(tree),
-        labels(ReadLabelRules(planned)),
+        rules(planned, losses),
         root(TreeOf(planned, places)),
-        socketKinds(SocketKinds(planned)) {}
+        mayMask(masksCount) {}
 
   PathPlan Run() {
     Examine(root, "/", {});
-    Place(root, "/", {}, 0);
-    return {std::move(rights), Fates()};
+    Place(root, "/", 0);
+    return {std::move(rights), std::move(masks), Fates()};
   }
 
  private:
   // What is known of a node before rights are given.
   struct Finding {
     FileKind kind = FileKind::kNothing;
+    Region region;
     Rights own = 0;   // what the file itself may be used for, and what is to come beneath it
     Rights here = 0;  // of these, what all beneath it has too
+    Rights any = 0;   // what anything has that is there: the file, or one beneath it
   };
 
-  // The kinds of unix sockets that the domain can make at all, as their numbers are for the kernel.
-  static std::array<bool, 3> SocketKinds(const InstalledDomain& domain) {
-    constexpr std::array<std::uint32_t, 3> kTypes = {SOCK_STREAM, SOCK_DGRAM, SOCK_SEQPACKET};
-    const ValueSet passing = PassingValues(RulesOfCheck(domain.rules, "socket_type"));
-    std::array<bool, 3> kinds = {};
-    for (std::size_t index = 0; index < kTypes.size(); ++index) {
-      kinds[index] = passing.Has(kTypes[index]);
-    }
-    return kinds;
-  }
-
-  Verdict PathVerdict(const Region& region, Permission permission) const {
-    if (region.rule == nullptr) return Verdict::kNone;
-    return region.rule->Permits().Has(permission) ? Verdict::kGrants : Verdict::kRefuses;
-  }
-
-  const LabelRules& RulesOf(std::string_view label) const {
-    static const LabelRules none;
-    const auto found = labels.find(label);
-    return found == labels.end() ? none : found->second;
-  }
-
-  bool MayMake(const Region& region, std::size_t index) const {
-    Verdict verdict = PathVerdict(region, Permission::kWrite);
-    if (!kCreations[index].byPath && verdict == Verdict::kGrants) verdict = Verdict::kNone;
-    return Join(verdict, RulesOf(region.label).creations[index]) == Verdict::kGrants;
-  }
-
-  // A kind of socket cannot be told from others, but by what the domain can make.
-  bool MayMakeSockets(const Region& region) const {
-    bool any = false;
-    for (std::size_t kind = 0; kind < socketKinds.size(); ++kind) {
-      if (!socketKinds[kind]) continue;
-      if (!MayMake(region, kFirstSocketKind + kind)) return false;
-      any = true;
-    }
-    return any;
-  }
-
-  Rights ComputeRights(const Region& region) {
-    const LabelRules& label = RulesOf(region.label);
-    Rights granted = 0;
-    for (std::size_t index = 0; index < kAccesses.size(); ++index) {
-      const Verdict byPath = PathVerdict(region, kAccesses[index].permission);
-      if (Join(byPath, label.accesses[index]) == Verdict::kGrants) {
-        granted |= kAccesses[index].rights;
-      }
-    }
-    for (std::size_t index = 0; index < kFirstSocketKind; ++index) {
-      if (MayMake(region, index)) granted |= kCreations[index].rights;
-    }
-    if (MayMakeSockets(region)) {
-      granted |= Landlock::kMakeSock;
-    } else {
-      NoteSocketKinds(region);
-    }
-    if ((granted & (Landlock::kMakeReg | Landlock::kMakeDir)) != 0) granted |= Landlock::kRefer;
-    return Restrict(region, granted);
-  }
-
-  // What the kernel cannot tell apart is not granted.
-  Rights Restrict(const Region& region, Rights granted) {
-    if (RulesOf(region.label).isTransition) {
-      Lose(region, granted & (Landlock::kReadFile | Landlock::kExecute),
-           "files labelled " + std::string(region.label) +
-               " enter another domain by \"secpolicy exec\", so they are neither executed nor "
-               "read here");
-      granted &= ~(Landlock::kReadFile | Landlock::kExecute);
-    }
-    const bool isUnreadable =
-        (granted & Landlock::kExecute) != 0 && (granted & Landlock::kReadFile) == 0;
-    if (isUnreadable) {
-      Lose(region, Landlock::kExecute,
-           "the kernel reads a program to execute it, and this one may not be read",
-           Fate::kNotExpressible);
-      granted &= ~Landlock::kExecute;
-    }
-    return granted;
-  }
-
-  void NoteSocketKinds(const Region& region) {
-    for (std::size_t kind = 0; kind < socketKinds.size(); ++kind) {
-      if (!socketKinds[kind] || !MayMake(region, kFirstSocketKind + kind)) continue;
-      Lose(region, Landlock::kMakeSock,
-           "kinds of unix sockets are not told apart: it takes socket_type rules that grant no "
-           "other kind");
-    }
-  }
-
-  Rights RightsOf(const Region& region) {
-    const auto known = regions.find(region);
-    if (known != regions.end()) return known->second;
-    return regions.emplace(region, ComputeRights(region)).first->second;
+  // Of rights that a directory is to have with all that is beneath it, those that its kind has.
+  static Rights Fitting(FileKind kind) {
+    return kind == FileKind::kDirectory ? ~Rights{0} : Landlock::kOfFiles;
   }
 
   // Beneath a file is nothing that rights to directories are about.
@@ -305,78 +97,85 @@ class Planner {
                : finding.here | ~Landlock::kOfFiles;
   }
 
+  static Rights AnyOf(const Finding& finding) {
+    const bool isThere = finding.kind == FileKind::kDirectory || finding.kind == FileKind::kFile;
+    return isThere ? finding.own & Fitting(finding.kind) : 0;
+  }
+
   Rights Examine(const Node& node, const std::string& path, const Region& above) {
-    const Region region = RegionOf(node, above);
-    Finding finding{.kind = files.KindOf(path)};
-    finding.own = RightsOf(region);
+    Finding finding{.kind = files.KindOf(path), .region = RegionOf(node, above)};
+    finding.own = rules.RightsOf(finding.region);
     finding.here = finding.own;
+    finding.any = AnyOf(finding);
     for (const auto& [name, child] : node.children) {
-      const Rights beneath = Examine(*child, Join(path, name), region);
+      const Rights beneath = Examine(*child, Join(path, name), finding.region);
       if (finding.kind == FileKind::kFile) continue;
+      const Finding& found = findings.at(child.get());
+      finding.any |= found.any;
       // An entry is removed by its own rights, whatever lies beneath it.
-      const Rights entry = findings[child.get()].own | ~kEntryRights;
-      finding.here &= beneath & entry;
+      finding.here &= beneath & (found.own | ~kEntryRights);
     }
     findings[&node] = finding;
     if (finding.kind == FileKind::kLink) return ~Rights{0};
     return Beneath(finding);
   }
 
-  void Place(const Node& node, const std::string& path, const Region& above, Rights have) {
-    const Region region = RegionOf(node, above);
-    const Finding& finding = findings[&node];
-    const Rights fitting = finding.kind == FileKind::kDirectory ? ~Rights{0} : Landlock::kOfFiles;
-    if (&node != &root) LoseEntry(region, finding.own & kEntryRights & ~have, path);
+  void Place(const Node& node, const std::string& path, Rights have) {
+    const Finding& finding = findings.at(&node);
     if (finding.kind == FileKind::kLink) return;
     if (finding.kind == FileKind::kNothing) {
-      if (node.rule != nullptr) LoseMissing(region, finding.own & ~have);
+      if (node.rule != nullptr) LoseMissing(finding.region, finding.own & ~have);
     } else {
-      Give(path, region, finding.here & fitting & ~have);
+      Give(path, finding.region, finding.here & Fitting(finding.kind) & ~have);
       have |= finding.here;
     }
-    const Rights apart = finding.own & fitting & ~have;
-    if (apart != 0 && finding.kind == FileKind::kDirectory) TakeApart(node, path, region, apart);
-    for (const auto& [name, child] : node.children) {
-      Place(*child, Join(path, name), region, have);
+    if (finding.kind == FileKind::kDirectory) {
+      const Rights apart = finding.own & ~have;
+      if (apart != 0) have |= Divide(node, path, apart);
     }
-  }
-
-  // The kernel asks the directory above whether its entries may go.
-  void LoseEntry(const Region& region, Rights lost, const std::string& path) {
-    if (lost == 0) return;
-    Lose(region, lost,
-         "removing " + path + " takes the right to remove from the directory above it");
+    for (const auto& [name, child] : node.children) Place(*child, Join(path, name), have);
   }
 
   void LoseMissing(const Region& region, Rights lost) {
-    Lose(region, lost, "there is nothing at " + region.rule->words[0] + ", or only a link");
+    losses.Lose(region, lost, "there is nothing at " + region.rule->words[0] + ", or only a link");
   }
 
   void Give(const std::string& path, const Region& region, Rights given,
             bool mayBeMissing = false) {
     if (given == 0) return;
     if (rights.size() == kMostPathRights) {
-      Lose(region, given,
-           "it takes more than " + std::to_string(kMostPathRights) + " rights to paths");
+      losses.Lose(region, given,
+                  "it takes more than " + std::to_string(kMostPathRights) + " rights to paths");
       return;
     }
     rights.push_back({path, given, mayBeMissing});
   }
 
-  // What is beneath the directory does not all have the rights: each entry gets them that does.
-  void TakeApart(const Node& node, const std::string& path, const Region& region, Rights apart) {
-    const auto entries = files.List(path, kMostSiblings);
-    if (!entries) {
-      Lose(region, apart,
-           path + " has more than " + std::to_string(kMostSiblings) +
-               " entries, and some have other rights");
-      return;
+  // What is beneath the directory does not all have the rights `apart`. Returns those of them that
+  // it has been given with all that is beneath it.
+  Rights Divide(const Node& node, const std::string& path, Rights apart) {
+    const Region& region = findings.at(&node).region;
+    if (const auto entries = files.List(path, kMostSiblings)) {
+      TakeApart(node, path, *entries, apart);
+      return 0;
     }
-    Lose(region, apart,
-         "entries of " + path +
-             " have different rights: those that are there at "
-             "the start have theirs, new ones and the directory itself do not");
-    for (const std::string& name : *entries) {
+    const Rights given = MaskBeneath(node, path, apart);
+    Give(path, region, given);
+    losses.Lose(region, apart & ~given,
+                path + " has more than " + std::to_string(kMostSiblings) +
+                    " entries, and some have other rights");
+    return given;
+  }
+
+  // Each entry gets the rights that has them.
+  void TakeApart(const Node& node, const std::string& path, const std::vector<std::string>& entries,
+                 Rights apart) {
+    const Region& region = findings.at(&node).region;
+    losses.Lose(region, apart,
+                "entries of " + path +
+                    " have different rights: those that are there at "
+                    "the start have theirs, new ones and the directory itself do not");
+    for (const std::string& name : entries) {
       if (node.children.contains(name)) continue;
       const std::string entry = Join(path, name);
       const FileKind kind = files.KindOf(entry);
@@ -386,87 +185,101 @@ class Planner {
     }
   }
 
-  // ---- What is not as the rules say
+  // ---- Masks
 
-  struct Loss {
-    Rights rights = 0;
-    Fate fate = Fate::kNarrowed;
-    std::string how;
+  struct LaidMask {
+    Mask mask;
+    const Finding* over;
   };
 
-  void Lose(const Region& region, Rights lost, const std::string& how,
-            Fate fate = Fate::kNarrowed) {
-    if (lost == 0) return;
-    Note(pathLosses[region.rule], {lost, fate, how});
-    Note(labelLosses[region.label], {lost, fate, how});
-  }
+  // What a mask takes away from its place, and from all that is beneath it.
+  struct Cover {
+    MaskKind kind;
+    Rights taken;
+    Rights takenBeneath;
+  };
 
-  // Of each fate the first reason is enough for the same rights.
-  static void Note(std::vector<Loss>& losses, Loss loss) {
-    for (const Loss& known : losses) {
-      if (known.fate == loss.fate) loss.rights &= ~known.rights;
+  // Lays masks over what is beneath the directory and lacks some of the rights `apart`. Returns
+  // those that it can be given then.
+  Rights MaskBeneath(const Node& node, const std::string& path, Rights apart) {
+    if (!mayMask || !files.CanMask()) return 0;
+    Rights given = apart;
+    std::vector<LaidMask> laid;
+    for (Rights left = apart; left != 0; given &= ~left) {
+      laid.clear();
+      left = given & LayMasks(node, path, given, true, laid);
     }
-    if (loss.rights != 0) losses.push_back(std::move(loss));
+    if (masks.size() + laid.size() > kMostMasks) return 0;
+    for (const LaidMask& each : laid) {
+      TellOfMask(each);
+      masks.push_back(each.mask);
+    }
+    return given;
   }
 
-  // The rights that a rule grants, if it is about files.
-  static Rights RightsOf(const Rule& rule) {
-    if (!rule.Grants()) return 0;
-    Rights granted = 0;
-    if (rule.kind == RuleKind::kFilePath) {
-      for (const AccessRow& row : kAccesses) {
-        if (rule.Permits().Has(row.permission)) granted |= row.rights;
+  // Adds the masks for all that is beneath the node and lacks some of the rights `wanted`. Returns
+  // those that no mask takes away where they are lacking.
+  Rights LayMasks(const Node& node, const std::string& path, Rights wanted, bool areEntries,
+                  std::vector<LaidMask>& laid) {
+    Rights left = 0;
+    if (wanted == 0) return left;
+    for (const auto& [name, child] : node.children) {
+      const Finding& finding = findings.at(child.get());
+      const std::string place = Join(path, name);
+      const Rights lacking = LackingOf(finding, wanted);
+      const std::optional<Cover> cover = CoverFor(*child, lacking);
+      Rights beneath = wanted;
+      if (cover) {
+        laid.push_back({{place, cover->kind}, &finding});
+        beneath &= ~cover->takenBeneath;
+        // A mask stays where it is, but the directories on the way could be moved, and the path be
+        // made anew.
+        if (child->rule != nullptr && !areEntries) left |= Landlock::kRemoveDir;
       }
-      for (const CreationRow& row : kCreations) {
-        if (row.byPath && rule.Permits().Has(Permission::kWrite)) granted |= row.rights;
-      }
+      left |= lacking & ~(cover ? cover->taken : 0);
+      left |= LayMasks(*child, place, beneath, false, laid);
     }
-    if (rule.kind == RuleKind::kObjectAccess) {
-      for (const AccessRow& row : kAccesses) {
-        if (row.word == rule.words[1]) granted |= row.rights;
-      }
-    }
-    if (rule.kind == RuleKind::kDomainTransition) granted = Landlock::kExecute;
-    for (const CreationRow& row : kCreations) {
-      if (row.kind != rule.kind) continue;
-      if (row.word == rule.words[rule.kind == RuleKind::kFileCreation ? 2 : 1]) {
-        granted |= row.rights;
-      }
-    }
-    return granted;
+    return left;
   }
 
-  std::span<const Loss> LossesOf(const Rule& rule) const {
-    if (rule.kind == RuleKind::kFilePath) {
-      const auto found = pathLosses.find(&rule);
-      return found == pathLosses.end() ? std::span<const Loss>() : found->second;
-    }
-    const auto found = labelLosses.find(std::string_view(rule.words[0]));
-    return found == labelLosses.end() ? std::span<const Loss>() : found->second;
+  static Rights LackingOf(const Finding& finding, Rights wanted) {
+    if (finding.kind == FileKind::kFile) wanted &= Landlock::kOfFiles | kEntryRights;
+    if (finding.kind == FileKind::kLink) wanted &= kEntryRights;
+    return wanted & ~finding.own;
   }
 
-  RuleFate FateOf(const Rule& rule) const {
-    const bool isWayIn = rule.kind == RuleKind::kDomainTransition && rule.Grants();
-    if (isWayIn && rule.words[2] != "exec") {
-      return {rule, Fate::kNarrowed, "only services of this host enter a domain this way"};
-    }
-    if (isWayIn) return {rule, Fate::kNarrowed, "only by \"secpolicy exec\""};
-    RuleFate fate{rule, Fate::kEnforced, ""};
-    const Rights granted = RightsOf(rule);
-    for (const Loss& loss : LossesOf(rule)) {
-      if ((loss.rights & granted) != 0 && loss.fate > fate.fate) fate = {rule, loss.fate, loss.how};
-    }
-    if (GivesNewLabel(rule)) {
-      fate.fate = std::max(fate.fate, Fate::kNarrowed);
-      fate.how += fate.how.empty() ? "" : "; ";
-      fate.how += "what is made has the label of its directory, as the kernel gives none";
-    }
-    return fate;
+  std::optional<Cover> CoverFor(const Node& node, Rights lacking) {
+    const Finding& finding = findings.at(&node);
+    const bool isFile = finding.kind == FileKind::kFile;
+    if (lacking == 0 || (!isFile && finding.kind != FileKind::kDirectory)) return std::nullopt;
+    // Whoever changes a file replaces it, as a rule, and the new one would have no mask. By its
+    // label it has the directory's then, but its path is still the one that a rule is about.
+    if (isFile && node.rule != nullptr) return std::nullopt;
+    constexpr Rights kAll = ~Rights{0};
+    const Rights starting = StartingTakenBy(finding);
+    const bool isHidden = finding.any == 0 && (lacking & ~starting) != 0;
+    if (isHidden && (!isFile || HasNullDevice())) return Cover{MaskKind::kHidden, kAll, kAll};
+    if (starting == 0) return std::nullopt;
+    return Cover{MaskKind::kNoExec, starting, Landlock::kExecute};
   }
 
-  static bool GivesNewLabel(const Rule& rule) {
-    return rule.kind == RuleKind::kFileCreation && rule.Grants() && rule.words[0] != rule.words[1];
+  // Where nothing can be executed, who reads a program cannot start it past its label.
+  Rights StartingTakenBy(const Finding& finding) {
+    if ((finding.any & Landlock::kExecute) != 0) return 0;
+    return Landlock::kExecute | (rules.WithheldOf(finding.region) & Landlock::kReadFile);
   }
+
+  // It is what lies over files that are hidden.
+  bool HasNullDevice() { return files.KindOf("/dev/null") == FileKind::kFile; }
+
+  void TellOfMask(const LaidMask& laid) {
+    if (laid.mask.kind != MaskKind::kNoExec) return;
+    losses.Lose(
+        laid.over->region, laid.over->own & Landlock::kReadFile,
+        laid.mask.path + " is mounted so that nothing there is executed, libraries neither");
+  }
+
+  // ---- What becomes of the rules
 
   std::vector<RuleFate> Fates() const {
     std::vector<RuleFate> fates;
@@ -477,7 +290,8 @@ class Planner {
         case RuleKind::kFileCreation:
         case RuleKind::kFilePath:
         case RuleKind::kUnixSocketCreation:
-          fates.push_back(FateOf(rule));
+          fates.push_back(losses.FateOf(rule));
+          fates.back().place = PlaceOf(rule, domain.rules);
           break;
         case RuleKind::kCapability:
         case RuleKind::kParameterCheck:
@@ -490,21 +304,20 @@ class Planner {
 
   const InstalledDomain& domain;
   FileTree& files;
-  const RulesByLabel labels;
+  PathLosses losses;
+  FileRules rules;
   const Node root;
-  const std::array<bool, 3> socketKinds;
-  std::map<Region, Rights> regions;
+  const bool mayMask;
   std::map<const Node*, Finding> findings;
-  std::map<const Rule*, std::vector<Loss>> pathLosses;
-  std::map<std::string_view, std::vector<Loss>> labelLosses;
   std::vector<PathRight> rights;
+  std::vector<Mask> masks;
 };
 
 }  // namespace
 
 PathPlan PlanPaths(const InstalledDomain& domain, const std::vector<LabelledPath>& places,
-                   FileTree& files) {
-  return Planner(domain, places, files).Run();
+                   FileTree& files, bool mayMask) {
+  return Planner(domain, places, files, mayMask).Run();
 }
 
 }  // namespace Enforce

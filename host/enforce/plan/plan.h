@@ -9,23 +9,10 @@
 
 #include "host/enforce/plan/entry_secret.h"
 #include "host/enforce/plan/landlock.h"
+#include "host/enforce/plan/mask.h"
 #include "policy/level.h"
 
 namespace Enforce {
-
-enum class MaskKind : std::uint8_t {
-  kHidden,    // an empty place that nothing can be done with
-  kNoExec,    // what is there cannot be executed
-  kReadOnly,  // what is there cannot be changed
-};
-
-// A path at which a domain may do less than a wider right says.
-struct Mask {
-  std::string path;
-  MaskKind kind = MaskKind::kHidden;
-
-  bool operator==(const Mask&) const = default;
-};
 
 // All that confines a process to a domain, as the kernel takes it. Paths are absolute, and no part
 // of them is a link.

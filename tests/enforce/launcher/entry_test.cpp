@@ -90,7 +90,7 @@ TEST_P(Entry, LeavesNoneOfItsOwn) {
   plan.filter = FilterWithout({});
   plan.paths.push_back({tree / "kept", AllRights()});
   if (Enforce::ProbeMounts() != Enforce::Namespace::kNone) {
-    plan.masks = {{tree / "open", Enforce::MaskKind::kReadOnly}};
+    plan.masks = {{tree / "open", Enforce::MaskKind::kNoExec}};
   }
   Launch launch{user, {"--plan", WritePlan(tree, plan)}, {ProbePath()}};
   std::string expected;

@@ -31,7 +31,7 @@ Plan SamplePlan() {
   plan.bindPorts = {22, 2222};
   plan.connectPorts = {65535};
   plan.isScoped = true;
-  plan.masks = {{"/etc/ssh/keys", MaskKind::kHidden}, {"/etc/ssh/bin", MaskKind::kReadOnly}};
+  plan.masks = {{"/etc/ssh/keys", MaskKind::kHidden}, {"/etc/ssh/bin", MaskKind::kNoExec}};
   plan.capabilities = std::uint64_t{1} << 40 | 1;
   plan.filter = {BPF_STMT(BPF_LD | BPF_W | BPF_ABS, 4),
                  BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, 1, 2, 3),
@@ -160,7 +160,7 @@ TEST(PlanFile, ContradictsItself) {
       {"a level that there is not",
        [](Plan* plan) { plan->level = static_cast<Policy::Level>(3); }},
       {"a mask that there is not",
-       [](Plan* plan) { plan->masks[1].kind = static_cast<MaskKind>(3); }},
+       [](Plan* plan) { plan->masks[1].kind = static_cast<MaskKind>(2); }},
   };
   for (const auto& [name, change] : changes) {
     Plan plan = SamplePlan();

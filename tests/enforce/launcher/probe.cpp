@@ -239,6 +239,12 @@ long ReadInClonedTree(const Words& words) {
   return tree < 0 ? -1 : openat(tree, words.Second(), O_RDONLY);
 }
 
+// Without the mounts that lie in it.
+long ReadInClonedMount(const Words& words) {
+  const int mount = open_tree(AT_FDCWD, words.First(), OPEN_TREE_CLONE);
+  return mount < 0 ? -1 : openat(mount, words.Second(), O_RDONLY);
+}
+
 long EnterMountsOf(const Words& words) {
   const std::string path = "/proc/" + words.first + "/ns/mnt";
   const int mounts = open(path.c_str(), O_RDONLY);
@@ -453,6 +459,7 @@ const NamedOperation kOperations[] = {
     {"move-mount", MoveMount},
     {"set-mount", SetMountAttributes},
     {"read-in-clone", ReadInClonedTree},
+    {"read-in-one-mount", ReadInClonedMount},
     {"setns-of", EnterMountsOf},
     {"clone", Clone},
     {"clone3", CloneByStruct},

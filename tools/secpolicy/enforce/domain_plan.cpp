@@ -12,7 +12,6 @@
 namespace SecPolicyCli {
 namespace {
 
-using Enforce::Fate;
 using Enforce::LabelIndex;
 using Enforce::LabelledPath;
 using Enforce::RuleFate;
@@ -80,20 +79,6 @@ Enforce::CompiledPlan PlanOf(const std::string& domain,
 
 std::string ExplanationOf(const std::string& domain, SecPolicy::TeskAccessInterfaceImpl& access) {
   return WithSources(domain, access, Enforce::Explain);
-}
-
-std::string FateText(const RuleFate& fate) {
-  std::string text = std::string(TextOf(fate.fate)) + ": ";
-  if (!fate.rule.origin.file.empty()) {
-    text += fate.rule.origin.file + ":" + std::to_string(fate.rule.origin.line) + ": ";
-  }
-  text += fate.rule.Text();
-  return fate.how.empty() ? text : text + " (" + fate.how + ")";
-}
-
-std::string GapText(const std::string& gap) {
-  return std::string(TextOf(Fate::kNotExpressible)) + ": files and calls beyond the rules (" + gap +
-         ")";
 }
 
 Json FatesToJson(const std::vector<RuleFate>& fates) {

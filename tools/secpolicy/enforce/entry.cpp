@@ -19,9 +19,9 @@ namespace {
 bool MaySurrender(const std::string& verb, const Enforce::CompiledPlan& compiled,
                   const EntryOptions& options) {
   if (compiled.plan.level != Policy::Level::kEnforcing || KeepsAllRules(compiled)) return true;
-  for (const std::string& gap : compiled.gaps) std::cerr << GapText(gap) << '\n';
+  for (const std::string& gap : compiled.gaps) std::cerr << Enforce::LineOfGap(gap) << '\n';
   for (const Enforce::RuleFate& fate : NotExpressible(compiled.fates)) {
-    std::cerr << Visible(FateText(fate)) << '\n';
+    std::cerr << Visible(LineOf(fate)) << '\n';
   }
   if (options.bestEffort) return true;
   std::cerr << "secpolicy: " << verb << ": the rules of " << compiled.plan.domain
