@@ -854,6 +854,18 @@ reaches() {
   gets narrowDom ok run=/t/public/program list=/t
 }
 
+@test "42 a broker starts what is masked for who asks" {
+  too_many
+  cp "$programs/secpolicy-run" "$root/t/public/ask"
+  domain narrowDom "${calls[@]}" '-s sendmsg grant' '-r /t rx' '-d secret secretDom exec grant'
+  domain secretDom "${calls[@]}" '-r /t/secret rx'
+  boot_as
+  as_machine
+  is_masked "mounted so that nothing is executed: /t/secret"
+  secpolicy run narrowDom -- /t/public/ask --ask -- /t/secret/program read=/t/secret/file read=/t/public/file
+  answers 0 'read=/t/secret/file ok' 'read=/t/public/file EACCES'
+}
+
 # ---- What others hold
 
 @test "44 the memory of others" {

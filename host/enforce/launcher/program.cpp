@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -18,12 +19,22 @@ namespace {
 
 constexpr char kUsualPath[] = "/bin:/usr/bin";
 
+// True for a program that only a mount keeps from being executed: a broker outside may start it.
+bool IsMasked(const std::string& path, const struct stat& status) {
+  constexpr mode_t kExecutable = S_IXUSR | S_IXGRP | S_IXOTH;
+  struct statvfs mount = {};
+  return (status.st_mode & kExecutable) != 0 && statvfs(path.c_str(), &mount) == 0 &&
+         (mount.f_flag & ST_NOEXEC) != 0;
+}
+
 // 0 when the path leads to a program, else the system error that tells why not.
 int ReasonAgainst(const std::string& path) {
   struct stat status = {};
   if (stat(path.c_str(), &status) != 0) return errno;
   if (!S_ISREG(status.st_mode)) return EACCES;
-  return access(path.c_str(), X_OK) == 0 ? 0 : errno;
+  if (access(path.c_str(), X_OK) == 0) return 0;
+  const int reason = errno;
+  return reason == EACCES && IsMasked(path, status) ? 0 : reason;
 }
 
 // A part of PATH that is empty is the working directory.
