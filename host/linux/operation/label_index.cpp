@@ -8,9 +8,11 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -105,14 +107,21 @@ bool MakeIndex(HostState& state) {
   return true;
 }
 
+// Two that make one at the same time would spoil each other's for ever if they kept pace.
+void LetOthersGoFirst(int tries) {
+  const std::int64_t longest = std::int64_t{8} << tries;
+  std::this_thread::sleep_for(std::chrono::milliseconds(NewSerial() % longest));
+}
+
 }  // namespace
 
 bool RefreshLabelIndex() {
-  constexpr int kMostTries = 5;
+  constexpr int kMostTries = 8;
   HostState* const state = HostState::Find();
   if (state == nullptr || !IsIndexWanted(*state)) return false;
   for (int tries = 1; tries <= kMostTries; ++tries) {
     if (MakeIndex(*state)) return true;
+    LetOthersGoFirst(tries);
   }
   throw HostError(EBUSY, StrCat("Unable to make the label index ", state->LabelIndexPath(),
                                 ": files are labelled or moved all the time. ", kAdvice));
