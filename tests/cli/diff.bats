@@ -146,7 +146,7 @@ END
   secpolicy diff nosuch installed
   exits 2
   [[ $stderr == "secpolicy: diff: there is no saved state 'nosuch', and no such directory. 'secpolicy --root $root history' lists what is saved; 'installed' is what is installed now." ]]
-  rm "$root/run/secpolicy/"*
+  rm -r "$root/run/secpolicy/"*
   secpolicy diff installed /new
   exits 2
   [[ $stderr == "secpolicy: diff: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]

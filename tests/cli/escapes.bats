@@ -915,6 +915,128 @@ reaches() {
   refuses_plan
 }
 
+# on_a_machine: from here on the root is a machine's, which root has booted, and $ordinary starts what an
+# ordinary user does there.
+on_a_machine() {
+  only_root
+  boot_as
+  as_machine
+  ordinary=(setpriv --reuid 65534 --regid 65534 --clear-groups)
+  plans=$root/run/secpolicy/plans
+}
+
+# user_tries DOMAIN OPERATION: what becomes of it when the ordinary user enters the domain.
+user_tries() {
+  run --separate-stderr on_machine "${ordinary[@]}" /programs/secpolicy run "$1" -- /probe "$2"
+}
+
+# no_plan WORDS: nothing was started, by the plan of narrowDom, and WORDS say why.
+no_plan() {
+  user_tries narrowDom getpgid
+  exits 126 && [[ -z $output && $stderr == "secpolicy: run: "*"$1"*". Let root run \"secpolicy load\", which makes "*"; nothing was started" ]] && return
+  printf 'not just: %s\n%s\n%s\n' "$1" "$output" "$stderr"
+  return 1
+}
+
+@test "46 a plan of a domain that another may have made, or of another time" {
+  domain narrowDom "${calls[@]}" '-r /t/public r'
+  domain wideDom "${calls[@]}" '-r /t r'
+  on_a_machine
+  local kept=$BATS_TEST_TMPDIR/kept
+  cp --archive "$plans" "$kept"
+  put_back() {
+    rm -rf "$plans"
+    cp --archive "$kept" "$plans"
+    user_tries narrowDom read=/t/secret/file
+    answers 0 "read=/t/secret/file EACCES"
+  }
+  put_back
+  user_tries wideDom read=/t/secret/file
+  answers 0 "read=/t/secret/file ok"
+  # Of another domain, that of another user, one that others may write, and a link.
+  cp "$plans/wideDom" "$plans/narrowDom"
+  no_plan "it is of another domain"
+  put_back
+  chown 7 "$plans/narrowDom"
+  no_plan "it belongs to another user"
+  put_back
+  chmod 666 "$plans/narrowDom"
+  no_plan "other users may write it"
+  put_back
+  mv "$plans/narrowDom" "$plans/narrowDom.aside"
+  ln -s narrowDom.aside "$plans/narrowDom"
+  no_plan "Too many levels of symbolic links"
+  # One that is not whole, and one of which a bit is another.
+  put_back
+  truncate --size=-1 "$plans/narrowDom"
+  no_plan "it is damaged"
+  put_back
+  printf '\1' | dd of="$plans/narrowDom" bs=1 seek=200 conv=notrunc status=none
+  cmp --silent "$plans/narrowDom" "$kept/narrowDom" && return 1
+  no_plan "it is damaged"
+  # One of before a change.
+  put_back
+  domain narrowDom "${calls[@]}" '-r /t r'
+  secpolicy load
+  exits 0
+  user_tries narrowDom read=/t/secret/file
+  answers 0 "read=/t/secret/file ok"
+  cp --archive "$kept/narrowDom" "$plans/narrowDom"
+  no_plan "it is of another policy, or for another kernel"
+  rm -rf "$plans"
+  cp --archive "$kept" "$plans"
+  rm "$plans/.current"
+  no_plan "There are no plans of the policy as it is in /run/secpolicy/plans"
+  # Root does not need any.
+  tries narrowDom read=/t/secret/file
+  answers 0 "read=/t/secret/file ok"
+}
+
+@test "48 the record of another user's process, and of one that is gone" {
+  domain narrowDom "${calls[@]}" '-s @clock grant' '-r /t/public r'
+  domain wideDom "${calls[@]}"
+  on_a_machine
+  # worlds: what root is told of who is in which domain.
+  worlds() {
+    secpolicy status
+    exits 0
+    sed -n '/^worlds /,/^tardisks /{/^tardisks /d;s/^worlds *[0-9]*//;s/^ *//;/./p}' <<<"$output"
+  }
+  in_background on_machine "${ordinary[@]}" /programs/secpolicy run narrowDom -- /probe getpgid wait-for=/t/public/go
+  until_true '[[ $(<"$told") == "getpgid ok" ]]'
+  local users
+  users=$(worlds)
+  users=${users%% *}
+  [[ $(stat --format=%u "/proc/$users") == 65534 && $(worlds) == "$users narrowDom enforcing" ]]
+  in_background sleep 60
+  local roots=$process
+  started() { cut -d ')' -f 2 "/proc/$1/stat" | cut -d ' ' -f 21; }
+  # claim PROCESS START: the ordinary user says that it is in wideDom.
+  claim() {
+    # shellcheck disable=SC2016
+    "${ordinary[@]}" sh -c 'cd "$0"/65534.* && printf "%s enforcing wideDom" "$2" >"$1"' "$root/run/secpolicy/worlds" "$@"
+  }
+  claim "$roots" "$(started "$roots")"
+  [[ $(worlds) == "$users narrowDom enforcing" ]]
+  # Of a process that had the number before.
+  claim "$users" 1
+  [[ -z $(worlds) ]]
+  # The domain that confines it cannot: there it may not write.
+  claim "$users" "$(started "$users")"
+  [[ $(worlds) == "$users wideDom enforcing" ]]
+  user_tries narrowDom "create=/run/secpolicy/worlds/$users"
+  answers 0 "create=/run/secpolicy/worlds/$users EACCES"
+  # What root has placed stays there, whatever its user says.
+  in_background on_machine /programs/secpolicy run narrowDom -- /probe getpgid wait-for=/t/public/go
+  until_true '[[ $(<"$told") == "getpgid ok" ]]'
+  kill "$users"
+  until_true '[[ $(worlds) != *wideDom* ]]'
+  roots=$(worlds)
+  roots=${roots%% *}
+  claim "$roots" "$(started "$roots")"
+  [[ $(worlds) == "$roots narrowDom enforcing" ]]
+}
+
 @test "49 a level that changes while a program runs" {
   domain narrowDom "${calls[@]}" '-s @clock grant' '-r /t/public r'
   boot_as

@@ -275,7 +275,7 @@ END
   ends_done load
   rm "$policy/domains/ioFilterDom"
   sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
-  rm "$root/run/secpolicy/"*
+  rm -r "$root/run/secpolicy/"*
   run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load
   exits 3
   ends_with "secpolicy: load: stopped: there is no domain ioFilterDom, so nothing was installed. Put a policy file named ioFilterDom into /etc/zorvan/secpolicy/domains and run it again."

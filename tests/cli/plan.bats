@@ -165,7 +165,7 @@ secpolicy: load: nothing would change" ]]
 }
 
 @test "a load that would be stopped would do nothing" {
-  rm "$root/run/secpolicy/"*
+  rm -r "$root/run/secpolicy/"*
   rm "$policy/domains/ioFilterDom"
   sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
   plan

@@ -155,7 +155,7 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   exits 1
   [[ $stderr == "secpolicy: rollback: there is no saved state 'good'. 'secpolicy --root $root history' lists what is saved." ]]
   secpolicy save good
-  rm "$root/run/secpolicy/"*
+  rm -r "$root/run/secpolicy/"*
   secpolicy save other
   exits 1
   [[ $stderr == "$(no_state save)" ]]

@@ -4,6 +4,7 @@
 
 #include "braxo/lib/exception.h"
 #include "ending.h"
+#include "enforce/published.h"
 #include "error_list.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
@@ -65,6 +66,7 @@ ExitCode Restore() {
         const auto before = ListDomains();
         SecPolicy::RestoreDomainEnforcement(errors);
         changed = TellOfChanges(before);
+        PublishPlans();
       },
       AdviseOnPrivilege, [&] { return "done (" + CountOf(changed, "level") + " changed)"; });
   if (end == kWell) TellOfOlderLevels();

@@ -1,6 +1,7 @@
 #include <stdexcept>
 
 #include "ending.h"
+#include "enforce/published.h"
 #include "host/linux/operation/saved_policy.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/store_copy.h"
@@ -33,7 +34,12 @@ ExitCode RollBack(const std::string& name) {
                                   " lists what is saved.");
   }
   return CallLibrary(
-      "rollback", [&](ErrorList&) { PutBack(name); }, AdviseOnPrivilege,
+      "rollback",
+      [&](ErrorList&) {
+        PutBack(name);
+        PublishPlans();
+      },
+      AdviseOnPrivilege,
       [] {
         return "done; files keep the labels that they have, and " + Call("label verify") +
                " compares them with the policy";

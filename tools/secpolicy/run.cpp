@@ -29,8 +29,7 @@ ExitCode Explain(const std::string& domain) {
 ExitCode Run(const Options& options) {
   if (options.explain) return Explain(options.domain);
   if (options.command.empty()) throw QuestionError("CMD is required, behind --");
-  const auto entry = [&](auto& /*access*/) { return Entry{options.domain, options.command}; };
-  return EnterDomain("run", entry, options.entry);
+  return EnterDomain("run", Entry{options.domain, options.command}, options.entry);
 }
 
 Action Define(Syntax& syntax) {

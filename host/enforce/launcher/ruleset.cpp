@@ -34,11 +34,15 @@ void RequireVersion(const Kernel::RulesetAttributes& attributes) {
          ", which this kernel has. 'secpolicy run' makes one for this kernel");
 }
 
+bool IsAway(int error) {
+  return error == ENOENT || error == ENOTDIR || error == ELOOP || error == EACCES;
+}
+
 // The descriptor of the place; -1 where there is nothing and need not be anything.
 int OpenPlaceOf(const PathRight& right) {
   const int place = Kernel::OpenPlace(right.path.c_str());
   if (place >= 0) return place;
-  if (errno == ENOENT && right.mayBeMissing) return -1;
+  if (right.mayBeMissing && IsAway(errno)) return -1;
   if (errno == ENOENT) {
     Refuse("the plan is stale: " + right.path + " is gone. 'secpolicy run' makes a new one");
   }

@@ -44,7 +44,9 @@ constexpr std::uint64_t AllRights(int version) {
 struct PathRight {
   std::string path;
   std::uint64_t rights = 0;
-  bool mayBeMissing = false;  // where nothing is by this path when the domain is entered
+  // What is away when the domain is entered, or behind a link, or where its user does not get,
+  // gives nothing then.
+  bool mayBeMissing = false;
 
   bool operator==(const PathRight&) const = default;
 };

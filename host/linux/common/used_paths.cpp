@@ -39,6 +39,8 @@ const std::string& StatePath() {
   return path;
 }
 
+bool IsStateAtUsualPlace() { return StatePath() == kState; }
+
 const std::string& ShownStatePath() {
   return usedState != nullptr ? usedState->shownAs : StatePath();
 }

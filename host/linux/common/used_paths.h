@@ -11,6 +11,9 @@ namespace LinuxHost {
 // HostError when it names none by an absolute path.
 const std::string& StatePath();
 
+// True when that is the usual place, whose directory is the host's to arrange.
+bool IsStateAtUsualPlace();
+
 // How messages call that state: a copy by the name of what it was made of.
 const std::string& ShownStatePath();
 

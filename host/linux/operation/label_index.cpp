@@ -127,6 +127,13 @@ bool RefreshLabelIndex() {
                                 ": files are labelled or moved all the time. ", kAdvice));
 }
 
+bool IsLabelIndexPossible() {
+  HostState* const state = HostState::Find();
+  if (state == nullptr) return false;
+  state->Refresh();
+  return state->LabelIndex() != kNeverLabelled;
+}
+
 LabelIndex ReadLabelIndex() {
   HostState* const state = HostState::Find();
   if (state != nullptr) return ReadIndexOf(*state);

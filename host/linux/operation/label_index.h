@@ -13,6 +13,9 @@ namespace LinuxHost {
 // there is none then, or an old one.
 bool RefreshLabelIndex();
 
+// True where labels were given to files, of which there can be an index.
+bool IsLabelIndexPossible();
+
 // The index. Throws Braxo::Lib::BraxoException, with what to do, when there is none, when it is not
 // of the labels as they are, and when others may have written it.
 Enforce::LabelIndex ReadLabelIndex();

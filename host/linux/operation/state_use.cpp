@@ -21,6 +21,11 @@ bool IsStateMissing() {
          (errno == ENOENT || errno == ENOTDIR);
 }
 
+bool IsStateForbidden() {
+  return faccessat(AT_FDCWD, StatePath().c_str(), R_OK, AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
+         errno == EACCES;
+}
+
 StateCopy CopyUsedState(const std::string& to) {
   const std::string& used = StatePath();
   const int flags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;

@@ -18,6 +18,9 @@ HostState& CurrentState();
 // look for counts as there.
 bool IsStateMissing();
 
+// True when there may be a state that this user is not allowed to read.
+bool IsStateForbidden();
+
 // What became of a copy of the state: only what is missing, or not this user's to read, is left
 // out.
 enum class StateCopy { kMade, kMissing, kForbidden };

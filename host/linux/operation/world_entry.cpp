@@ -3,11 +3,13 @@
 #include <sys/prctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <fstream>
 #include <string>
 
 #include "host/linux/common/host_error.h"
+#include "host/linux/operation/world_records.h"
 #include "host/linux/state/domain.h"
 #include "host/linux/state/host_state.h"
 
@@ -25,6 +27,11 @@ pid_t ParentOf(pid_t process) {
   return 0;
 }
 
+// What others say of a process does not count for one of the superuser that it has started.
+std::vector<WorldRecord> OwnRecords() {
+  return geteuid() == 0 ? std::vector<WorldRecord>() : ReadWorldRecords();
+}
+
 }  // namespace
 
 void EnterWorld(unsigned int id, Policy::Level level) {
@@ -36,14 +43,25 @@ std::vector<PlacedWorld> ListWorlds(HostState& state) {
   for (const World& world : state.Worlds().All()) {
     worlds.push_back({world.id, world.domainId, Policy::FindLevel(world.level)});
   }
+  state.Refresh();
+  for (const WorldRecord& record : ReadWorldRecords()) {
+    if (std::ranges::count(worlds, record.id, &PlacedWorld::id) != 0) continue;
+    const Domain* const domain = state.Domains().Find(record.domain);
+    worlds.push_back({record.id, domain == nullptr ? kDomainSlots : domain->id,
+                      Policy::FindLevel(record.level)});
+  }
+  std::ranges::sort(worlds, {}, &PlacedWorld::id);
   return worlds;
 }
 
 unsigned int DomainOfCaller() {
-  WorldTable& worlds = HostState::Current().Worlds();
+  HostState& state = HostState::Current();
+  const std::vector<WorldRecord> records = OwnRecords();
   // A child is in the domain of its parent, unless it was placed elsewhere itself.
   for (pid_t process = getpid(); process > 1; process = ParentOf(process)) {
-    if (const auto placed = worlds.FindDomainOf(process)) return *placed;
+    if (const auto placed = state.Worlds().FindDomainOf(process)) return *placed;
+    const auto record = std::ranges::find(records, process, &WorldRecord::id);
+    if (record != records.end()) return state.Domains().Get(record->domain).id;
   }
   if (prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0) == 1) {
     throw HostError(ESRCH,

@@ -14,18 +14,20 @@ class HostState;
 // be written.
 void EnterWorld(unsigned int id, Policy::Level level);
 
-// A living process that was placed in a domain.
+// A living process that was placed in a domain, or of which its user has recorded that it was.
 struct PlacedWorld {
   int id = 0;
-  unsigned int domainId = 0;
+  unsigned int domainId = 0;           // no domain's where the recorded one is gone
   std::optional<Policy::Level> level;  // that confines it; nothing where a service has placed it
 };
 
-// All of them, in ascending order of their identifiers.
+// All of them, in ascending order of their identifiers. Of a process that was placed no record
+// counts.
 std::vector<PlacedWorld> ListWorlds(HostState& state);
 
 // The domain that this process was placed in, or the nearest process above it, or the start domain.
-// Throws HostError for a confined process of which that cannot be told.
+// Records count that this user has made, unless it is the superuser. Throws HostError for a
+// confined process of which that cannot be told.
 unsigned int DomainOfCaller();
 
 }  // namespace LinuxHost

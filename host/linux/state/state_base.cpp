@@ -1,11 +1,16 @@
 #include "host/linux/state/state_base.h"
 
+#include <unistd.h>
+
+#include "host/linux/state/plan_place.h"
 #include "host/linux/state/schema.h"
 
 namespace LinuxHost {
 
+// Plans are of the state before the commit, which others may see as soon as it is made.
 StateBase::StateBase(const std::string& path, const std::string& shownAs)
-    : database(path, kStateLayout, shownAs) {
+    : database(path, kStateLayout, shownAs,
+               [current = CurrentPlansOf(path)] { unlink(current.c_str()); }) {
   Refresh();
 }
 

@@ -19,6 +19,7 @@
 #include <cstdio>
 #include <cstring>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "braxo/misc/strcat.h"
@@ -132,8 +133,13 @@ std::string Rows::Text(int column) const {
           static_cast<std::size_t>(sqlite3_column_bytes(statement, column))};
 }
 
-Store::Store(const std::string& path, const StoreLayout& wanted, const std::string& shownAs)
-    : layout(wanted), file(path), shown(shownAs), forks(ForksUntilNow()) {
+Store::Store(const std::string& path, const StoreLayout& wanted, const std::string& shownAs,
+             std::function<void()> tellCommit)
+    : layout(wanted),
+      file(path),
+      shown(shownAs),
+      forks(ForksUntilNow()),
+      onCommit(std::move(tellCommit)) {
   PreparePrivateFile(file, layout.purpose);
   const auto slash = file.rfind('/');
   directory = slash == 0 ? "/" : file.substr(0, slash);
@@ -170,6 +176,12 @@ bool Store::IsCurrent() const {
          status.st_ino == inode;
 }
 
+int Store::BeforeCommit(void* store) {
+  const auto& committing = *static_cast<const Store*>(store);
+  if (committing.isCommitTold) committing.onCommit();
+  return 0;
+}
+
 void Store::Open() {
   const int result =
       sqlite3_open_v2(file.c_str(), &database,
@@ -181,6 +193,7 @@ void Store::Open() {
   inode = status.st_ino;
   sqlite3_extended_result_codes(database, 1);
   sqlite3_busy_handler(database, WaitForOthers, nullptr);
+  if (onCommit) sqlite3_commit_hook(database, BeforeCommit, this);
   if (sqlite3_db_readonly(database, "main") == 1) {
     throw HostError(EROFS, StrCat("Unable to use the ", layout.purpose, " ", shown,
                                   ": it cannot be written. Make it writable, or choose another "

@@ -6,6 +6,7 @@
 #include <concepts>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -79,8 +80,10 @@ class Store {
 
   // Opens the database at the absolute `path`, which messages call `shownAs`; creates it (mode
   // 0600) and its directory (0700) as needed. Refuses what is not `layout`, what another user owns
-  // or may write, and links.
-  Store(const std::string& path, const StoreLayout& layout, const std::string& shownAs);
+  // or may write, and links. `tellCommit`, if any, is called before whatever this connection
+  // commits; it may neither throw nor use the database.
+  Store(const std::string& path, const StoreLayout& layout, const std::string& shownAs,
+        std::function<void()> tellCommit = {});
   Store(const std::string& path, const StoreLayout& wanted) : Store(path, wanted, path) {}
   Store(const Store&) = delete;
   Store& operator=(const Store&) = delete;
@@ -137,6 +140,7 @@ class Store {
   friend class Rows;
   friend class Snapshot;
   friend class Transaction;
+  friend class UntoldCommits;
 
   template <class... Args>
   void BindAll([[maybe_unused]] sqlite3_stmt* statement, const Args&... args) {
@@ -159,6 +163,8 @@ class Store {
   [[noreturn]] void Fail(int result) const;
   [[noreturn]] void Refuse(int code, const std::string& reason) const;
 
+  static int BeforeCommit(void* store);
+
   void Open();
   bool IsReady();
   bool IsOfVersionBefore(std::int64_t version) const;
@@ -177,6 +183,8 @@ class Store {
   ino_t inode = 0;
   sqlite3* database = nullptr;
   int openTransactions = 0;  // each within the one before it
+  std::function<void()> onCommit;
+  bool isCommitTold = true;
   const volatile std::uint32_t* commitHeader = nullptr;
   std::unordered_map<const char*, sqlite3_stmt*> statements;
 };
@@ -210,6 +218,21 @@ class Transaction {
   Store& store;
   const bool isStep;
   bool isOpen = true;
+};
+
+// While it lives, commits of the store are not told.
+class UntoldCommits {
+ public:
+  explicit UntoldCommits(Store& quiet) : store(quiet), before(quiet.isCommitTold) {
+    store.isCommitTold = false;
+  }
+  UntoldCommits(const UntoldCommits&) = delete;
+  UntoldCommits& operator=(const UntoldCommits&) = delete;
+  ~UntoldCommits() { store.isCommitTold = before; }
+
+ private:
+  Store& store;
+  const bool before;
 };
 
 }  // namespace LinuxHost

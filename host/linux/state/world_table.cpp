@@ -1,46 +1,16 @@
 #include "host/linux/state/world_table.h"
 
-#include <signal.h>
-
 #include <cerrno>
-#include <fstream>
-#include <sstream>
 #include <string>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/process.h"
 #include "host/linux/state/domain.h"
 
 using Braxo::Misc::StrCat;
 
 namespace LinuxHost {
-namespace {
-
-bool IsAlive(int world) { return world > 0 && (kill(world, 0) == 0 || errno == EPERM); }
-
-// When the process was started, in clock ticks since boot: tells it from a later one with the same
-// number. 0 where it cannot be told.
-std::int64_t StartOf(int world) {
-  std::ifstream file(StrCat("/proc/", world, "/stat"));
-  std::string text;
-  std::getline(file, text);
-  // The second field is the program's name in parentheses, which may hold anything; the start is
-  // the twentieth field behind it.
-  const auto nameEnd = text.rfind(')');
-  if (nameEnd == std::string::npos) return 0;
-  std::istringstream fields(text.substr(nameEnd + 1));
-  std::string skipped;
-  for (int field = 1; field < 20; ++field) fields >> skipped;
-  std::int64_t start = 0;
-  fields >> start;
-  return start;
-}
-
-bool IsStill(int world, std::int64_t started) {
-  return IsAlive(world) && StartOf(world) == started;
-}
-
-}  // namespace
 
 void WorldTable::RequireAlive(int world) {
   if (!IsAlive(world)) throw HostError(ESRCH, StrCat("no world has the identifier ", world));
@@ -48,6 +18,8 @@ void WorldTable::RequireAlive(int world) {
 
 void WorldTable::Place(int world, unsigned int domainId, const std::string& level) {
   RequireAlive(world);
+  // No plan depends on it.
+  const UntoldCommits untold(store);
   const int placed =
       store.Run("INSERT OR REPLACE INTO world SELECT ?1, ?2, id, ?4 FROM domain WHERE id = ?3",
                 world, StartOf(world), domainId, level);

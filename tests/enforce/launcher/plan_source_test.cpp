@@ -147,6 +147,8 @@ TEST_P(PlanSource, LeadsThroughNoLink) {
   fs::remove_all(tree / "open");
   fs::create_symlink(tree / "kept", tree / "open");
   ExpectRefused(RunWith(path), message);
+  plan.paths.back().mayBeMissing = true;
+  ExpectStarted(RunWith(WritePlan(tree, plan)));
 }
 
 TEST_P(PlanSource, IsForThisKernel) {

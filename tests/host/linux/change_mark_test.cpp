@@ -13,6 +13,7 @@
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/policy_count.h"
 #include "host/linux/operation/policy_load.h"
+#include "host/linux/operation/published_plans.h"
 #include "host/linux/operation/saved_policy.h"
 #include "host/linux/operation/stable_view.h"
 #include "host/linux/operation/store_copy.h"
@@ -63,6 +64,11 @@ class ChangeMark : public ::testing::TestWithParam<Deed> {
   const unsigned int domain = state.Domains().Create("a", TESKACCESS_DEFAULT_DOM_NONE, true);
 };
 
+void PublishNoPlans() {
+  ASSERT_TRUE(LinuxHost::PublishPlans(LinuxHost::TakeChangeMark(), "1", {}));
+  ASSERT_TRUE(LinuxHost::ArePlansPublished());
+}
+
 class Change : public ChangeMark {};
 
 TEST_P(Change, IsNoticed) {
@@ -71,6 +77,12 @@ TEST_P(Change, IsNoticed) {
   GetParam().act(state, domain);
   EXPECT_TRUE(ChangedSince(mark));
   EXPECT_FALSE(ChangedSince(LinuxHost::TakeChangeMark()));
+}
+
+TEST_P(Change, EndsThePlansOfTheState) {
+  PublishNoPlans();
+  GetParam().act(state, domain);
+  EXPECT_FALSE(LinuxHost::ArePlansPublished());
 }
 
 TEST_P(Change, OfAnotherProcessIsNoticed) {
@@ -157,6 +169,12 @@ TEST_P(NoChange, IsTakenForOne) {
   EXPECT_FALSE(ChangedSince(mark));
   ASSERT_EQ(RunInChild([&] { GetParam().act(HostState::Current(), domain); }), "");
   EXPECT_FALSE(ChangedSince(mark));
+}
+
+TEST_P(NoChange, EndsThePlansOfTheState) {
+  PublishNoPlans();
+  GetParam().act(state, domain);
+  EXPECT_TRUE(LinuxHost::ArePlansPublished());
 }
 
 INSTANTIATE_TEST_SUITE_P(

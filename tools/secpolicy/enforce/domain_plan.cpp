@@ -1,10 +1,8 @@
 #include "domain_plan.h"
 
-#include <map>
-#include <vector>
+#include <string_view>
+#include <utility>
 
-#include "host/enforce/label_index.h"
-#include "host/enforce/real_file_tree.h"
 #include "host/linux/operation/label_index.h"
 #include "installed/installed_policy.h"
 #include "query/question.h"
@@ -13,13 +11,17 @@ namespace SecPolicyCli {
 namespace {
 
 using Enforce::LabelIndex;
-using Enforce::LabelledPath;
 using Enforce::RuleFate;
 
-using NamesById = std::map<std::uint32_t, std::string>;
+// A number that no label has any more is as good as none known.
+std::string_view NameOf(std::uint32_t label, const LabelNames& names) {
+  if (label == Enforce::kUnlabelled) return "";
+  const auto name = names.find(label);
+  return name == names.end() ? Enforce::kUnknownLabel : std::string_view(name->second);
+}
 
-NamesById LabelNames(SecPolicy::TeskAccessInterfaceImpl& access) {
-  NamesById names;
+LabelNames ReadLabelNames(SecPolicy::TeskAccessInterfaceImpl& access) {
+  LabelNames names;
   for (const auto& [name, id] :
        access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL)) {
     names.emplace(static_cast<std::uint32_t>(id), name);
@@ -27,58 +29,45 @@ NamesById LabelNames(SecPolicy::TeskAccessInterfaceImpl& access) {
   return names;
 }
 
-// A number that no label has any more is as good as none known.
-std::string_view NameOf(std::uint32_t label, const NamesById& names) {
-  if (label == Enforce::kUnlabelled) return "";
-  const auto name = names.find(label);
-  return name == names.end() ? Enforce::kUnknownLabel : std::string_view(name->second);
+LabelIndex ReadNewestIndex() {
+  LinuxHost::RefreshLabelIndex();
+  return LinuxHost::ReadLabelIndex();
 }
 
-std::vector<LabelledPath> PlacesOf(const LabelIndex& index, const NamesById& names) {
-  std::vector<LabelledPath> places;
-  places.reserve(index.Size());
-  for (const Enforce::LabelledPlace& place : index) {
-    places.push_back({place.path, NameOf(place.label, names)});
-  }
-  return places;
-}
-
-// What a plan is made from, of an installed domain.
-struct Sources {
-  Policy::InstalledDomain domain;
-  LabelIndex index;
-  NamesById names;
-};
-
-Sources ReadSources(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
+Policy::InstalledDomain FindDomain(const std::string& name,
+                                   SecPolicy::TeskAccessInterfaceImpl& access) {
   auto domain = ReadInstalledDomain(name, access);
   if (!domain) RefuseDomain(name, access);
-  LinuxHost::RefreshLabelIndex();
-  return {.domain = std::move(*domain),
-          .index = LinuxHost::ReadLabelIndex(),
-          .names = LabelNames(access)};
-}
-
-// Calls `use` with the domain and all else that its plan depends on.
-template <class Use>
-auto WithSources(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access, Use use) {
-  const Sources sources = ReadSources(name, access);
-  const std::vector<LabelledPath> places = PlacesOf(sources.index, sources.names);
-  const Enforce::Features features = Enforce::ProbeFeatures();
-  Enforce::RealFileTree files;
-  const Enforce::Surroundings surroundings{.features = features, .places = places, .files = files};
-  return use(sources.domain, surroundings);
+  return std::move(*domain);
 }
 
 }  // namespace
 
-Enforce::CompiledPlan PlanOf(const std::string& domain,
-                             SecPolicy::TeskAccessInterfaceImpl& access) {
-  return WithSources(domain, access, Enforce::Compile);
+PlanSources::PlanSources(SecPolicy::TeskAccessInterfaceImpl& access,
+                         const Enforce::Features& kernelFeatures)
+    : features(kernelFeatures), index(ReadNewestIndex()), names(ReadLabelNames(access)) {
+  places.reserve(index.Size());
+  for (const Enforce::LabelledPlace& place : index) {
+    places.push_back({place.path, NameOf(place.label, names)});
+  }
 }
 
-std::string ExplanationOf(const std::string& domain, SecPolicy::TeskAccessInterfaceImpl& access) {
-  return WithSources(domain, access, Enforce::Explain);
+Enforce::CompiledPlan PlanSources::Compile(const Policy::InstalledDomain& domain) {
+  return Enforce::Compile(domain, All());
+}
+
+std::string PlanSources::Explain(const Policy::InstalledDomain& domain) {
+  return Enforce::Explain(domain, All());
+}
+
+Enforce::CompiledPlan PlanOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
+  const Policy::InstalledDomain domain = FindDomain(name, access);
+  return PlanSources(access, Enforce::ProbeFeatures()).Compile(domain);
+}
+
+std::string ExplanationOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
+  const Policy::InstalledDomain domain = FindDomain(name, access);
+  return PlanSources(access, Enforce::ProbeFeatures()).Explain(domain);
 }
 
 Json FatesToJson(const std::vector<RuleFate>& fates) {

@@ -2,13 +2,19 @@
 
 #include <exception>
 #include <iostream>
+#include <optional>
 
 #include "broker.h"
 #include "domain_plan.h"
+#include "host/linux/operation/log_use.h"
+#include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
+#include "host/linux/operation/world_records.h"
 #include "launcher.h"
 #include "observe/permissive.h"
 #include "observe/watch.h"
+#include "published.h"
+#include "teskctl/system.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -30,6 +36,40 @@ bool MaySurrender(const std::string& verb, const Enforce::CompiledPlan& compiled
   return false;
 }
 
+ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
+                          SecPolicy::TeskAccessInterfaceImpl& access, const EntryOptions& options) {
+  const Enforce::CompiledPlan compiled = PlanOf(entry.domain, access);
+  if (!MaySurrender(verb, compiled, options)) return kNotConfined;
+  LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
+  std::cerr << std::flush;
+  if (compiled.plan.level == Policy::Level::kPermissive) {
+    return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
+  }
+  StartConfined(compiled.plan, entry, KeepBroker(compiled));
+}
+
+ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
+  const Enforce::Plan plan = ReadPublishedPlan(entry.domain);
+  LinuxHost::RecordWorld(plan.domain, TextOf(plan.level));
+  if (plan.level != Policy::Level::kPermissive) StartConfined(plan, entry, {});
+  // Of ordinary users only the daemon takes lines.
+  std::optional<LinuxHost::DroppedLog> withoutLog;
+  if (!TeskCtl::System::SyslogIsRunning()) withoutLog.emplace();
+  const PublishedState state;
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
+}
+
+ExitCode TellFailure(const std::string& verb, const std::function<ExitCode()>& enter) {
+  try {
+    return enter();
+  } catch (const std::exception& failure) {
+    std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
+              << std::endl;
+    return kNotConfined;
+  }
+}
+
 }  // namespace
 
 void AddEntryOptions(Syntax& syntax, EntryOptions& options) {
@@ -42,25 +82,27 @@ void PrepareEntry() {
   OpenProc();
 }
 
+ExitCode EnterDomain(const std::string& verb, const Entry& entry, const EntryOptions& options) {
+  return TellFailure(verb, [&] {
+    if (LinuxHost::IsStateForbidden()) return EnterAsPublished(verb, entry);
+    SecPolicy::TeskAccessInterfaceImpl access;
+    return EnterAsInstalled(verb, entry, access, options);
+  });
+}
+
 ExitCode EnterDomain(const std::string& verb,
                      const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
                      const EntryOptions& options) {
-  try {
+  return TellFailure(verb, [&] {
+    // Whatever becomes of this process, the copy is removed first.
+    std::optional<PublishedState> copy;
+    if (LinuxHost::IsStateForbidden()) copy.emplace();
     SecPolicy::TeskAccessInterfaceImpl access;
     const Entry entry = find(access);
-    const Enforce::CompiledPlan compiled = PlanOf(entry.domain, access);
-    if (!MaySurrender(verb, compiled, options)) return kNotConfined;
-    LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
-    std::cerr << std::flush;
-    if (compiled.plan.level == Policy::Level::kPermissive) {
-      return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
-    }
-    StartConfined(compiled.plan, entry, KeepBroker(compiled));
-  } catch (const std::exception& failure) {
-    std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
-              << std::endl;
-    return kNotConfined;
-  }
+    if (!copy) return EnterAsInstalled(verb, entry, access, options);
+    copy.reset();
+    return EnterAsPublished(verb, entry);
+  });
 }
 
 }  // namespace SecPolicyCli

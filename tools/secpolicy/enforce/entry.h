@@ -29,9 +29,12 @@ struct Entry {
   std::vector<std::string> environment = {};  // variables in place of those of this process
 };
 
-// Becomes the program of the entry that `find` finds, or runs and watches it where the domain is
-// permissive. Returns only then, and where nothing was started, with what to end with; why has been
-// told.
+// Becomes the program of the entry, or runs and watches it where the domain is permissive. Whoever
+// may not read the state enters by a published plan. Returns only then, and where nothing was
+// started, with what to end with; why has been told.
+ExitCode EnterDomain(const std::string& verb, const Entry& entry, const EntryOptions& options);
+
+// The same for the entry that `find` finds in what is installed.
 ExitCode EnterDomain(const std::string& verb,
                      const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
                      const EntryOptions& options);

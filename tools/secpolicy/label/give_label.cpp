@@ -2,6 +2,7 @@
 #include <cerrno>
 #include <filesystem>
 
+#include "enforce/published.h"
 #include "host/linux/operation/label_index.h"
 #include "label_actions.h"
 #include "root.h"
@@ -53,6 +54,7 @@ std::string GiveLabel(LabelRun& run, const std::string& label,
   if (run.FindLabel(label) == kNoSuchLabel) RefuseLabel(run, label, paths);
   for (const std::string& path : paths) GiveLabelTo(run, label, path, wholeTrees);
   LinuxHost::RefreshLabelIndex();
+  PublishPlans();
   return "done";
 }
 

@@ -3,6 +3,7 @@
 #include <map>
 
 #include "braxo/misc/strcat.h"
+#include "enforce/published.h"
 #include "host/linux/operation/file_label.h"
 #include "host/linux/operation/label_index.h"
 #include "label_actions.h"
@@ -68,7 +69,10 @@ std::string Relabel(LabelRun& run, const std::string& dir, const std::vector<std
                                   [&](const LinuxHost::WalkedFile& file, const LabelLine& line) {
                                     relabelling.Visit(file, line);
                                   });
-  if (!dryRun) LinuxHost::RefreshLabelIndex();
+  if (!dryRun) {
+    LinuxHost::RefreshLabelIndex();
+    PublishPlans();
+  }
   return relabelling.Summarize();
 }
 

@@ -12,6 +12,7 @@
 #include <optional>
 
 #include "ending.h"
+#include "enforce/published.h"
 #include "host/linux/operation/label_index.h"
 #include "host/linux/operation/label_journal.h"
 #include "host/linux/operation/label_numbers.h"
@@ -116,7 +117,7 @@ class LoadRun {
       transaction.reset();
       Fail(raised);
     }
-    if (hasBegun && !request.dryRun && (isInstalled || !stateIsNew)) IndexLabels();
+    if (hasBegun && !request.dryRun && (isInstalled || !stateIsNew)) FollowChange();
     if (request.timing) std::cout << Describe(listener.timing.Phases());
     std::cout.flush();
     return WentWell() ? ReportDone() : ReportFailure();
@@ -173,10 +174,11 @@ class LoadRun {
     ReportPutBack(*back);
   }
 
-  // Also after a load that failed, which may have labelled files.
-  void IndexLabels() {
+  // What is made from the policy. Also after a load that failed, which may have labelled files.
+  void FollowChange() {
     try {
       if (LinuxHost::RefreshLabelIndex()) listener.timing.EndPhase("label index");
+      if (PublishPlans()) listener.timing.EndPhase("plans");
     } catch (const Braxo::Lib::BraxoException& problem) {
       listener.OnError(problem.what());
       SecPolicy::SecpolicyError(problem.what());

@@ -1,0 +1,223 @@
+#include "host/linux/operation/published_plans.h"
+
+#include <fcntl.h>
+#include <sys/random.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdint>
+#include <optional>
+#include <set>
+#include <string_view>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/common/shared_directory.h"
+#include "host/linux/common/used_paths.h"
+#include "host/linux/operation/store_copy.h"
+#include "host/linux/operation/world_records.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/plan_place.h"
+
+namespace LinuxHost {
+namespace {
+
+using Braxo::Misc::StrCat;
+
+constexpr char kNew[] = ".new";
+constexpr char kStateCopy[] = ".state";
+
+// A letter that is itself in the name of a file; a dot begins names that are no domain's.
+bool IsPlain(char letter) {
+  constexpr std::string_view kMarks = "-_+,=@";
+  return (letter >= 'a' && letter <= 'z') || (letter >= 'A' && letter <= 'Z') ||
+         (letter >= '0' && letter <= '9') || kMarks.find(letter) != std::string_view::npos;
+}
+
+std::string FileNameOf(const std::string& domain) {
+  constexpr char kDigits[] = "0123456789ABCDEF";
+  std::string name;
+  for (const char letter : domain) {
+    if (IsPlain(letter)) {
+      name += letter;
+      continue;
+    }
+    const auto byte = static_cast<unsigned char>(letter);
+    name += '%';
+    name += kDigits[byte >> 4];
+    name += kDigits[byte & 0xf];
+  }
+  return name;
+}
+
+// Another state beside the same plans is another file. Empty where there is no state.
+std::string IdentityOfState() {
+  struct stat status {};
+  if (stat(StatePath().c_str(), &status) != 0) return "";
+  return StrCat(status.st_dev, ":", status.st_ino);
+}
+
+std::string CurrentText(const std::string& serial) {
+  return StrCat(serial, " ", IdentityOfState(), "\n");
+}
+
+// The directory of the plans, for who writes them.
+class PlanDirectory {
+ public:
+  PlanDirectory() : path(PlansOf(StatePath())), opened(MakeSharedDirectory(path, kMode)) {}
+
+  // In place of the file of the name, whole.
+  void Write(const std::string& name, std::string_view content) {
+    unlinkat(opened.Number(), kNew, 0);
+    constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+    const Descriptor file(openat(opened.Number(), kNew, kFlags, S_IRUSR | S_IWUSR));
+    if (!file.IsOpen() || !WriteAll(file, content)) Fail(name);
+    TakeName(file, name);
+  }
+
+  // What others have to find there under another name first.
+  std::string NewFile() {
+    unlinkat(opened.Number(), kNew, 0);
+    return StrCat(path, "/", kNew);
+  }
+
+  void TakeNewFile(const std::string& name) {
+    const Descriptor file(openat(opened.Number(), kNew, O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+    if (!file.IsOpen()) Fail(name);
+    TakeName(file, name);
+  }
+
+  void RemoveAllBut(const std::set<std::string>& kept) {
+    for (const std::string& name : NamesIn(opened)) {
+      if (!kept.contains(name)) unlinkat(opened.Number(), name.c_str(), 0);
+    }
+  }
+
+ private:
+  static constexpr mode_t kMode = 0755;
+  static constexpr mode_t kFileMode = 0644;
+
+  static bool WriteAll(const Descriptor& file, std::string_view content) {
+    while (!content.empty()) {
+      const ssize_t count = write(file.Number(), content.data(), content.size());
+      if (count < 0) return false;
+      content.remove_prefix(static_cast<std::size_t>(count));
+    }
+    return true;
+  }
+
+  void TakeName(const Descriptor& file, const std::string& name) const {
+    if (fchmod(file.Number(), kFileMode) != 0 ||
+        renameat(opened.Number(), kNew, opened.Number(), name.c_str()) != 0) {
+      Fail(name);
+    }
+  }
+
+  [[noreturn]] void Fail(const std::string& name) const {
+    ThrowErrno("Unable to write ", path, "/", name);
+  }
+
+  const std::string path;
+  const Descriptor opened;
+};
+
+// What only its owner, the superuser or this user, can have written.
+std::string ReadTrusted(const std::string& path) {
+  // Without waiting for the other end, should it be a pipe.
+  const Descriptor file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  struct stat status {};
+  if (!file.IsOpen() || fstat(file.Number(), &status) != 0) ThrowErrno();
+  if (!S_ISREG(status.st_mode)) throw HostError(EINVAL, "it is no regular file");
+  if (status.st_uid != 0 && status.st_uid != geteuid()) {
+    throw HostError(EACCES, "it belongs to another user");
+  }
+  if ((status.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+    throw HostError(EACCES, "other users may write it");
+  }
+  std::string content(static_cast<std::size_t>(status.st_size), '\0');
+  const ssize_t count = read(file.Number(), content.data(), content.size());
+  if (count < 0) ThrowErrno();
+  content.resize(static_cast<std::size_t>(count));
+  return content;
+}
+
+// Nothing where nobody says so who is to be believed.
+std::optional<std::string> FindSerial() {
+  try {
+    const std::string current = ReadTrusted(CurrentPlansOf(StatePath()));
+    std::string serial = current.substr(0, current.find(' '));
+    if (current == CurrentText(serial)) return serial;
+  } catch (const HostError&) {
+    return std::nullopt;
+  }
+  return std::nullopt;
+}
+
+}  // namespace
+
+bool PublishPlans(const ChangeMark& since, const std::string& serial,
+                  const std::map<std::string, std::string>& plans) {
+  PlanDirectory directory;
+  MakeWorldRecords();
+  // As a lock: who commits waits until the plans are there, and this ends without a commit.
+  const Transaction others(since.state->Database());
+  if (ChangedSince(since)) return false;
+  CopyDatabase(StatePath(), CopyOf::kState, directory.NewFile());
+  directory.TakeNewFile(kStateCopy);
+  std::set<std::string> names = {kStateCopy};
+  for (const auto& [domain, bytes] : plans) {
+    const std::string name = FileNameOf(domain);
+    directory.Write(name, bytes);
+    names.insert(name);
+  }
+  directory.RemoveAllBut(names);
+  const std::string current = CurrentPlansOf(StatePath());
+  directory.Write(current.substr(current.rfind('/') + 1), CurrentText(serial));
+  return true;
+}
+
+std::string NewPlanSerial() {
+  std::uint64_t serial = 0;
+  if (getrandom(&serial, sizeof serial, 0) != sizeof serial) {
+    ThrowErrno("Unable to number the plans");
+  }
+  return std::to_string(serial);
+}
+
+bool ArePlansPublished() { return FindSerial().has_value(); }
+
+std::string PublishedSerial() {
+  if (const auto serial = FindSerial()) return *serial;
+  throw HostError(ESTALE,
+                  StrCat("There are no plans of the policy as it is in ", PlansOf(StatePath()),
+                         ". Let root run \"secpolicy load\", which makes them"));
+}
+
+std::string PlanFileOf(const std::string& domain) {
+  return StrCat(PlansOf(StatePath()), "/", FileNameOf(domain));
+}
+
+std::string ReadPublishedPlan(const std::string& domain) {
+  try {
+    return ReadTrusted(PlanFileOf(domain));
+  } catch (const HostError& failure) {
+    if (failure.Code() != ENOENT) RefusePublishedPlan(domain, failure.what());
+  }
+  throw HostError(ENOENT, StrCat("There is no plan of a domain '", domain,
+                                 "'. Let root run \"secpolicy features --for ", domain,
+                                 "\", which tells whether there is such a domain and what of its "
+                                 "rules this kernel cannot keep to"));
+}
+
+void RefusePublishedPlan(const std::string& domain, const std::string& reason) {
+  throw HostError(EPROTO, StrCat("The plan ", PlanFileOf(domain), " cannot be used: ", reason,
+                                 ". Let root run \"secpolicy load\", which makes a new one"));
+}
+
+void CopyPublishedState(const std::string& to) {
+  CopyDatabase(StrCat(PlansOf(StatePath()), "/", kStateCopy), CopyOf::kOwnCopy, to);
+}
+
+}  // namespace LinuxHost

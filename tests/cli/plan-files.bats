@@ -1,0 +1,201 @@
+# Ordinary users in domains of a machine's own root, which they enter by the plans that root has made:
+# what they get, when the plans are made anew, and what is said where there is none.
+
+load helper
+
+setup() {
+  [[ $(id -u) -eq 0 ]] || skip "only root can lay out a machine"
+  needs_landlock
+  make_root
+  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR" "$BATS_TEST_TMPDIR"
+  mkdir -p "$root"/{proc,dev,usr,programs,tmp} "$BATS_TEST_TMPDIR/programs"
+  chmod 1777 "$root/tmp"
+  ln -s usr/lib usr/lib64 "$root"
+  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$BATS_TEST_TMPDIR/programs"
+  boot
+  plans=$root/run/secpolicy/plans
+}
+
+# on_machine COMMAND...: where the root is that of a machine.
+on_machine() {
+  # shellcheck disable=SC2016
+  run --separate-stderr unshare --mount sh -ec '
+    mount --rbind "$0" "$0"
+    mount --rbind /proc "$0/proc"
+    mount --rbind /dev "$0/dev"
+    mount --rbind /usr "$0/usr"
+    mount --bind "$1" "$0/programs"
+    cd "$0"
+    shift
+    pivot_root . .
+    umount -l .
+    exec "$@"' "$root" "$BATS_TEST_TMPDIR/programs" "$@"
+}
+
+# by_root WORDS...: the command, as root types it; it ends well.
+by_root() {
+  secpolicy "$@"
+  exits 0
+}
+
+# by_user WORDS...: the same of an ordinary user.
+by_user() {
+  on_machine /usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups /programs/secpolicy "$@"
+}
+
+# by_user_in DOMAIN WORDS: what the shell of the example makes of WORDS in the domain, for that user.
+by_user_in() {
+  by_user run "$1" -- /bin/sh -c "$2"
+}
+
+# not_started WORDS: nothing was, and the only line says why.
+not_started() {
+  exits 126 && [[ -z $output && $stderr == "secpolicy: run: $1; nothing was started" ]] && return
+  printf 'not just: %s\nbut:\n%s\n%s\n' "$1" "$output" "$stderr"
+  return 1
+}
+
+# shellcheck disable=SC2016
+by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let root run "secpolicy load", which makes them'
+
+@test "after a boot an ordinary user runs domains, with the rights of their rules" {
+  by_user_in monitorDom 'cat /opt/monitor/etc/agent.conf'
+  exits 0
+  [[ -n $output && -z $stderr ]]
+  by_user_in monitorDom 'cat /var/lib/vms/demo/disk'
+  exits 1
+  [[ $stderr == *"/var/lib/vms/demo/disk': Permission denied"* ]]
+  # As the user that it is.
+  chmod 600 "$root/opt/monitor/etc/agent.conf"
+  by_user_in monitorDom 'cat /opt/monitor/etc/agent.conf'
+  exits 1
+  by_root run monitorDom -- /bin/sh -c 'cat /opt/monitor/etc/agent.conf'
+}
+
+@test "who may not read the state cannot read it, nor the label index" {
+  [[ $(stat --format=%a "$root/run/secpolicy") == 711 ]]
+  local file
+  for file in host.db labels.index; do
+    [[ $(stat --format=%a "$root/run/secpolicy/$file") == 600 ]]
+  done
+  [[ $(stat --format='%a %U' "$plans" "$plans/monitorDom") == $'755 root\n644 root' ]]
+}
+
+@test "a rule about what this user cannot reach takes nothing from the others" {
+  mkdir -m 700 "$root/locked"
+  mkdir "$root/locked/in" "$root/goes"
+  printf '%s\n' '-r /locked/in r' '-r /goes r' >>"$policy/domains/monitorDom"
+  by_root load
+  rmdir "$root/goes"
+  by_user_in monitorDom 'cat /opt/monitor/etc/agent.conf'
+  exits 0
+}
+
+@test "what changes the policy makes the plans anew" {
+  local words=(-- /bin/sh -c 'cat /etc/services.conf')
+  by_user run monitorDom "${words[@]}"
+  exits 1
+  by_root label set monitorConfig /etc/services.conf
+  by_user run monitorDom "${words[@]}"
+  exits 0
+  by_root label relabel /etc/services.conf
+  by_user run monitorDom "${words[@]}"
+  exits 1
+  by_root save before
+  echo '-r /etc/services.conf r' >>"$policy/domains/monitorDom"
+  by_root load
+  by_user run monitorDom "${words[@]}"
+  exits 0
+  by_root rollback before
+  by_user run monitorDom "${words[@]}"
+  exits 1
+  by_root load-early
+  by_user run monitorDom "${words[@]}"
+  exits 1
+  [[ $stderr == *"Permission denied"* ]]
+}
+
+@test "a change that nobody has made plans of is not passed over" {
+  by_user_in monitorDom 'echo started'
+  answers 0 started
+  # As a service does it, whatever it is.
+  SECPOLICY_HOST_STATE=$root/run/secpolicy/host.db "$RUNTIME_EXAMPLE" >/dev/null 2>&1 || true
+  [[ ! -e $plans/.current ]]
+  by_user_in monitorDom 'echo started'
+  not_started "$by_load"
+  by_root run monitorDom -- /bin/sh -c 'echo started'
+  [[ $output == started ]]
+  by_user_in monitorDom 'echo started'
+  not_started "$by_load"
+  by_root load
+  by_user_in monitorDom 'echo started'
+  answers 0 started
+}
+
+@test "a domain that there is not, or that this kernel cannot keep to" {
+  local advice="Let root run \"secpolicy features --for"
+  by_user_in nowhereDom true
+  not_started "There is no plan of a domain 'nowhereDom'. $advice nowhereDom\", which tells whether there is such a domain and what of its rules this kernel cannot keep to"
+  echo '-p connect_port 25 revoke' >"$policy/domains/appDom"
+  by_root load
+  by_user_in appDom true
+  not_started "There is no plan of a domain 'appDom'. $advice appDom\", which tells whether there is such a domain and what of its rules this kernel cannot keep to"
+  by_user run appDom --best-effort -- /bin/sh -c true
+  exits 126
+  echo '-s @start grant' >"$policy/domains/appDom"
+  by_root load
+  [[ -f $plans/appDom ]]
+  rm "$policy/domains/appDom"
+}
+
+@test "a host that nobody has booted" {
+  rm -r "$root/run/secpolicy"
+  by_user run monitorDom -- /bin/sh -c true
+  exits 126
+  [[ -z $output && $stderr == *"run 'secpolicy boot' first"* ]]
+}
+
+@test "levels are those of the plans: permissive tells, disabled only records" {
+  local words=(-- /bin/sh -c 'cat /var/lib/vms/demo/disk')
+  by_root settings enforcement monitorDom permissive
+  by_user run monitorDom "${words[@]}"
+  exits 1
+  by_root restore
+  by_user run monitorDom "${words[@]}"
+  exits 0
+  says "secpolicy: run: monitorDom would be refused: read /var/lib/vms/demo/disk"
+  by_root settings enforcement monitorDom disabled
+  by_root restore
+  by_user run monitorDom "${words[@]}"
+  exits 0
+  [[ -n $output && -z $stderr ]]
+  [[ -z $(ls "$root/tmp") ]]
+}
+
+@test "exec of an ordinary user enters the domain that the label leads to" {
+  mkdir "$root/srv"
+  printf '%s\n' '#!/bin/sh' 'cat /opt/monitor/etc/agent.conf' >"$root/srv/look"
+  chmod 755 "$root/srv/look"
+  echo '-a filterProgram read grant' >>"$policy/domains/ioFilterDom"
+  by_root load
+  by_root label set filterProgram /srv/look
+  by_user exec -- /srv/look
+  exits 1
+  [[ $stderr == *"/opt/monitor/etc/agent.conf': Permission denied"* ]]
+  [[ -z $(ls "$root/tmp") ]]
+}
+
+@test "root sees who runs in which domain, and at which level" {
+  # shellcheck disable=SC2016
+  on_machine /bin/sh -c '
+    /usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups /programs/secpolicy run monitorDom -- \
+      /bin/sh -c "echo \$\$; exec sleep 60" >/tmp/world 2>&1 &
+    for turn in 1 2 3 4 5 6 7 8 9 10; do [ -s /tmp/world ] || sleep 1; done
+    /programs/secpolicy status
+    /programs/secpolicy settings enforcement monitorDom permissive
+    /programs/secpolicy restore
+    kill $!'
+  exits 0
+  shows "             $(<"$root/tmp/world") monitorDom enforcing"
+  says "still at the level of the entry: 1 world; 'secpolicy status' lists each, and a new start takes the new level"
+}

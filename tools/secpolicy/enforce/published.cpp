@@ -1,0 +1,113 @@
+#include "published.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <limits>
+#include <map>
+#include <utility>
+
+#include "domain_plan.h"
+#include "host/enforce/features.h"
+#include "host/enforce/plan_file.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/operation/label_index.h"
+#include "host/linux/operation/published_plans.h"
+#include "policy/installed_policy.h"
+#include "secpolicy/secpolicy.h"
+
+namespace SecPolicyCli {
+namespace {
+
+using Enforce::Features;
+using LinuxHost::HostError;
+
+// What a plan was made for: the state that has the number, and what the kernel can do.
+std::string MarkOf(const std::string& serial, const Features& features) {
+  return serial + " landlock=" + std::to_string(features.landlock) +
+         " seccomp=" + std::to_string(features.seccomp);
+}
+
+// The launcher keeps no capability that whoever enters does not have.
+Features FeaturesForAnybody() {
+  Features features = Enforce::ProbeFeatures();
+  features.capabilities = std::numeric_limits<std::uint64_t>::max();
+  return features;
+}
+
+// Nothing for a domain whose rules cannot be kept to: to give that up is for who may see them.
+std::optional<Enforce::Plan> PlanForAnybody(const Policy::InstalledDomain& domain,
+                                            PlanSources& sources) {
+  Enforce::CompiledPlan compiled = sources.Compile(domain);
+  if (domain.level == Policy::Level::kEnforcing && !KeepsAllRules(compiled)) return std::nullopt;
+  // It is entered later, and by users who do not get everywhere.
+  for (Enforce::PathRight& right : compiled.plan.paths) right.mayBeMissing = true;
+  return std::move(compiled.plan);
+}
+
+// False when the policy was changed meanwhile.
+bool TryToPublish() {
+  const LinuxHost::ChangeMark since = LinuxHost::TakeChangeMark();
+  SecPolicy::TeskAccessInterfaceImpl access;
+  const Features features = FeaturesForAnybody();
+  const std::string serial = LinuxHost::NewPlanSerial();
+  PlanSources sources(access, features);
+  std::map<std::string, std::string> plans;
+  for (const Policy::InstalledDomain& domain : Policy::ReadPolicy(access).domains) {
+    auto plan = PlanForAnybody(domain, sources);
+    if (!plan) continue;
+    plan->mark = MarkOf(serial, features);
+    plans.emplace(domain.name, Enforce::Serialize(*plan));
+  }
+  return LinuxHost::PublishPlans(since, serial, plans);
+}
+
+Enforce::Plan Verified(const std::string& domain, const std::string& bytes,
+                       const std::string& serial) {
+  Enforce::Plan plan;
+  const char* whyNot = nullptr;
+  if (!Enforce::Parse(bytes, &plan, &whyNot)) LinuxHost::RefusePublishedPlan(domain, whyNot);
+  if (plan.domain != domain) LinuxHost::RefusePublishedPlan(domain, "it is of another domain");
+  if (plan.mark != MarkOf(serial, Enforce::ProbeFeatures())) {
+    LinuxHost::RefusePublishedPlan(domain, "it is of another policy, or for another kernel");
+  }
+  return plan;
+}
+
+}  // namespace
+
+bool PublishPlans() {
+  constexpr int kMostTries = 5;
+  if (geteuid() != 0 || !LinuxHost::IsLabelIndexPossible() || LinuxHost::ArePlansPublished()) {
+    return false;
+  }
+  for (int tries = 1; tries <= kMostTries; ++tries) {
+    if (TryToPublish()) return true;
+  }
+  throw HostError(EBUSY,
+                  "Unable to make plans for ordinary users: the policy changes all the time. Run "
+                  "\"secpolicy load\" again");
+}
+
+Enforce::Plan ReadPublishedPlan(const std::string& domain) {
+  std::string serial = LinuxHost::PublishedSerial();
+  while (true) {
+    const std::string bytes = LinuxHost::ReadPublishedPlan(domain);
+    // Others may have been published in between.
+    const std::string now = LinuxHost::PublishedSerial();
+    if (now == serial) return Verified(domain, bytes, serial);
+    serial = now;
+  }
+}
+
+PublishedState::PublishedState() {
+  const std::string serial = LinuxHost::PublishedSerial();
+  const std::string copy = directory.File("host.db");
+  LinuxHost::CopyPublishedState(copy);
+  if (LinuxHost::PublishedSerial() != serial) {
+    throw HostError(EAGAIN, "The policy has just been changed. Try it again");
+  }
+  used.emplace(copy, LinuxHost::ShownStatePath());
+}
+
+}  // namespace SecPolicyCli
