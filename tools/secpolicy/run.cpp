@@ -50,11 +50,11 @@ Action Define(Syntax& syntax) {
 const Verb kRun = {
     "run", "Run a program in a domain, with exactly the rights of its rules",
     "Starts CMD in the domain DOMAIN: this process, and all that it starts, may do what the\n"
-    "installed rules of the domain grant, and nothing else. It is for who owns the state: root, "
-    "and any\n"
-    "user below a root of one's own (--root). A domain never gives rights that its user does not\n"
-    "have. In a domain that is permissive nothing is refused, and what its rules would refuse is\n"
-    "told once, on standard error and in the log; one that is disabled is only recorded.\n"
+    "installed rules of the domain grant, and nothing else. On the machine's own root, ordinary\n"
+    "users enter by the plans that root's boot and load have left for them. A domain never\n"
+    "gives rights that its user does not have. In a domain that is permissive nothing is refused,\n"
+    "and what its rules would refuse is told once, on standard error and in the log; one that is\n"
+    "disabled is only recorded.\n"
     "What this kernel cannot refuse is told with file and line before anything starts, and\n"
     "nothing is started then; --best-effort starts it all the same.\n"
     "\n"

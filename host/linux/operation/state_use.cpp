@@ -22,8 +22,8 @@ bool IsStateMissing() {
 }
 
 bool IsStateForbidden() {
-  return faccessat(AT_FDCWD, StatePath().c_str(), R_OK, AT_EACCESS | AT_SYMLINK_NOFOLLOW) != 0 &&
-         errno == EACCES;
+  constexpr int kFlags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;
+  return faccessat(AT_FDCWD, StatePath().c_str(), R_OK | W_OK, kFlags) != 0 && errno == EACCES;
 }
 
 StateCopy CopyUsedState(const std::string& to) {

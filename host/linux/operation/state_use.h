@@ -18,7 +18,7 @@ HostState& CurrentState();
 // look for counts as there.
 bool IsStateMissing();
 
-// True when there may be a state that this user is not allowed to read.
+// True when there may be a state that this user may not use.
 bool IsStateForbidden();
 
 // What became of a copy of the state: only what is missing, or not this user's to read, is left
