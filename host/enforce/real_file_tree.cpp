@@ -31,17 +31,23 @@ struct CloseDirectory {
   void operator()(DIR* directory) const { closedir(directory); }
 };
 
-bool IsEntry(const std::string& name) { return name != "." && name != ".."; }
-
-}  // namespace
-
-FileKind RealFileTree::KindOf(const std::string& path) {
+FileKind LookAt(const std::string& path) {
   const int file = OpenPlainly(path, O_PATH);
   if (file < 0) return FileKind::kNothing;
   struct stat status {};
   const bool isThere = fstat(file, &status) == 0;
   close(file);
   return isThere ? KindOfMode(status.st_mode) : FileKind::kNothing;
+}
+
+bool IsEntry(const std::string& name) { return name != "." && name != ".."; }
+
+}  // namespace
+
+FileKind RealFileTree::KindOf(const std::string& path) {
+  const auto [place, isNew] = known.try_emplace(path, FileKind::kNothing);
+  if (isNew) place->second = LookAt(path);
+  return place->second;
 }
 
 std::optional<std::vector<std::string>> RealFileTree::List(const std::string& directory,

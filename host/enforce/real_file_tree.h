@@ -1,12 +1,15 @@
 #pragma once
 
 #include <optional>
+#include <string>
+#include <unordered_map>
 
 #include "host/enforce/plan/path_plan.h"
 
 namespace Enforce {
 
-// The files below the root directory of this process.
+// The files below the root directory of this process, each as it was when it was first asked for:
+// domains mostly name the same.
 class RealFileTree : public FileTree {
  public:
   FileKind KindOf(const std::string& path) override;
@@ -16,6 +19,7 @@ class RealFileTree : public FileTree {
 
  private:
   std::optional<bool> canMask;
+  std::unordered_map<std::string, FileKind> known;
 };
 
 }  // namespace Enforce
