@@ -854,6 +854,21 @@ reaches() {
   gets narrowDom ok run=/t/public/program list=/t
 }
 
+@test "42 exec of a program that the domain which it leads to has a mask over" {
+  too_many
+  domain narrowDom "${calls[@]}" '-r /t rx' '-r /t/secret r'
+  domain wideDom "${calls[@]}" '-r /t rx'
+  printf '%s\n' '-d secret narrowDom exec grant' '-d public wideDom exec grant' >>"$policy/domains/hostDom"
+  boot_as
+  as_machine
+  is_masked "mounted so that nothing is executed: /t/secret"
+  secpolicy exec -- /t/secret/program read=/t/public/file
+  exits 126
+  [[ -z $output && $stderr == *"cannot execute /t/secret/program in the domain narrowDom: Permission denied"* ]]
+  secpolicy exec -- /t/public/program read=/t/public/file
+  answers 0 'read=/t/public/file ok'
+}
+
 @test "42 a broker starts what is masked for who asks" {
   too_many
   cp "$programs/secpolicy-run" "$root/t/public/ask"

@@ -101,11 +101,14 @@ secpolicy_in_time() {
   shows "-p connect_port 9 grant   # 1 time, first by /bin/busybox"
   mkdir "$root/dev" && : >"$root/dev/null"
   local port=$((20000 + BASHPID % 20000))
-  secpolicy_in_time observe -- /bin/sh -c "nc -l -p $port >/out & until echo hello | nc 127.0.0.1 $port; do sleep 0.1; done; wait"
+  # One that is told of the other's end before it has read what to send sends nothing.
+  secpolicy_in_time observe -- /bin/sh -c "until [ -s /out ]; do
+    nc -l -p $port >/out & until echo hello | nc 127.0.0.1 $port; do sleep 0.1; done; wait
+  done"
   exits 0
   [[ $(<"$root/out") == hello ]]
-  shows "-p bind_port $port grant   # 1 time, first by /bin/busybox"
-  shows "-p bind_port 0 grant   # 1 time, first by /bin/busybox"
+  grep -qE -- "^-p bind_port $port grant   # [0-9]+ times?, first by /bin/busybox$" <<<"$output"
+  grep -qE -- "^-p bind_port 0 grant   # [0-9]+ times?, first by /bin/busybox$" <<<"$output"
 }
 
 @test "the exit status is that of the program" {

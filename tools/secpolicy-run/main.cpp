@@ -18,7 +18,9 @@ namespace {
         "u-s,g-s)");
   }
   const Options options = ReadOptions(arguments);
-  if (options.asks) Enforce::AskBroker(Enforce::FindProgram(options.command, environ));
+  if (options.asks) {
+    Enforce::AskBroker(Enforce::FindProgram(options.command, environ, Enforce::Executed::kOutside));
+  }
   Enforce::Plan plan = Enforce::ReadPlan(options.plan);
   const Enforce::Program program =
       options.program ? Enforce::ProgramOf(*options.program, options.command, environ)

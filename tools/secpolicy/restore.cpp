@@ -66,7 +66,7 @@ ExitCode Restore() {
         const auto before = ListDomains();
         SecPolicy::RestoreDomainEnforcement(errors);
         changed = TellOfChanges(before);
-        PublishPlans();
+        PublishPlansOrTell("restore");
       },
       AdviseOnPrivilege, [&] { return "done (" + CountOf(changed, "level") + " changed)"; });
   if (end == kWell) TellOfOlderLevels();

@@ -37,7 +37,7 @@ ExitCode RollBack(const std::string& name) {
       "rollback",
       [&](ErrorList&) {
         PutBack(name);
-        PublishPlans();
+        PublishPlansOrTell("rollback");
       },
       AdviseOnPrivilege,
       [] {

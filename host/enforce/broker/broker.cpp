@@ -218,7 +218,8 @@ class Broker {
     const ssize_t size = read(entry.signals.Number(), signals.data(), signals.size());
     if (size < 0) return;
     for (ssize_t index = 0; index < size; ++index) {
-      kill(entry.process, signals[static_cast<std::size_t>(index)]);
+      const int signal = signals[static_cast<std::size_t>(index)];
+      if (std::ranges::count(kHandedOnSignals, signal) > 0) kill(entry.process, signal);
     }
     if (size > 0) return;
     // Who asked has been killed, or it would be waiting.

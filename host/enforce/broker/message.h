@@ -1,5 +1,6 @@
 #pragma once
 
+#include <csignal>
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -33,6 +34,11 @@ enum EntryDescriptor : unsigned int {
   kSignals,  // of a pipe, from which the numbers of signals are read that the program is to get
   kEntryDescriptors
 };
+
+// What a program may be sent that was started for another: what terminals and service managers
+// send.
+inline constexpr int kHandedOnSignals[] = {SIGHUP,  SIGINT,  SIGQUIT, SIGTERM,
+                                           SIGCONT, SIGUSR1, SIGUSR2};
 
 // Comes once for each request that brings a pipe for it.
 struct EntryAnswer {

@@ -17,8 +17,6 @@
 namespace Enforce {
 namespace {
 
-constexpr int kHandedOn[] = {SIGHUP, SIGINT, SIGQUIT, SIGTERM, SIGCONT, SIGUSR1, SIGUSR2};
-
 // The handler has no other way to know it.
 int signalsEnd = -1;
 
@@ -99,7 +97,7 @@ void HandOnSignals(int end) {
   struct sigaction action = {};
   action.sa_sigaction = HandOn;
   action.sa_flags = SA_SIGINFO | SA_RESTART;
-  for (const int signal : kHandedOn) sigaction(signal, &action, nullptr);
+  for (const int signal : kHandedOnSignals) sigaction(signal, &action, nullptr);
   static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
 }
 

@@ -28,13 +28,14 @@ bool IsMasked(const std::string& path, const struct stat& status) {
 }
 
 // 0 when the path leads to a program, else the system error that tells why not.
-int ReasonAgainst(const std::string& path) {
+int ReasonAgainst(const std::string& path, Executed where) {
   struct stat status = {};
   if (stat(path.c_str(), &status) != 0) return errno;
   if (!S_ISREG(status.st_mode)) return EACCES;
   if (access(path.c_str(), X_OK) == 0) return 0;
   const int reason = errno;
-  return reason == EACCES && IsMasked(path, status) ? 0 : reason;
+  const bool mayBeMasked = where == Executed::kOutside && reason == EACCES;
+  return mayBeMasked && IsMasked(path, status) ? 0 : reason;
 }
 
 // A part of PATH that is empty is the working directory.
@@ -48,7 +49,7 @@ struct Found {
 };
 
 // In the first directory of PATH that has it. One that may not be executed is passed over.
-Found SearchPath(const std::string& name) {
+Found SearchPath(const std::string& name, Executed where) {
   if (name.empty()) return {name, ENOENT};
   const char* const given = std::getenv("PATH");
   std::string_view unread = given == nullptr ? kUsualPath : given;
@@ -56,7 +57,7 @@ Found SearchPath(const std::string& name) {
   while (true) {
     const std::size_t end = std::min(unread.find(':'), unread.size());
     const std::string path = PathIn(unread.substr(0, end), name);
-    const int reasonHere = ReasonAgainst(path);
+    const int reasonHere = ReasonAgainst(path, where);
     if (reasonHere == 0) return {path, 0};
     if (reasonHere == EACCES) reason = EACCES;
     if (end == unread.size()) return {name, reason};
@@ -77,10 +78,10 @@ bool IsScript(int program) {
 
 }  // namespace
 
-Program FindProgram(char* const* arguments, char* const* environment) {
+Program FindProgram(char* const* arguments, char* const* environment, Executed where) {
   const std::string name = arguments[0];
   const bool isPath = name.find('/') != std::string::npos;
-  const Found found = isPath ? Found{name, ReasonAgainst(name)} : SearchPath(name);
+  const Found found = isPath ? Found{name, ReasonAgainst(name, where)} : SearchPath(name, where);
   if (found.reason != 0) RefuseProgram(name, found.reason);
   return {found.path, -1, arguments, environment};
 }

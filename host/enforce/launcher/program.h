@@ -13,9 +13,13 @@ struct Program {
   char* const* environment = nullptr;
 };
 
+// Who executes the program: this process, or another outside of its mounts.
+enum class Executed { kHere, kOutside };
+
 // Looks the program up by its first argument, in PATH when it has no slash, as a shell does.
 // Refuses (refuse.h) one that is not there or cannot be executed.
-Program FindProgram(char* const* arguments, char* const* environment);
+Program FindProgram(char* const* arguments, char* const* environment,
+                    Executed where = Executed::kHere);
 
 // The program that a descriptor stands for; the first argument is only its name. It is closed when
 // the program starts. Not so where it can be read and is a script: the interpreter opens it again,

@@ -27,9 +27,12 @@ pid_t ParentOf(pid_t process) {
   return 0;
 }
 
-// What others say of a process does not count for one of the superuser that it has started.
+// What others say of their processes does not count for one of this user that they have started.
 std::vector<WorldRecord> OwnRecords() {
-  return geteuid() == 0 ? std::vector<WorldRecord>() : ReadWorldRecords();
+  if (geteuid() == 0) return {};
+  std::vector<WorldRecord> records = ReadWorldRecords();
+  std::erase_if(records, [](const WorldRecord& record) { return record.user != geteuid(); });
+  return records;
 }
 
 }  // namespace

@@ -141,7 +141,9 @@ std::vector<WorldRecord> ReadWorldRecords() {
     if (!directory) continue;
     for (const std::string& name : NamesIn(directory->opened)) {
       auto record = ReadRecord(*directory, name);
-      if (record && OwnerOf(record->id) == directory->owner) found.push_back(std::move(*record));
+      if (!record || OwnerOf(record->id) != directory->owner) continue;
+      record->user = directory->owner;
+      found.push_back(std::move(*record));
     }
   }
   std::ranges::sort(found, {}, &WorldRecord::id);

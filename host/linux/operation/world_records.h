@@ -11,6 +11,7 @@ namespace LinuxHost {
 
 struct WorldRecord {
   int id = 0;
+  unsigned int user = 0;  // whose process it is, and who has told of it
   std::string domain;
   std::string level;  // that confines it
 };

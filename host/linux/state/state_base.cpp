@@ -2,15 +2,19 @@
 
 #include <unistd.h>
 
+#include <cerrno>
+
 #include "host/linux/state/plan_place.h"
 #include "host/linux/state/schema.h"
 
 namespace LinuxHost {
 
-// Plans are of the state before the commit, which others may see as soon as it is made.
+// Plans are of the state before the commit, which others may see as soon as it is made. Where they
+// cannot be ended, nothing may change.
 StateBase::StateBase(const std::string& path, const std::string& shownAs)
-    : database(path, kStateLayout, shownAs,
-               [current = CurrentPlansOf(path)] { unlink(current.c_str()); }) {
+    : database(path, kStateLayout, shownAs, [current = CurrentPlansOf(path)] {
+        return unlink(current.c_str()) == 0 || errno == ENOENT;
+      }) {
   Refresh();
 }
 

@@ -134,7 +134,7 @@ std::string Rows::Text(int column) const {
 }
 
 Store::Store(const std::string& path, const StoreLayout& wanted, const std::string& shownAs,
-             std::function<void()> tellCommit)
+             std::function<bool()> tellCommit)
     : layout(wanted),
       file(path),
       shown(shownAs),
@@ -178,8 +178,8 @@ bool Store::IsCurrent() const {
 
 int Store::BeforeCommit(void* store) {
   const auto& committing = *static_cast<const Store*>(store);
-  if (committing.isCommitTold) committing.onCommit();
-  return 0;
+  if (!committing.isCommitTold || committing.onCommit()) return 0;
+  return 1;
 }
 
 void Store::Open() {

@@ -81,9 +81,10 @@ class Store {
   // Opens the database at the absolute `path`, which messages call `shownAs`; creates it (mode
   // 0600) and its directory (0700) as needed. Refuses what is not `layout`, what another user owns
   // or may write, and links. `tellCommit`, if any, is called before whatever this connection
-  // commits; it may neither throw nor use the database.
+  // commits; it may neither throw nor use the database, and nothing is committed when it returns
+  // false.
   Store(const std::string& path, const StoreLayout& layout, const std::string& shownAs,
-        std::function<void()> tellCommit = {});
+        std::function<bool()> tellCommit = {});
   Store(const std::string& path, const StoreLayout& wanted) : Store(path, wanted, path) {}
   Store(const Store&) = delete;
   Store& operator=(const Store&) = delete;
@@ -183,7 +184,7 @@ class Store {
   ino_t inode = 0;
   sqlite3* database = nullptr;
   int openTransactions = 0;  // each within the one before it
-  std::function<void()> onCommit;
+  std::function<bool()> onCommit;
   bool isCommitTold = true;
   const volatile std::uint32_t* commitHeader = nullptr;
   std::unordered_map<const char*, sqlite3_stmt*> statements;

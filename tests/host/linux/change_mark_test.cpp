@@ -10,6 +10,7 @@
 #include <string>
 
 #include "child_process.h"
+#include "host/linux/common/host_error.h"
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/policy_count.h"
 #include "host/linux/operation/policy_load.h"
@@ -67,6 +68,18 @@ class ChangeMark : public ::testing::TestWithParam<Deed> {
 void PublishNoPlans() {
   ASSERT_TRUE(LinuxHost::PublishPlans(LinuxHost::TakeChangeMark(), "1", {}));
   ASSERT_TRUE(LinuxHost::ArePlansPublished());
+}
+
+TEST(PlansThatCannotBeEnded, LetNothingBeCommitted) {
+  const StateDirectory directory;
+  HostState& state = HostState::Current();
+  // Nothing takes a directory for a file to remove.
+  const std::string current = directory.Path() + "/plans/.current";
+  std::filesystem::create_directories(current);
+  EXPECT_THROW(state.Domains().Create("a", TESKACCESS_DEFAULT_DOM_NONE, true),
+               LinuxHost::HostError);
+  std::filesystem::remove(current);
+  EXPECT_NO_THROW(state.Domains().Create("a", TESKACCESS_DEFAULT_DOM_NONE, true));
 }
 
 class Change : public ChangeMark {};
@@ -171,7 +184,7 @@ TEST_P(NoChange, IsTakenForOne) {
   EXPECT_FALSE(ChangedSince(mark));
 }
 
-TEST_P(NoChange, EndsThePlansOfTheState) {
+TEST_P(NoChange, KeepsThePlansOfTheState) {
   PublishNoPlans();
   GetParam().act(state, domain);
   EXPECT_TRUE(LinuxHost::ArePlansPublished());

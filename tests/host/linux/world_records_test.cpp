@@ -8,6 +8,8 @@
 
 #include <filesystem>
 #include <fstream>
+#include <functional>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -206,6 +208,37 @@ TEST_F(RecordsBesideTheState, KeepNoDomain) {
   const auto listed = LinuxHost::ListWorlds(state);
   ASSERT_EQ(listed.size(), 1U);
   EXPECT_EQ(state.Domains().Find(listed[0].domainId), nullptr);
+}
+
+// Where the process of `asking` is by what its parent, one of kUser's, tells of itself.
+void ExpectDomainBelow(const std::function<void(pid_t)>& tell, uid_t asking,
+                       unsigned int expected) {
+  int told[2];
+  ASSERT_EQ(pipe(told), 0);
+  tell(getpid());
+  ChildProcess asks([&] {
+    HostState::Current().Refresh();
+    char byte = 0;
+    if (read(told[0], &byte, 1) != 1) throw std::runtime_error("nothing is told");
+    if (setresuid(asking, asking, asking) != 0) throw std::runtime_error("who asks is root");
+    const unsigned int found = LinuxHost::DomainOfCaller();
+    if (found != expected) throw std::runtime_error("it is in " + std::to_string(found));
+  });
+  if (setresuid(kUser, kUser, kUser) != 0) throw std::runtime_error("who tells is root");
+  if (write(told[1], "x", 1) != 1) throw std::runtime_error("nothing can be told");
+  const std::string failure = asks.Wait();
+  if (!failure.empty()) throw std::runtime_error(failure);
+}
+
+TEST_F(RecordsBesideTheState, CountForWhatTheirUserStarts) {
+  const auto tell = [&](pid_t process) { Write(std::to_string(process), Content(process)); };
+  EXPECT_EQ(RunInChild([&] { ExpectDomainBelow(tell, kUser, domain); }), "");
+}
+
+TEST_F(RecordsBesideTheState, CountForNothingThatIsStartedForAnother) {
+  const auto tell = [&](pid_t process) { Write(std::to_string(process), Content(process)); };
+  const auto expected = LinuxHost::kStartDomain;
+  EXPECT_EQ(RunInChild([&] { ExpectDomainBelow(tell, kUser + 1, expected); }), "");
 }
 
 TEST_F(RecordsBesideTheState, CountForNothingThatTheSuperuserDecides) {

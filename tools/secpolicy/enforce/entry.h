@@ -26,6 +26,7 @@ struct Entry {
   std::string domain;
   std::vector<std::string> command;
   LinuxHost::Descriptor program{-1};  // of what was judged; else the command says what it is
+  std::string programPath = {};       // its real path
   std::vector<std::string> environment = {};  // variables in place of those of this process
 };
 

@@ -101,6 +101,17 @@ std::vector<char*> Pointers(std::vector<std::string>& words) {
   return pointers;
 }
 
+// A descriptor leads past what is put over its path.
+void RefuseMaskedProgram(const Enforce::Plan& plan, const Entry& entry) {
+  if (plan.level != Policy::Level::kEnforcing) return;
+  for (const Enforce::Mask& mask : plan.masks) {
+    const bool isBelow = entry.programPath.starts_with(mask.path + "/");
+    if (!isBelow && entry.programPath != mask.path) continue;
+    throw Braxo::Lib::BraxoException("cannot execute " + entry.programPath + " in the domain " +
+                                     plan.domain + ": " + std::strerror(EACCES));
+  }
+}
+
 // Where neither a program nor a shell is likely to put another.
 int MoveAway(int descriptor) {
   constexpr int kLowest = 100;
@@ -121,6 +132,7 @@ void OpenLauncher() {
 void StartConfined(const Enforce::Plan& plan, const Entry& entry,
                    const Enforce::FileDescriptor& broker) {
   if (launcher < 0) ThrowNoLauncher();
+  RefuseMaskedProgram(plan, entry);
   if (geteuid() != 0) HandOnCapabilities();
   const Descriptor file = SealedFile(Enforce::Serialize(plan));
   std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};

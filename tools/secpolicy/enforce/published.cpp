@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "domain_plan.h"
+#include "ending.h"
 #include "host/enforce/features.h"
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/host_error.h"
@@ -87,6 +88,14 @@ bool PublishPlans() {
   throw HostError(EBUSY,
                   "Unable to make plans for ordinary users: the policy changes all the time. Run "
                   "\"secpolicy load\" again");
+}
+
+void PublishPlansOrTell(const std::string& verb) {
+  try {
+    PublishPlans();
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    Summarize(verb, failure.what());
+  }
 }
 
 Enforce::Plan ReadPublishedPlan(const std::string& domain) {

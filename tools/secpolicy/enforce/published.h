@@ -15,6 +15,10 @@ namespace SecPolicyCli {
 // some, for others than the superuser, who need none, and where labels were never given to files.
 bool PublishPlans();
 
+// The same for the verb `verb`, whose work is done: that there are no plans is told on standard
+// error.
+void PublishPlansOrTell(const std::string& verb);
+
 // The published plan of the domain, which is of the policy as it is and of this kernel. Throws,
 // with what to do, when there is none.
 Enforce::Plan ReadPublishedPlan(const std::string& domain);

@@ -93,6 +93,7 @@ Entry EntryOf(std::string domain, std::vector<std::string> command, ProgramFile 
     entry.command.front() = program.path;
   } else {
     entry.program = std::move(program.file);
+    entry.programPath = program.path;
   }
   return entry;
 }

@@ -54,7 +54,7 @@ std::string GiveLabel(LabelRun& run, const std::string& label,
   if (run.FindLabel(label) == kNoSuchLabel) RefuseLabel(run, label, paths);
   for (const std::string& path : paths) GiveLabelTo(run, label, path, wholeTrees);
   LinuxHost::RefreshLabelIndex();
-  PublishPlans();
+  PublishPlansOrTell("label set");
   return "done";
 }
 

@@ -71,7 +71,7 @@ std::string Relabel(LabelRun& run, const std::string& dir, const std::vector<std
                                   });
   if (!dryRun) {
     LinuxHost::RefreshLabelIndex();
-    PublishPlans();
+    PublishPlansOrTell("label relabel");
   }
   return relabelling.Summarize();
 }
