@@ -161,17 +161,13 @@ ExitCode Check(const Options& options) {
   const std::string why = run.scratch.WhyNoCopy();
   Summarize("check", DescribeFound(run.diagnostics) +
                          (why.empty() ? "" : "; checked as after a boot, since " + why));
-  const Severity leastWrong = options.warningsAreErrors ? Severity::kWarning : Severity::kError;
-  const bool isWrong =
-      run.diagnostics.Count(Severity::kError) > 0 || run.diagnostics.Count(leastWrong) > 0;
-  return isWrong ? kFailed : kWell;
+  const std::size_t wrong =
+      options.warningsAreErrors ? run.diagnostics.Count() : run.diagnostics.Count(Severity::kError);
+  return wrong > 0 ? kFailed : kWell;
 }
 
 std::string CheckCodeName(const std::string& name) {
-  for (const Code* code : AllCodes()) {
-    if (code->name == name) return "";
-  }
-  return "there is no problem '" + name + "'";
+  return FindCode(name) != nullptr ? "" : "there is no problem '" + name + "'";
 }
 
 std::string CheckNumber(const std::string& word) {
@@ -181,12 +177,10 @@ std::string CheckNumber(const std::string& word) {
 }
 
 std::string CheckWarningName(const std::string& name) {
-  for (const Code* code : AllCodes()) {
-    if (code->name != name) continue;
-    if (code->severity == Severity::kWarning) return "";
-    return "'" + name + "' is an error: a load does not end well with it";
-  }
-  return "there is no warning '" + name + "'";
+  const Code* const code = FindCode(name);
+  if (code == nullptr) return "there is no warning '" + name + "'";
+  if (code->severity == Severity::kWarning) return "";
+  return "'" + name + "' is an error: a load does not end well with it";
 }
 
 Action Define(Syntax& syntax) {

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <string_view>
 
+#include "text/format.h"
 #include "text/suggestion.h"
 #include "text/visible.h"
 
@@ -45,15 +46,6 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
     problem += KindsOf(*app->get_subcommands().front());
   }
   return "secpolicy: " + VisibleLines(problem) + "\n'" + command + " --help' explains the usage.\n";
-}
-
-// "A, B or C".
-std::string JoinChoices(const std::vector<std::string>& choices) {
-  std::string text = choices.front();
-  for (std::size_t index = 1; index < choices.size(); ++index) {
-    text += (index + 1 < choices.size() ? ", " : " or ") + choices[index];
-  }
-  return text;
 }
 
 // "help" and nothing at all ask for the list of verbs, "help VERB" for what "VERB --help" tells.
@@ -121,7 +113,7 @@ Option Syntax::AddFormat(std::string& value, const std::string& what,
                          const std::vector<std::string>& formats) {
   value = formats.front();
   CLI::Option* const format =
-      app.add_option("--format", value, "How to write " + what + ": " + JoinChoices(formats));
+      app.add_option("--format", value, "How to write " + what + ": " + ListOf(formats, "or"));
   format->check(CLI::IsMember(formats))->type_name("FORMAT")->capture_default_str();
   return Option(*format);
 }

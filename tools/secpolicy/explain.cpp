@@ -1,8 +1,8 @@
-#include <algorithm>
 #include <iostream>
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "check/diagnostic.h"
 #include "check/diagnostic_pages.h"
@@ -22,9 +22,9 @@ std::string_view PageOf(const std::string& code) {
 }
 
 std::string CheckCode(const std::string& name) {
+  if (FindCode(name) != nullptr) return "";
   std::vector<std::string> names;
   for (const Code* code : AllCodes()) names.emplace_back(code->name);
-  if (std::ranges::find(names, name) != names.end()) return "";
   const std::string nearest = NearestWord(name, names);
   return "there is no problem '" + name + "'" +
          (nearest.empty() ? "; 'secpolicy explain' lists all"

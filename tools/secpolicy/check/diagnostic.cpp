@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <iterator>
 #include <tuple>
 #include <utility>
 
@@ -104,6 +105,12 @@ constexpr std::array<const Code*, 35> kAll = {
 }  // namespace
 
 std::span<const Code* const> AllCodes() { return kAll; }
+
+const Code* FindCode(const std::string& name) {
+  const auto found =
+      std::ranges::find_if(kAll, [&](const Code* code) { return code->name == name; });
+  return found == std::end(kAll) ? nullptr : *found;
+}
 
 const Code& CodeOf(SecPolicy::Fault fault) {
   switch (fault) {

@@ -67,6 +67,9 @@ extern const Code kUnusedObject;
 // All codes: the errors and then the warnings, each in order of name.
 std::span<const Code* const> AllCodes();
 
+// The code with this name; null when there is none.
+const Code* FindCode(const std::string& name);
+
 // The code of a line that the library refuses.
 const Code& CodeOf(SecPolicy::Fault fault);
 

@@ -37,10 +37,7 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
 }
 
 std::string DescribeStop(const std::vector<std::string>& missing, const std::string& policyDir) {
-  std::string names = missing.front();
-  for (std::size_t index = 1; index < missing.size(); ++index) {
-    names += (index + 1 < missing.size() ? ", " : " and ") + missing[index];
-  }
+  const std::string names = ListOf(missing, "and");
   const bool isOne = missing.size() == 1;
   return std::string("stopped: there ") + (isOne ? "is no domain " : "are no domains ") + names +
          ", so nothing was installed. Put " +

@@ -26,6 +26,14 @@ std::string CountOf(std::size_t count, const std::string& noun) {
   return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
 }
 
+std::string ListOf(const std::vector<std::string>& words, const std::string& last) {
+  std::string text = words.front();
+  for (std::size_t index = 1; index < words.size(); ++index) {
+    text += (index + 1 < words.size() ? ", " : " " + last + " ") + words[index];
+  }
+  return text;
+}
+
 std::string UtcTime(std::int64_t seconds) { return FormatTime(seconds, "%Y-%m-%d %H:%M:%S UTC"); }
 
 std::string IsoTime(std::int64_t seconds) { return FormatTime(seconds, "%Y-%m-%dT%H:%M:%SZ"); }

@@ -11,6 +11,9 @@ namespace SecPolicyCli {
 // "1 file", "2 files".
 std::string CountOf(std::size_t count, const std::string& noun);
 
+// "A, B and C", where `last` is "and". There is one word at least.
+std::string ListOf(const std::vector<std::string>& words, const std::string& last);
+
 // The time, in seconds since 1970, for people: "2026-11-21 07:00:00 UTC".
 std::string UtcTime(std::int64_t seconds);
 
