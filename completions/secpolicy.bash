@@ -26,7 +26,7 @@ _secpolicy_tardisks() {
 
 _secpolicy() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local verbs='help init new explain boot check load load-early restore status display run exec observe features why who-can words graph diff save history rollback label settings'
+  local verbs='help init new explain boot check load load-early restore status display domain file-policy capability param-check run exec observe features why who-can words graph diff save history rollback label settings'
   local questions='read write exec list remove truncate make make-socket call use access enter create create-socket pass'
   local verb='' kind='' root='' word index positional=0
   for ((index = 1; index < COMP_CWORD; index++)); do
@@ -38,7 +38,7 @@ _secpolicy() {
       continue
     elif [[ -z $verb ]]; then
       verb=$word
-    elif [[ ($verb == settings || $verb == label) && -z $kind ]]; then
+    elif [[ ($verb == settings || $verb == label || $verb == domain || $verb == file-policy || $verb == capability || $verb == param-check) && -z $kind ]]; then
       kind=$word
     else
       positional=$((positional + 1))
@@ -127,6 +127,16 @@ _secpolicy() {
   elif [[ $verb == label ]] && [[ $kind != set || $positional -gt 0 ]]; then
     compopt -o filenames
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
+  elif [[ $verb == domain && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'create destroy list show leaked add-service of' -- "$current")
+  elif [[ $verb == file-policy && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'add remove update list replace' -- "$current")
+  elif [[ $verb == capability && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'grant revoke' -- "$current")
+  elif [[ $verb == param-check && -z $kind ]]; then
+    mapfile -t COMPREPLY < <(compgen -W 'set remove' -- "$current")
+  elif [[ $verb == domain || $verb == file-policy || $verb == capability || $verb == param-check ]] && ((positional == 0)) && [[ $kind != @(create|list|leaked|of|replace) || $verb == file-policy && $kind == list ]]; then
+    mapfile -t COMPREPLY < <(compgen -W "$(_secpolicy_domains "$root")" -- "$current")
   elif [[ $verb == settings && -z $kind ]]; then
     mapfile -t COMPREPLY < <(compgen -W 'list unset option enforcement' -- "$current")
   elif [[ $kind == option ]] && ((positional == 0)); then

@@ -21,6 +21,7 @@ const VerbGroup kVerbs[] = {
     {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
     {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff}},
     {"Ask about it", {&kWhy, &kWhoCan, &kFeatures}},
+    {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
     {"Run programs in it", {&kRun, &kExec, &kObserve}},
     {"Go back", {&kSave, &kHistory, &kRollback}}};
 
@@ -56,6 +57,10 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r rollback good               put it back\n"
     "  secpolicy --root ./r settings enforcement appDom permissive\n"
     "  secpolicy --root ./r restore                     apply the stored level\n"
+    "  secpolicy --root ./r domain create job7          a domain for a job, until the next boot\n"
+    "  secpolicy --root ./r file-policy add job7 rw /srv/jobs/7\n"
+    "  secpolicy --root ./r capability grant job7 cap_net_bind_service\n"
+    "  secpolicy --root ./r param-check set job7 bind_port 80 grant\n"
     "\n"
     "'secpolicy help VERB' explains one verb. The files are described in secpolicy(5).\n"
     "\n"

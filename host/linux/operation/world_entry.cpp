@@ -57,6 +57,15 @@ std::vector<PlacedWorld> ListWorlds(HostState& state) {
   return worlds;
 }
 
+std::optional<PlacedWorld> FindWorldAbove(HostState& state, int process) {
+  const std::vector<PlacedWorld> worlds = ListWorlds(state);
+  for (pid_t above = process; above > 0; above = ParentOf(above)) {
+    const auto found = std::ranges::find(worlds, above, &PlacedWorld::id);
+    if (found != worlds.end()) return *found;
+  }
+  return std::nullopt;
+}
+
 unsigned int DomainOfCaller() {
   HostState& state = HostState::Current();
   const std::vector<WorldRecord> records = OwnRecords();

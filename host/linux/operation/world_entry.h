@@ -25,6 +25,10 @@ struct PlacedWorld {
 // counts.
 std::vector<PlacedWorld> ListWorlds(HostState& state);
 
+// The process itself or the nearest one above it that is among them: a child is in the domain of
+// its parent. Nothing where none is, and where processes cannot be looked at.
+std::optional<PlacedWorld> FindWorldAbove(HostState& state, int process);
+
 // The domain that this process was placed in, or the nearest process above it, or the start domain.
 // Records count that this user has made, unless it is the superuser. Throws HostError for a
 // confined process of which that cannot be told.

@@ -10,6 +10,7 @@
 #include "host/linux/common/require_text.h"
 #include "host/linux/state/label_table.h"
 #include "host/linux/state/removal.h"
+#include "policy/installed_policy.h"
 #include "policy/level.h"
 
 using Braxo::Misc::StrCat;
@@ -24,7 +25,6 @@ constexpr TextLimit kName = {.noun = "domain name",
 constexpr TextLimit kService = {.noun = "guest-communication service",
                                 .whenEmpty = "a guest-communication service must not be empty",
                                 .maxSize = 255};
-constexpr unsigned int kCreatedAtRunTime = 0x8;
 
 // The bit of the state word, and the name in the state, of a part.
 struct RoleName {
@@ -33,9 +33,9 @@ struct RoleName {
   const char* name;
 };
 constexpr std::array<RoleName, 3> kRoles = {{
-    {DomainRole::GlobalVm, 0x1, "global VM"},
-    {DomainRole::IoFilter, 0x2, "IO filter"},
-    {DomainRole::DaemonFramework, 0x4, "daemon framework"},
+    {DomainRole::GlobalVm, Policy::kPlaysGlobalVm, "global VM"},
+    {DomainRole::IoFilter, Policy::kPlaysIoFilter, "IO filter"},
+    {DomainRole::DaemonFramework, Policy::kPlaysDaemonFramework, "daemon framework"},
 }};
 
 const RoleName& RowOf(DomainRole role) {
@@ -293,7 +293,7 @@ std::optional<DomainDescription> DomainTable::Describe(unsigned int id) {
 }
 
 unsigned int DomainDescription::StateWord() const {
-  return references.roles | (domain.createdAtRunTime ? kCreatedAtRunTime : 0);
+  return references.roles | (domain.createdAtRunTime ? Policy::kCreatedAtRunTime : 0);
 }
 
 std::vector<unsigned int> DomainTable::Leaked() {

@@ -16,17 +16,22 @@ Json ToJson(const Policy::Rule& rule) {
   return json;
 }
 
-Json ToJson(const Policy::InstalledDomain& domain) {
-  Json rules = Json::Array();
-  for (const Policy::Rule& rule : domain.rules) rules.Append(ToJson(rule));
+Json FactsToJson(const Policy::InstalledDomain& domain) {
   return {{"name", domain.name},
           {"id", domain.id},
           {"level", TextOf(domain.level)},
           {"state", domain.state},
           {"references", domain.references},
           {"worldReferences", domain.worldReferences},
-          {"defaultRules", static_cast<int>(domain.defaultRules)},
-          {"rules", rules}};
+          {"defaultRules", static_cast<int>(domain.defaultRules)}};
+}
+
+Json ToJson(const Policy::InstalledDomain& domain) {
+  Json rules = Json::Array();
+  for (const Policy::Rule& rule : domain.rules) rules.Append(ToJson(rule));
+  Json json = FactsToJson(domain);
+  json["rules"] = rules;
+  return json;
 }
 
 Json ToJson(const std::vector<InstalledTardisk>& tardisks) {

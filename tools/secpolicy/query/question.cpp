@@ -54,7 +54,9 @@ std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& acce
 void RefuseWord(const std::string& noun, const std::string& word,
                 const std::vector<std::string>& known) {
   std::string text = "there is no " + noun + " '" + word + "'";
-  const std::string nearest = NearestWord(word, known);
+  // Other tools take capabilities by their names alone.
+  const bool lacksPrefix = std::ranges::find(known, "cap_" + word) != known.end();
+  const std::string nearest = lacksPrefix ? "cap_" + word : NearestWord(word, known);
   if (!nearest.empty()) throw QuestionError(text + "; did you mean '" + nearest + "'?");
   if (known.size() <= kShortTable) {
     const char* separator = "; there are ";
@@ -66,12 +68,12 @@ void RefuseWord(const std::string& noun, const std::string& word,
   throw QuestionError(text);
 }
 
-namespace {
-
 void RequirePath(const std::string& path) {
   if (path.starts_with('/')) return;
   throw QuestionError("'" + path + "' is no path from the root on: it begins with a slash");
 }
+
+namespace {
 
 void RequireNumber(const std::string& word) {
   try {

@@ -58,6 +58,9 @@ Question ReadQuestion(const std::vector<std::string>& words,
 [[noreturn]] void RefuseWord(const std::string& noun, const std::string& word,
                              const std::vector<std::string>& known);
 
+// Throws QuestionError for a path that does not begin at the root.
+void RequirePath(const std::string& path);
+
 // Throws QuestionError: there is no domain `name`.
 [[noreturn]] void RefuseDomain(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access);
 

@@ -1,0 +1,21 @@
+#pragma once
+
+#include <string>
+
+#include "secpolicy/secpolicy.h"
+
+// What people name by its name or its number. A name counts before a number that is written the
+// same. Both throw QuestionError, with the nearest name, when there is no such thing.
+namespace SecPolicyCli {
+
+struct NamedDomain {
+  unsigned int id = 0;
+  std::string name;
+};
+
+NamedDomain FindDomain(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The name of an object label.
+std::string FindObject(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);
+
+}  // namespace SecPolicyCli

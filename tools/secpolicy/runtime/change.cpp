@@ -1,0 +1,68 @@
+#include "change.h"
+
+#include <charconv>
+#include <memory>
+#include <vector>
+
+#include "command_line.h"
+#include "ending.h"
+#include "enforce/published.h"
+#include "query/question.h"
+#include "root.h"
+
+namespace SecPolicyCli {
+namespace {
+
+// A cause that cannot be found out is no second failure.
+std::string Advise(const std::function<std::string()>& whyNot) {
+  try {
+    const std::string cause = whyNot();
+    return cause.empty() ? AdviseOnPrivilege() : cause;
+  } catch (const Braxo::Lib::BraxoException&) {
+    return AdviseOnPrivilege();
+  }
+}
+
+}  // namespace
+
+ExitCode Change(const std::string& verb, const std::function<void()>& change,
+                const std::function<std::string()>& whyNot) {
+  return CallLibrary(
+      verb,
+      [&](ErrorList&) {
+        change();
+        PublishPlansOrTell(verb);
+      },
+      [&] { return Advise(whyNot); });
+}
+
+std::shared_ptr<const std::string> AddDomain(Syntax& syntax) {
+  const auto domain = std::make_shared<std::string>();
+  syntax.AddOption("DOMAIN", *domain, "The name of a domain, or its number").Require();
+  return domain;
+}
+
+bool ReadGrant(const std::string& word) {
+  if (word == "grant" || word == "revoke") return word == "grant";
+  throw QuestionError("'" + word + "' is neither grant nor revoke");
+}
+
+int ReadProcess(const std::string& word) {
+  int process = 0;
+  const char* const end = word.data() + word.size();
+  const auto read = std::from_chars(word.data(), end, process);
+  if (read.ec == std::errc() && read.ptr == end && process > 0) return process;
+  throw QuestionError("'" + word + "' is not the number of a process");
+}
+
+unsigned int NumberOf(Policy::WordKind kind, const std::string& word,
+                      SecPolicy::TeskAccessInterfaceImpl& access) {
+  std::vector<std::string> known;
+  for (const auto& [name, id] : access.GetKeywordsMap(*FormOf(kind).table)) {
+    if (name == word) return static_cast<unsigned int>(id);
+    known.push_back(name);
+  }
+  RefuseWord(FormOf(kind).plainNoun, word, known);
+}
+
+}  // namespace SecPolicyCli

@@ -1,0 +1,33 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+
+#include "policy/rule_kind.h"
+#include "query/named.h"
+#include "verb.h"
+
+// What the verbs of the runtime interface share.
+namespace SecPolicyCli {
+
+// Makes one call that changes what is installed, and ends `verb` with a summary. After a failure,
+// `whyNot` is asked for its cause and what to do, of which it may know nothing.
+ExitCode Change(const std::string& verb, const std::function<void()>& change,
+                const std::function<std::string()>& whyNot);
+
+// Adds the required argument DOMAIN, a name or a number, to `syntax`.
+std::shared_ptr<const std::string> AddDomain(Syntax& syntax);
+
+// True for "grant", false for "revoke". Throws QuestionError for any other word.
+bool ReadGrant(const std::string& word);
+
+// The number of a process. Throws QuestionError for a word that is none.
+int ReadProcess(const std::string& word);
+
+// The number by which the runtime interface knows a word of the table. Throws QuestionError for a
+// word that is not in it.
+unsigned int NumberOf(Policy::WordKind kind, const std::string& word,
+                      SecPolicy::TeskAccessInterfaceImpl& access);
+
+}  // namespace SecPolicyCli
