@@ -14,7 +14,7 @@ policyFile   # the files of this policy
 
 constexpr char kFileLabels[] =
     R"(# Which files carry which label: a path and a label. "/*" behind a directory means all that is in
-# it. Of several lines about a file, the one with the longest path counts.
+# it. Of several lines about a file, the last one counts.
 
 /etc/zorvan/*   policyFile
 )";
