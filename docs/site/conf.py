@@ -1,0 +1,44 @@
+"""How Sphinx makes the site. Its pages are the files of the repository as they are, so that their links lead
+to the same places in the repository and in the site. scripts/docs runs it."""
+
+import pathlib
+import re
+
+ROOT = pathlib.Path(__file__).resolve().parents[2]
+
+project = html_title = "libsecpolicy"
+extensions = ["myst_parser"]
+
+root_doc = "docs/index"
+include_patterns = ["*.md", "docs/*.md"]
+# What builds and tests leave behind is not walked.
+exclude_patterns = [entry.name for entry in ROOT.iterdir() if entry.is_dir() and entry.name != "docs"]
+
+myst_heading_anchors = 4
+highlight_language = "none"
+
+html_theme = "furo"
+html_copy_source = False
+html_show_copyright = False
+html_show_sphinx = False
+# The way in, where one looks for it.
+html_additional_pages = {"index": "way-in.html"}
+templates_path = ["templates"]
+
+
+def mend_theme(app, _failure):
+    """As Debian builds this theme, it looks for a style outside of the site, and its dark colours count only
+    where somebody has chosen them: here they count where the system is dark as well."""
+    path = pathlib.Path(app.outdir, "_static/styles/furo.css")
+    style = path.read_text()
+    outside = "@import url(/javascript/normalize.css/normalize.css);"
+    dark = re.search(r'body\[data-theme="dark"\] (\{.*?\})', style, re.DOTALL)[1]
+    if outside in style:
+        normal = pathlib.Path("/usr/share/javascript/normalize.css/normalize.css").read_text()
+        style = style.replace(outside, normal)
+    style += f'@media (prefers-color-scheme: dark) {{ body:not([data-theme="light"]) {dark} }}\n'
+    path.write_text(style)
+
+
+def setup(app):
+    app.connect("build-finished", mend_theme)
