@@ -41,6 +41,8 @@ install(FILES completions/secpolicy.bash RENAME secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions")
 install(FILES completions/_secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
+install(FILES completions/secpolicy.fish
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d")
 foreach(unit boot restore load)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")

@@ -309,12 +309,3 @@ files to get their first label: "[0-9]* ]]
   exits 1
   [[ -z $output && $stderr == "secpolicy: boot: Unable to unpack tardisk aaa.tgz: Unrecognized archive format" ]]
 }
-
-@test "completion offers what boot takes" {
-  complete_line secpolicy boot --pl
-  [[ ${COMPREPLY[*]} == --plan ]]
-  complete_line secpolicy --root "$root" boot --policy-from b
-  [[ ${COMPREPLY[*]} == base.tgz ]]
-  complete_line secpolicy boot --plan --format j
-  [[ ${COMPREPLY[*]} == json ]]
-}

@@ -626,14 +626,6 @@ END
     <(sed -n 's/^### `\(.*\)`$/\1/p' "$SOURCE/docs/diagnostics.md" | sort)
 }
 
-@test "both shells complete the warnings, and no errors" {
-  local warnings
-  warnings=$(sed -n '/^## Warnings/,$s/^### `\(.*\)`$/\1/p' "$SOURCE/docs/diagnostics.md")
-  complete_line secpolicy check --disable ""
-  diff <(echo "$warnings") <(printf '%s\n' "${COMPREPLY[@]}")
-  diff <(echo "$warnings") <(sed -n 's/.*warning:(\(.*\)).*/\1/p' "$SOURCE/completions/_secpolicy" | tr ' ' '\n')
-}
-
 @test "cannot-start, of a domain with rules that lacks a call of @start" {
   printf '%s\n' '-s @start grant' '-s mmap revoke' >"$policy/domains/appDom"
   : >"$policy/domains/ioFilterDom"

@@ -84,28 +84,8 @@ load helper
   [[ ! -e $root/usr ]]
 }
 
-@test "the completions of bash know the verbs and the directories" {
-  complete_line secpolicy --root "$root" lo
-  [[ ${COMPREPLY[*]} == "load load-early" ]]
-  complete_line secpolicy --root "$root/ta"
-  [[ ${COMPREPLY[*]} == "$root/tardisks" ]]
-  complete_line secpolicy settings enforcement appDom p
-  [[ ${COMPREPLY[*]} == permissive ]]
-  complete_line secpolicy why sshDom c
-  [[ ${COMPREPLY[*]} == "call create create-socket" ]]
-  complete_line secpolicy who-can r
-  [[ ${COMPREPLY[*]} == "read remove" ]]
-  complete_line secpolicy words ca
-  [[ ${COMPREPLY[*]} == "capabilities calls" ]]
-}
-
-@test "every verb is in the manual page and in both completions" {
-  local verbs
-  verbs=$("$SECPOLICY" --help | sed -n '/^Write a policy:/,/^A first session/s/^  \([a-z-]*\) .*/\1/p')
-  [[ $(wc -w <<<"$verbs") -ge 24 ]]
-  for verb in $verbs; do
-    grep -q "^.It Cm $verb" "$SOURCE/docs/man/secpolicy.8"
-    grep -q "verbs=.*\<$verb\>" "$SOURCE/completions/secpolicy.bash"
-    grep -q "'$verb:" "$SOURCE/completions/_secpolicy"
-  done
+@test "the manual page, --help and the completions agree" {
+  boot
+  secpolicy save good
+  python3 "$SOURCE/tests/cli/described.py" "$SECPOLICY" "$SOURCE/docs/man/secpolicy.8" "$root"
 }

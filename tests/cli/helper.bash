@@ -137,5 +137,7 @@ complete_line() {
   compopt() { :; }
   COMP_WORDS=("$@")
   COMP_CWORD=$(($# - 1))
-  _secpolicy
+  COMP_LINE="$*"
+  COMP_POINT=${#COMP_LINE}
+  _secpolicy "$SECPOLICY" "${*: -1}"
 }

@@ -94,6 +94,7 @@ EOF
   [[ -f $PREFIX/share/man/man5/secpolicy.5 && -f $PREFIX/share/man/man8/secpolicy.8 ]]
   [[ -f $PREFIX/share/bash-completion/completions/secpolicy ]]
   [[ -f $PREFIX/share/zsh/vendor-completions/_secpolicy ]]
+  [[ -f $PREFIX/share/fish/vendor_completions.d/secpolicy.fish ]]
   for unit in boot restore load; do
     grep -q "^ExecStart=/.*/secpolicy $unit$" "$PREFIX/lib/systemd/system/secpolicy-$unit.service"
   done

@@ -314,14 +314,3 @@ refuses() {
   exits 2
   [[ $stderr == "secpolicy: diff: Unable to examine $root/run/secpolicy: Permission denied" ]]
 }
-
-@test "the completion of bash knows the saved states" {
-  secpolicy save good
-  secpolicy save nightly
-  complete_line secpolicy --root "$root" rollback ''
-  [[ ${COMPREPLY[*]} == "good nightly" ]]
-  complete_line secpolicy --root "$root" diff nig
-  [[ ${COMPREPLY[*]} == nightly ]]
-  complete_line secpolicy --root "$root/no/such" rollback ''
-  [[ -z ${COMPREPLY[*]} ]]
-}

@@ -49,7 +49,9 @@ const Verb kPaint = {
       syntax.AddOption("--color", given.color, "Color").Check(WhyNoColor).Need(thick);
       syntax.AddFormat(given.format, "it", {"text", "json", "xml"});
       syntax.AddList("--coat", given.coats, "Coat");
-      syntax.AddList("WALL", given.walls, "Walls").Require();
+      syntax.AddList("WALL", given.walls, "Walls")
+          .Require()
+          .Offer(SecPolicyCli::OfferWords({"door"}));
       given.wordsBehindDashes = syntax.WordsBehindDashes();
       return [verbose = syntax.Verbose()] {
         given.isVerbose = verbose.IsGiven();
@@ -66,7 +68,9 @@ const Verb kCarve = {
       static const Kind kinds[] = {
           {"bowl", "A bowl", "Bowls are round",
            [](Syntax& kind) -> Action {
-             kind.AddOption("WOOD", given.wood, "Wood").Require();
+             kind.AddOption("WOOD", given.wood, "Wood")
+                 .Require()
+                 .Offer(SecPolicyCli::OfferWords({"oak"}));
              return [] { return kWell; };
            }},
           {"spoon", "A spoon", nullptr, [](Syntax&) -> Action { return [] { return kFailed; }; }},
@@ -153,6 +157,62 @@ TEST_F(CommandLineTest, DoesWhatTheKindDoes) {
   EXPECT_EQ(line->Act(), kWell);
   EXPECT_EQ(Read({"carve", "spoon"}), std::nullopt);
   EXPECT_EQ(line->Act(), kFailed);
+}
+
+// What can stand for the last word, told by the words that are offered.
+struct Place {
+  std::vector<std::string> line;
+  std::vector<std::string> offered;
+  std::vector<std::string> before;
+};
+
+TEST_F(CommandLineTest, KnowsWhatCanStandOnALineThatIsNotComplete) {
+  const std::vector<std::string> paintOptions = {"--help",  "--thick",  "--thin",
+                                                 "--color", "--format", "--coat"};
+  const Place table[] = {
+      {{""}, {"help", "paint", "carve"}, {}},
+      {{"-v", "pa"}, {"help", "paint", "carve"}, {}},
+      {{"help", ""}, {"paint", "carve"}, {}},
+      {{"help", "carve", ""}, {}, {}},
+      {{"nothing", ""}, {}, {}},
+      {{"carve", ""}, {"bowl", "spoon"}, {}},
+      {{"carve", "nothing", ""}, {}, {}},
+      {{"carve", "bowl", ""}, {"oak"}, {}},
+      {{"paint", "--format", ""}, {"text", "json", "xml"}, {}},
+      {{"paint", "--format=j"}, {"--format=text", "--format=json", "--format=xml"}, {}},
+      {{"paint", "--thick", "--coat", "a", "--"},
+       {"--help", "--thin", "--color", "--format", "--coat"},
+       {}},
+      {{"paint", "-"}, paintOptions, {}},
+      {{"paint", ""}, {"door"}, {}},
+      {{"paint", "north", "--thin", "--root", "/r", "south", ""}, {"door"}, {"north", "south"}},
+      {{"paint", "north", "--", "-"}, {"door"}, {}},
+      {{"carve", "bowl", "oak", ""}, {"--help"}, {}},
+  };
+  for (const auto& [words, offered, before] : table) {
+    line.emplace(SecPolicyCli::Description{"Tests.", "The end.", "secpolicy 1.2.3"}, kVerbs);
+    const SecPolicyCli::WordPlace place = line->FindPlace(words);
+    std::vector<std::string> found;
+    for (const auto& each : place.words) found.push_back(each.word);
+    if (place.offering) {
+      for (const auto& each : place.offering(place.before).words)
+        found.push_back(place.fixed + each.word);
+    }
+    std::erase_if(found, [](const std::string& word) {
+      return word == "--root" || word == "--verbose" || word == "--version";
+    });
+    EXPECT_EQ(found, offered) << testing::PrintToString(words);
+    EXPECT_EQ(place.before, before) << testing::PrintToString(words);
+  }
+}
+
+TEST_F(CommandLineTest, KnowsTheRootOfALineThatIsNotComplete) {
+  for (const std::vector<std::string>& words :
+       {std::vector<std::string>{"--root", "/r", "paint", ""},
+        {"paint", "--root=/r", "--coat", ""}}) {
+    line.emplace(SecPolicyCli::Description{"Tests.", "The end.", "secpolicy 1.2.3"}, kVerbs);
+    EXPECT_EQ(line->FindPlace(words).root, "/r");
+  }
 }
 
 struct Misuse {

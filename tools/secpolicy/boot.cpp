@@ -104,7 +104,8 @@ Action Define(Syntax& syntax) {
   syntax
       .AddList("--policy-from", options->policyFrom,
                "Let the tardisk NAME bring the policy of the host; may be repeated")
-      .NameValue("NAME");
+      .NameValue("NAME")
+      .Offer(OfferTardisks());
   AddTiming(syntax, options->timing).Exclude(plan);
   const Option verbose = syntax.Verbose();
   return [=] {

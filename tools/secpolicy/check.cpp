@@ -188,6 +188,7 @@ Action Define(Syntax& syntax) {
   syntax
       .AddOption("DIR", options->path,
                  "The policy directory, or a file in it, as seen from the root")
+      .Offer(OfferFiles())
       .ShowDefault();
   syntax.AddFlag("--fresh", options->fresh,
                  "Check as after a boot, whatever is installed on this host now");
@@ -204,7 +205,8 @@ Action Define(Syntax& syntax) {
   syntax.AddFlag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
   syntax.AddList("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
       .Check(CheckWarningName)
-      .NameValue("CODE");
+      .NameValue("CODE")
+      .Offer(OfferCodes(true));
   return [options] { return Check(*options); };
 }
 

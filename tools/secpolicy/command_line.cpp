@@ -92,21 +92,26 @@ Option& Option::Exclude(const Option& other) {
   return *this;
 }
 
+Option& Option::Offer(const Offering& offering) {
+  offerings->insert_or_assign(option, offering);
+  return *this;
+}
+
 bool Option::IsGiven() const { return option->count() > 0; }
 
 Option Syntax::AddFlag(const char* name, bool& value, const char* meaning) {
-  return Option(*app.add_flag(name, value, meaning));
+  return {*app.add_flag(name, value, meaning), offerings};
 }
 
 Option Syntax::AddOption(const char* name, std::string& value, const std::string& meaning) {
-  return Option(*app.add_option(name, value, meaning));
+  return {*app.add_option(name, value, meaning), offerings};
 }
 
 Option Syntax::AddList(const char* name, std::vector<std::string>& values,
                        const std::string& meaning) {
   CLI::Option* const list = app.add_option(name, values, meaning);
   if (name[0] == '-') list->allow_extra_args(false);
-  return Option(*list);
+  return {*list, offerings};
 }
 
 Option Syntax::AddFormat(std::string& value, const std::string& what,
@@ -115,7 +120,7 @@ Option Syntax::AddFormat(std::string& value, const std::string& what,
   CLI::Option* const format =
       app.add_option("--format", value, "How to write " + what + ": " + ListOf(formats, "or"));
   format->check(CLI::IsMember(formats))->type_name("FORMAT")->capture_default_str();
-  return Option(*format);
+  return Option(*format, offerings).Offer(OfferWords(formats));
 }
 
 Action Syntax::AddKinds(std::span<const Kind> kinds) {
@@ -124,17 +129,17 @@ Action Syntax::AddKinds(std::span<const Kind> kinds) {
   for (const Kind& kind : kinds) {
     CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
     if (kind.help != nullptr) subcommand->footer(kind.help);
-    Syntax syntax(*subcommand, behindDashes);
+    Syntax syntax(*subcommand, offerings, behindDashes);
     subcommand->parse_complete_callback(
         [chosen, action = kind.define(syntax)] { *chosen = action; });
   }
   return [chosen] { return (*chosen)(); };
 }
 
-Option Syntax::Verbose() const { return Option(*app.get_parent()->get_option("--verbose")); }
+Option Syntax::Verbose() const { return {*app.get_parent()->get_option("--verbose"), offerings}; }
 
-CommandLine::CommandLine(const Description& description, std::span<const VerbGroup> groups)
-    : app(std::make_unique<CLI::App>(description.about, "secpolicy")) {
+CommandLine::CommandLine(const Description& description, std::span<const VerbGroup> verbGroups)
+    : app(std::make_unique<CLI::App>(description.about, "secpolicy")), groups(verbGroups) {
   app->require_subcommand(1);
   app->fallthrough();
   app->footer(description.footer);
@@ -156,10 +161,25 @@ void CommandLine::AddVerb(const Verb& added, const char* group) {
   subcommand->group(group);
   subcommand->preparse_callback([this, &added, subcommand](std::size_t /*rest*/) {
     subcommand->footer(added.help);
-    Syntax syntax(*subcommand, wordsBehindDashes);
-    action = added.define(syntax);
+    action = Define(added, *subcommand);
     verb = &added;
   });
+}
+
+Action CommandLine::Define(const Verb& defined, CLI::App& subcommand) {
+  Syntax syntax(subcommand, offerings, wordsBehindDashes);
+  return defined.define(syntax);
+}
+
+WordPlace CommandLine::FindPlace(const std::vector<std::string>& words) {
+  const auto define = [this](CLI::App& subcommand) {
+    for (const VerbGroup& group : groups) {
+      const auto found = std::ranges::find(group.verbs, subcommand.get_name(), &Verb::name);
+      // The values of options belong to the action.
+      if (found != group.verbs.end()) action = Define(**found, subcommand);
+    }
+  };
+  return SecPolicyCli::FindPlace(*app, define, offerings, words);
 }
 
 std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "complete/word_place.h"
 #include "verb.h"
 
 // The only file that knows the library for command lines is command_line.cpp: its headers cost
@@ -22,7 +23,7 @@ namespace SecPolicyCli {
 // and meaning. It lasts as long as the command line.
 class Option {
  public:
-  explicit Option(CLI::Option& added) : option(&added) {}
+  Option(CLI::Option& added, Offerings& all) : option(&added), offerings(&all) {}
 
   Option& Require(bool isRequired = true);
   Option& NameValue(const char* name);
@@ -34,12 +35,16 @@ class Option {
   Option& Need(const Option& other);
   Option& Exclude(const Option& other);
 
+  // What completion offers for a value whose name does not tell, as complete/offer.h has it.
+  Option& Offer(const Offering& offering);
+
   bool IsGiven() const;
 
  private:
   friend class Syntax;
 
   CLI::Option* option;
+  Offerings* offerings;
 };
 
 class Syntax;
@@ -56,8 +61,8 @@ struct Kind {
 // done: they become what is given, and stay as they are when nothing is.
 class Syntax {
  public:
-  Syntax(CLI::App& verb, std::size_t wordsBehindDashes)
-      : app(verb), behindDashes(wordsBehindDashes) {}
+  Syntax(CLI::App& verb, Offerings& all, std::size_t wordsBehindDashes)
+      : app(verb), offerings(all), behindDashes(wordsBehindDashes) {}
 
   Option AddFlag(const char* name, bool& value, const char* meaning);
 
@@ -83,6 +88,7 @@ class Syntax {
 
  private:
   CLI::App& app;
+  Offerings& offerings;
   const std::size_t behindDashes;
 };
 
@@ -102,7 +108,7 @@ struct Description {
 // The command line as a whole.
 class CommandLine {
  public:
-  CommandLine(const Description& description, std::span<const VerbGroup> groups);
+  CommandLine(const Description& description, std::span<const VerbGroup> verbGroups);
   CommandLine(const CommandLine&) = delete;
   CommandLine& operator=(const CommandLine&) = delete;
   ~CommandLine();
@@ -110,6 +116,10 @@ class CommandLine {
   // Returns the exit code when there is nothing to do: help is printed, or what is wrong with the
   // usage.
   std::optional<ExitCode> Read(int argc, char** argv);
+
+  // What can stand for the last of `words`, which are those behind the command's name and need not
+  // be complete.
+  WordPlace FindPlace(const std::vector<std::string>& words);
 
   // What was read.
   std::optional<std::string> Root() const;
@@ -119,8 +129,11 @@ class CommandLine {
 
  private:
   void AddVerb(const Verb& added, const char* group);
+  Action Define(const Verb& defined, CLI::App& subcommand);
 
   std::unique_ptr<CLI::App> app;
+  std::span<const VerbGroup> groups;
+  Offerings offerings;
   CLI::Option* rootOption = nullptr;
   std::string root;
   bool verbose = false;

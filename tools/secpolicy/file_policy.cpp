@@ -72,7 +72,7 @@ std::shared_ptr<const std::string> AddPermissions(Syntax& syntax) {
 
 std::shared_ptr<const std::string> AddPath(Syntax& syntax, const char* name, const char* meaning) {
   const auto path = std::make_shared<std::string>();
-  syntax.AddOption(name, *path, meaning).Require();
+  syntax.AddOption(name, *path, meaning).Require().Offer(OfferFiles());
   return path;
 }
 

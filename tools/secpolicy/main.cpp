@@ -5,8 +5,10 @@
 #include <iostream>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "command_line.h"
+#include "complete/completion.h"
 #include "host/linux/operation/log_use.h"
 #include "root.h"
 #include "text/terminal_guard.h"
@@ -78,6 +80,9 @@ ExitCode FlushOutput(ExitCode code) {
 
 int Run(int argc, char** argv) {
   CommandLine commandLine({kAbout, kFooter, "secpolicy " SECPOLICY_VERSION}, kVerbs);
+  if (argc > 1 && std::string_view(argv[1]) == kAskForWords) {
+    return Complete(commandLine, {argv + 2, argv + argc});
+  }
   if (const auto end = commandLine.Read(argc, argv)) return *end;
   bool isInRoot = false;
   try {

@@ -31,6 +31,7 @@ struct Setting {
   std::optional<std::string> (*find)(const std::string& key);
   void (*store)(const std::string& key, const std::string& value);
   bool (*remove)(const std::string& key);
+  Offer (*offerKeys)(const std::vector<std::string>& before);
 };
 
 std::string TextOf(const LinuxHost::OptionValue& value) {
@@ -67,14 +68,24 @@ void StoreEnforcement(const std::string& domain, const std::string& level) {
   LinuxHost::StoreWantedEnforcement(domain, level);
 }
 
+Offer OfferOptions(const std::vector<std::string>& /*before*/) {
+  Offer offer{.words = {{"/UserVars/CheckAccessTemplateEnabled"}}};
+  for (const auto& [path, value] : LinuxHost::ListWantedOptions()) offer.words.push_back({path});
+  return offer;
+}
+
+Offer OfferDomains(const std::vector<std::string>& before) {
+  return OfferWordsOf(Policy::WordKind::kDomain)(before);
+}
+
 constexpr Setting kSettingKinds[] = {
     {"option", "An advanced option of the host", "PATH",
      "The option, such as /UserVars/CheckAccessTemplateEnabled", "VALUE",
      "What to store: a whole number, or any other text", FindOption, StoreOption,
-     LinuxHost::RemoveWantedOption},
+     LinuxHost::RemoveWantedOption, OfferOptions},
     {"enforcement", "The level that 'restore' gives a domain", "DOMAIN", "The name of the domain",
      "LEVEL", "What to store: enforcing, permissive or disabled", LinuxHost::FindWantedEnforcement,
-     StoreEnforcement, LinuxHost::RemoveWantedEnforcement},
+     StoreEnforcement, LinuxHost::RemoveWantedEnforcement, OfferDomains},
 };
 
 ExitCode Show(const Setting& setting, const std::string& key) {
@@ -98,7 +109,7 @@ ExitCode Store(const Setting& setting, const std::string& key, const std::string
 Action DefineSetting(const Setting& setting, Syntax& syntax) {
   const auto key = std::make_shared<std::string>();
   const auto value = std::make_shared<std::string>();
-  syntax.AddOption(setting.key, *key, setting.keyMeaning).Require();
+  syntax.AddOption(setting.key, *key, setting.keyMeaning).Require().Offer(setting.offerKeys);
   const Option stored = syntax.AddOption(setting.value, *value, setting.valueMeaning);
   return [=, &setting] {
     return stored.IsGiven() ? Store(setting, *key, *value) : Show(setting, *key);
@@ -121,11 +132,24 @@ std::string CheckSettingKind(const std::string& kind) {
   return "'" + kind + "' is no kind of setting: option or enforcement";
 }
 
+Offer OfferKeys(const std::vector<std::string>& before) {
+  Offer offer = OfferOptions(before);
+  for (const auto& [domain, level] : LinuxHost::ListWantedEnforcement()) {
+    offer.words.push_back({domain});
+  }
+  return offer;
+}
+
 Action DefineUnset(Syntax& syntax) {
   const auto kind = std::make_shared<std::string>();
   const auto key = std::make_shared<std::string>();
-  syntax.AddOption("KIND", *kind, "option or enforcement").Check(CheckSettingKind).Require();
-  syntax.AddOption("KEY", *key, "The path of the option, or the name of the domain").Require();
+  syntax.AddOption("KIND", *kind, "option or enforcement")
+      .Check(CheckSettingKind)
+      .Require()
+      .Offer(OfferWords({"option", "enforcement"}));
+  syntax.AddOption("KEY", *key, "The path of the option, or the name of the domain")
+      .Require()
+      .Offer(OfferKeys);
   return [=] { return Unset(*kind, *key); };
 }
 

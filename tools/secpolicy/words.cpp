@@ -37,13 +37,17 @@ constexpr std::array<WordList, 8> kLists = {{
     {"sockets", WordKind::kSocketKind},
 }};
 
-const WordList& FindList(const std::string& name) {
-  const auto* const list = std::ranges::find(kLists, name, &WordList::name);
-  if (list != kLists.end()) return *list;
+std::vector<std::string> NamesOfLists() {
   std::vector<std::string> names;
   names.reserve(kLists.size());
   for (const WordList& each : kLists) names.emplace_back(each.name);
-  RefuseWord("kind of words", name, names);
+  return names;
+}
+
+const WordList& FindList(const std::string& name) {
+  const auto* const list = std::ranges::find(kLists, name, &WordList::name);
+  if (list != kLists.end()) return *list;
+  RefuseWord("kind of words", name, NamesOfLists());
 }
 
 std::vector<std::string> WordsOf(WordKind kind, SecPolicy::TeskAccessInterfaceImpl& access) {
@@ -100,7 +104,8 @@ ExitCode Answer(const std::string& kind, const std::string& format) {
 
 Action Define(Syntax& syntax) {
   const auto kind = std::make_shared<std::string>();
-  syntax.AddOption("KIND", *kind, "The kind of words; without it, the kinds are listed");
+  syntax.AddOption("KIND", *kind, "The kind of words; without it, the kinds are listed")
+      .Offer(OfferWords(NamesOfLists()));
   const auto format = AddAnswerFormat(syntax);
   return [=] { return Ask("words", [=] { return Answer(*kind, *format); }); };
 }

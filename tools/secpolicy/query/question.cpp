@@ -39,7 +39,8 @@ std::vector<std::string> DomainNames(TeskAccessInterfaceImpl& access) {
   return names;
 }
 
-// The words that can stand there. The name of a domain is a label, too.
+}  // namespace
+
 std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& access) {
   std::vector<std::string> known;
   if (CanBeDomain(kind)) known = DomainNames(access);
@@ -48,8 +49,6 @@ std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& acce
   }
   return known;
 }
-
-}  // namespace
 
 void RefuseWord(const std::string& noun, const std::string& word,
                 const std::vector<std::string>& known) {

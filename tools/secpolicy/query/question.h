@@ -54,6 +54,11 @@ struct Question {
 Question ReadQuestion(const std::vector<std::string>& words,
                       SecPolicy::TeskAccessInterfaceImpl& access);
 
+// The words that can stand for a word of this kind in a question: those of the host's table, if
+// there is one. The name of a domain is a label, too.
+std::vector<std::string> KnownWords(Policy::WordKind kind,
+                                    SecPolicy::TeskAccessInterfaceImpl& access);
+
 // Throws QuestionError: there is no `noun` with the word `word`, but those in `known`.
 [[noreturn]] void RefuseWord(const std::string& noun, const std::string& word,
                              const std::vector<std::string>& known);

@@ -94,7 +94,10 @@ std::vector<SavedState> ListSavedStates() {
 
 std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning) {
   const auto name = std::make_shared<std::string>();
-  syntax.AddOption("NAME", *name, meaning).Require().Check(WhyNoSavedName);
+  syntax.AddOption("NAME", *name, meaning)
+      .Require()
+      .Check(WhyNoSavedName)
+      .Offer(OfferSavedStates());
   return name;
 }
 
