@@ -1,7 +1,13 @@
+#include <fcntl.h>
+#include <linux/openat2.h>
+#include <sys/syscall.h>
+
 #include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <string_view>
 
+#include "host/linux/common/descriptor.h"
 #include "zorvan/kernel.h"
 
 namespace Zorvan::Kernel {
@@ -9,15 +15,41 @@ namespace {
 
 constexpr std::size_t kResolvedSize = 1984;  // as in the kernel's own file records
 
+// True for a path from the root whose parts are all names.
+bool IsOfNames(std::string_view path) {
+  if (!path.starts_with('/')) return false;
+  while (!path.empty()) {
+    path.remove_prefix(1);
+    const std::string_view name = path.substr(0, path.find('/'));
+    if (name.empty() || name == "." || name == "..") return false;
+    path.remove_prefix(name.size());
+  }
+  return true;
+}
+
+bool LeadsOverNoLink(const char* path) {
+  open_how how{};
+  how.flags = O_PATH | O_CLOEXEC;
+  how.resolve = RESOLVE_NO_SYMLINKS;
+  const auto opened = syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof how);
+  return LinuxHost::Descriptor(static_cast<int>(opened)).IsOpen();
+}
+
+int Take(const char* path, char* resolved) {
+  const std::size_t size = std::strlen(path) + 1;
+  if (size > kResolvedSize) return -1;
+  std::memcpy(resolved, path, size);
+  return 0;
+}
+
 }  // namespace
 
+// Most paths are written as they resolve, which the kernel tells in one step.
 int RealPath(const char* path, char* resolved) {
+  if (IsOfNames(path) && LeadsOverNoLink(path)) return Take(path, resolved);
   char canonical[PATH_MAX];
   if (realpath(path, canonical) == nullptr) return -1;
-  const std::size_t size = std::strlen(canonical) + 1;
-  if (size > kResolvedSize) return -1;
-  std::memcpy(resolved, canonical, size);
-  return 0;
+  return Take(canonical, resolved);
 }
 
 }  // namespace Zorvan::Kernel
