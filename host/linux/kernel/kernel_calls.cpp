@@ -126,6 +126,7 @@ FilePolicy ToFilePolicy(const TeskAccess_FileRule& rule, unsigned int domainId, 
 std::vector<FilePolicy> ReadFilePolicies(std::uint64_t address, std::uint32_t count,
                                          unsigned int domainId, int world) {
   std::vector<FilePolicy> policies;
+  policies.reserve(count);
   std::array<TeskAccess_FileRule, kPiece> piece;
   while (policies.size() < count) {
     const std::size_t size = std::min(kPiece, count - policies.size());
@@ -142,9 +143,13 @@ std::uint32_t AddFilePolicies(HostState& state, Args args) {
   if (count == 0 || count > kMaxBatch) throw HostError(EINVAL, "bad number of file policies");
   auto policies = ReadFilePolicies(args[2], count, Unsigned(args[1]), Signed(args[0]));
   for (FilePolicy& policy : policies) policy.line = state.CurrentLine();
-  Store(args[4], std::uint32_t{0});
-  state.FilePolicies().Install(policies);
   Store(args[4], count);
+  try {
+    state.FilePolicies().Install(policies);
+  } catch (...) {
+    Store(args[4], std::uint32_t{0});
+    throw;
+  }
   return 0;
 }
 

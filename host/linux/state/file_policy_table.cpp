@@ -1,6 +1,8 @@
 #include "host/linux/state/file_policy_table.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <optional>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
@@ -31,6 +33,11 @@ bool IsForTheSame(const FilePolicy& one, const FilePolicy& other) {
          one.domain.name == other.domain.name;
 }
 
+bool AreForTheSame(std::span<const FilePolicy> policies) {
+  return std::ranges::all_of(
+      policies, [&](const FilePolicy& policy) { return IsForTheSame(policy, policies.front()); });
+}
+
 }  // namespace
 
 void FilePolicyTable::RequireDomain(unsigned int domainId) {
@@ -39,7 +46,9 @@ void FilePolicyTable::RequireDomain(unsigned int domainId) {
 }
 
 void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
-  Transaction transaction(base.Database());
+  // A single row is a step by itself.
+  std::optional<Transaction> transaction;
+  if (!AreForTheSame(policies)) transaction.emplace(base.Database());
   for (std::size_t index = 0; index < policies.size(); ++index) {
     const FilePolicy& policy = policies[index];
     RequireWorld(policy.world);
@@ -52,7 +61,7 @@ void FilePolicyTable::Install(std::span<const FilePolicy> policies) {
         base, [&] { return domains.Refusal(policy.domain); },
         [&] { return InstallIfUnchanged(policy); });
   }
-  transaction.Commit();
+  if (transaction) transaction->Commit();
 }
 
 bool FilePolicyTable::InstallIfUnchanged(const FilePolicy& policy) {
@@ -132,8 +141,8 @@ std::vector<FilePolicy> FilePolicyTable::All(unsigned int domainId) {
 
 std::vector<Policy::Rule> FilePolicyTable::Read(unsigned int domainId) {
   Rows rows = base.Database().Select(
-      "SELECT path, permission, line FROM file_policy WHERE domain_id = ?1 AND world = 0 "
-      "ORDER BY id",
+      "SELECT path, permission, line FROM file_policy WHERE id IN "
+      "(SELECT id FROM file_policy WHERE domain_id = ?1 AND world = 0) ORDER BY id",
       domainId);
   std::vector<Policy::Rule> rules;
   while (rows.Next()) {
