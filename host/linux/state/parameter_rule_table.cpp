@@ -124,7 +124,7 @@ void ParameterRuleTable::Remove(unsigned int domainId, const std::string& check,
 std::vector<Policy::Rule> ParameterRuleTable::Read(unsigned int domainId) {
   Rows rows = base.Database().Select(
       "SELECT parameter_check, first_word, last_word, granted, line FROM parameter_rule "
-      "WHERE domain_id = ?1 ORDER BY id",
+      "WHERE id IN (SELECT id FROM parameter_rule WHERE domain_id = ?1) ORDER BY id",
       domainId);
   std::vector<Policy::Rule> rules;
   while (rows.Next()) {

@@ -51,11 +51,11 @@ void RuleTable::Install(const DomainReference& domain, const Policy::Rule& rule,
 }
 
 std::vector<Policy::Rule> RuleTable::Read(unsigned int domainId, RuleKind kind) {
-  // Of a bare ?2 the engine would look whether it fits the condition of transition_target, and
-  // prepare the statement again for each other kind.
+  // Numbers are sorted sooner than rows. Of a bare ?2 the engine would look whether it fits the
+  // condition of transition_target, and prepare the statement again for each other kind.
   Rows rows = base.Database().Select(
-      "SELECT granted, line, word1, word2, word3 FROM rule WHERE domain_id = ?1 AND kind = +?2 "
-      "ORDER BY id",
+      "SELECT granted, line, word1, word2, word3 FROM rule WHERE id IN "
+      "(SELECT id FROM rule WHERE domain_id = ?1 AND kind = +?2) ORDER BY id",
       domainId, FormOf(kind).name);
   const std::size_t wordCount = FormOf(kind).words.size();
   // Growing from nothing would move each rule twice; few domains have more of a kind.
