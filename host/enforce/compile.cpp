@@ -118,11 +118,10 @@ std::vector<std::string> GapsOf(const Features& features) {
 }
 
 // In the order of the rules.
-std::vector<RuleFate> FatesOf(const Parts& parts, const Features& features) {
-  std::vector<RuleFate> fates;
-  for (const auto* const part :
-       {&parts.paths.fates, &parts.calls.fates, &parts.capabilities.fates, &parts.net.fates}) {
-    fates.insert(fates.end(), part->begin(), part->end());
+std::vector<RuleFate> TakeFates(Parts& parts, const Features& features) {
+  std::vector<RuleFate> fates = std::move(parts.paths.fates);
+  for (auto* const part : {&parts.calls.fates, &parts.capabilities.fates, &parts.net.fates}) {
+    std::ranges::move(*part, std::back_inserter(fates));
   }
   std::ranges::sort(fates, {}, &RuleFate::place);
   for (RuleFate& fate : fates) {
@@ -153,7 +152,7 @@ void TakePorts(NetPlan& net, Plan* plan) {
 
 CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts parts) {
   CompiledPlan compiled;
-  compiled.fates = FatesOf(parts, features);
+  compiled.fates = TakeFates(parts, features);
   TellOfBroker(domain.name, &compiled.fates);
   compiled.gaps = GapsOf(features);
   Plan& plan = compiled.plan;

@@ -17,12 +17,28 @@ using Policy::RuleKind;
 
 // ---- The tree of places where rights may change
 
+// What is known of a place before rights are given.
+struct Finding {
+  FileKind kind = FileKind::kNothing;
+  Region region;
+  Rights own = 0;   // what the file itself may be used for, and what is to come beneath it
+  Rights here = 0;  // of these, what all beneath it has too
+  Rights any = 0;   // what anything has that is there: the file, or one beneath it
+};
+
 // A path that a rule or a label begins at, or one on the way there.
 struct Node {
   std::map<std::string, std::unique_ptr<Node>, std::less<>> children;
   const Rule* rule = nullptr;             // about this very path
   std::optional<std::string_view> label;  // where it is not that of the directory above
+  Finding finding;
 };
+
+Node& ChildOf(Node& node, std::string_view name) {
+  const auto known = node.children.find(name);
+  if (known != node.children.end()) return *known->second;
+  return *node.children.emplace(name, std::make_unique<Node>()).first->second;
+}
 
 Node& NodeAt(Node& root, std::string_view path) {
   Node* node = &root;
@@ -31,9 +47,7 @@ Node& NodeAt(Node& root, std::string_view path) {
     const std::string_view name = path.substr(0, end);
     path.remove_prefix(std::min(end + 1, path.size()));
     if (name.empty()) continue;
-    auto& child = node->children[std::string(name)];
-    if (child == nullptr) child = std::make_unique<Node>();
-    node = child.get();
+    node = &ChildOf(*node, name);
   }
   return *node;
 }
@@ -76,15 +90,6 @@ class Planner {
   }
 
  private:
-  // What is known of a node before rights are given.
-  struct Finding {
-    FileKind kind = FileKind::kNothing;
-    Region region;
-    Rights own = 0;   // what the file itself may be used for, and what is to come beneath it
-    Rights here = 0;  // of these, what all beneath it has too
-    Rights any = 0;   // what anything has that is there: the file, or one beneath it
-  };
-
   // Of rights that a directory is to have with all that is beneath it, those that its kind has.
   static Rights Fitting(FileKind kind) {
     return kind == FileKind::kDirectory ? ~Rights{0} : Landlock::kOfFiles;
@@ -102,26 +107,27 @@ class Planner {
     return isThere ? finding.own & Fitting(finding.kind) : 0;
   }
 
-  Rights Examine(const Node& node, const std::string& path, const Region& above) {
-    Finding finding{.kind = files.KindOf(path), .region = RegionOf(node, above)};
+  Rights Examine(Node& node, const std::string& path, const Region& above) {
+    Finding& finding = node.finding;
+    finding.kind = files.KindOf(path);
+    finding.region = RegionOf(node, above);
     finding.own = rules.RightsOf(finding.region);
     finding.here = finding.own;
     finding.any = AnyOf(finding);
     for (const auto& [name, child] : node.children) {
       const Rights beneath = Examine(*child, Join(path, name), finding.region);
       if (finding.kind == FileKind::kFile) continue;
-      const Finding& found = findings.at(child.get());
+      const Finding& found = child->finding;
       finding.any |= found.any;
       // An entry is removed by its own rights, whatever lies beneath it.
       finding.here &= beneath & (found.own | ~kEntryRights);
     }
-    findings[&node] = finding;
     if (finding.kind == FileKind::kLink) return ~Rights{0};
     return Beneath(finding);
   }
 
   void Place(const Node& node, const std::string& path, Rights have) {
-    const Finding& finding = findings.at(&node);
+    const Finding& finding = node.finding;
     if (finding.kind == FileKind::kLink) return;
     if (finding.kind == FileKind::kNothing) {
       if (node.rule != nullptr) LoseMissing(finding.region, finding.own & ~have);
@@ -154,7 +160,7 @@ class Planner {
   // What is beneath the directory does not all have the rights `apart`. Returns those of them that
   // it has been given with all that is beneath it.
   Rights Divide(const Node& node, const std::string& path, Rights apart) {
-    const Region& region = findings.at(&node).region;
+    const Region& region = node.finding.region;
     if (const auto entries = files.List(path, kMostSiblings)) {
       TakeApart(node, path, *entries, apart);
       return 0;
@@ -170,7 +176,7 @@ class Planner {
   // Each entry gets the rights that has them.
   void TakeApart(const Node& node, const std::string& path, const std::vector<std::string>& entries,
                  Rights apart) {
-    const Region& region = findings.at(&node).region;
+    const Region& region = node.finding.region;
     losses.Lose(region, apart,
                 "entries of " + path +
                     " have different rights: those that are there at "
@@ -224,7 +230,7 @@ class Planner {
     Rights left = 0;
     if (wanted == 0) return left;
     for (const auto& [name, child] : node.children) {
-      const Finding& finding = findings.at(child.get());
+      const Finding& finding = child->finding;
       const std::string place = Join(path, name);
       const Rights lacking = LackingOf(finding, wanted);
       const std::optional<Cover> cover = CoverFor(*child, lacking);
@@ -249,7 +255,7 @@ class Planner {
   }
 
   std::optional<Cover> CoverFor(const Node& node, Rights lacking) {
-    const Finding& finding = findings.at(&node);
+    const Finding& finding = node.finding;
     const bool isFile = finding.kind == FileKind::kFile;
     if (lacking == 0 || (!isFile && finding.kind != FileKind::kDirectory)) return std::nullopt;
     // Whoever changes a file replaces it, as a rule, and the new one would have no mask. By its
@@ -306,9 +312,8 @@ class Planner {
   FileTree& files;
   PathLosses losses;
   FileRules rules;
-  const Node root;
+  Node root;
   const bool mayMask;
-  std::map<const Node*, Finding> findings;
   std::vector<PathRight> rights;
   std::vector<Mask> masks;
 };
