@@ -164,7 +164,7 @@ bool PublishPlans(const ChangeMark& since, const std::string& serial,
   // As a lock: who commits waits until the plans are there, and this ends without a commit.
   const Transaction others(since.state->Database());
   if (ChangedSince(since)) return false;
-  CopyDatabase(StatePath(), CopyOf::kState, directory.NewFile());
+  CopyDatabase(StatePath(), CopyOf::kPublicState, directory.NewFile());
   directory.TakeNewFile(kStateCopy);
   std::set<std::string> names = {kStateCopy};
   for (const auto& [domain, bytes] : plans) {

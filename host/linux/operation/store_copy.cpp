@@ -29,6 +29,7 @@ using Database = std::unique_ptr<sqlite3, CloseDatabase>;
 const char* PurposeOf(CopyOf what) {
   switch (what) {
     case CopyOf::kState:
+    case CopyOf::kPublicState:
       return "host state";
     case CopyOf::kSettings:
       return "configuration";
@@ -162,6 +163,20 @@ std::string Unseal(const std::string& copy) {
   return damage;
 }
 
+std::string DamageOf(const std::string& copy, CopyOf what) {
+  switch (what) {
+    case CopyOf::kSavedState:
+      return Unseal(copy);
+    case CopyOf::kPublicState:
+      return FindDamagedPages(copy);
+    case CopyOf::kState:
+    case CopyOf::kSettings:
+    case CopyOf::kOwnCopy:
+      break;
+  }
+  return FindDamage(copy);
+}
+
 // Leaves no file behind unless it is kept.
 class TargetFile {
  public:
@@ -203,7 +218,7 @@ void CopyDatabase(const std::string& from, CopyOf what, const std::string& to) {
       ThrowNotCopied(from, what, ReasonOf(result, sourceError, targetError), EIO);
     }
   }
-  const std::string damage = what == CopyOf::kSavedState ? Unseal(to) : FindDamage(to);
+  const std::string damage = DamageOf(to, what);
   if (!damage.empty()) ThrowNotCopied(from, what, damage, EIO);
   file.Keep();
 }

@@ -138,22 +138,28 @@ std::string DigestOf(PrivateDatabase& database) {
   return digest.Text();
 }
 
-std::string FindDamageIn(PrivateDatabase& database) {
-  const std::string found = database.FirstText("PRAGMA integrity_check(1)");
-  return found == "ok" ? "" : kDamaged;
+constexpr char kCheckAll[] = "PRAGMA integrity_check(1)";
+constexpr char kCheckPages[] = "PRAGMA quick_check(1)";
+
+std::string FindDamageIn(PrivateDatabase& database, const char* check) {
+  return database.FirstText(check) == "ok" ? "" : kDamaged;
 }
 
-}  // namespace
-
-std::string FindDamage(const std::string& path) {
+std::string FindDamageBy(const char* check, const std::string& path) {
   try {
     PrivateDatabase database(path);
-    return FindDamageIn(database);
+    return FindDamageIn(database, check);
   } catch (const HostError& failure) {
     if (failure.Code() != EIO) throw;
     return kDamaged;
   }
 }
+
+}  // namespace
+
+std::string FindDamage(const std::string& path) { return FindDamageBy(kCheckAll, path); }
+
+std::string FindDamagedPages(const std::string& path) { return FindDamageBy(kCheckPages, path); }
 
 void Seal(const std::string& path) {
   PrivateDatabase database(path);
@@ -165,7 +171,7 @@ void Seal(const std::string& path) {
 std::string FindBrokenSeal(const std::string& path) {
   try {
     PrivateDatabase database(path);
-    std::string damage = FindDamageIn(database);
+    std::string damage = FindDamageIn(database, kCheckAll);
     if (!damage.empty()) return damage;
     return database.FirstText("SELECT digest FROM seal") == DigestOf(database) ? "" : kDamaged;
   } catch (const HostError& failure) {

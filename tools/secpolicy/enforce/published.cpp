@@ -54,11 +54,13 @@ bool TryToPublish() {
   const std::string serial = LinuxHost::NewPlanSerial();
   PlanSources sources(access, features);
   std::map<std::string, std::string> plans;
-  for (const Policy::InstalledDomain& domain : Policy::ReadPolicy(access).domains) {
-    auto plan = PlanForAnybody(domain, sources);
+  for (unsigned int id = 0; id < access.GetMaxDomains(); ++id) {
+    const auto domain = Policy::ReadDomain(access, id);
+    if (!domain) continue;
+    auto plan = PlanForAnybody(*domain, sources);
     if (!plan) continue;
     plan->mark = MarkOf(serial, features);
-    plans.emplace(domain.name, Enforce::Serialize(*plan));
+    plans.emplace(domain->name, Enforce::Serialize(*plan));
   }
   return LinuxHost::PublishPlans(since, serial, plans);
 }
