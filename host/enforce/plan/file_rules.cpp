@@ -165,9 +165,9 @@ FileRules::Settled FileRules::Settle(const Region& region) {
 }
 
 const FileRules::Settled& FileRules::SettledOf(const Region& region) {
-  const auto known = regions.find(region);
-  if (known != regions.end()) return known->second;
-  return regions.emplace(region, Settle(region)).first->second;
+  const auto [place, isNew] = regions.try_emplace(region);
+  if (isNew) place->second = Settle(region);
+  return place->second;
 }
 
 }  // namespace Enforce

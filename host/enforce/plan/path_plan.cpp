@@ -35,9 +35,11 @@ struct Node {
 };
 
 Node& ChildOf(Node& node, std::string_view name) {
-  const auto known = node.children.find(name);
-  if (known != node.children.end()) return *known->second;
-  return *node.children.emplace(name, std::make_unique<Node>()).first->second;
+  auto place = node.children.lower_bound(name);
+  if (place == node.children.end() || place->first != name) {
+    place = node.children.emplace_hint(place, name, std::make_unique<Node>());
+  }
+  return *place->second;
 }
 
 Node& NodeAt(Node& root, std::string_view path) {
@@ -289,6 +291,7 @@ class Planner {
 
   std::vector<RuleFate> Fates() const {
     std::vector<RuleFate> fates;
+    fates.reserve(domain.rules.size());
     for (const Rule& rule : domain.rules) {
       switch (rule.kind) {
         case RuleKind::kObjectAccess:
