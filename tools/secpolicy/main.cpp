@@ -10,6 +10,7 @@
 #include "command_line.h"
 #include "complete/completion.h"
 #include "host/linux/operation/log_use.h"
+#include "host/linux/operation/state_use.h"
 #include "root.h"
 #include "text/terminal_guard.h"
 #include "text/visible.h"
@@ -114,6 +115,7 @@ void TakeClosedDescriptors() {
 
 int main(int argc, char** argv) {
   SecPolicyCli::TakeClosedDescriptors();
+  LinuxHost::OwnProcess();
   const SecPolicyCli::TerminalGuard output(std::cout, STDOUT_FILENO);
   const SecPolicyCli::TerminalGuard errors(std::cerr, STDERR_FILENO);
   return SecPolicyCli::Run(argc, argv);

@@ -14,6 +14,8 @@ namespace LinuxHost {
 
 using Braxo::Misc::StrCat;
 
+void OwnProcess() { KeepNoMemoryAccount(); }
+
 HostState& CurrentState() { return HostState::Current(); }
 
 bool IsStateMissing() {

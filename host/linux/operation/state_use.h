@@ -10,6 +10,9 @@ namespace LinuxHost {
 
 class HostState;
 
+// To be called first by a program that has its process to itself: databases are used faster then.
+void OwnProcess();
+
 // The state that this process works with, made if there is none. The reference holds until the
 // state is used next. Throws HostError when it cannot be used.
 HostState& CurrentState();

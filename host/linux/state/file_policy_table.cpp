@@ -144,7 +144,10 @@ std::vector<Policy::Rule> FilePolicyTable::Read(unsigned int domainId) {
       "SELECT path, permission, line FROM file_policy WHERE id IN "
       "(SELECT id FROM file_policy WHERE domain_id = ?1 AND world = 0) ORDER BY id",
       domainId);
+  // Growing from nothing would move each rule twice; few domains have more.
+  constexpr std::size_t kRoom = 128;
   std::vector<Policy::Rule> rules;
+  rules.reserve(kRoom);
   while (rows.Next()) {
     Policy::Rule& rule = rules.emplace_back();
     rule.kind = Policy::RuleKind::kFilePath;

@@ -100,6 +100,8 @@ class DirectoryLock {
 
 }  // namespace
 
+void KeepNoMemoryAccount() { sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0); }
+
 void MoveAside(const std::string& path) {
   const DirectoryLock lock(path.substr(0, path.rfind('/') + 1));
   const std::string aside = path + ".damaged";

@@ -21,6 +21,10 @@ namespace LinuxHost {
 // when it is time to give up, after about half a minute. The engine calls it, too.
 int WaitForOthers(void* unused, int waits);
 
+// Spares the account that the engine keeps of its memory, a tenth of an installation. For a program
+// that owns its process, before it uses any database: the engine is the whole process's.
+void KeepNoMemoryAccount();
+
 // Moves the database at `path`, which nobody can use any more, out of the way to `path`.damaged,
 // which it replaces, and removes what lies beside it: that must not get into the next one.
 void MoveAside(const std::string& path);
