@@ -48,6 +48,12 @@ class PublishedPlans : public ::testing::Test {
     fs::permissions(path, fs::perms(0644));
   }
 
+  // Changes what the engine has noted of a table or an index.
+  void EditSchema(const std::string& change, const std::string& name) {
+    state.Database().RunScript("PRAGMA writable_schema = ON; UPDATE sqlite_schema SET " + change +
+                               " WHERE name = '" + name + "'");
+  }
+
   // Of the plan of the domain "a".
   std::string Refusal(const std::string& reason) const {
     return "The plan " + directory.Path() + "/plans/a cannot be used: " + reason + kLoad;
@@ -168,6 +174,23 @@ TEST_F(PublishedPlans, BringTheStateThatTheyAreOf) {
   LinuxHost::CopyPublishedState(copy);
   const LinuxHost::UsedState used(copy);
   EXPECT_EQ(HostState::Current().Domains().Get("a").level, "disabled");
+}
+
+TEST_F(PublishedPlans, AreNotMadeOfDamagedPages) {
+  EditSchema("rootpage = (SELECT rootpage FROM sqlite_schema WHERE name = 'role')", "world");
+  EXPECT_EQ(MessageOf([] { Publish({}); }),
+            "Unable to copy the host state " + directory.Database() + ": it is damaged");
+  EXPECT_FALSE(ArePlansPublished());
+}
+
+// Who copies the state looks at all of it.
+TEST_F(PublishedPlans, BringNoStateWhoseIndexesDoNotFit) {
+  state.Database().RunScript(
+      "INSERT INTO rule VALUES (1, 0, 'domain transition', 'label', 'a', 'exec', 1, 0, 0)");
+  EditSchema("sql = replace(sql, '(word2)', '(word1)')", "transition_target");
+  ASSERT_TRUE(Publish({}));
+  EXPECT_EQ(MessageOf([&] { LinuxHost::CopyPublishedState(directory.Path() + "/copy.db"); }),
+            "Unable to copy the copy " + directory.Path() + "/plans/.state: it is damaged");
 }
 
 TEST_F(PublishedPlans, CountForNobodyWhoReadsSomethingElse) {
