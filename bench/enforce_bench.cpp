@@ -5,6 +5,8 @@
 //   the
 //                                                           processor time of one in microseconds
 //   enforce_bench open COUNT FILE                           opens and closes the file so often
+//   enforce_bench landlock COUNT FILE                       the same where Landlock lets everything
+//                                                           be read, and nothing else is set up
 //   enforce_bench call COUNT                                makes the cheapest system call so often
 
 #include <fcntl.h>
@@ -21,12 +23,15 @@
 #include <vector>
 
 #include "host/enforce/compile.h"
+#include "host/enforce/kernel.h"
 #include "host/enforce/plan_file.h"
 #include "host/enforce/real_file_tree.h"
 
 namespace {
 
 namespace fs = std::filesystem;
+namespace Kernel = Enforce::Kernel;
+namespace Landlock = Enforce::Landlock;
 using Enforce::LabelledPath;
 using Policy::Rule;
 using Policy::RuleKind;
@@ -104,6 +109,21 @@ void OpenOften(int count, const char* path) {
   }
 }
 
+// What a domain that reads cannot do without: all rights are handled, and one rule is all that
+// there is.
+void RestrictToReading() {
+  const int ruleset =
+      Kernel::CreateRuleset({.handledFiles = Landlock::AllRights(Kernel::LandlockVersion())});
+  const int root = Kernel::OpenPlace("/");
+  if (ruleset < 0 || root < 0 || prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
+      Kernel::AddPath(ruleset, root, Landlock::kReadFile | Landlock::kReadDir) != 0 ||
+      Kernel::RestrictSelf(ruleset) != 0) {
+    Fail("landlock");
+  }
+  close(root);
+  close(ruleset);
+}
+
 void CallOften(int count) {
   for (int turn = 0; turn < count; ++turn) syscall(SYS_getppid);
 }
@@ -117,6 +137,9 @@ int main(int count, char** words) {
   } else if (verb == "compile" && count == 5) {
     TimeCompile(std::atoi(words[2]), words[3], std::atoi(words[4]));
   } else if (verb == "open" && count == 4) {
+    OpenOften(std::atoi(words[2]), words[3]);
+  } else if (verb == "landlock" && count == 4) {
+    RestrictToReading();
     OpenOften(std::atoi(words[2]), words[3]);
   } else if (verb == "call" && count == 3) {
     CallOften(std::atoi(words[2]));
