@@ -1,5 +1,5 @@
-# What a package of this project holds, for one prefix: the libraries and their headers, how other
-# builds find them, the command with its manual pages and completions, and the systemd units.
+# What the packages of this project hold, for one prefix: each component of the installation is a
+# package, in debian/control and for `cpack`.
 include(CMakePackageConfigHelpers)
 
 set(SECPOLICY_HEADERS "${CMAKE_INSTALL_INCLUDEDIR}/libsecpolicy")
@@ -9,16 +9,24 @@ set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, b
 # Libraries and headers. A caller's include paths begin at the public header, at the contract headers
 # that it includes, and at those of the Linux host.
 target_include_directories(host_contract INTERFACE "$<INSTALL_INTERFACE:${SECPOLICY_HEADERS}>")
-set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN" BUILD_WITH_INSTALL_RPATH ON)
-install(TARGETS secpolicy secpolicyhost secpolicyhost_headers host_contract EXPORT secpolicyTargets
-  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}")
-# Never linked to, so without the name for linkers.
-install(TARGETS secpolicyhost_archive
-  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" NAMELINK_SKIP)
+# In the system's own directories the loader looks anyway.
+if(NOT CMAKE_INSTALL_PREFIX STREQUAL "/usr")
+  set_target_properties(secpolicy PROPERTIES INSTALL_RPATH "$ORIGIN" BUILD_WITH_INSTALL_RPATH ON)
+endif()
+install(TARGETS secpolicy EXPORT secpolicyTargets
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+  COMPONENT libsecpolicy1 NAMELINK_COMPONENT libsecpolicy-dev)
+install(TARGETS secpolicyhost secpolicyhost_headers host_contract EXPORT secpolicyTargets
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+  COMPONENT libsecpolicyhost1 NAMELINK_COMPONENT libsecpolicy-dev)
+
+set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME libsecpolicy-dev)
 install(FILES secpolicy/secpolicy.h secpolicy/export.h
   DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
 install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")
 install(DIRECTORY host/linux/include/ DESTINATION "${SECPOLICY_HEADERS}")
+install(FILES docs/abi.md examples/runtime.cpp
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/libsecpolicy-dev")
 
 # For find_package and pkg-config.
 install(EXPORT secpolicyTargets NAMESPACE secpolicy:: DESTINATION "${SECPOLICY_CMAKE}")
@@ -32,8 +40,11 @@ file(RELATIVE_PATH SECPOLICY_PC_TO_PREFIX
 configure_file(packaging/secpolicy.pc.in secpolicy.pc @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 
-# The command.
+# The command, with the library that is never linked to, only loaded by a boot.
+set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME secpolicy)
 install(TARGETS secpolicy_cli)
+install(TARGETS secpolicyhost_archive
+  LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/secpolicy" NAMELINK_SKIP)
 install(TARGETS secpolicy_run DESTINATION "${CMAKE_INSTALL_LIBEXECDIR}/secpolicy")
 install(FILES docs/man/secpolicy.5 DESTINATION "${CMAKE_INSTALL_MANDIR}/man5")
 install(FILES docs/man/secpolicy.8 docs/man/secpolicy-run.8 DESTINATION "${CMAKE_INSTALL_MANDIR}/man8")
@@ -47,18 +58,17 @@ foreach(unit boot restore load)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
-install(FILES LICENSE README.md CHANGELOG.md docs/policy-format.md docs/diagnostics.md
-  docs/json.md docs/queries.md docs/graph.svg
+install(FILES README.md CHANGELOG.md SECURITY.md docs/policy-format.md docs/diagnostics.md
+  docs/enforcement.md docs/json.md docs/messages.md docs/queries.md docs/graph.svg
   DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(DIRECTORY examples/host examples/systemd
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples" USE_SOURCE_PERMISSIONS)
+install(PROGRAMS scripts/pack-example DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
 
-# `cpack` in the build directory makes a Debian package.
-set(CPACK_GENERATOR DEB)
-set(CPACK_PACKAGE_NAME libsecpolicy)
-set(CPACK_PACKAGE_CONTACT "The libsecpolicy authors")
-set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
-set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
-set(CPACK_DEBIAN_PACKAGE_SECTION libs)
-set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
-set(CPACK_STRIP_FILES ON)
-include(CPack)
+foreach(component libsecpolicy1 libsecpolicyhost1 libsecpolicy-dev secpolicy)
+  install(FILES LICENSE DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${component}"
+    COMPONENT ${component})
+endforeach()
+
+include(Rpm)

@@ -62,7 +62,7 @@ const Verb kExec = {
     "\n"
     "Examples:\n"
     "  secpolicy exec -- /usr/sbin/sshd\n"
-    "  ExecStart=/usr/sbin/secpolicy exec -- /usr/sbin/sshd     in a unit of systemd",
+    "  ExecStart=/usr/bin/secpolicy exec -- /usr/sbin/sshd     in a unit of systemd",
     Define, PrepareEntry};
 
 }  // namespace SecPolicyCli

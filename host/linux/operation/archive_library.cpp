@@ -28,7 +28,7 @@ void ReadConversions() {
 // Out of the installation that the command belongs to, or else as any library is found. A run path
 // would find it too, and slow every start of the command.
 void* Open() {
-  const std::string installed = StrCat("$ORIGIN/../" SECPOLICY_LIBDIR "/", kLibrary);
+  const std::string installed = StrCat("$ORIGIN/../" SECPOLICY_LIBDIR "/secpolicy/", kLibrary);
   void* const library = dlopen(installed.c_str(), RTLD_NOW | RTLD_LOCAL);
   return library != nullptr ? library : dlopen(kLibrary, RTLD_NOW | RTLD_LOCAL);
 }
@@ -38,8 +38,8 @@ const ArchiveFunctions& Load() {
   void* const entryPoint = library == nullptr ? nullptr : dlsym(library, kEntryPoint);
   if (entryPoint != nullptr) return *static_cast<const ArchiveFunctions*>(entryPoint);
   throw HostError(ELIBACC, StrCat("Unable to load what unpacks tardisks: ", dlerror(),
-                                  ". It belongs beside libsecpolicyhost.so.1: "
-                                  "install that again"));
+                                  ". It is installed with this command: "
+                                  "install secpolicy again"));
 }
 
 const ArchiveFunctions& Loaded() {
