@@ -25,7 +25,7 @@ install(FILES secpolicy/secpolicy.h secpolicy/export.h
   DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
 install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")
 install(DIRECTORY host/linux/include/ DESTINATION "${SECPOLICY_HEADERS}")
-install(FILES docs/abi.md examples/runtime.cpp
+install(FILES docs/abi.md docs/embed.md examples/runtime.cpp
   DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/libsecpolicy-dev")
 
 # For find_package and pkg-config.
@@ -58,8 +58,10 @@ foreach(unit boot restore load)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
-install(FILES README.md CHANGELOG.md SECURITY.md docs/policy-format.md docs/diagnostics.md
-  docs/enforcement.md docs/json.md docs/messages.md docs/queries.md docs/graph.svg
+install(FILES README.md CHANGELOG.md SECURITY.md
+  docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
+  docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
+  docs/messages.md docs/queries.md docs/runtime.md docs/graph.svg
   DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY examples/host examples/systemd
