@@ -28,6 +28,8 @@ sources() {
 # A Debian without anything of ours but what our packages need of others, and then with them.
 make_debian() {
   local needed=libarchive13,libseccomp2,libsqlite3-0,libstdc++6,zlib1g
+  # Images of machines come without apt's lists.
+  [[ -n $(sources) ]] || apt-get --quiet update >&2
   # shellcheck source=/dev/null
   sources | mmdebstrap --quiet --mode=root --variant=apt --format=directory \
     --include="$needed,busybox-static,systemd" "$(. /etc/os-release && echo "$VERSION_CODENAME")" "$DEBIAN" -
