@@ -11,15 +11,24 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Pair;
 
-TEST(LoadListener, KeepsErrorsInOrderAndHandsThemOn) {
-  std::vector<std::string> handed;
+class Watcher : public SecPolicyCli::LoadWatcher {
+ public:
+  void OnError(const std::string& message) override { told.push_back(message); }
+  void OnProblem(const SecPolicy::Problem& problem) override { told.push_back(problem.file); }
+
+  std::vector<std::string> told;
+};
+
+TEST(LoadListener, KeepsErrorsInOrderAndHandsAllOn) {
+  Watcher watcher;
   LoadListener listener;
-  listener.forward = [&](const std::string& message) { handed.push_back(message); };
+  listener.watcher = &watcher;
+  listener.OnProblem({.file = "/a"});
   listener.OnError("first");
   listener.OnError("second");
   EXPECT_EQ(listener.Count(), 2u);
   EXPECT_THAT(listener.Messages(), ElementsAre("first", "second"));
-  EXPECT_THAT(handed, ElementsAre("first", "second"));
+  EXPECT_THAT(watcher.told, ElementsAre("/a", "first", "second"));
 }
 
 TEST(LoadListener, CountsProblemsByFile) {

@@ -18,8 +18,9 @@ struct Options {
 
 ExitCode Compare(const Options& options) {
   const LinuxHost::DroppedLog dropped;
-  Side before = ReadSide(options.before);
-  Side after = ReadSide(options.after);
+  SecPolicy::PolicyObserver nobody;
+  Side before = ReadSide(options.before, nobody);
+  Side after = ReadSide(options.after, nobody);
   if (before.labels.has_value() != after.labels.has_value()) {
     Summarize("diff",
               "file labels and the transitions of tardisks are left out: a directory has the "

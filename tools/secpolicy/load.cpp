@@ -1,8 +1,7 @@
 #include "command_line.h"
 #include "dry_run/planned_load.h"
-#include "load/load_run.h"
+#include "load/full_load.h"
 #include "policy_dir.h"
-#include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
 #include "verb.h"
 
@@ -17,21 +16,12 @@ struct Options {
   PlanOptions planOptions;
 };
 
-LoadRequest FullLoad(const std::string& dir, const Options& options) {
-  return {.verb = "load",
-          .policyDir = dir,
-          .steps = {{LinuxHost::LoadKind::kFull, dir, SecPolicy::LoadPolicy}},
-          .keep = options.keep,
-          .allOrNothing = options.allOrNothing,
-          .timing = options.timing,
-          .mend = {},
-          .prepare = {},
-          .begin = {}};
-}
-
 ExitCode Load(const std::string& dir, const Options& options) {
   if (const auto refusal = RefuseMissingDir("load", dir)) return *refusal;
-  const LoadRequest load = FullLoad(dir, options);
+  LoadRequest load = FullLoad(dir);
+  load.keep = options.keep;
+  load.allOrNothing = options.allOrNothing;
+  load.timing = options.timing;
   return options.plan ? PlanLoad(load, options.planOptions) : RunLoad(load);
 }
 

@@ -10,38 +10,15 @@
 #include "query/answer.h"
 #include "query/ask.h"
 #include "query/question.h"
+#include "query/search.h"
 #include "text/format.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 namespace {
 
-// A domain that may.
-struct Found {
-  const Policy::InstalledDomain& domain;
-  Policy::Decision decision;
-};
-
-std::vector<Found> FindDomains(const Question& question, const Policy::InstalledPolicy& policy) {
-  std::vector<Found> found;
-  for (const Policy::InstalledDomain& domain : policy.domains) {
-    Policy::Decision decision = Policy::Decide(question.asked, domain);
-    if (decision.IsAllowed()) found.push_back(Found{domain, std::move(decision)});
-  }
-  return found;
-}
-
 void WriteText(const std::vector<Found>& found) {
   for (const auto& [domain, decision] : found) WriteAnswerLine(domain, decision, std::cout);
-}
-
-void WriteJson(const Question& question, const std::vector<Found>& found) {
-  Json domains = Json::Array();
-  for (const auto& [domain, decision] : found) domains.Append(AnswerToJson(domain, decision));
-  const Json answer = {{"schema", "secpolicy.who-can/1"},
-                       {"question", QuestionToJson(question)},
-                       {"domains", domains}};
-  std::cout << answer.Text();
 }
 
 ExitCode Answer(const std::vector<std::string>& words, const std::string& format) {
@@ -50,7 +27,7 @@ ExitCode Answer(const std::vector<std::string>& words, const std::string& format
   const Question question = ReadQuestion(words, access);
   const std::vector<Found> found = FindDomains(question, policy);
   if (format == "json") {
-    WriteJson(question, found);
+    std::cout << WhoCanToJson(question, found).Text();
   } else {
     WriteText(found);
   }

@@ -22,9 +22,7 @@ ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
   const Question question = ReadQuestion(words, access);
   const Policy::Decision decision = Policy::Decide(question.asked, *domain);
   if (format == "json") {
-    Json json = {{"schema", "secpolicy.why/1"}, {"question", QuestionToJson(question)}};
-    json.Add(AnswerToJson(*domain, decision));
-    std::cout << json.Text();
+    std::cout << WhyToJson(question, *domain, decision).Text();
   } else {
     WriteAnswer(question, *domain, decision, std::cout);
   }

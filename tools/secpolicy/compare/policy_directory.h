@@ -4,6 +4,7 @@
 #include <string>
 
 #include "installed/installed_policy.h"
+#include "secpolicy/observed/policy_observer.h"
 
 namespace SecPolicyCli {
 
@@ -19,7 +20,9 @@ std::string PartnerDirOf(const std::string& dir);
 
 // Reads the objects, the domains of early boot, the domains and the file labels of `dir`, and the
 // partner domains of `partnerDir`; there may be none of early boot and of partners. Works on a
-// scratch state. What is refused is reported, as a load does. Throws what the host throws.
-WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir);
+// scratch state. What is refused is reported, as a load does, and told to `observer`. Throws what
+// the host throws.
+WrittenPolicy ReadPolicyDirectory(const std::string& dir, const std::string& partnerDir,
+                                  SecPolicy::PolicyObserver& observer);
 
 }  // namespace SecPolicyCli

@@ -14,17 +14,16 @@ namespace {
 
 constexpr char kInstalled[] = "installed";
 
-Side ReadDirectory(const std::string& dir) {
+Side ReadDirectory(const std::string& dir, SecPolicy::PolicyObserver& observer) {
   if (!File_IsDirectory(dir.c_str())) {
-    throw std::runtime_error("there is no directory " + dir +
-                             " below this root. Name a policy directory, a saved state, or "
-                             "'installed'.");
+    throw NoSuchPolicy("there is no directory " + dir +
+                       " below this root. Name a policy directory, a saved state, or "
+                       "'installed'.");
   }
-  WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir));
+  WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir), observer);
   if (!written.isClean) {
-    throw std::runtime_error("the policy in " + dir +
-                             " has errors (above), so it was not compared. " +
-                             Call("check " + dir) + " shows every one with its place.");
+    throw BadPolicy("the policy in " + dir + " has errors (above), so it was not compared. " +
+                    Call("check " + dir) + " shows every one with its place.");
   }
   return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
 }
@@ -35,7 +34,7 @@ Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::Co
 
 Side ReadInstalled() {
   if (LinuxHost::IsStateMissing()) {
-    throw std::runtime_error(
+    throw NothingInstalled(
         "nothing is installed below this root. Name the root that was booted (--root DIR), or "
         "run " +
         Call("boot") + " first.");
@@ -45,9 +44,9 @@ Side ReadInstalled() {
 
 Side ReadSaved(const std::string& name) {
   if (!IsSaved(name)) {
-    throw std::runtime_error("there is no saved state '" + name + "', and no such directory. " +
-                             Call("history") +
-                             " lists what is saved; 'installed' is what is installed now.");
+    throw NoSuchPolicy("there is no saved state '" + name + "', and no such directory. " +
+                       Call("history") +
+                       " lists what is saved; 'installed' is what is installed now.");
   }
   return ReadStateOf(name, SavedStatePath(name), LinuxHost::CopyOf::kSavedState);
 }
@@ -68,9 +67,9 @@ bool MeansDirectory(const std::string& name) {
 
 }  // namespace
 
-Side ReadSide(const std::string& name) {
+Side ReadSide(const std::string& name, SecPolicy::PolicyObserver& observer) {
   if (name == kInstalled) return ReadInstalled();
-  return MeansDirectory(name) ? ReadDirectory(name) : ReadSaved(name);
+  return MeansDirectory(name) ? ReadDirectory(name, observer) : ReadSaved(name);
 }
 
 }  // namespace SecPolicyCli

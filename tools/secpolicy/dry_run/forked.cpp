@@ -6,10 +6,10 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdlib>
 #include <cstring>
 #include <exception>
 #include <iostream>
+#include <thread>
 
 #include "host/linux/common/host_error.h"
 #include "text/visible.h"
@@ -17,15 +17,13 @@
 namespace SecPolicyCli {
 namespace {
 
-[[noreturn]] void RunChild(const std::function<ExitCode()>& body) {
-  ExitCode code = kFailed;
+ExitCode Try(const std::function<ExitCode()>& body) {
   try {
-    code = body();
+    return body();
   } catch (const std::exception& failure) {
     std::cerr << "secpolicy: " << VisibleLines(failure.what()) << std::endl;
+    return kFailed;
   }
-  // Closes the connections to the state. What the parent has on its stack is not cleaned up.
-  std::exit(code);
 }
 
 // Nobody would clear up after a child whose parent was killed. The parent may be gone already.
@@ -42,7 +40,7 @@ pid_t Fork(const std::function<ExitCode()>& body) {
   if (child < 0) LinuxHost::ThrowErrno("cannot fork");
   if (child == 0) {
     DieWith(parent);
-    RunChild(body);
+    RunAndExit(body);
   }
   return child;
 }
@@ -57,6 +55,15 @@ ForkedEnd EndOf(pid_t child) {
 }
 
 }  // namespace
+
+void RunAndExit(const std::function<ExitCode()>& body) noexcept {
+  ExitCode code = kFailed;
+  // Connections to the state are a thread's, and are closed when it ends.
+  std::thread([&] { code = Try(body); }).join();
+  std::cout.flush();
+  std::cerr.flush();
+  _exit(code);
+}
 
 ForkedEnd RunForked(const std::function<ExitCode()>& body) { return EndOf(Fork(body)); }
 

@@ -18,4 +18,9 @@ struct ForkedEnd {
 // none may be open. Throws Braxo::Lib::BraxoException when no child can be made.
 ForkedEnd RunForked(const std::function<ExitCode()>& body);
 
+// Ends a process that was forked with the code that `body` returns. What the host keeps open for it
+// is closed; what the parent would do at its own end, the functions of atexit() for one, is not
+// done.
+[[noreturn]] void RunAndExit(const std::function<ExitCode()>& body) noexcept;
+
 }  // namespace SecPolicyCli

@@ -35,6 +35,17 @@ void Redirect(int descriptor, const std::string& path) {
   close(file);
 }
 
+// Each as it happens: the load may end the process.
+class ErrorFile : public LoadWatcher {
+ public:
+  explicit ErrorFile(const std::string& path) : file(path, std::ios::binary) {}
+
+  void OnError(const std::string& message) override { file << message << '\0' << std::flush; }
+
+ private:
+  std::ofstream file;
+};
+
 void WriteLabels(const LinuxHost::NotedLabels& labels, const std::string& path) {
   std::ofstream file(path, std::ios::binary);
   for (const auto& change : labels.Changes()) {
@@ -87,11 +98,8 @@ LoadDryRun::LoadDryRun(const LoadRequest& load) {
     const LinuxHost::UsedState state(StateAfter(), LinuxHost::ShownStatePath());
     LoadRequest dryRun = load;
     dryRun.dryRun = true;
-    std::ofstream errorFile(scratch.File("errors"), std::ios::binary);
-    // The load may end the process.
-    dryRun.onError = [&](const std::string& message) {
-      errorFile << message << '\0' << std::flush;
-    };
+    ErrorFile errorFile(scratch.File("errors"));
+    dryRun.watcher = &errorFile;
     const ExitCode code = RunLoad(dryRun);
     WriteLabels(notes, labelFile);
     return code;

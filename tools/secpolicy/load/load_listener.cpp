@@ -29,7 +29,12 @@ void LoadListener::OnEnd(SecPolicy::LoadPhase phase) { timing.EndPhase(NameOf(ph
 
 void LoadListener::OnError(const std::string& message) {
   ErrorList::OnError(message);
-  if (forward) forward(message);
+  if (watcher != nullptr) watcher->OnError(message);
+}
+
+void LoadListener::OnProblem(const SecPolicy::Problem& problem) {
+  ++problems[problem.file];
+  if (watcher != nullptr) watcher->OnProblem(problem);
 }
 
 void LoadListener::OnLabelFailure(const std::string& message) {

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstddef>
-#include <functional>
 #include <map>
 #include <string>
 #include <vector>
@@ -10,6 +9,7 @@
 #include "host/linux/operation/policy_load.h"
 #include "host/linux/operation/rule_origins.h"
 #include "load/load_timing.h"
+#include "load/load_watcher.h"
 
 namespace SecPolicyCli {
 
@@ -21,7 +21,7 @@ class LoadListener : public ErrorList {
 
   void OnEnd(SecPolicy::LoadPhase phase) override;
   void OnError(const std::string& message) override;
-  void OnProblem(const SecPolicy::Problem& problem) override { ++problems[problem.file]; }
+  void OnProblem(const SecPolicy::Problem& problem) override;
   void OnPathRule(const TeskCtl::Security::TeskAccess_FilePathAccessRule& rule) override;
   void OnFileLabel(const SecPolicy::FileLabel& label) override;
   void OnTardiskTransition(const TeskCtl::Security::TeskAccess_DomTransRule& rule,
@@ -46,8 +46,7 @@ class LoadListener : public ErrorList {
 
   LoadTiming timing;
 
-  // Gets every error as it happens, if set.
-  std::function<void(const std::string& message)> forward;
+  LoadWatcher* watcher = nullptr;  // is told each problem and error, if set
 
  private:
   LinuxHost::PolicyTransaction* transaction = nullptr;

@@ -100,7 +100,7 @@ class LoadRun {
  public:
   explicit LoadRun(const LoadRequest& wanted)
       : request(wanted), otherwise(std::set_terminate(OnTerminate)) {
-    listener.forward = request.onError;
+    listener.watcher = request.watcher;
     running = this;
   }
   LoadRun(const LoadRun&) = delete;
@@ -301,17 +301,22 @@ class LoadRun {
     });
   }
 
+  ExitCode End(ExitCode code, const std::string& reason, const std::string& summary) const {
+    if (request.watcher != nullptr) request.watcher->OnOutcome({code, reason, ending});
+    Summarize(request.verb, summary);
+    return code;
+  }
+
   ExitCode ReportDone() {
     if (!request.keep) WriteStayingDomains();
-    Summarize(request.verb, DescribeDone(request.verb) + DescribeRemainder(ending, request.keep));
-    return kWell;
+    return End(kWell, "", DescribeDone(request.verb) + DescribeRemainder(ending, request.keep));
   }
 
   ExitCode ReportFailure() {
     if (!isInstalled) Attempt([&] { RecordUndone(Ending()); });
     WriteProblems();
-    std::string summary = failure.empty() ? "failed" : failure;
-    summary += DescribeErrors();
+    const std::string reason = failure.empty() ? "failed" : failure;
+    std::string summary = reason + DescribeErrors();
     if (isInstalled) {
       if (!request.dryRun) {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });
@@ -321,8 +326,7 @@ class LoadRun {
       summary += "; nothing was installed";
     }
     const std::string next = AdviseOnPrivilege();
-    Summarize(request.verb, next.empty() ? summary : summary + ". " + next);
-    return kFailed;
+    return End(kFailed, reason, next.empty() ? summary : summary + ". " + next);
   }
 
   // An exception that left the terminate handler would be an abort without a summary.
@@ -335,9 +339,9 @@ class LoadRun {
       RecordUndone(record);
     });
     WriteProblems();
-    Summarize(request.verb,
-              DescribeStop(NeededDomainsWithout(request.policyDir, missing), request.policyDir));
-    _exit(kStopped);
+    const std::string stop =
+        DescribeStop(NeededDomainsWithout(request.policyDir, missing), request.policyDir);
+    _exit(End(kStopped, stop, stop));
   }
 
   const LoadRequest& request;

@@ -6,6 +6,7 @@
 
 #include "host/linux/operation/policy_load.h"
 #include "load/load_timing.h"
+#include "load/load_watcher.h"
 #include "secpolicy/observed/policy_observer.h"
 #include "verb.h"
 
@@ -27,8 +28,7 @@ struct LoadRequest {
   bool timing = false;        // prints the time of each phase
   bool dryRun = false;        // who asks has put copies in place of all that a load changes
 
-  // Gets every error as it happens, if set.
-  std::function<void(const std::string& message)> onError = {};
+  LoadWatcher* watcher = nullptr;  // if anybody wants to be told
 
   // What makes a state usable that is not, if anything can.
   std::function<void()> mend;

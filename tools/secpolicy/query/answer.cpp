@@ -151,4 +151,10 @@ Json AnswerToJson(const InstalledDomain& domain, const Decision& decision) {
   return json;
 }
 
+Json WhyToJson(const Question& question, const InstalledDomain& domain, const Decision& decision) {
+  Json json = {{"schema", "secpolicy.why/1"}, {"question", QuestionToJson(question)}};
+  json.Add(AnswerToJson(domain, decision));
+  return json;
+}
+
 }  // namespace SecPolicyCli

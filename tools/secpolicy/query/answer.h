@@ -20,5 +20,7 @@ void WriteAnswerLine(const Policy::InstalledDomain& domain, const Policy::Decisi
 // The same for programs; see docs/json.md.
 Json QuestionToJson(const Question& question);
 Json AnswerToJson(const Policy::InstalledDomain& domain, const Policy::Decision& decision);
+Json WhyToJson(const Question& question, const Policy::InstalledDomain& domain,
+               const Policy::Decision& decision);
 
 }  // namespace SecPolicyCli
