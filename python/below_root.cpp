@@ -1,0 +1,204 @@
+#include "below_root.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <sys/mman.h>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+// The header of older C libraries does not say itself that it is one of C.
+extern "C" {
+#include <sys/pidfd.h>
+}
+
+#include "dry_run/forked.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/operation/store_fork.h"
+#include "root.h"
+
+namespace SecPolicyPython {
+namespace {
+
+using LinuxHost::Descriptor;
+using LinuxHost::HostError;
+using LinuxHost::ThrowErrno;
+
+using Work = std::function<void(const Send&)>;
+
+// A file without a name, and never in the place of a standard descriptor that the interpreter has
+// closed.
+Descriptor MakeFile() {
+  Descriptor file(memfd_create("secpolicy", MFD_CLOEXEC));
+  if (file.IsOpen()) file = Descriptor(fcntl(file.Number(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
+  if (!file.IsOpen()) ThrowErrno("cannot make a file in memory");
+  return file;
+}
+
+void Append(const Descriptor& file, const std::string& text) {
+  for (std::size_t written = 0; written < text.size();) {
+    const ssize_t size = write(file.Number(), text.data() + written, text.size() - written);
+    if (size < 0) ThrowErrno("cannot write to a file in memory");
+    written += static_cast<std::size_t>(size);
+  }
+}
+
+std::string ReadAll(const Descriptor& file) {
+  std::string text;
+  char part[65536];
+  while (true) {
+    const auto offset = static_cast<off_t>(text.size());
+    const ssize_t size = pread(file.Number(), part, sizeof part, offset);
+    if (size <= 0) return text;
+    text.append(part, static_cast<std::size_t>(size));
+  }
+}
+
+// Nothing reaches the calling thread while this lives: a handler of the interpreter is not to run
+// in the child.
+class BlockedSignals {
+ public:
+  BlockedSignals() {
+    sigset_t all;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, &before);
+  }
+  BlockedSignals(const BlockedSignals&) = delete;
+  BlockedSignals& operator=(const BlockedSignals&) = delete;
+  ~BlockedSignals() { pthread_sigmask(SIG_SETMASK, &before, nullptr); }
+
+ private:
+  sigset_t before;
+};
+
+pid_t Fork() {
+  const LinuxHost::StoresAtRest stores;
+  return fork();
+}
+
+// No handler of the interpreter's runs in the child. Keys are for the interpreter to act on, which
+// shares its terminal with the child.
+void ForgetHandlers() {
+  struct sigaction usual {};
+  usual.sa_handler = SIG_DFL;
+  for (int number = 1; number < NSIG; ++number) {
+    struct sigaction present {};
+    const bool isKnown = sigaction(number, nullptr, &present) == 0;
+    if (isKnown && present.sa_handler != SIG_IGN) sigaction(number, &usual, nullptr);
+  }
+  sigset_t keys;
+  sigemptyset(&keys);
+  sigaddset(&keys, SIGINT);
+  sigaddset(&keys, SIGQUIT);
+  sigprocmask(SIG_SETMASK, &keys, nullptr);
+}
+
+std::string DeathOf(int status) {
+  return WIFSIGNALED(status) ? std::string(": ") + strsignal(WTERMSIG(status)) : "";
+}
+
+void WaitFor(pid_t child) {
+  while (waitpid(child, nullptr, 0) < 0 && errno == EINTR) continue;
+}
+
+class Child {
+ public:
+  Child(const std::optional<std::string>& root, const Work& work) {
+    const pid_t parent = getpid();
+    const BlockedSignals blocked;
+    id = Fork();
+    if (id < 0) ThrowErrno("cannot fork");
+    if (id == 0) Act(parent, root, work);
+    end = Descriptor(pidfd_open(id, 0));
+    // One that is gone has ended, in a program that ignores SIGCHLD.
+    if (!end.IsOpen() && errno != ESRCH) GiveUp();
+  }
+  Child(const Child&) = delete;
+  Child& operator=(const Child&) = delete;
+  ~Child() {
+    if (isOver) return;
+    pidfd_send_signal(end.Number(), SIGTERM, nullptr, 0);
+    WaitFor(id);
+  }
+
+  // Returns what it has sent.
+  Reply Reap(const std::function<void()>& checkSignals) {
+    Await(checkSignals);
+    isOver = true;
+    // A program that ignores SIGCHLD, or waits for all its children, leaves nothing to be told.
+    int status = 0;
+    const bool isKnown = waitpid(id, &status, 0) == id;
+    const std::string text = ReadAll(sent);
+    const std::size_t kindSize = text.find('\n');
+    if (kindSize == std::string::npos) {
+      throw HostError(ECHILD, "the process that does the work ended without an answer" +
+                                  (isKnown ? DeathOf(status) : ""));
+    }
+    return {text.substr(0, kindSize), text.substr(kindSize + 1), ReadAll(messages)};
+  }
+
+ private:
+  [[noreturn]] void GiveUp() const {
+    const int reason = errno;
+    kill(id, SIGTERM);
+    WaitFor(id);
+    errno = reason;
+    ThrowErrno("cannot watch a process");
+  }
+
+  // Until it has ended.
+  void Await(const std::function<void()>& checkSignals) const {
+    // A signal may come to another thread, or just before the wait.
+    constexpr int kMostMilliseconds = 100;
+    pollfd ended{.fd = end.Number(), .events = POLLIN, .revents = 0};
+    while (end.IsOpen() && poll(&ended, 1, kMostMilliseconds) <= 0) checkSignals();
+  }
+
+  [[noreturn]] void Act(pid_t parent, const std::optional<std::string>& root,
+                        const Work& work) const noexcept {
+    for (int standard = 0; standard <= STDERR_FILENO; ++standard) {
+      dup2(messages.Number(), standard);
+    }
+    ForgetHandlers();
+    const Send send = [this](const Reply& reply) {
+      Append(sent, reply.kind + "\n" + reply.document);
+    };
+    if (root) Enter(*root, send);
+    // What enters a user namespace has forgotten an earlier wish.
+    prctl(PR_SET_PDEATHSIG, SIGTERM);
+    if (getppid() != parent) _exit(SecPolicyCli::kFailed);
+    SecPolicyCli::RunAndExit([&] {
+      SendFailureOf([&] { work(send); }, send);
+      return SecPolicyCli::kWell;
+    });
+  }
+
+  static void Enter(const std::string& root, const Send& send) {
+    try {
+      SecPolicyCli::EnterRoot(root);
+    } catch (const HostError& failure) {
+      send(ToReply("root", failure));
+      _exit(SecPolicyCli::kFailed);
+    }
+  }
+
+  const Descriptor sent = MakeFile();
+  const Descriptor messages = MakeFile();
+  pid_t id = -1;
+  bool isOver = false;
+  Descriptor end = Descriptor(-1);  // tells that it has ended
+};
+
+}  // namespace
+
+Reply RunBelow(const std::optional<std::string>& root, const Work& work,
+               const std::function<void()>& checkSignals) {
+  return Child(root, work).Reap(checkSignals);
+}
+
+}  // namespace SecPolicyPython
