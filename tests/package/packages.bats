@@ -35,7 +35,7 @@ make_debian() {
     --include="$needed,busybox-static,systemd" "$(. /etc/os-release && echo "$VERSION_CODENAME")" "$DEBIAN" -
   files >"$BATS_FILE_TMPDIR/clean"
   mkdir "$DEBIAN/srv/packages"
-  cp "$PACKAGES"/*.deb "$DEBIAN/srv/packages"
+  cp "$PACKAGES"/{lib,}secpolicy*.deb "$DEBIAN/srv/packages"
   inside sh -c 'apt-get --yes --quiet install /srv/packages/*.deb' >"$BATS_FILE_TMPDIR/install.log" 2>&1
 }
 
@@ -75,7 +75,7 @@ listed() { for package; do dpkg-deb --fsys-tarfile "$package" | tar --list; done
 
 @test "another folder, time zone and umask make the same bytes" {
   (umask 077 && TZ=Asia/Tokyo "$SOURCE/scripts/pack" "$BUILD" "$BATS_TEST_TMPDIR/again") >/dev/null 2>&1
-  [[ $(find "$PACKAGES" -name '*.deb' | wc -l) -eq 4 ]]
+  [[ $(find "$PACKAGES" -name '*.deb' | wc -l) -eq 5 ]]
   for package in "$PACKAGES"/*.deb; do
     cmp "$package" "$BATS_TEST_TMPDIR/again/${package##*/}"
   done
@@ -140,6 +140,19 @@ rpm_files() {
     $(PKG_CONFIG_LIBDIR=$libraries/pkgconfig pkg-config --cflags --libs secpolicy)
   run inside env SECPOLICY_HOST_STATE=/srv/state/host.db /srv/runtime
   [[ $status -eq 0 && $output == *"job7: /usr/bin/convert 0x11"* ]]
+}
+
+# Not in that Debian, which would need Python for it.
+@test "the package for Python holds a module that works, and says what it needs" {
+  local package=("$PACKAGES"/python3-secpolicy_*.deb)
+  dpkg-deb --extract "${package[0]}" "$BATS_TEST_TMPDIR"
+  [[ $(dpkg-deb --field "${package[0]}" Depends) == *"python3 (>= 3."*libsqlite3-0* ]]
+  cd "$BATS_TEST_TMPDIR/usr/lib/python3/dist-packages"
+  run --separate-stderr /usr/bin/python3 -B -c '
+import secpolicy, sys
+report = secpolicy.check(sys.argv[1], fresh=True)
+print(report.errors[0].code, report.errors[0].line)' "$SOURCE/examples/broken"
+  [[ $output == "unknown-word 4" && -z $stderr ]]
 }
 
 # Runs /started.sh of a copy of that Debian under systemd, and shows what it writes.
