@@ -86,6 +86,8 @@ listed() { for package; do dpkg-deb --fsys-tarfile "$package" | tar --list; done
   [[ -x $BATS_TEST_TMPDIR/files/usr/bin/secpolicy ]]
   run grep -rlF "$SOURCE" "$BATS_TEST_TMPDIR/files"
   [[ $status -eq 1 && -z $output ]]
+  # The number of a build is made from all that was linked, also from what a package leaves out.
+  run -1 bash -c "readelf -d '$BUILD'/lib/lib*.so.*.*.* '$BUILD'/bin/secpolicy | grep 'RUNPATH.*[:[]/'"
 }
 
 # rpm_files COMPONENT: the files and links of its RPM package, but for what rpm adds for debuggers.
