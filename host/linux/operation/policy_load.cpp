@@ -61,6 +61,12 @@ void DropKept(Store& store, const RuleTableColumns& table, const std::string& co
                          " AS kept CROSS JOIN ", table.name, " USING (", columns, "))"));
 }
 
+// False at a boot: then nothing can stay, and all rules need not be looked at.
+bool HasEarlierLoad(Store& store, int kind, std::int64_t load) {
+  return store.ReadInteger(StrCat("SELECT count(*) FROM policy_load WHERE kind = ", kind,
+                                  " AND number <> ", load)) != 0;
+}
+
 // The rules of the load's own kind that it has not installed.
 std::string StayingRules(const RuleTableColumns& table, int kind, std::int64_t load) {
   return StrCat(" FROM ", table.name, " WHERE load <> ", load, " AND load IN ", LoadsOf(kind));
@@ -70,7 +76,9 @@ std::string StayingRules(const RuleTableColumns& table, int kind, std::int64_t l
 int RemoveStaying(Store& store, const RuleTableColumns& table, int kind, std::int64_t load) {
   // What the kind itself had, and others had covered.
   store.RunScript(StrCat("DELETE FROM covered_", table.name, " WHERE load IN ", LoadsOf(kind)));
-  const int gone = store.RunScript("DELETE" + StayingRules(table, kind, load));
+  const int gone = HasEarlierLoad(store, kind, load)
+                       ? store.RunScript("DELETE" + StayingRules(table, kind, load))
+                       : 0;
   const int back =
       store.RunScript(StrCat("INSERT OR IGNORE INTO ", table.name, " (", table.content, ") SELECT ",
                              table.content, " FROM (SELECT *, max(id) FROM covered_", table.name,
@@ -108,6 +116,7 @@ std::uint64_t RemoveStayingRules(Store& store, int kind, std::int64_t load) {
 }
 
 std::uint64_t CountStayingRules(Store& store, int kind, std::int64_t load) {
+  if (!HasEarlierLoad(store, kind, load)) return 0;
   std::int64_t staying = 0;
   for (const RuleTableColumns& table : kRuleTables) {
     staying += store.ReadInteger("SELECT count(*)" + StayingRules(table, kind, load));
