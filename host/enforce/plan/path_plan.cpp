@@ -73,6 +73,22 @@ std::string Join(const std::string& directory, const std::string& name) {
   return (directory == "/" ? "" : directory) + "/" + name;
 }
 
+// On a walk down the tree: the path is longer by a name for as long as this lives.
+class Step {
+ public:
+  Step(std::string& walked, const std::string& name) : path(walked), before(walked.size()) {
+    if (path != "/") path += '/';
+    path += name;
+  }
+  Step(const Step&) = delete;
+  Step& operator=(const Step&) = delete;
+  ~Step() { path.resize(before); }
+
+ private:
+  std::string& path;
+  const std::size_t before;
+};
+
 // ---- The plan
 
 class Planner {
@@ -86,8 +102,9 @@ class Planner {
         mayMask(masksCount) {}
 
   PathPlan Run() {
-    Examine(root, "/", {});
-    Place(root, "/", 0);
+    std::string path = "/";
+    Examine(root, path, {});
+    Place(root, path, 0);
     return {std::move(rights), std::move(masks), Fates()};
   }
 
@@ -109,7 +126,7 @@ class Planner {
     return isThere ? finding.own & Fitting(finding.kind) : 0;
   }
 
-  Rights Examine(Node& node, const std::string& path, const Region& above) {
+  Rights Examine(Node& node, std::string& path, const Region& above) {
     Finding& finding = node.finding;
     finding.kind = files.KindOf(path);
     finding.region = RegionOf(node, above);
@@ -117,7 +134,8 @@ class Planner {
     finding.here = finding.own;
     finding.any = AnyOf(finding);
     for (const auto& [name, child] : node.children) {
-      const Rights beneath = Examine(*child, Join(path, name), finding.region);
+      const Step step(path, name);
+      const Rights beneath = Examine(*child, path, finding.region);
       if (finding.kind == FileKind::kFile) continue;
       const Finding& found = child->finding;
       finding.any |= found.any;
@@ -128,7 +146,7 @@ class Planner {
     return Beneath(finding);
   }
 
-  void Place(const Node& node, const std::string& path, Rights have) {
+  void Place(const Node& node, std::string& path, Rights have) {
     const Finding& finding = node.finding;
     if (finding.kind == FileKind::kLink) return;
     if (finding.kind == FileKind::kNothing) {
@@ -141,7 +159,10 @@ class Planner {
       const Rights apart = finding.own & ~have;
       if (apart != 0) have |= Divide(node, path, apart);
     }
-    for (const auto& [name, child] : node.children) Place(*child, Join(path, name), have);
+    for (const auto& [name, child] : node.children) {
+      const Step step(path, name);
+      Place(*child, path, have);
+    }
   }
 
   void LoseMissing(const Region& region, Rights lost) {
