@@ -5,34 +5,19 @@
 # ESCAPE_AS is the number of an ordinary user whose programs ask, when root starts this.
 
 load helper
+load small_root
 
 setup_file() {
-  export programs=$BATS_FILE_TMPDIR/programs
-  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
-  mkdir "$programs"
-  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$PROBE" "$programs"
+  copy_programs "$PROBE"
 }
 
 # /t/public is what askDom reads; /t/secret is what takes secretDom, which /t/secret/program enters.
 setup() {
   needs_landlock
-  [[ -z $ESCAPE_AS || $(id -u) -eq 0 ]] || skip "only root can become another user"
-  as=()
-  [[ -z $ESCAPE_AS ]] || as=(setpriv --reuid "$ESCAPE_AS" --regid "$ESCAPE_AS" --clear-groups)
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/etc/zorvan/secpolicy
-  mkdir -p "$policy"/{objects,domains/plugins,fileLabels,early/domains} "$root"/{tardisks,t/{public,secret}}
-  chmod 755 "$BATS_TEST_TMPDIR"
-  cp "$PROBE" "$root/probe"
+  works_as "$ESCAPE_AS"
+  lay_out_root
+  lay_out_two_places
   cp "$programs/secpolicy-run" "$root/ask"
-  for place in public secret; do
-    echo content >"$root/t/$place/file"
-    cp "$PROBE" "$root/t/$place/program"
-  done
-  printf '%s\n' public secret >"$policy/objects/all"
-  printf '/t/%s/* %s\n' public public secret secret >"$policy/fileLabels/all"
-  for name in globalVMDom ioFilterDom appDom daemonFrameworkDom; do : >"$policy/domains/$name"; done
-  echo '-s @start grant' >"$policy/domains/hostDom"
   domain askDom "${asking[@]}" '-d secret secretDom exec grant'
   domain secretDom "${calls[@]}" '-r /t/secret rwx'
 }
@@ -45,12 +30,6 @@ domain() {
   printf '%s\n' "${@:2}" >"$policy/domains/$1"
 }
 
-boot_as() {
-  [[ -z $ESCAPE_AS ]] || chown -R "$ESCAPE_AS:$ESCAPE_AS" "$root"
-  secpolicy boot
-  exits 0
-}
-
 secpolicy() {
   run --separate-stderr "${as[@]}" "$programs/secpolicy" --root "$root" "$@"
 }
@@ -61,7 +40,7 @@ asks() {
 }
 
 @test "a program enters the domain that its label leads to, from within another" {
-  boot_as
+  boot_root
   secpolicy run askDom -- /probe read=/t/secret/file run=/t/secret/program read=/t/public/file
   answers 0 'read=/t/secret/file EACCES' 'run=/t/secret/program EACCES' 'read=/t/public/file ok'
   asks /t/secret/program read=/t/secret/file read=/t/public/file write=/t/secret/file
@@ -73,13 +52,13 @@ asks() {
   printf '#!/t/secret/program read=/t/secret/file\n' >"$root/t/secret/script"
   chmod +x "$root/t/secret/script"
   ln -s secret/script "$root/t/link"
-  boot_as
+  boot_root
   asks /t/link read=/t/public/file
   answers 0 'read=/t/secret/file ok' '/t/secret/script is no operation' 'read=/t/public/file EACCES'
 }
 
 @test "a program is found by PATH, from the working directory, and gets its name" {
-  boot_as
+  boot_root
   local who=("${as[@]}")
   as=("${who[@]}" env PATH=/t/public:/t/secret)
   asks program read=/t/secret/file
@@ -102,7 +81,7 @@ waits() {
 
 @test "the exit status is that of the program, and it gets the signals of who asked" {
   cp "$programs/secpolicy-run" "$root/t/secret/run"
-  boot_as
+  boot_root
   asks /t/secret/run --plan nothing -- true
   exits 126
   [[ $stderr == "secpolicy-run: cannot open the plan nothing: "* ]]
@@ -126,7 +105,7 @@ waits() {
 @test "the program has the environment of who entered the first domain, but for the terminal" {
   cp /bin/busybox "$root/t/public"
   cp /bin/busybox "$root/t/secret"
-  boot_as
+  boot_root
   as+=(env -i "PATH=$PATH" TERM=outside HELLO=outside SECPOLICY_BROKER=7)
   secpolicy run askDom -- /t/public/busybox env TERM=inside LANG=/etc LC_ALL=C HELLO=inside LD_PRELOAD=/t/public/file \
     SECPOLICY_HOST_STATE=/t/public/state PATH=/t/public BASH_ENV=/t/public/file /ask --ask -- /t/secret/busybox env
@@ -144,7 +123,7 @@ waits() {
   cp "$root/ask" "$root/t/secret/version"
   domain askDom "${asking[@]}" '-r /t/public rwx' '-r /dev/null r' '-d secret secretDom exec grant'
   domain secretDom "${calls[@]}" '-r /t rx'
-  boot_as
+  boot_root
   # It may make links in /t/public, to what leads to the other domain and to what does not.
   # shellcheck disable=SC2016
   secpolicy run askDom -- /t/public/busybox sh -c '
@@ -163,7 +142,7 @@ waits() {
   domain otherDom "${calls[@]}"
   printf '%s\n' '-d secret secretDom exec grant' >>"$policy/domains/otherDom"
   domain revokingDom "${asking[@]}" '-d secret secretDom exec grant' '-a secret execute revoke'
-  boot_as
+  boot_root
   asks /probe
   exits 126
   [[ $stderr == *"no rule leads from askDom to another domain by /probe, "*"nothing was started" ]]
@@ -186,7 +165,7 @@ waits() {
   domain dumbDom "${calls[@]}" '-r /ask rx' '-d secret secretDom exec grant'
   domain openDom "${asking[@]}" '-d secret secretDom exec grant'
   domain staysDom "${asking[@]}"
-  boot_as
+  boot_root
   secpolicy settings enforcement openDom disabled
   secpolicy restore
   local name
@@ -204,7 +183,7 @@ waits() {
 @test "the new program is a world of its own domain, and so are those that it asks for" {
   domain secretDom "${asking[@]}" '-r /t/secret rx' '-r /t/public/program rx' '-d public publicDom exec grant'
   domain publicDom "${calls[@]}" '-r /t/public rx'
-  boot_as
+  boot_root
   asks /ask --ask
   exits 126
   cp "$root/ask" "$root/t/secret/ask"
@@ -223,12 +202,10 @@ waits() {
   for file in $(ldd "$SECPOLICY" | grep -o '/[^ ]*'); do install -D "$file" "$root$file"; done
   domain askDom "${asking[@]}" '-s @memory grant' '-d secret secretDom exec grant' \
     '-r /opt rx' '-r /lib rx' '-r /lib64 rx' '-r /proc r'
-  boot_as
+  boot_root
   # It looks for the launcher beside itself.
-  local options=(--mount)
-  [[ $(id -u) -eq 0 ]] || options+=(--map-current-user --keep-caps)
-  # shellcheck disable=SC2016
-  as=(unshare "${options[@]}" sh -c 'mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}")
+  has_places proc
+  secpolicy() { run --separate-stderr inside "$programs/secpolicy" --root "$root" "$@"; }
   secpolicy run askDom -- /opt/secpolicy exec -- /t/secret/program read=/t/secret/file read=/t/public/file
   answers 0 'read=/t/secret/file ok' 'read=/t/public/file EACCES'
   secpolicy run askDom -- /opt/secpolicy exec -- /probe getppid

@@ -5,42 +5,24 @@
 # ESCAPE_AS is the number of an ordinary user whose programs try it, when root starts this.
 
 load helper
+load small_root
 
 # ---- A root, and domains in it
 
-# Where an ordinary user can reach them.
 setup_file() {
-  export programs=$BATS_FILE_TMPDIR/programs
-  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
-  mkdir "$programs"
-  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$PROBE" "$PRELOADED" "$programs"
+  copy_programs "$PROBE" "$PRELOADED"
 }
 
 setup() {
   needs_landlock
-  [[ -z $ESCAPE_AS || $(id -u) -eq 0 ]] || skip "only root can become another user"
+  works_as "$ESCAPE_AS"
   is_machine=
-  before=()
   options=()
-  namespace=(unshare --mount)
-  [[ $(id -u) -eq 0 ]] || namespace+=(--map-current-user --keep-caps)
-  as=()
-  [[ -z $ESCAPE_AS ]] || as=(setpriv --reuid "$ESCAPE_AS" --regid "$ESCAPE_AS" --clear-groups)
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/etc/zorvan/secpolicy
   victims=()
-  mkdir -p "$policy"/{objects,domains/plugins,fileLabels,early/domains} "$root"/{tardisks,proc,run,usr,programs,t/{public,secret}/directory}
-  chmod 755 "$BATS_TEST_TMPDIR"
+  lay_out_root proc run usr programs t/{public,secret}/directory
+  has_places proc
   ln -s usr/bin usr/lib usr/lib64 "$root"
-  cp "$PROBE" "$root/probe"
-  for place in public secret; do
-    echo content >"$root/t/$place/file"
-    cp "$PROBE" "$root/t/$place/program"
-  done
-  printf '%s\n' public secret >"$policy/objects/all"
-  printf '/t/%s/* %s\n' public public secret secret >"$policy/fileLabels/all"
-  for name in globalVMDom ioFilterDom appDom daemonFrameworkDom; do : >"$policy/domains/$name"; done
-  echo '-s @start grant' >"$policy/domains/hostDom"
+  lay_out_two_places
   domain openDom
 }
 
@@ -59,36 +41,10 @@ domain() {
   printf '%s\n' "${start[@]}" "${@:2}" >"$policy/domains/$1"
 }
 
-# boot_as: boots the root, all of which is whose programs try it.
-boot_as() {
-  [[ -z $ESCAPE_AS ]] || chown -R "$ESCAPE_AS:$ESCAPE_AS" "$root"
-  secpolicy boot
-  exits 0
-  secpolicy settings enforcement openDom disabled
-  exits 0
-  secpolicy restore
-  exits 0
-}
-
-# inside COMMAND...: below a root that is a mount point, with the processes of the machine, for the command
-# alone.
-inside() {
-  # shellcheck disable=SC2016
-  "${before[@]}" "${namespace[@]}" sh -c 'mount --bind "$0" "$0" && mount --rbind /proc "$0/proc" && exec "$@"' "$root" "${as[@]}" "$@"
-}
-
-# on_machine COMMAND...: where the root is that of a machine, with the programs of this one.
-on_machine() {
-  # shellcheck disable=SC2016
-  "${namespace[@]}" sh -ec '
-    mount --rbind "$0" "$0"
-    mount --rbind /proc "$0/proc"
-    mount --rbind /usr "$0/usr"
-    mount --bind "$programs" "$0/programs"
-    cd "$0"
-    pivot_root . .
-    umount -l .
-    exec "$@"' "$root" "${as[@]}" "$@"
+# boots: the root, in which openDom refuses nothing.
+boots() {
+  boot_root
+  refuses_nothing openDom
 }
 
 secpolicy() {
@@ -133,6 +89,7 @@ only_root() {
 as_machine() {
   [[ $(id -u) -eq 0 ]] || skip "only root can lay out a machine"
   is_machine=yes
+  has_places proc usr
 }
 
 # in_background COMMAND...: $process runs until the test ends; its output is in $told.
@@ -154,7 +111,7 @@ a_victim() {
 @test "1 reading what has a label that is not granted" {
   domain narrowDom "${calls[@]}" '-a public read grant'
   domain wideDom "${calls[@]}" '-a public read grant' '-a secret read grant'
-  boot_as
+  boots
   refuses EACCES read=/t/secret/file
   gets narrowDom ok read=/t/public/file
 }
@@ -162,7 +119,7 @@ a_victim() {
 @test "2 writing to what may only be read" {
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses EACCES write=/t/secret/file
   gets narrowDom ok read=/t/secret/file
 }
@@ -170,14 +127,14 @@ a_victim() {
 @test "3 emptying what may only be read" {
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
 }
 
 @test "3 emptying what may be written but not truncated" {
   domain narrowDom "${calls[@]}" '-a secret read grant' '-a secret write grant'
   domain wideDom "${calls[@]}" '-a secret read grant' '-a secret write grant' '-a secret truncate grant'
-  boot_as
+  boots
   refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
   gets narrowDom ok write=/t/secret/file
 }
@@ -185,14 +142,14 @@ a_victim() {
 @test "4 making a file where nothing may be written" {
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses EACCES create=/t/secret/new link-nameless=/t/secret,/t/secret/linked
 }
 
 @test "4 linking a file without a name from where files may be made" {
   domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses "EACCES|EXDEV" link-nameless=/t/public,/t/secret/linked
   gets narrowDom ok link-nameless=/t/public,/t/public/linked
 }
@@ -214,7 +171,7 @@ makes_only() {
     domain "$kind" "${calls[@]}" "-f public public $kind grant" '-c cap_mknod grant'
   done
   domain stream "${calls[@]}" '-u public stream grant' '-p socket_type 1 grant'
-  boot_as
+  boots
   makes_only regular mknod-file
   makes_only directory mkdir
   makes_only symlink symlink
@@ -227,49 +184,49 @@ makes_only() {
 @test "6 removing an entry of a directory that may only be read" {
   domain narrowDom "${calls[@]}" '-r /t rw' '-r /t/secret r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses EACCES unlink=/t/secret/file rmdir=/t/secret/directory
 }
 
 @test "6 removing the directory itself" {
   domain narrowDom "${calls[@]}" '-r /t rw' '-r /t/secret/directory r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses "EACCES|EXDEV" rmdir=/t/secret/directory rename=/t/secret,/t/other
 }
 
 @test "7 moving or linking a file to where it may be read" {
   domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret w'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses "EACCES|EXDEV" link=/t/secret/file,/t/public/linked rename=/t/secret/file,/t/public/moved
 }
 
 @test "8 exchanging a file with one that may be read" {
   domain narrowDom "${calls[@]}" '-r /t/public rw' '-r /t/secret w'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   refuses "EACCES|EXDEV" exchange=/t/public/file,/t/secret/file exchange=/t/secret/file,/t/public/file
 }
 
 @test "9 listing" {
   domain narrowDom "${calls[@]}" '-a secret read grant'
   domain wideDom "${calls[@]}" '-a secret read grant' '-a secret list grant'
-  boot_as
+  boots
   refuses EACCES list=/t/secret list=/t/secret/directory
 }
 
 @test "9 watching, which tells names as well" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t/public r' '-s inotify_add_watch grant'
-  boot_as
+  boots
   refuses EPERM watch=/t/secret watch=/t/public
 }
 
 @test "10 by the links of processes" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t r'
-  boot_as
+  boots
   refuses EACCES read=/proc/self/root/t/secret/file read=/proc/thread-self/cwd/t/secret/file
   gets narrowDom ok read=/proc/self/root/t/public/file
   in_background "${as[@]}" sh -c 'cd "$0/t/secret" && exec sleep 60 7<file' "$root"
@@ -283,7 +240,7 @@ makes_only() {
 @test "11 a link in place of a file while the domain is entered" {
   domain narrowDom "${calls[@]}" '-r /t/public/data r'
   domain wideDom "${calls[@]}" '-r /t r'
-  boot_as
+  boots
   echo content >"$root/t/data"
   ln -s /t/secret/file "$root/t/link"
   cp "$root/t/data" "$root/t/public/data"
@@ -307,7 +264,7 @@ makes_only() {
   printf '%s\n' '-d public openDom exec grant' '-d secret silentDom exec grant' >>"$policy/domains/hostDom"
   domain openDom
   domain silentDom "${calls[@]}" '-r /t rx' '-s write revoke'
-  boot_as
+  boots
   ln -s /t/public/program "$root/t/one"
   ln -s /t/secret/program "$root/t/other"
   ln -s /t/public/program "$root/t/link"
@@ -333,14 +290,14 @@ for kind in itertools.cycle(("public", "secret")):
 @test "12 by the directory above" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t r'
-  boot_as
+  boots
   refuses EACCES read=/t/public/../secret/file read=/t/public/directory/../../secret/file list=/t/public/..
 }
 
 @test "13 all that may be done above a narrower part" {
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
   domain wideDom "${calls[@]}" '-r /t rwx'
-  boot_as
+  boots
   refuses "EACCES" run=/t/secret/program map-executable=/t/secret/program write=/t/secret/file read=/t/secret/file list=/t/secret create=/t/secret/new
   gets narrowDom ok run=/t/public/program map-executable=/t/public/program write=/t/public/file list=/t/public
 }
@@ -348,7 +305,7 @@ for kind in itertools.cycle(("public", "secret")):
 @test "13 a narrower part that is made later" {
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/new'
   domain wideDom "${calls[@]}" '-r /t rwx'
-  boot_as
+  boots
   refuses EACCES mkdir=/t/new rename=/t/secret,/t/new
   mkdir -p "$root/t/new"
   gets narrowDom EACCES list=/t/new create=/t/new/other
@@ -371,7 +328,7 @@ is_masked() {
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
   domain wideDom "${calls[@]}" '-r /t rwx'
-  boot_as
+  boots
   is_masked "hidden by a mount: /t/secret"
   refuses EACCES run=/t/secret/program map-executable=/t/secret/program write=/t/secret/file read=/t/secret/file list=/t/secret create=/t/secret/new
   gets narrowDom EBUSY rmdir=/t/secret rename=/t/secret,/t/moved rename=/t/public,/t/secret exchange=/t/public,/t/secret
@@ -382,7 +339,7 @@ is_masked() {
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret rw'
   domain wideDom "${calls[@]}" '-r /t rwx'
-  boot_as
+  boots
   is_masked "mounted so that nothing is executed: /t/secret"
   refuses "EACCES|EPERM" run=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program run=/proc/self/root/t/secret/program
   gets narrowDom ok run=/t/public/program read=/t/secret/file write=/t/secret/file create=/t/secret/new
@@ -397,7 +354,7 @@ is_masked() {
   domain narrowDom "${calls[@]}" '-a public read grant' '-a public list grant' '-a public write grant'
   domain wideDom "${calls[@]}" '-a public read grant' '-a secret read grant' '-a secret write grant'
   printf '/t/* public\n/t/key secret\n/t/secret/* secret\n' >"$policy/fileLabels/all"
-  boot_as
+  boots
   is_masked "hidden by a mount: /t/key"
   refuses EACCES read=/t/key write=/t/key read=/t/secret/file
   gets narrowDom ok read=/t/entry1 list=/t read=/t/public/file
@@ -410,7 +367,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   local part=('-r /t rwx' '-r /t/secret' '-c cap_sys_admin grant')
   domain narrowDom "${calls[@]}" "${part[@]}"
   domain wideDom "${calls[@]}" "${part[@]}" "${mounting[@]}"
-  boot_as
+  boots
   local acts=("bind-mount=/t/secret,/t/public" "move-mount=/t/secret,/t/public" remount=/proc unmount=/proc)
   # With its calls as well nothing is mounted. Where nothing is refused all of it works.
   gets narrowDom EPERM set-mount=/proc "${acts[@]}"
@@ -421,7 +378,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "14 mounts over and around a part that is masked" {
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' "${mounting[@]}"
-  boot_as
+  boots
   is_masked "hidden by a mount: /t/secret"
   local acts=(unmount=/t/secret remount=/t/secret set-mount=/t/secret "move-mount=/t/secret,/t/public" "bind-mount=/t/public,/t/secret")
   gets narrowDom EPERM "${acts[@]}"
@@ -434,7 +391,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   only_root
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' "${mounting[@]}" '-c cap_sys_admin grant'
-  boot_as
+  boots
   secpolicy run narrowDom --explain
   exits 0
   [[ $output != *"hidden by a mount"* ]]
@@ -444,7 +401,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "15 uncovering a masked part in a user namespace of its own" {
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret' '-s unshare grant' "${mounting[@]}" '-p clone_flags 0x10020000 grant'
-  boot_as
+  boots
   as_machine
   is_masked "hidden by a mount: /t/secret"
   tries narrowDom unshare-user unmount=/t/secret remount=/t/secret set-mount=/t/secret bind-mount=/t/public,/t/secret read=/t/secret/file
@@ -458,7 +415,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   local part=('-r /t rwx' '-r /t/secret' '-s unshare grant')
   domain narrowDom "${calls[@]}" "${part[@]}"
   domain wideDom "${calls[@]}" "${part[@]}" "${mounting[@]}" '-p clone_flags 0x10020000 grant'
-  boot_as
+  boots
   # Below a root that is not the machine's nobody is given a user namespace.
   as_machine
   tries narrowDom unshare-user
@@ -474,7 +431,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   local can=('-c cap_sys_admin grant' '-c cap_sys_chroot grant')
   domain narrowDom "${calls[@]}" "${can[@]}"
   domain wideDom "${calls[@]}" "${can[@]}" '-s setns grant'
-  boot_as
+  boots
   refuses EPERM setns
   a_victim
   gets narrowDom "EPERM|EACCES" "setns-of=$process"
@@ -491,7 +448,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   local can=('-c cap_dac_read_search grant' '-r /t/public r' '-s name_to_handle_at grant')
   domain narrowDom "${calls[@]}" "${can[@]}"
   domain wideDom "${calls[@]}" "${can[@]}" '-s open_by_handle_at grant'
-  boot_as
+  boots
   refuses EPERM open-by-handle=/t/public/file,/t/public
   gets wideDom EACCES open-by-handle=/t/secret/file,/t/public
   gets openDom ok open-by-handle=/t/secret/file,/t/public
@@ -499,7 +456,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 
 @test "18 inherited descriptors" {
   domain narrowDom "${calls[@]}"
-  boot_as
+  boots
   exec 7<"$root/t/secret/file" 18<"$root"
   gets narrowDom EBADF is-open=7 is-open=18
   gets openDom ok is-open=7 is-open=18
@@ -511,7 +468,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "18 reopening what was inherited" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   exec 7<&0 <"$root/t/secret/file"
   refuses EACCES read=/proc/self/fd/0 write=/proc/self/fd/0
   exec <"$root"
@@ -522,7 +479,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "20 attributes by ioctl" {
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t r' '-p ioctl_request 0x80086601 grant' '-p ioctl_request 0x40086602 grant'
-  boot_as
+  boots
   tries openDom set-flags=/t/secret/file
   [[ $output != *@(ENOTTY|EOPNOTSUPP) ]] || skip "this file system has no such attributes"
   refuses EPERM set-flags=/t/secret/file
@@ -531,7 +488,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "20 modes, owners, times and labels" {
   domain narrowDom "${calls[@]}" '-r /t rwx'
   domain wideDom "${calls[@]}" '-r /t rwx' '-s @attributes grant' '-c cap_sys_admin grant'
-  boot_as
+  boots
   local label=user.zorvan.security
   ! is_root || label=security.bpf.zorvan
   refuses EPERM chmod=/t/secret/file chown=/t/secret/file utime=/t/secret/file "setxattr=/t/secret/file,$label"
@@ -542,14 +499,14 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 @test "21 calls that no rule grants, or one revokes" {
   domain narrowDom '-s getppid revoke'
   domain wideDom '-s getpgid grant'
-  boot_as
+  boots
   refuses EPERM getppid getpgid
 }
 
 @test "22 by the numbers of another table" {
   [[ $(uname -m) == x86_64 ]] || skip "only x86_64 has other tables"
   domain narrowDom "${calls[@]}"
-  boot_as
+  boots
   local operation bad_call=159
   for operation in call-int80 call-x32; do
     tries narrowDom "$operation"
@@ -563,14 +520,14 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 
 @test "23 numbers that no call has, or that nobody can look into" {
   domain narrowDom "${calls[@]}" '-s clone3 grant'
-  boot_as
+  boots
   gets narrowDom ENOSYS call=9999 call=4294967295 clone3=0
   gets openDom ok clone3=0
 }
 
 @test "24 families with high bits" {
   domain narrowDom '-s socket grant' '-p socket_family 2 grant'
-  boot_as
+  boots
   gets narrowDom EPERM socket=0x100000010,3 socket=0x10,3
   gets narrowDom ok socket=0x100000002,1 socket=2,1
   gets openDom ok socket=0x100000010,3 socket=0x10,3
@@ -578,7 +535,7 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
 
 @test "25 types with flags and high bits" {
   domain narrowDom '-s socket grant' '-p socket_type 1 grant'
-  boot_as
+  boots
   gets narrowDom EPERM socket=2,2 socket=2,0x80002 socket=2,0x800 socket=2,0x100000002
   gets narrowDom ok socket=2,1 socket=2,0x80001 socket=2,0x80801
   gets openDom ok socket=2,2 socket=2,0x80002 socket=2,0x100000002
@@ -608,7 +565,7 @@ network=("${calls[@]}" '-s @network grant' '-p socket_family 2 grant')
   [[ $(cat /proc/sys/net/mptcp/enabled) == 1 ]] || skip "this kernel has no MPTCP"
   domain narrowDom "${network[@]}" '-p connect_port 1 grant'
   domain wideDom "${network[@]}"
-  boot_as
+  boots
   refuses EPERM socket-mptcp
 }
 
@@ -616,14 +573,14 @@ network=("${calls[@]}" '-s @network grant' '-p socket_family 2 grant')
   a_server tcp any
   domain narrowDom "${network[@]}" '-p connect_port 1 grant'
   domain wideDom "${network[@]}"
-  boot_as
+  boots
   refuses "EACCES|EPERM" "connect-tcp=$at" "send-fast=$at" "send-message-fast=$at" "connect-fast=$at"
 }
 
 @test "28 other protocols, and listening without a port" {
   domain narrowDom "${network[@]}" '-p connect_port 53 grant' '-p bind_port 53 grant'
   domain wideDom "${network[@]}"
-  boot_as
+  boots
   refuses EPERM socket=2,2 listen-unbound
 }
 
@@ -631,7 +588,7 @@ network=("${calls[@]}" '-s @network grant' '-p socket_family 2 grant')
   a_server tcp any
   domain narrowDom "${network[@]}" '-p connect_port 1 grant' '-p bind_port 7391 grant'
   domain wideDom "${network[@]}" "-p connect_port $at grant" '-p bind_port 0 grant' '-p bind_port 7392 grant'
-  boot_as
+  boots
   refuses EACCES "connect-tcp=$at" bind-tcp=7392 bind-tcp=0
   gets narrowDom ok bind-tcp=7391
 }
@@ -652,7 +609,7 @@ reaches() {
 @test "30 unix sockets of others that have a name" {
   domain narrowDom "${calls[@]}" '-s @network grant' '-r /run r'
   domain wideDom "${calls[@]}" '-s @network grant' '-r /run r' '-p socket_family 1 grant'
-  boot_as
+  boots
   # Outside of the root such a name would be too long.
   cd "$root/run"
   a_server stream stream
@@ -664,7 +621,7 @@ reaches() {
 
 @test "31 abstract unix sockets of others" {
   domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant'
-  boot_as
+  boots
   a_server stream "@secpolicy-$$"
   gets openDom ok "connect-abstract=secpolicy-$$"
   options=(--best-effort)
@@ -674,7 +631,7 @@ reaches() {
 @test "32 unix sockets elsewhere, or of another kind" {
   domain narrowDom '-s socket grant' '-s bind grant' '-u public stream grant' '-p socket_type 1 grant'
   domain wideDom '-s socket grant' '-s bind grant' '-r /t rw'
-  boot_as
+  boots
   refuses EACCES bind-unix=/t/secret/socket
   refuses EPERM bind-unix-datagram=/t/public/datagram
   gets narrowDom ok bind-unix=/t/public/socket
@@ -685,8 +642,8 @@ reaches() {
 @test "33 typing into the terminal" {
   domain narrowDom "${calls[@]}"
   domain wideDom "${calls[@]}" '-p ioctl_request 0x5412 grant' '-p ioctl_request 0x541c grant' '-c cap_sys_admin grant'
-  boot_as
-  before=(python3 -c 'import os, pty, sys; sys.exit(os.waitstatus_to_exitcode(pty.spawn(sys.argv[1:])))')
+  boots
+  comes_after python3 -c 'import os, pty, sys; sys.exit(os.waitstatus_to_exitcode(pty.spawn(sys.argv[1:])))'
   # TIOCSTI, and TIOCLINUX, which only consoles have. Without rights a kernel may refuse the first anyhow.
   gets narrowDom EPERM ioctl=0x5412 ioctl=0x100005412 ioctl=0x541c ioctl=0x10000541c
   local reaches=ok
@@ -699,7 +656,7 @@ reaches() {
 @test "34 options of prctl" {
   domain narrowDom "${calls[@]}" '-p prctl_option 15 grant'
   domain wideDom "${calls[@]}"
-  boot_as
+  boots
   # PR_SET_DUMPABLE; then PR_SET_NAME, without a name.
   refuses EPERM prctl=4,1 prctl=0x100000004,1
   gets narrowDom EFAULT prctl=15,0
@@ -708,7 +665,7 @@ reaches() {
 @test "34 PR_SET_MM" {
   domain narrowDom "${calls[@]}"
   domain wideDom "${calls[@]}" '-p prctl_option 35 grant'
-  boot_as
+  boots
   # PR_SET_MM_MAP_SIZE, which any user may ask for, without a place for the answer.
   gets narrowDom EPERM prctl=35,15 prctl=0x100000023,15
   gets wideDom EFAULT prctl=35,15 prctl=0x100000023,15
@@ -717,7 +674,7 @@ reaches() {
 @test "35 namespaces by clone, unshare and clone3" {
   domain narrowDom "${calls[@]}" '-s unshare grant' '-r /probe rx'
   domain wideDom "${calls[@]}" '-s unshare grant' '-p clone_flags 0x10000000 grant' '-p clone_flags 0 grant'
-  boot_as
+  boots
   as_machine
   local user=0x10000000
   tries narrowDom clone=$user unshare=$user clone3=$user clone=0
@@ -730,7 +687,7 @@ reaches() {
 
 @test "36 signals to others" {
   domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant'
-  boot_as
+  boots
   a_victim
   gets openDom ok "kill=$process" "tgkill=$process" "sigqueue=$process" "pidfd=$process"
   options=(--best-effort)
@@ -745,7 +702,7 @@ reaches() {
 
 @test "36 other signals than are granted" {
   domain narrowDom "${calls[@]}" '-s @network grant' '-p socket_family 1 grant' '-p kill_signal 15 grant'
-  boot_as
+  boots
   a_victim
   options=(--best-effort)
   gets narrowDom EPERM "kill=$process" "input-signal=$process"
@@ -759,7 +716,7 @@ reaches() {
   local can=('-s @identity grant' '-c cap_setuid grant' '-c cap_setgid grant')
   domain narrowDom "${calls[@]}" "${can[@]}" '-p set_uid 7 grant' '-p set_gid 7 grant'
   domain wideDom "${calls[@]}" "${can[@]}"
-  boot_as
+  boots
   refuses EPERM setuid=8 setfsuid=8 setgroups
   gets narrowDom ok setuid=7 setfsuid=7
 }
@@ -768,7 +725,7 @@ reaches() {
   only_root
   domain narrowDom "${calls[@]}" '-s capset grant'
   domain wideDom "${calls[@]}" '-s capset grant' '-c cap_dac_override grant'
-  boot_as
+  boots
   refuses EPERM has-capability=1 has-bounding=1 raise-capability=1 raise-ambient=1
   gets narrowDom EPERM flip-securebit=0 flip-securebit=2 keep-capabilities
   gets openDom ok flip-securebit=0
@@ -783,7 +740,7 @@ reaches() {
   only_root
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t r' '-c cap_dac_override grant'
-  boot_as
+  boots
   chown 65534:65534 "$root/t/secret/file"
   chmod 600 "$root/t/secret/file"
   refuses EACCES read=/t/secret/file
@@ -795,7 +752,7 @@ reaches() {
   local rules=('-s @file grant' '-s @io grant' '-s clone grant' '-s wait4 grant' '-s memfd_create grant' '-r /t rx')
   domain narrowDom "${rules[@]}"
   domain wideDom "${rules[@]}" '-s execve grant' '-s execveat grant'
-  boot_as
+  boots
   refuses EPERM run=/t/public/program run-by-secret=/t/public/program,{0,1,0xffffffffffffffff} run-by-descriptor=/t/public/program \
     run-from-memory=/t/public/program
 }
@@ -803,7 +760,7 @@ reaches() {
 @test "40 a program from memory" {
   domain narrowDom "${calls[@]}" '-r /t/public r'
   domain wideDom "${calls[@]}" '-r /t/public r' '-s memfd_create grant'
-  boot_as
+  boots
   refuses EPERM run-from-memory=/t/public/program
 }
 
@@ -817,7 +774,7 @@ reaches() {
   domain narrowDom "${calls[@]}" '-r /t r' '-r /t/public/script rx' '-r /t/public/other rx' '-r /t/public/program rx'
   domain wideDom "${calls[@]}" '-r /t rx'
   domain loaderDom "${calls[@]}" '-r /t r' '-r /t/public/loader rx'
-  boot_as
+  boots
   refuses EACCES run-by-loader=/t/public/loader,/t/secret/true run=/t/secret/program
   gets narrowDom EACCES run=/t/public/other
   tries wideDom run=/t/public/other
@@ -833,7 +790,7 @@ reaches() {
   local rules=('-r /t rx' '-f secret secret regular revoke')
   domain narrowDom "${calls[@]}" "${rules[@]}" '-d secret openDom exec grant'
   domain wideDom "${calls[@]}" "${rules[@]}"
-  boot_as
+  boots
   refuses EACCES run=/t/secret/program read=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program
   gets narrowDom ok run=/t/public/program
   printf '#!/t/secret/program\n' >"$root/t/public/script"
@@ -848,7 +805,7 @@ reaches() {
   local rules=('-r /t rx')
   domain narrowDom "${calls[@]}" "${rules[@]}" '-d secret openDom exec grant'
   domain wideDom "${calls[@]}" "${rules[@]}"
-  boot_as
+  boots
   is_masked "mounted so that nothing is executed: /t/secret"
   refuses "EACCES|EPERM" run=/t/secret/program map-executable=/t/secret/program run-by-descriptor=/t/secret/program
   gets narrowDom ok run=/t/public/program list=/t
@@ -859,7 +816,7 @@ reaches() {
   domain narrowDom "${calls[@]}" '-r /t rx' '-r /t/secret r'
   domain wideDom "${calls[@]}" '-r /t rx'
   printf '%s\n' '-d secret narrowDom exec grant' '-d public wideDom exec grant' >>"$policy/domains/hostDom"
-  boot_as
+  boots
   as_machine
   is_masked "mounted so that nothing is executed: /t/secret"
   secpolicy exec -- /t/secret/program read=/t/public/file
@@ -874,7 +831,7 @@ reaches() {
   cp "$programs/secpolicy-run" "$root/t/public/ask"
   domain narrowDom "${calls[@]}" '-s sendmsg grant' '-r /t rx' '-d secret secretDom exec grant'
   domain secretDom "${calls[@]}" '-r /t/secret rx'
-  boot_as
+  boots
   as_machine
   is_masked "mounted so that nothing is executed: /t/secret"
   secpolicy run narrowDom -- /t/public/ask --ask -- /t/secret/program read=/t/secret/file read=/t/public/file
@@ -885,7 +842,7 @@ reaches() {
 
 @test "44 the memory of others" {
   domain narrowDom "${calls[@]}" '-s ptrace grant' '-s process_vm_readv grant' '-c cap_sys_ptrace grant'
-  boot_as
+  boots
   a_victim
   as_machine
   gets openDom ok "trace=$process" "read-memory=$process" "read=/proc/$process/environ" "write=/proc/$process/mem"
@@ -894,7 +851,7 @@ reaches() {
 
 @test "45 rings" {
   domain narrowDom "${calls[@]}" '-s io_uring_setup grant'
-  boot_as
+  boots
   gets narrowDom EPERM set-up-ring
   gets openDom ok set-up-ring
 }
@@ -934,9 +891,8 @@ reaches() {
 # ordinary user does there.
 on_a_machine() {
   only_root
-  boot_as
+  boots
   as_machine
-  ordinary=(setpriv --reuid 65534 --regid 65534 --clear-groups)
   plans=$root/run/secpolicy/plans
 }
 
@@ -1054,7 +1010,7 @@ no_plan() {
 
 @test "49 a level that changes while a program runs" {
   domain narrowDom "${calls[@]}" '-s @clock grant' '-r /t/public r'
-  boot_as
+  boots
   in_background inside "$programs/secpolicy" --root "$root" run narrowDom -- /probe getpgid wait-for=/t/public/go read=/t/secret/file
   until_true '[[ $(<"$told") == "getpgid ok" ]]'
   secpolicy settings enforcement narrowDom permissive
@@ -1069,7 +1025,7 @@ no_plan() {
 @test "50 what the caller puts into the environment" {
   [[ -z $SANITIZER ]] || skip "the sanitizers' runtime has to be loaded first"
   domain narrowDom "${calls[@]}"
-  boot_as
+  boots
   local library variable
   library=$programs/$(basename "$PRELOADED")
   for variable in LD_PRELOAD LD_AUDIT; do
@@ -1088,7 +1044,7 @@ no_plan() {
   local part=('-r /t r' '-r /t/secret' '-c cap_sys_admin grant' '-s open_tree grant')
   domain narrowDom "${calls[@]}" "${part[@]}"
   domain wideDom "${calls[@]}" '-r /t r' '-c cap_sys_admin grant' '-s open_tree grant'
-  boot_as
+  boots
   gets narrowDom EACCES read-in-clone=/t,secret/file read-in-clone=/t/secret,file read-in-clone=/,t/secret/file
   gets openDom ok read-in-clone=/t,secret/file read-in-clone=/t/secret,file
 }
@@ -1097,7 +1053,7 @@ no_plan() {
   too_many
   local part=('-r /t rw' '-r /t/secret' '-s unshare grant' '-s open_tree grant' '-p clone_flags 0x10020000 grant')
   domain narrowDom "${calls[@]}" "${part[@]}"
-  boot_as
+  boots
   as_machine
   is_masked "hidden by a mount: /t/secret"
   gets narrowDom EPERM read-in-clone=/t,secret/file read-in-one-mount=/t,secret/file
@@ -1111,7 +1067,7 @@ no_plan() {
 @test "53 a directory from before the masks" {
   too_many
   domain narrowDom "${calls[@]}" '-r /t rwx' '-r /t/secret'
-  boot_as
+  boots
   is_masked "hidden by a mount: /t/secret"
   exec 7<&0 <"$root/t"
   tries narrowDom read=/t/public/file
@@ -1125,7 +1081,7 @@ no_plan() {
 @test "52 a link in place of a rule's path" {
   domain narrowDom "${calls[@]}" '-r /t/public/directory rw'
   domain wideDom "${calls[@]}" '-r /t rw'
-  boot_as
+  boots
   rmdir "$root/t/public/directory"
   ln -s /t/secret "$root/t/public/directory"
   refuses EACCES read=/t/secret/file read=/t/public/directory/file create=/t/public/directory/new

@@ -2,34 +2,23 @@
 # what they get, when the plans are made anew, and what is said where there is none.
 
 load helper
+load small_root
+
+setup_file() {
+  copy_programs
+}
 
 setup() {
   [[ $(id -u) -eq 0 ]] || skip "only root can lay out a machine"
   needs_landlock
   make_root
-  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR" "$BATS_TEST_TMPDIR"
-  mkdir -p "$root"/{proc,dev,usr,programs,tmp} "$BATS_TEST_TMPDIR/programs"
+  chmod 755 "$BATS_TEST_TMPDIR"
+  mkdir -p "$root"/{proc,dev,usr,programs,tmp}
   chmod 1777 "$root/tmp"
   ln -s usr/lib usr/lib64 "$root"
-  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$BATS_TEST_TMPDIR/programs"
+  has_places proc dev usr
   boot
   plans=$root/run/secpolicy/plans
-}
-
-# on_machine COMMAND...: where the root is that of a machine.
-on_machine() {
-  # shellcheck disable=SC2016
-  run --separate-stderr unshare --mount sh -ec '
-    mount --rbind "$0" "$0"
-    mount --rbind /proc "$0/proc"
-    mount --rbind /dev "$0/dev"
-    mount --rbind /usr "$0/usr"
-    mount --bind "$1" "$0/programs"
-    cd "$0"
-    shift
-    pivot_root . .
-    umount -l .
-    exec "$@"' "$root" "$BATS_TEST_TMPDIR/programs" "$@"
 }
 
 # by_root WORDS...: the command, as root types it; it ends well.
@@ -40,7 +29,7 @@ by_root() {
 
 # by_user WORDS...: the same of an ordinary user.
 by_user() {
-  on_machine /usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups /programs/secpolicy "$@"
+  run --separate-stderr on_machine "${ordinary[@]}" /programs/secpolicy "$@"
 }
 
 # by_user_in DOMAIN WORDS: what the shell of the example makes of WORDS in the domain, for that user.
@@ -187,7 +176,7 @@ by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let 
 
 @test "root sees who runs in which domain, and at which level" {
   # shellcheck disable=SC2016
-  on_machine /bin/sh -c '
+  run --separate-stderr on_machine /bin/sh -c '
     /usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups /programs/secpolicy run monitorDom -- \
       /bin/sh -c "echo \$\$; exec sleep 60" >/tmp/world 2>&1 &
     for turn in 1 2 3 4 5 6 7 8 9 10; do [ -s /tmp/world ] || sleep 1; done

@@ -3,24 +3,17 @@
 # machine, whose own root is neither labelled nor confined.
 
 load helper
+load small_root
 
 setup_file() {
-  export programs=$BATS_FILE_TMPDIR/programs
-  chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
-  mkdir "$programs"
-  cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$programs"
+  copy_programs
 }
 
 setup() {
   needs_landlock
-  root=$BATS_TEST_TMPDIR/root
-  policy=$root/etc/zorvan/secpolicy
   started=()
-  as=()
-  namespace=(unshare --mount)
-  [[ $(id -u) -eq 0 ]] || namespace+=(--map-current-user --keep-caps)
-  mkdir -p "$policy"/{objects,domains/plugins,fileLabels,early/domains} "$root"/{tardisks,dev,proc,usr,tmp,run,srv/{app,out},root}
-  chmod 755 "$BATS_TEST_TMPDIR"
+  lay_out_root dev proc usr tmp run srv/{app,out} root
+  has_places usr proc dev
   chmod 1777 "$root/tmp"
   ln -s usr/bin usr/lib usr/lib64 usr/sbin "$root"
   cp -r --dereference /etc/{ld.so.cache,nsswitch.conf,hosts,ssl/openssl.cnf} "$root/etc"
@@ -29,9 +22,7 @@ setup() {
   printf '%s\n' root:x:0:0::/root:/bin/bash nobody:x:65534:65534::/:/bin/sh >"$root/etc/passwd"
   echo /bin/bash >"$root/etc/shells"
   printf '%s\n' root:x:0: nogroup:x:65534: >"$root/etc/group"
-  for name in hostDom globalVMDom ioFilterDom appDom daemonFrameworkDom openDom; do
-    echo '-s @start grant' >"$policy/domains/$name"
-  done
+  : >"$policy/domains/openDom"
   echo 'nobody has to know' >"$root/srv/secret"
 }
 
@@ -47,24 +38,18 @@ teardown() {
 # is_root, is_nobody: whose programs they are.
 is_root() {
   [[ $(id -u) -eq 0 ]] || skip "this is what root does"
-  boot_root
+  works_as ""
+  boots
 }
 
 is_nobody() {
-  if [[ $(id -u) -eq 0 ]]; then
-    as=(setpriv --reuid 65534 --regid 65534 --clear-groups)
-    chown -R 65534:65534 "$root"
-  fi
-  boot_root
+  if [[ $(id -u) -eq 0 ]]; then works_as 65534; else works_as ""; fi
+  boots
 }
 
-boot_root() {
-  secpolicy boot
-  exits 0
-  secpolicy settings enforcement openDom disabled
-  exits 0
-  secpolicy restore
-  exits 0
+boots() {
+  boot_root
+  refuses_nothing openDom
 }
 
 # secpolicy VERB...: where the root has nothing of this machine in it: to boot is to label all that there
@@ -73,20 +58,15 @@ secpolicy() {
   run --separate-stderr "${as[@]}" "$programs/secpolicy" --root "$root" "$@"
 }
 
-# inside VERB...: the same with programs, processes and devices of this machine below the root, for
-# verbs that label nothing. Who could label its programs cannot write there.
-inside() {
-  # shellcheck disable=SC2016
-  "${namespace[@]}" sh -ec '
-    mount --bind /usr "$0/usr"
-    [ "$(id -u)" -ne 0 ] || mount -o remount,bind,ro "$0/usr"
-    for place in proc dev; do mount --rbind "/$place" "$0/$place"; done
-    exec timeout 60 "$@"' "$root" "${as[@]}" "$programs/secpolicy" --root "$root" "$@"
+# within_a_minute VERB...: the same with programs, processes and devices of this machine below the root,
+# for verbs that label nothing.
+within_a_minute() {
+  inside timeout 60 "$programs/secpolicy" --root "$root" "$@"
 }
 
 # beside_programs VERB...: does that, and keeps $status, $output and $stderr.
 beside_programs() {
-  run --separate-stderr inside "$@"
+  run --separate-stderr within_a_minute "$@"
 }
 
 # ---- From a run to a policy
@@ -279,7 +259,7 @@ sshd=(/usr/sbin/dropbear -F -E -s -r /etc/host_key -P /run/sshd.pid)
 # starts WORD...: the server, by these words of the command, until it waits at $port.
 starts() {
   rm -f "$root/run/sshd.pid"
-  inside "$@" -- "${sshd[@]}" -p "127.0.0.1:$port" \
+  within_a_minute "$@" -- "${sshd[@]}" -p "127.0.0.1:$port" \
     >"$BATS_TEST_TMPDIR/told" 2>&1 3>&- &
   server=$!
   started+=("$server")
