@@ -8,20 +8,15 @@ kind in every domain by "secpolicy run --best-effort": what `why` refuses has to
 that refuses is told not to be expressible on this kernel; what it grants has to work, unless one of the
 rules behind the answer is told to be narrowed. A root that fails is told with its seed."""
 
-import argparse
 import errno
 import json
 import os
-import random
 import re
 import shutil
 import stat
-import subprocess
-import sys
-import tempfile
 
-POLICY = "etc/zorvan/secpolicy"
-NEEDED = ["globalVMDom", "ioFilterDom", "appDom", "daemonFrameworkDom", "hostDom"]
+from small_roots import Failure, SmallRoot, main, parser_for
+
 LABELS = ["one", "two", "three"]
 DIRECTORIES = ["t", "t/a", "t/a/b", "t/a/b/c", "t/d", "t/d/e"]
 # With so many more a directory is not taken apart.
@@ -51,10 +46,6 @@ NEVER_REVOKED = ["@file", "@io", "@process", "@memory", "@signal", "write", "wai
 # How the library of C forks.
 FORK = ["pass", "clone_flags", "0x1200011"]
 REFUSALS = {errno.EPERM, errno.EACCES, errno.ENOSYS}
-
-
-class Failure(Exception):
-    pass
 
 
 def grant(chance):
@@ -103,20 +94,14 @@ def some_domain(chance):
     return kept
 
 
-class Root:
+class Root(SmallRoot):
     def __init__(self, options, chance, path):
-        self.options = options
-        self.path = path
+        super().__init__(options, path)
         self.lay_files([directory for directory in DIRECTORIES if chance.random() < 0.6])
         self.domains = {f"test{number}Dom": some_domain(chance) for number in range(options.domains)}
-        self.write("objects/all", LABELS)
-        for name in NEEDED:
-            self.write("domains/" + name, ["-s @start grant"] if name == "hostDom" else [])
-        for name, rules in self.domains.items():
-            self.write("domains/" + name, rules)
-        self.write("fileLabels/all", [f"/{place}{'/*' if place in DIRECTORIES and chance.random() < 0.7 else ''} "
-                                      f"{chance.choice(LABELS)}"
-                                      for place in chance.sample(DIRECTORIES + FILES, 6)])
+        self.lay_policy(LABELS, self.domains,
+                        [f"/{place}{'/*' if place in DIRECTORIES and chance.random() < 0.7 else ''} "
+                         f"{chance.choice(LABELS)}" for place in chance.sample(DIRECTORIES + FILES, 6)])
         self.call("boot")
 
     def lay_files(self, crowded):
@@ -131,30 +116,6 @@ class Root:
         for file in FILES:
             shutil.copy(self.options.well, self.at(file))
         shutil.copy(self.options.probe, self.at("probe"))
-        for directory in ("objects", "domains/plugins", "fileLabels", "early/domains"):
-            os.makedirs(self.at(POLICY, directory))
-        os.makedirs(self.at("tardisks"))
-
-    def at(self, *parts):
-        return os.path.join(self.path, *parts)
-
-    def write(self, file, lines):
-        with open(self.at(POLICY, file), "w", encoding="utf-8") as policy:
-            policy.write("".join(line + "\n" for line in lines))
-
-    def start(self, *words):
-        command = [self.options.command, "--root", self.path, *words]
-        # Below a root that is no mount point, root cannot keep masks from the rest of the system.
-        if os.geteuid() == 0 and words[0] in ("run", "features"):
-            command = ["unshare", "--mount", "sh", "-c", 'mount --bind "$0" "$0" && exec "$@"', self.path, *command]
-        return subprocess.run(command, capture_output=True, text=True,
-                              timeout=60, check=False)
-
-    def call(self, *words):
-        done = self.start(*words)
-        if done.returncode != 0:
-            raise Failure(f"{words} ended with {done.returncode}: {done.stderr}")
-        return done.stdout
 
     def renew(self, made):
         """Puts the files back, in place where it can, so that they keep their labels."""
@@ -235,10 +196,7 @@ class Oracle:
     def answer(self, question):
         key = tuple(question)
         if key not in self.answers:
-            done = self.root.start("why", self.domain, *question, "--format", "json")
-            if done.returncode not in (0, 1):
-                raise Failure(f"why {self.domain} {question}: {done.stderr}")
-            self.answers[key] = json.loads(done.stdout)
+            self.answers[key] = self.root.tell("why", self.domain, *question)
         return self.answers[key]
 
     def grants(self, questions):
@@ -295,74 +253,13 @@ def check_domain(root, domain, chance, count, tally):
     root.renew([probe[1] for probe, _ in tries if probe[0].startswith("make")])
 
 
-def check_root(seed, options, tally):
-    chance = random.Random(seed)
-    with tempfile.TemporaryDirectory(prefix="secpolicy-domains-") as path:
-        os.chmod(path, 0o755)
-        root = Root(options, chance, path)
-        for domain in root.domains:
-            check_domain(root, domain, chance, options.tries, tally)
-
-
-def version_of_landlock(options):
-    told = subprocess.run([options.command, "features", "--format", "json"], capture_output=True, check=True)
-    return json.loads(told.stdout)["features"]["landlock"]
-
-
-def check_roots(options):
-    tally = {"pairs": 0, "granted": 0, "narrowed": 0, "surrendered": 0, "refused": 0, "masks": 0}
-    failures = 0
-    for seed in range(options.first, options.first + options.roots):
-        try:
-            check_root(seed, options, tally)
-        except Failure as failure:
-            failures += 1
-            print(f"seed {seed}: {failure}", file=sys.stderr)
-    print(", ".join(f"{count} {what}" for what, count in tally.items()))
-    return 1 if failures else 0
-
-
-def check_as(user, options):
-    """Checks as an ordinary user, who need not reach the directory that all was built in."""
-    launcher = os.path.join(os.path.dirname(options.command), "secpolicy-run")
-    with tempfile.TemporaryDirectory(prefix="secpolicy-programs-") as programs:
-        os.chmod(programs, 0o755)
-        for program in (options.command, options.probe, options.well, launcher):
-            shutil.copy(program, programs)
-        for name in ("command", "probe", "well"):
-            setattr(options, name, os.path.join(programs, os.path.basename(getattr(options, name))))
-        child = os.fork()
-        if child == 0:
-            os.setgroups([])
-            os.setgid(user)
-            os.setuid(user)
-            result = check_roots(options)
-            sys.stdout.flush()
-            os._exit(result)
-        return os.waitstatus_to_exitcode(os.waitpid(child, 0)[1])
-
-
-def main():
-    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
-    parser.add_argument("command")
-    parser.add_argument("probe")
-    parser.add_argument("well")
-    parser.add_argument("--user", type=int, help="who tries, when root starts this")
-    parser.add_argument("--first", type=int, default=1)
-    parser.add_argument("--roots", type=int, default=25)
-    parser.add_argument("--domains", type=int, default=8)
-    parser.add_argument("--tries", type=int, default=52)
-    options = parser.parse_args()
-    if version_of_landlock(options) < 3:
-        print("skipped: this kernel's Landlock cannot refuse what a domain may not do")
-        sys.exit(77)
-    if options.user is None:
-        sys.exit(check_roots(options))
-    if os.geteuid() != 0:
-        print("skipped: only root can become another user")
-        sys.exit(77)
-    sys.exit(check_as(options.user, options))
+def check_root(chance, options, path, tally):
+    root = Root(options, chance, path)
+    for domain in root.domains:
+        check_domain(root, domain, chance, options.tries, tally)
 
 
 if __name__ == "__main__":
-    main()
+    all_options = parser_for(__doc__)
+    all_options.add_argument("--tries", type=int, default=52)
+    main(all_options, check_root, {"pairs": 0, "granted": 0, "narrowed": 0, "surrendered": 0, "refused": 0, "masks": 0})
