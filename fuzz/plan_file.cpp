@@ -6,14 +6,14 @@
 #include <cstdint>
 #include <string>
 
+#include "host/enforce/checksum.h"
 #include "support/require.h"
 
 namespace SecPolicyFuzz {
 namespace {
 
 std::string Sign(std::string body) {
-  std::uint64_t sum = 0xcbf2'9ce4'8422'2325;
-  for (const char byte : body) sum = (sum ^ static_cast<unsigned char>(byte)) * 0x100'0000'01b3;
+  const std::uint64_t sum = Enforce::Checksum(body);
   return body.append(reinterpret_cast<const char*>(&sum), sizeof(sum));
 }
 

@@ -79,6 +79,15 @@ bool MayAskBroker(const std::vector<RuleFate>& fates) {
                              [&](const char* call) { return IsCallGranted(fates, call); });
 }
 
+// True where those that it confines have somebody outside to ask, and can.
+bool KeepsBroker(const InstalledDomain& domain, const std::vector<RuleFate>& fates) {
+  const auto leadsElsewhere = [&](const RuleFate& fate) {
+    return LeadsElsewhere(fate.rule, domain.name);
+  };
+  return domain.level == Policy::Level::kEnforcing && std::ranges::any_of(fates, leadsElsewhere) &&
+         MayAskBroker(fates);
+}
+
 // A way into another domain is for those who are outside, too.
 void TellOfBroker(const std::string& domain, std::vector<RuleFate>* fates) {
   if (MayAskBroker(*fates)) return;
@@ -159,6 +168,7 @@ CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts
   plan.domain = domain.name;
   plan.domainId = domain.id;
   plan.level = domain.level;
+  plan.keepsBroker = KeepsBroker(domain, compiled.fates);
   if (HasLandlock(features)) TakeFiles(parts.paths, features.landlock, &plan);
   TakePorts(parts.net, &plan);
   plan.isScoped = IsScoped(features);
@@ -183,14 +193,6 @@ std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
 
 bool KeepsAllRules(const CompiledPlan& compiled) {
   return compiled.gaps.empty() && NotExpressible(compiled.fates).empty();
-}
-
-bool KeepsBroker(const CompiledPlan& compiled) {
-  const auto leadsElsewhere = [&](const RuleFate& fate) {
-    return LeadsElsewhere(fate.rule, compiled.plan.domain);
-  };
-  return compiled.plan.level == Policy::Level::kEnforcing &&
-         std::ranges::any_of(compiled.fates, leadsElsewhere) && MayAskBroker(compiled.fates);
 }
 
 std::vector<std::string> CoverageOf(const CompiledPlan& compiled) {

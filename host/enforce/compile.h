@@ -35,10 +35,6 @@ std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates);
 // True where the domain can do no more than its rules say.
 bool KeepsAllRules(const CompiledPlan& compiled);
 
-// True where those that it confines need somebody outside who starts programs for them, and can
-// ask: in an enforcing domain from which another is entered by exec.
-bool KeepsBroker(const CompiledPlan& compiled);
-
 // For people, a line each: what cannot be refused although no rule is about it, and then what
 // becomes of the rules.
 std::vector<std::string> CoverageOf(const CompiledPlan& compiled);

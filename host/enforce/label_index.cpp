@@ -18,6 +18,7 @@
 
 #include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
+#include "host/enforce/checksum.h"
 
 namespace Enforce {
 namespace {
@@ -61,26 +62,6 @@ class File {
 [[noreturn]] void ThrowDamaged(const std::string& file, const char* reason) {
   throw BraxoException(StrCat("The label index ", file, " is damaged (", reason,
                               "). Run \"secpolicy load\", which makes a new one"));
-}
-
-// Finds every change of a few bytes; nobody is kept from writing a false one who may write at all.
-std::uint64_t Checksum(std::string_view bytes) {
-  constexpr std::uint64_t kFactor = 0x9e3779b97f4a7c15;
-  std::uint64_t sum = bytes.size();
-  const auto take = [&](std::uint64_t word) {
-    sum = (sum ^ word) * kFactor;
-    sum ^= sum >> 32;
-  };
-  while (bytes.size() >= sizeof(std::uint64_t)) {
-    std::uint64_t word = 0;
-    std::memcpy(&word, bytes.data(), sizeof word);
-    take(word);
-    bytes.remove_prefix(sizeof word);
-  }
-  std::uint64_t rest = 0;
-  std::memcpy(&rest, bytes.data(), bytes.size());
-  take(rest);
-  return sum;
 }
 
 template <class Value>

@@ -4,21 +4,13 @@
 #include <cstring>
 #include <type_traits>
 
+#include "host/enforce/checksum.h"
+
 namespace Enforce {
 namespace {
 
 constexpr std::string_view kMagic = "secpolicy-plan\n";
-constexpr std::uint32_t kVersion = 1;
-
-// FNV-1a: each byte changes the sum in a way that no later byte takes back, so a single changed
-// byte is always noticed. Against malice stands the owner of the file.
-std::uint64_t Checksum(std::string_view bytes) {
-  std::uint64_t sum = 0xcbf2'9ce4'8422'2325;
-  for (const char byte : bytes) {
-    sum = (sum ^ static_cast<unsigned char>(byte)) * 0x0000'0100'0000'01b3;
-  }
-  return sum;
-}
+constexpr std::uint32_t kVersion = 2;
 
 class Writer {
  public:
@@ -163,6 +155,7 @@ void ReadPlan(Reader& reader, Plan* plan) {
   plan->mark = reader.TakeText();
   plan->level = static_cast<Policy::Level>(
       reader.TakeUpTo(static_cast<std::uint8_t>(Policy::Level::kDisabled)));
+  plan->keepsBroker = reader.TakeFlag();
   plan->handledFiles = reader.Take<std::uint64_t>();
   plan->paths = ReadEach<PathRight>(reader);
   plan->bindsChecked = reader.TakeFlag();
@@ -194,6 +187,14 @@ bool IsConsistent(const Plan& plan) {
          (!plan.secret || (isInFilter(plan.secret->lower) && isInFilter(plan.secret->upper)));
 }
 
+// True for bytes that another version of the program has made, whose checksum may be another, too.
+bool IsOfAnotherVersion(std::string_view bytes) {
+  std::uint32_t version = 0;
+  if (bytes.size() < kMagic.size() + sizeof(version)) return false;
+  std::memcpy(&version, bytes.data() + kMagic.size(), sizeof(version));
+  return version != kVersion;
+}
+
 // Takes the checksum off the end; true when it is that of the rest.
 bool TakeChecksum(std::string_view* bytes) {
   std::uint64_t sum = 0;
@@ -206,9 +207,10 @@ bool TakeChecksum(std::string_view* bytes) {
 // What is wrong with the bytes; nothing when `plan` is the one that they are.
 const char* ReasonAgainst(std::string_view bytes, Plan* plan) {
   if (!bytes.starts_with(kMagic)) return "it is no plan";
+  if (IsOfAnotherVersion(bytes)) return "another version of secpolicy made it";
   if (!TakeChecksum(&bytes)) return "it is damaged";
   Reader reader(bytes.substr(kMagic.size()));
-  if (reader.Take<std::uint32_t>() != kVersion) return "another version of secpolicy made it";
+  reader.Take<std::uint32_t>();
   ReadPlan(reader, plan);
   if (!reader.EndsWell() || !IsConsistent(*plan)) return "it contradicts itself";
   return nullptr;
@@ -224,6 +226,7 @@ std::string Serialize(const Plan& plan) {
   writer.Put(static_cast<std::uint32_t>(plan.domainId));
   writer.PutText(plan.mark);
   writer.Put(static_cast<std::uint8_t>(plan.level));
+  writer.Put(static_cast<std::uint8_t>(plan.keepsBroker));
   writer.Put(plan.handledFiles);
   WriteEach(writer, plan.paths);
   writer.Put(static_cast<std::uint8_t>(plan.bindsChecked));

@@ -174,6 +174,79 @@ by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let 
   [[ -z $(ls "$root/tmp") ]]
 }
 
+# looks_by_broker: monitorDom may ask for /srv/look, which looks at files in ioFilterDom and, if it is
+# told to, for someone.
+looks_by_broker() {
+  mkdir "$root/srv"
+  printf '%s\n' '#!/bin/sh' 'cat /opt/monitor/etc/agent.conf' 'cat /var/lib/vms/demo/disk && echo disk' \
+    '[ -z "$1" ] || { echo $$; exec sleep "$1"; }' >"$root/srv/look"
+  chmod 755 "$root/srv/look"
+  printf '%s\n' '-s sendmsg grant' '-s pipe2 grant' '-r /programs rx' '-r /tmp rw' \
+    '-d filterProgram ioFilterDom exec grant' >>"$policy/domains/monitorDom"
+  printf '%s\n' '-a filterProgram read grant' '-s @clock grant' >>"$policy/domains/ioFilterDom"
+  by_root load
+  by_root label set filterProgram /srv/look
+}
+
+@test "from within a domain an ordinary user enters another by the broker" {
+  looks_by_broker
+  by_user_in monitorDom 'cat /opt/monitor/etc/agent.conf && echo agent; cat /var/lib/vms/demo/disk'
+  exits 1
+  [[ $output == *agent ]]
+  by_user_in monitorDom '/programs/secpolicy-run --ask -- /srv/look'
+  exits 0
+  [[ $output == *disk && $stderr == *"/opt/monitor/etc/agent.conf': Permission denied"* ]]
+  by_user_in monitorDom '/srv/look'
+  exits 126
+  by_user_in monitorDom '/programs/secpolicy-run --ask -- /opt/monitor/bin/agent'
+  exits 126
+  [[ -z $output && $stderr == *"no rule leads from monitorDom to another domain by /opt/monitor/bin/agent"* ]]
+  # Whom the broker has started has a domain for others to see, and is the user's.
+  # shellcheck disable=SC2016
+  run --separate-stderr on_machine /bin/sh -c '
+    "$@" /programs/secpolicy run monitorDom -- /bin/sh -c "exec /programs/secpolicy-run --ask -- /srv/look 60" >/tmp/look &
+    waited=0
+    while [ "$(/usr/bin/wc -l </tmp/look)" != 2 ] && [ $((waited += 1)) -lt 100 ]; do sleep 0.1; done
+    /programs/secpolicy status
+    kill $!' - "${ordinary[@]}"
+  exits 0
+  shows "             $(tail -n 1 "$root/tmp/look") ioFilterDom enforcing"
+}
+
+@test "a broker of an ordinary user asks the plans as they are by then" {
+  looks_by_broker
+  # asks_again: what becomes of it when it asks once more.
+  asks_again() {
+    local turn=$1
+    touch "$root/tmp/go$turn"
+    until_true '[[ -s $root/tmp/end'"$turn"' ]]'
+    output=$(<"$root/tmp/out$turn")
+  }
+  # shellcheck disable=SC2016
+  by_user_in monitorDom '
+    for turn in 1 2 3 4; do
+      waited=0
+      while [ ! -e /tmp/go$turn ] && [ $((waited += 1)) -lt 100 ]; do sleep 0.1; done
+      /programs/secpolicy-run --ask -- /srv/look >/tmp/out$turn 2>&1
+      echo $? >/tmp/end$turn
+    done' 3>&- &
+  asks_again 1
+  [[ $output == *disk ]]
+  SECPOLICY_HOST_STATE=$root/run/secpolicy/host.db "$RUNTIME_EXAMPLE" >/dev/null 2>&1 || true
+  [[ ! -e $plans/.current ]]
+  asks_again 2
+  [[ $output == "secpolicy: exec: $by_load; nothing was started" ]]
+  sed -i '/^-a vmDisk *read/d' "$policy/domains/ioFilterDom"
+  by_root load
+  asks_again 3
+  [[ $output != *disk && $output == *"/var/lib/vms/demo/disk': Permission denied" ]]
+  echo '-p connect_port 25 revoke' >>"$policy/domains/ioFilterDom"
+  by_root load
+  asks_again 4
+  [[ $output == "secpolicy: exec: There is no plan of a domain 'ioFilterDom'. "*"; nothing was started" ]]
+  wait
+}
+
 @test "root sees who runs in which domain, and at which level" {
   # shellcheck disable=SC2016
   run --separate-stderr on_machine /bin/sh -c '

@@ -1,7 +1,7 @@
 # Small roots for programs that are confined, and who works there; a test file loads helper first.
 
 # An ordinary user, for root to become.
-ordinary=(setpriv --reuid 65534 --regid 65534 --clear-groups)
+ordinary=(/usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups)
 
 # copy_programs FILE...: the command, its launcher and these files are in $programs, where anybody can
 # reach them.

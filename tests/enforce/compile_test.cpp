@@ -126,6 +126,27 @@ TEST(Compile, TellsHowFarSignalsReach) {
   EXPECT_EQ(CompileOn(features, lines).fates[0].fate, Fate::kEnforced);
 }
 
+TEST(Compile, KeepsABrokerForWhoIsLedElsewhereAndMayAsk) {
+  const auto keepsBroker = [](std::vector<std::string> lines) {
+    lines.insert(lines.end(), {"-s pipe2 grant", "-s @network grant"});
+    return CompileOn(NewKernel(), lines).plan.keepsBroker;
+  };
+  EXPECT_TRUE(keepsBroker({"-d program otherDom exec grant"}));
+  EXPECT_FALSE(keepsBroker({}));
+  EXPECT_FALSE(keepsBroker({"-d program testDom exec grant"}));
+  EXPECT_FALSE(keepsBroker({"-d program otherDom exec revoke"}));
+  EXPECT_FALSE(keepsBroker({"-d program otherDom tardisk_exec grant"}));
+  EXPECT_FALSE(keepsBroker({"-d program otherDom exec grant", "-s sendmsg revoke"}));
+
+  EmptyDirectories files;
+  const Features features = NewKernel();
+  auto domain = DomainOf({"-d program otherDom exec grant", "-s @io grant", "-s sendmsg grant"});
+  const Enforce::Surroundings surroundings{.features = features, .places = {}, .files = files};
+  EXPECT_TRUE(Compile(domain, surroundings).plan.keepsBroker);
+  domain.level = Policy::Level::kPermissive;
+  EXPECT_FALSE(Compile(domain, surroundings).plan.keepsBroker);
+}
+
 TEST(Compile, TellsWhatAKernelWithoutFiltersCannotRefuse) {
   Features features = NewKernel();
   features.seccomp = false;

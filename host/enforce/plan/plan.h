@@ -21,6 +21,7 @@ struct Plan {
   unsigned int domainId = 0;
   std::string mark;  // of the state that it was made from; only its maker understands it
   Policy::Level level = Policy::Level::kEnforcing;  // of any other, nothing below is applied
+  bool keepsBroker = false;  // for those in it, whom rules lead to other domains by exec
 
   std::uint64_t handledFiles = 0;  // rights that are refused where `paths` do not give them
   std::vector<PathRight> paths;    // with rights among the handled ones, and not without any

@@ -8,6 +8,8 @@
 #include <cstring>
 #include <functional>
 
+#include "host/enforce/checksum.h"
+
 namespace EnforceTest {
 namespace {
 
@@ -23,6 +25,7 @@ Plan SamplePlan() {
   plan.domainId = 7;
   plan.mark = std::string("\0mark\n", 6);
   plan.level = Policy::Level::kPermissive;
+  plan.keepsBroker = true;
   plan.handledFiles = Enforce::Landlock::AllRights(5);
   plan.paths = {{"/etc/ssh", Enforce::Landlock::kReadFile, false},
                 {"/run/sshd.pid", Enforce::Landlock::kWriteFile, true}};
@@ -58,6 +61,7 @@ TEST(PlanFile, KeepsAllOfAPlan) {
   EXPECT_EQ(plan.domainId, sample.domainId);
   EXPECT_EQ(plan.mark, sample.mark);
   EXPECT_EQ(plan.level, sample.level);
+  EXPECT_EQ(plan.keepsBroker, sample.keepsBroker);
   EXPECT_EQ(plan.handledFiles, sample.handledFiles);
   EXPECT_EQ(plan.paths, sample.paths);
   EXPECT_EQ(plan.bindsChecked, sample.bindsChecked);
@@ -110,8 +114,7 @@ TEST(PlanFile, HasNoFlippedBit) {
 
 // Puts the right checksum behind `body`, as no accident does.
 std::string Sign(std::string body) {
-  std::uint64_t sum = 0xcbf2'9ce4'8422'2325;
-  for (const char byte : body) sum = (sum ^ static_cast<unsigned char>(byte)) * 0x100'0000'01b3;
+  const std::uint64_t sum = Enforce::Checksum(body);
   return body.append(reinterpret_cast<const char*>(&sum), sizeof(sum));
 }
 
@@ -126,6 +129,7 @@ TEST(PlanFile, IsOfThisVersion) {
   ASSERT_THAT(ReasonAgainst(Sign(body)), StrEq(""));
   ++body[std::strlen("secpolicy-plan\n")];
   EXPECT_THAT(ReasonAgainst(Sign(body)), StrEq("another version of secpolicy made it"));
+  EXPECT_THAT(ReasonAgainst(body + "another sum"), StrEq("another version of secpolicy made it"));
 }
 
 TEST(PlanFile, BelievesNoCount) {

@@ -40,9 +40,9 @@ ExitCode EnterFor(const DomainReference& asker, const AskedEntry& asked) {
 
 }  // namespace
 
-Enforce::FileDescriptor KeepBroker(const Enforce::CompiledPlan& compiled) {
-  if (!Enforce::KeepsBroker(compiled) || ProcDirectory() < 0) return {};
-  const DomainReference asker = {compiled.plan.domainId, compiled.plan.domain};
+Enforce::FileDescriptor KeepBroker(const Enforce::Plan& plan) {
+  if (!plan.keepsBroker || ProcDirectory() < 0) return {};
+  const DomainReference asker = {plan.domainId, plan.domain};
   const Enforce::Brokerage brokerage = {
       .procDirectory = ProcDirectory(),
       .enter = [&](const AskedEntry& asked) { return EnterFor(asker, asked); }};

@@ -45,13 +45,13 @@ ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
   if (compiled.plan.level == Policy::Level::kPermissive) {
     return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
   }
-  StartConfined(compiled.plan, entry, KeepBroker(compiled));
+  StartConfined(compiled.plan, entry, KeepBroker(compiled.plan));
 }
 
 ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
   const Enforce::Plan plan = ReadPublishedPlan(entry.domain);
   LinuxHost::RecordWorld(plan.domain, TextOf(plan.level));
-  if (plan.level != Policy::Level::kPermissive) StartConfined(plan, entry, {});
+  if (plan.level != Policy::Level::kPermissive) StartConfined(plan, entry, KeepBroker(plan));
   // Of ordinary users only the daemon takes lines.
   std::optional<LinuxHost::DroppedLog> withoutLog;
   if (!TeskCtl::System::SyslogIsRunning()) withoutLog.emplace();
