@@ -124,7 +124,7 @@ def main(parser, check_root, tally):
     if version_of_landlock(options) < 3:
         print("skipped: this kernel's Landlock cannot refuse what a domain may not do")
         sys.exit(77)
-    if options.user is not None and os.geteuid() != 0:
+    if os.geteuid() != 0 and (options.user is not None or getattr(options, "published", False)):
         print("skipped: only root can become another user")
         sys.exit(77)
     with tempfile.TemporaryDirectory(prefix="secpolicy-programs-") as programs:

@@ -2,17 +2,20 @@
 """Holds what the rules say of transitions between domains against where programs end up.
 
 usage: transitions.py COMMAND PROBE WELL [--user ID] [--first SEED] [--roots COUNT] [--domains COUNT] [--example PACK]
+                      [--published]
 
 Makes small roots with programs, labels and domains by chance, boots each, and starts every program by
 "secpolicy exec" from outside, and from within each domain by its broker. The program has to have just
 the rights that it has when it is run in the domain that the -d rules lead to from there, or not to start;
 and a plain execve from within a domain has to refuse what leads elsewhere. With --example the domains and
-labels are those of the example host, which PACK writes into a directory, and its programs are probes. A root that fails is told with its
+labels are those of the example host, which PACK writes into a directory, and its programs are probes. With
+--published an ordinary user starts them by the plans that root has made, where the root is a machine's. A root that fails is told with its
 seed."""
 
 import json
 import os
 import shutil
+import subprocess
 
 from small_roots import Failure, SmallRoot, main, parser_for
 
@@ -20,6 +23,15 @@ LABELS = ["one", "two", "three", "four"]
 PROGRAMS = [f"p/{name}" for name in ("a", "b", "in/c", "in/d", "bare")]
 SETS = ["@start", "@file", "@io", "@process", "@signal", "@clock"]
 SENDING = "-s sendmsg grant"
+MACHINE = """
+mount --rbind "$0" "$0"
+for place in proc usr; do mount --rbind "/$place" "$0/$place"; done
+mount --bind "$1" "$0/programs"
+cd "$0"
+pivot_root . .
+umount -l .
+shift
+exec /usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups /programs/secpolicy "$@" """
 LEVELS = ["enforcing"] * 6 + ["permissive", "disabled"]
 
 
@@ -51,8 +63,26 @@ class Root(SmallRoot):
         self.domains = []
         self.rights = {}
 
+    def start(self, *words):
+        if not self.options.published or words[0] not in ("run", "exec"):
+            return super().start(*words)
+        # To give rules up is root's.
+        words = [word for word in words if word != "--best-effort"]
+        programs = os.path.dirname(self.options.command)
+        return subprocess.run(["unshare", "--mount", "sh", "-ec", MACHINE, self.path, programs, *words],
+                              capture_output=True, text=True, timeout=60, check=False)
+
+    def lay_machine(self):
+        for directory in ("proc", "usr", "tmp", "programs"):
+            os.makedirs(self.at(directory))
+        os.chmod(self.at("tmp"), 0o1777)
+        for link in ("lib", "lib64"):
+            os.symlink("usr/" + link, self.at(link))
+
     def lay_by_chance(self, chance):
         names = [f"test{number}Dom" for number in range(self.options.domains)]
+        if self.options.published:
+            self.lay_machine()
         for directory in ("p/in", "marks"):
             os.makedirs(self.at(directory))
         for program in ("probe", *PROGRAMS):
@@ -202,4 +232,6 @@ def check_root(chance, options, path, tally):
 
 
 if __name__ == "__main__":
-    main(parser_for(__doc__), check_root, {"started": 0, "refused": 0, "not for the domain": 0, "execve refused": 0})
+    parser = parser_for(__doc__)
+    parser.add_argument("--published", action="store_true")
+    main(parser, check_root, {"started": 0, "refused": 0, "not for the domain": 0, "execve refused": 0})
