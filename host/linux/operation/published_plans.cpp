@@ -63,6 +63,17 @@ std::string CurrentText(const std::string& serial) {
   return StrCat(serial, " ", IdentityOfState(), "\n");
 }
 
+// In its place until the plans are there; nobody takes it for a number.
+std::string MakingText(const std::string& serial) { return StrCat("making ", CurrentText(serial)); }
+
+std::string NewSerial() {
+  std::uint64_t serial = 0;
+  if (getrandom(&serial, sizeof serial, 0) != sizeof serial) {
+    ThrowErrno("Unable to number the plans");
+  }
+  return std::to_string(serial);
+}
+
 // The directory of the plans, for who writes them.
 class PlanDirectory {
  public:
@@ -75,6 +86,11 @@ class PlanDirectory {
     const Descriptor file(openat(opened.Number(), kNew, kFlags, S_IRUSR | S_IWUSR));
     if (!file.IsOpen() || !WriteAll(file, content)) Fail(name);
     TakeName(file, name);
+  }
+
+  void WriteCurrent(std::string_view content) {
+    const std::string current = CurrentPlansOf(StatePath());
+    Write(current.substr(current.rfind('/') + 1), content);
   }
 
   // What others have to find there under another name first.
@@ -157,13 +173,29 @@ std::optional<std::string> FindSerial() {
 
 }  // namespace
 
-bool PublishPlans(const ChangeMark& since, const std::string& serial,
-                  const std::map<std::string, std::string>& plans) {
+// Who commits has taken the mark away by then, and it is not put back before that commit ends.
+PlansInTheMaking::PlansInTheMaking()
+    : state(HostState::Current().shared_from_this()), serial(NewSerial()) {
+  PlanDirectory directory;
+  const Transaction others(state->Database());
+  directory.WriteCurrent(MakingText(serial));
+}
+
+bool PlansInTheMaking::IsLatest() const {
+  if (!state->Database().IsCurrent()) return false;
+  try {
+    return ReadTrusted(CurrentPlansOf(StatePath())) == MakingText(serial);
+  } catch (const HostError&) {
+    return false;
+  }
+}
+
+bool PlansInTheMaking::Publish(const std::map<std::string, std::string>& plans) {
   PlanDirectory directory;
   MakeWorldRecords();
   // As a lock: who commits waits until the plans are there, and this ends without a commit.
-  const Transaction others(since.state->Database());
-  if (ChangedSince(since)) return false;
+  const Transaction others(state->Database());
+  if (!IsLatest()) return false;
   CopyDatabase(StatePath(), CopyOf::kPublicState, directory.NewFile());
   directory.TakeNewFile(kStateCopy);
   std::set<std::string> names = {kStateCopy};
@@ -173,17 +205,8 @@ bool PublishPlans(const ChangeMark& since, const std::string& serial,
     names.insert(name);
   }
   directory.RemoveAllBut(names);
-  const std::string current = CurrentPlansOf(StatePath());
-  directory.Write(current.substr(current.rfind('/') + 1), CurrentText(serial));
+  directory.WriteCurrent(CurrentText(serial));
   return true;
-}
-
-std::string NewPlanSerial() {
-  std::uint64_t serial = 0;
-  if (getrandom(&serial, sizeof serial, 0) != sizeof serial) {
-    ThrowErrno("Unable to number the plans");
-  }
-  return std::to_string(serial);
 }
 
 bool ArePlansPublished() { return FindSerial().has_value(); }

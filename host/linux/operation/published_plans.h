@@ -1,25 +1,38 @@
 #pragma once
 
 #include <map>
+#include <memory>
 #include <string>
-
-#include "host/linux/operation/change_mark.h"
 
 // Plans of domains as files in the directory `plans` beside the state, which everybody may read and
 // only who may write the state writes: so that those enter domains who may not read the state. They
 // count until the state changes; placing a world in a domain is no change.
 namespace LinuxHost {
 
-// Writes `plans`, by the names of their domains, in place of all that were published before, and a
-// copy of the state beside them. Those count that carry the number `serial`, which is the maker's
-// to put into them. Makes their directory, and the one that world_records.h is about. Returns
-// false, and publishes nothing, when the state was changed since `since`. Throws HostError when
-// they cannot be written: none count then.
-bool PublishPlans(const ChangeMark& since, const std::string& serial,
-                  const std::map<std::string, std::string>& plans);
+class HostState;
 
-// A number that no other published plans have.
-std::string NewPlanSerial();
+// New plans, of the state in use as it is from here on. Those that were published before count no
+// more, and of several that are in the making only the latest is published.
+class PlansInTheMaking {
+ public:
+  // Makes their directory. Throws HostError when it cannot be written.
+  PlansInTheMaking();
+
+  // A number that no other plans have, which the maker has to put into these.
+  const std::string& Serial() const { return serial; }
+
+  // Writes `plans`, by the names of their domains, in place of all that were published before, and
+  // a copy of the state beside them. Makes the directory that world_records.h is about. Returns
+  // false, and publishes nothing, when the state was changed meanwhile, or others are in the
+  // making. Throws HostError when they cannot be written: none count then.
+  bool Publish(const std::map<std::string, std::string>& plans);
+
+ private:
+  bool IsLatest() const;
+
+  const std::shared_ptr<HostState> state;
+  const std::string serial;
+};
 
 // True while those that were published count.
 bool ArePlansPublished();

@@ -66,7 +66,7 @@ class ChangeMark : public ::testing::TestWithParam<Deed> {
 };
 
 void PublishNoPlans() {
-  ASSERT_TRUE(LinuxHost::PublishPlans(LinuxHost::TakeChangeMark(), "1", {}));
+  ASSERT_TRUE(LinuxHost::PlansInTheMaking().Publish({}));
   ASSERT_TRUE(LinuxHost::ArePlansPublished());
 }
 

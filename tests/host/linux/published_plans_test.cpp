@@ -25,6 +25,7 @@ namespace fs = std::filesystem;
 using LinuxHost::ArePlansPublished;
 using LinuxHost::HostState;
 using LinuxHost::PlanFileOf;
+using LinuxHost::PlansInTheMaking;
 using LinuxHost::ReadPublishedPlan;
 using SecPolicyTest::MessageOf;
 using TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE;
@@ -34,7 +35,7 @@ constexpr char kLoad[] = ". Let root run \"secpolicy load\", which makes a new o
 class PublishedPlans : public ::testing::Test {
  protected:
   static bool Publish(const std::map<std::string, std::string>& plans) {
-    return LinuxHost::PublishPlans(LinuxHost::TakeChangeMark(), "7", plans);
+    return PlansInTheMaking().Publish(plans);
   }
 
   static mode_t ModeOf(const std::string& path) {
@@ -68,8 +69,10 @@ TEST_F(PublishedPlans, CountAsLongAsTheStateStaysAsItIs) {
   const std::string none = "There are no plans of the policy as it is in " + directory.Path() +
                            "/plans. Let root run \"secpolicy load\", which makes them";
   EXPECT_EQ(MessageOf([] { LinuxHost::PublishedSerial(); }), none);
-  ASSERT_TRUE(Publish({{"a", "bytes"}}));
-  EXPECT_EQ(LinuxHost::PublishedSerial(), "7");
+  PlansInTheMaking making;
+  EXPECT_EQ(MessageOf([] { LinuxHost::PublishedSerial(); }), none);
+  ASSERT_TRUE(making.Publish({{"a", "bytes"}}));
+  EXPECT_EQ(LinuxHost::PublishedSerial(), making.Serial());
   EXPECT_EQ(ReadPublishedPlan("a"), "bytes");
   state.Domains().SetLevel("a", "disabled");
   EXPECT_EQ(MessageOf([] { LinuxHost::PublishedSerial(); }), none);
@@ -82,11 +85,44 @@ TEST_F(PublishedPlans, StayWhenAWorldEntersADomain) {
 }
 
 TEST_F(PublishedPlans, AreNotOfAStateThatHasChangedMeanwhile) {
-  const LinuxHost::ChangeMark since = LinuxHost::TakeChangeMark();
+  PlansInTheMaking making;
   state.Domains().SetLevel("a", "disabled");
-  EXPECT_FALSE(LinuxHost::PublishPlans(since, "7", {{"a", "bytes"}}));
+  EXPECT_FALSE(making.Publish({{"a", "bytes"}}));
   EXPECT_FALSE(ArePlansPublished());
   EXPECT_FALSE(fs::exists(PlanFileOf("a")));
+}
+
+TEST_F(PublishedPlans, AreNotOfAStateThatAnotherProcessHasChangedMeanwhile) {
+  PlansInTheMaking making;
+  EXPECT_EQ(RunInChild([] { HostState::Current().Domains().SetLevel("a", "permissive"); }), "");
+  EXPECT_FALSE(making.Publish({{"a", "bytes"}}));
+  EXPECT_FALSE(ArePlansPublished());
+}
+
+TEST_F(PublishedPlans, AreOfAStateInWhichAWorldHasEnteredADomainMeanwhile) {
+  PlansInTheMaking making;
+  LinuxHost::EnterWorld(domain, Policy::Level::kEnforcing);
+  EXPECT_TRUE(making.Publish({{"a", "bytes"}}));
+  EXPECT_TRUE(ArePlansPublished());
+}
+
+TEST_F(PublishedPlans, AreThoseOfWhoHasBegunLast) {
+  PlansInTheMaking first;
+  PlansInTheMaking last;
+  EXPECT_FALSE(first.Publish({{"a", "first"}}));
+  EXPECT_TRUE(last.Publish({{"a", "last"}}));
+  EXPECT_FALSE(first.Publish({{"a", "first"}}));
+  EXPECT_EQ(ReadPublishedPlan("a"), "last");
+  EXPECT_TRUE(ArePlansPublished());
+}
+
+TEST_F(PublishedPlans, AreNotOfAStateThatAnotherFileHasReplacedMeanwhile) {
+  PlansInTheMaking making;
+  const std::string file = LinuxHost::StatePath();
+  fs::rename(file, file + ".aside");
+  fs::copy_file(file + ".aside", file);
+  EXPECT_FALSE(making.Publish({{"a", "bytes"}}));
+  EXPECT_FALSE(ArePlansPublished());
 }
 
 TEST_F(PublishedPlans, EndWhenAnotherProcessChangesTheState) {

@@ -3,8 +3,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <limits>
 #include <map>
+#include <thread>
 #include <utility>
 
 #include "domain_plan.h"
@@ -48,10 +50,11 @@ std::optional<Enforce::Plan> PlanForAnybody(const Policy::InstalledDomain& domai
 
 // False when the policy was changed meanwhile.
 bool TryToPublish() {
-  const LinuxHost::ChangeMark since = LinuxHost::TakeChangeMark();
+  // Or to make it would be a change.
+  LinuxHost::RefreshLabelIndex();
+  LinuxHost::PlansInTheMaking making;
   SecPolicy::TeskAccessInterfaceImpl access;
   const Features features = FeaturesForAnybody();
-  const std::string serial = LinuxHost::NewPlanSerial();
   PlanSources sources(access, features);
   std::map<std::string, std::string> plans;
   for (unsigned int id = 0; id < access.GetMaxDomains(); ++id) {
@@ -59,10 +62,16 @@ bool TryToPublish() {
     if (!domain) continue;
     auto plan = PlanForAnybody(*domain, sources);
     if (!plan) continue;
-    plan->mark = MarkOf(serial, features);
+    plan->mark = MarkOf(making.Serial(), features);
     plans.emplace(domain->name, Enforce::Serialize(*plan));
   }
-  return LinuxHost::PublishPlans(since, serial, plans);
+  return making.Publish(plans);
+}
+
+// Two that make plans at the same time would be in each other's way for ever if they kept pace.
+void LetOthersGoFirst(int tries) {
+  const int share = getpid() % 8;
+  std::this_thread::sleep_for(std::chrono::milliseconds(share << tries));
 }
 
 Enforce::Plan Verified(const std::string& domain, const std::string& bytes,
@@ -81,11 +90,11 @@ Enforce::Plan Verified(const std::string& domain, const std::string& bytes,
 
 bool PublishPlans() {
   constexpr int kMostTries = 5;
-  if (geteuid() != 0 || !LinuxHost::IsLabelIndexPossible() || LinuxHost::ArePlansPublished()) {
-    return false;
-  }
+  if (geteuid() != 0 || !LinuxHost::IsLabelIndexPossible()) return false;
   for (int tries = 1; tries <= kMostTries; ++tries) {
+    if (LinuxHost::ArePlansPublished()) return false;
     if (TryToPublish()) return true;
+    LetOthersGoFirst(tries);
   }
   throw HostError(EBUSY,
                   "Unable to make plans for ordinary users: the policy changes all the time. Run "
