@@ -79,16 +79,18 @@ waits() {
   grep -qsaF wait-for=/t/secret/never /proc/[0-9]*/cmdline
 }
 
-@test "the exit status is that of the program, and it gets the signals of who asked" {
-  cp "$programs/secpolicy-run" "$root/t/secret/run"
-  boot_root
-  asks /t/secret/run --plan nothing -- true
-  exits 126
-  [[ $stderr == "secpolicy-run: cannot open the plan nothing: "* ]]
-  asks /t/secret/program wait-for=/t/secret/file read=/t/secret/file
-  answers 0 'wait-for=/t/secret/file ok' 'read=/t/secret/file ok'
+# is_permissive DOMAIN
+is_permissive() {
+  secpolicy settings enforcement "$1" permissive
+  exits 0
+  secpolicy restore
+  exits 0
+}
+
+# ends_by SIGNAL...: who asks is sent it, and ends as the program does, which ends, too.
+ends_by() {
   local signal process status
-  for signal in TERM KILL; do
+  for signal; do
     "${as[@]}" "$programs/secpolicy" --root "$root" run askDom -- /ask --ask -- \
       /t/secret/program getppid wait-for=/t/secret/never >"$BATS_TEST_TMPDIR/$signal" 3>&- &
     process=$!
@@ -102,6 +104,26 @@ waits() {
   done
 }
 
+@test "the exit status is that of the program, and it gets the signals of who asked" {
+  cp "$programs/secpolicy-run" "$root/t/secret/run"
+  boot_root
+  asks /t/secret/run --plan nothing -- true
+  exits 126
+  [[ $stderr == "secpolicy-run: cannot open the plan nothing: "* ]]
+  asks /t/secret/program wait-for=/t/secret/file read=/t/secret/file
+  answers 0 'wait-for=/t/secret/file ok' 'read=/t/secret/file ok'
+  ends_by TERM KILL
+}
+
+@test "so it is where the domain that is entered is permissive" {
+  boot_root
+  is_permissive secretDom
+  asks /t/secret/program wait-for=/t/secret/file read=/t/public/file
+  answers 0 'wait-for=/t/secret/file ok' 'read=/t/public/file ok'
+  says "secpolicy: exec: secretDom would be refused: read /t/public/file"
+  ends_by TERM KILL
+}
+
 @test "the program has the environment of who entered the first domain, but for the terminal" {
   cp /bin/busybox "$root/t/public"
   cp /bin/busybox "$root/t/secret"
@@ -112,6 +134,12 @@ waits() {
   exits 0
   output=$(sort <<<"$output")
   answers 0 HELLO=outside LC_ALL=C "PATH=$PATH" TERM=inside
+  # Nothing is refused in a permissive domain, and still it takes nothing else from who asks.
+  is_permissive secretDom
+  secpolicy run askDom -- /t/public/busybox env TERM=inside HELLO=inside LD_PRELOAD=/t/public/file /ask --ask -- /t/secret/busybox env
+  exits 0
+  output=$(sort <<<"$output")
+  answers 0 HELLO=outside "PATH=$PATH" TERM=inside
 }
 
 # Attacks by who may say to the broker what it likes are in tests/enforce/broker_test.cpp.

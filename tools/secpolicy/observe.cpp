@@ -83,7 +83,7 @@ Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl&
       observations.Note(WithLabel(asked, access), program);
     }
   };
-  end = RunWatched("observe", options.command, IsNoticed, notice);
+  end = RunWatched("observe", options.command, {.isNoticed = IsNoticed, .notice = notice});
   return observations;
 }
 

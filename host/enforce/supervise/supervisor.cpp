@@ -39,7 +39,8 @@ constexpr std::string_view kNeverNoticed = "write";
 // Has flags that lie in memory, so no domain has it.
 constexpr std::string_view kAnsweredUnknown = "clone3";
 
-constexpr std::array kForwardedSignals = {SIGHUP, SIGINT, SIGQUIT, SIGTERM, SIGUSR1, SIGUSR2};
+constexpr std::array kForwardedSignals = {SIGHUP,  SIGINT,  SIGQUIT, SIGTERM,
+                                          SIGCONT, SIGUSR1, SIGUSR2};
 
 constexpr int kSignalledStatus = 128;
 
@@ -91,15 +92,20 @@ struct Word {
 void Tell(int channel, const Word& word) { static_cast<void>(!write(channel, &word, sizeof word)); }
 
 // By the path or, where one is open, the descriptor.
-void Execute(const char* path, int descriptor, char* const* arguments) {
-  if (descriptor < 0) {
-    execve(path, arguments, environ);
+void Execute(const char* path, const Supervision& told, char* const* arguments) {
+  if (told.program < 0) {
+    execve(path, arguments, told.environment);
   } else {
-    execveat(descriptor, "", arguments, environ, AT_EMPTY_PATH);
+    execveat(told.program, "", arguments, told.environment, AT_EMPTY_PATH);
   }
 }
 
-[[noreturn]] void BecomeProgram(const char* path, int program, char* const* arguments,
+void EndWith(pid_t parent) {
+  prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);
+  if (getppid() != parent) _exit(kSignalledStatus + SIGKILL);
+}
+
+[[noreturn]] void BecomeProgram(const char* path, const Supervision& told, char* const* arguments,
                                 std::vector<sock_filter>& filter, int channel,
                                 const sigset_t& signals) {
   sigprocmask(SIG_SETMASK, &signals, nullptr);
@@ -109,7 +115,7 @@ void Execute(const char* path, int descriptor, char* const* arguments) {
   }
   Tell(channel, {.listener = listener, .error = listener < 0 ? errno : 0});
   if (listener < 0) _exit(kSignalledStatus - 1);
-  Execute(path, program, arguments);
+  Execute(path, told, arguments);
   Tell(channel, {.listener = listener, .error = errno});
   _exit(kSignalledStatus - 1);
 }
@@ -267,10 +273,12 @@ SupervisedEnd Supervise(const std::vector<std::string>& command, const Supervisi
   FileDescriptor childsEnd(ends[1]);
   const HeldSignals signals;
   prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
+  const pid_t self = getpid();
   const pid_t child = fork();
   if (child < 0) ThrowError("cannot start a process", errno);
   if (child == 0) {
-    BecomeProgram(path.c_str(), supervision.program, arguments.data(), filter, childsEnd.Number(),
+    if (supervision.isKilledAlong) EndWith(self);
+    BecomeProgram(path.c_str(), supervision, arguments.data(), filter, childsEnd.Number(),
                   signals.Before());
   }
   childsEnd = {};

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <sys/types.h>
+#include <unistd.h>
 
 #include <functional>
 #include <string>
@@ -24,6 +25,8 @@ struct Attempt {
 struct Supervision {
   int procDirectory = -1;  // of the /proc of this process's own PID namespace
   int program = -1;        // what to execute, closed on execution; else the command says what it is
+  char* const* environment = environ;  // of the program
+  bool isKilledAlong = false;          // the program, when this process is
 
   // Which calls are told. `write` never is, and so has to be said no to.
   std::function<bool(std::string_view call)> isNoticed;

@@ -43,7 +43,7 @@ ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
   LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
   std::cerr << std::flush;
   if (compiled.plan.level == Policy::Level::kPermissive) {
-    return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
+    return RunPermissive(verb, entry, access);
   }
   StartConfined(compiled.plan, entry, KeepBroker(compiled.plan));
 }
@@ -57,7 +57,7 @@ ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
   if (!TeskCtl::System::SyslogIsRunning()) withoutLog.emplace();
   const PublishedState state;
   SecPolicy::TeskAccessInterfaceImpl access;
-  return RunPermissive(verb, entry.domain, entry.command, entry.program, access);
+  return RunPermissive(verb, entry, access);
 }
 
 ExitCode TellFailure(const std::string& verb, const std::function<ExitCode()>& enter) {

@@ -28,6 +28,7 @@ struct Entry {
   LinuxHost::Descriptor program{-1};  // of what was judged; else the command says what it is
   std::string programPath = {};       // its real path
   std::vector<std::string> environment = {};  // variables in place of those of this process
+  bool isForAnother = false;                  // who waits for its end, and at whose end it ends
 };
 
 // Becomes the program of the entry, or runs and watches it where the domain is permissive. Whoever

@@ -9,9 +9,9 @@
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
-#include <set>
 #include <utility>
 
+#include "enforce/environment.h"
 #include "host/enforce/broker/message.h"
 #include "host/enforce/kernel.h"
 #include "host/enforce/plan_file.h"
@@ -81,26 +81,6 @@ void HandOn(int number, const char* option, std::vector<std::string>* words) {
   words->insert(words->end(), {option, std::to_string(number)});
 }
 
-std::string NameOf(const std::string& variable) { return variable.substr(0, variable.find('=')); }
-
-// Those of this process, with others in place of those that have the same names.
-std::vector<std::string> EnvironmentWith(std::vector<std::string> variables) {
-  std::set<std::string> names = {Enforce::kBrokerVariable};
-  for (const std::string& variable : variables) names.insert(NameOf(variable));
-  for (char* const* variable = environ; *variable != nullptr; ++variable) {
-    if (!names.contains(NameOf(*variable))) variables.emplace_back(*variable);
-  }
-  return variables;
-}
-
-std::vector<char*> Pointers(std::vector<std::string>& words) {
-  std::vector<char*> pointers;
-  pointers.reserve(words.size() + 1);
-  for (std::string& word : words) pointers.push_back(word.data());
-  pointers.push_back(nullptr);
-  return pointers;
-}
-
 // A descriptor leads past what is put over its path.
 void RefuseMaskedProgram(const Enforce::Plan& plan, const Entry& entry) {
   if (plan.level != Policy::Level::kEnforcing) return;
@@ -136,7 +116,7 @@ void StartConfined(const Enforce::Plan& plan, const Entry& entry,
   if (geteuid() != 0) HandOnCapabilities();
   const Descriptor file = SealedFile(Enforce::Serialize(plan));
   std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};
-  std::vector<std::string> variables = entry.environment;
+  std::vector<std::string> variables = EnvironmentOf(entry);
   if (entry.program.IsOpen()) HandOn(entry.program.Number(), "--program", &words);
   if (broker.IsOpen()) {
     const int number = MoveAway(broker.Number());
@@ -145,8 +125,7 @@ void StartConfined(const Enforce::Plan& plan, const Entry& entry,
   }
   words.emplace_back("--");
   words.insert(words.end(), entry.command.begin(), entry.command.end());
-  variables = EnvironmentWith(std::move(variables));
-  execveat(launcher, "", Pointers(words).data(), Pointers(variables).data(), AT_EMPTY_PATH);
+  execveat(launcher, "", PointersTo(words).data(), PointersTo(variables).data(), AT_EMPTY_PATH);
   ThrowErrno("cannot start secpolicy-run");
 }
 
@@ -157,7 +136,7 @@ void AskBroker(const std::vector<std::string>& command) {
   if (launcher < 0) ThrowNoLauncher();
   std::vector<std::string> words = {kName, "--ask", "--"};
   words.insert(words.end(), command.begin(), command.end());
-  for (const auto& place : Places()) execv(place.c_str(), Pointers(words).data());
+  for (const auto& place : Places()) execv(place.c_str(), PointersTo(words).data());
   ThrowErrno("cannot start secpolicy-run");
 }
 

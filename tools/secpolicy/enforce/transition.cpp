@@ -122,6 +122,7 @@ Entry EntryByBroker(const Enforce::AskedEntry& asked, const DomainReference& ask
   }
   Entry entry = EntryOf(*domain, asked.request.command, std::move(program));
   entry.environment = asked.request.environment;
+  entry.isForAnother = true;
   return entry;
 }
 

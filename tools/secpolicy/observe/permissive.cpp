@@ -1,8 +1,10 @@
 #include "permissive.h"
 
 #include <iostream>
+#include <vector>
 
 #include "asked_rules.h"
+#include "enforce/environment.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/operation/log_use.h"
 #include "installed/installed_policy.h"
@@ -31,15 +33,14 @@ void TellRefused(const std::string& verb, const std::string& domain,
 
 }  // namespace
 
-ExitCode RunPermissive(const std::string& verb, const std::string& name,
-                       const std::vector<std::string>& command, const LinuxHost::Descriptor& opened,
+ExitCode RunPermissive(const std::string& verb, const Entry& entry,
                        SecPolicy::TeskAccessInterfaceImpl& access) {
-  const auto domain = ReadInstalledDomain(name, access);
-  if (!domain) RefuseDomain(name, access);
+  const auto domain = ReadInstalledDomain(entry.domain, access);
+  if (!domain) RefuseDomain(entry.domain, access);
   Observations seen;
   const auto judge = [&](const Policy::Question& question, const std::string& program) {
     if (!seen.Note(question, program) || IsGranted(question, *domain)) return;
-    TellRefused(verb, name, question);
+    TellRefused(verb, entry.domain, question);
   };
   const auto isNoticed = [&](std::string_view call) {
     return Enforce::AsksMore(call) || !Decide(AskCall(call), *domain).granted;
@@ -50,7 +51,14 @@ ExitCode RunPermissive(const std::string& verb, const std::string& name,
       judge(WithLabel(asked, access), attempt.program);
     }
   };
-  return RunWatched(verb, command, isNoticed, notice, opened.Number());
+  std::vector<std::string> variables = EnvironmentOf(entry);
+  const std::vector<char*> environment = PointersTo(variables);
+  return RunWatched(verb, entry.command,
+                    {.program = entry.program.Number(),
+                     .environment = environment.data(),
+                     .isKilledAlong = entry.isForAnother,
+                     .isNoticed = isNoticed,
+                     .notice = notice});
 }
 
 }  // namespace SecPolicyCli

@@ -5,7 +5,6 @@
 #include <cerrno>
 #include <cstring>
 #include <iostream>
-#include <utility>
 
 #include "braxo/lib/exception.h"
 #include "host/enforce/features.h"
@@ -25,17 +24,13 @@ void OpenProc() { proc = open("/proc", O_PATH | O_DIRECTORY | O_CLOEXEC); }
 int ProcDirectory() { return proc; }
 
 ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& command,
-                    std::function<bool(std::string_view call)> isNoticed,
-                    std::function<void(const Enforce::Attempt&)> notice, int program) {
+                    Enforce::Supervision supervision) {
   if (proc < 0) throw Braxo::Lib::BraxoException("programs cannot be watched without /proc");
   if (!Enforce::ProbeFeatures().notifies) {
     throw Braxo::Lib::BraxoException("this kernel has no filters that ask a supervisor");
   }
   std::cout << std::flush;
-  const Enforce::Supervision supervision = {.procDirectory = proc,
-                                            .program = program,
-                                            .isNoticed = std::move(isNoticed),
-                                            .notice = std::move(notice)};
+  supervision.procDirectory = proc;
   const Enforce::SupervisedEnd end = Enforce::Supervise(command, supervision);
   if (end.startError == 0) return static_cast<ExitCode>(end.exitStatus);
   std::cerr << "secpolicy: " << verb << ": cannot start " << Visible(command.front()) << ": "
