@@ -1,6 +1,9 @@
 // What a domain costs: makes plans for the launcher, and is itself the program that runs in one.
 //
-//   enforce_bench plan FILE DIRECTORY RULES reads|writes    a plan with so many rules about paths
+//   enforce_bench plan FILE DIRECTORY RULES reads|writes|masks
+//                                                           a plan with so many rules about paths
+//                                                           that may be written, or all be read as
+//                                                           one; of those it may hide eight
 //   enforce_bench compile COUNT DIRECTORY RULES             makes such a plan so often, and prints
 //   the
 //                                                           processor time of one in microseconds
@@ -79,10 +82,16 @@ Enforce::CompiledPlan Compile(const Policy::InstalledDomain& domain,
   return Enforce::Compile(domain, {.features = features, .places = places, .files = files});
 }
 
-void WritePlan(const char* file, const fs::path& directory, int rules, bool writes) {
-  const std::string bytes =
-      Enforce::Serialize(Compile(DomainWith(directory, rules, writes), {}).plan);
-  std::ofstream(file, std::ios::binary) << bytes;
+void WritePlan(const char* file, const fs::path& directory, int rules, std::string_view kind) {
+  constexpr std::size_t kMasks = 8;
+  Enforce::Plan plan = Compile(DomainWith(directory, rules, kind != "reads"), {}).plan;
+  for (const Enforce::PathRight& right : plan.paths) {
+    const bool isMasked = kind == "masks" && plan.masks.size() < kMasks;
+    if (isMasked && right.path.starts_with(directory.native())) {
+      plan.masks.push_back({right.path, Enforce::MaskKind::kHidden});
+    }
+  }
+  std::ofstream(file, std::ios::binary) << Enforce::Serialize(plan);
   fs::permissions(file, fs::perms(0644));
 }
 
@@ -133,7 +142,7 @@ void CallOften(int count) {
 int main(int count, char** words) {
   const std::string_view verb = count > 1 ? words[1] : "";
   if (verb == "plan" && count == 6) {
-    WritePlan(words[2], words[3], std::atoi(words[4]), std::string_view(words[5]) == "writes");
+    WritePlan(words[2], words[3], std::atoi(words[4]), words[5]);
   } else if (verb == "compile" && count == 5) {
     TimeCompile(std::atoi(words[2]), words[3], std::atoi(words[4]));
   } else if (verb == "open" && count == 4) {
