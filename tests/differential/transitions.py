@@ -225,6 +225,8 @@ def check_root(chance, options, path, tally):
     else:
         root.lay_by_chance(chance)
         asking = [name for name in root.domains if name.startswith("test") and root.level(name) == "enforcing"]
+        if options.published:
+            asking = [name for name in asking if root.keeps_to(name)]
     for program in root.programs:
         check_program(root, program, asking, tally)
     for domain in asking:
