@@ -39,6 +39,7 @@ std::string RecordsPath() {
 struct UserDirectory {
   Descriptor opened;
   uid_t owner;
+  std::string path;
 };
 
 std::optional<UserDirectory> OpenUserDirectory(const Descriptor& records, const std::string& name) {
@@ -46,7 +47,9 @@ std::optional<UserDirectory> OpenUserDirectory(const Descriptor& records, const 
                            O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   struct stat status {};
   if (!opened.IsOpen() || fstat(opened.Number(), &status) != 0) return std::nullopt;
-  return UserDirectory{.opened = std::move(opened), .owner = status.st_uid};
+  return UserDirectory{.opened = std::move(opened),
+                       .owner = status.st_uid,
+                       .path = StrCat(RecordsPath(), "/", name)};
 }
 
 // 0 for what is none.
@@ -130,6 +133,8 @@ void RecordWorld(const std::string& domain, const std::string& level) {
   const std::string path = RecordsPath();
   ThrowErrno("Unable to record the domain in ", path);
 }
+
+std::string OwnRecordsPath() { return OpenOwnDirectory().path; }
 
 std::vector<WorldRecord> ReadWorldRecords() {
   std::vector<WorldRecord> found;

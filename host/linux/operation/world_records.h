@@ -24,6 +24,10 @@ void MakeWorldRecords();
 // `level`. Throws HostError when it cannot be recorded.
 void RecordWorld(const std::string& domain, const std::string& level);
 
+// The directory of this user's own records, made if there is none: what only those of this user may
+// write that are confined by no rule about other files. Throws HostError when it cannot be made.
+std::string OwnRecordsPath();
+
 // The records of living processes that their own users have made, as far as this user may read
 // them, in ascending order of their identifiers.
 std::vector<WorldRecord> ReadWorldRecords();

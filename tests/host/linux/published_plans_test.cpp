@@ -118,7 +118,7 @@ TEST_F(PublishedPlans, AreThoseOfWhoHasBegunLast) {
 
 TEST_F(PublishedPlans, AreNotOfAStateThatAnotherFileHasReplacedMeanwhile) {
   PlansInTheMaking making;
-  const std::string file = LinuxHost::StatePath();
+  const std::string& file = LinuxHost::StatePath();
   fs::rename(file, file + ".aside");
   fs::copy_file(file + ".aside", file);
   EXPECT_FALSE(making.Publish({{"a", "bytes"}}));

@@ -16,6 +16,7 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/operation/label_index.h"
 #include "host/linux/operation/published_plans.h"
+#include "host/linux/operation/world_records.h"
 #include "policy/installed_policy.h"
 #include "secpolicy/secpolicy.h"
 
@@ -120,7 +121,8 @@ Enforce::Plan ReadPublishedPlan(const std::string& domain) {
   }
 }
 
-PublishedState::PublishedState() {
+// Where programs have rights for their own files, those of a domain could change what is judged.
+PublishedState::PublishedState() : directory(LinuxHost::OwnRecordsPath()) {
   const std::string serial = LinuxHost::PublishedSerial();
   const std::string copy = directory.File("host.db");
   LinuxHost::CopyPublishedState(copy);

@@ -12,10 +12,14 @@ namespace SecPolicyCli {
 namespace {
 
 // A root that was never booted has none of the usual places, so that only the root itself is left.
-std::string MakePrivateDirectory() {
+std::vector<std::string> UsualPlaces() {
   std::vector<std::string> places = {"/tmp", "/var/tmp", "/run", ""};
   const char* const wanted = secure_getenv("TMPDIR");
   if (wanted != nullptr && *wanted != '\0') places.emplace(places.begin(), wanted);
+  return places;
+}
+
+std::string MakePrivateDirectory(const std::vector<std::string>& places) {
   for (const std::string& place : places) {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
@@ -32,7 +36,10 @@ std::optional<LinuxHost::StateCopy> CopyUnless(bool fresh, const std::string& to
 
 }  // namespace
 
-ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory()) {}
+ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory(UsualPlaces())) {}
+
+ScratchDirectory::ScratchDirectory(const std::string& place)
+    : path(MakePrivateDirectory({place})) {}
 
 ScratchDirectory::~ScratchDirectory() {
   std::error_code ignored;
