@@ -1,4 +1,7 @@
+/// @file
+/// What the library shows to programs.
+
 #pragma once
 
-// Makes a name visible outside libsecpolicy; everything else is hidden.
+/// Makes a name visible outside libsecpolicy; everything else is hidden.
 #define SECPOLICY_EXPORT __attribute__((visibility("default")))

@@ -1,8 +1,9 @@
 #pragma once
 
+/// Advanced options of the host.
 namespace Braxo::Adv {
 
-// One advanced option of the host. Its kind is told by `dynamic_cast` to a derived class.
+/// One advanced option of the host. Its kind is told by `dynamic_cast` to a derived class.
 class __attribute__((visibility("default"))) AdvancedOption {
  public:
   AdvancedOption() = default;
@@ -11,10 +12,10 @@ class __attribute__((visibility("default"))) AdvancedOption {
   virtual ~AdvancedOption() = default;
 };
 
-// An option that holds an integer.
+/// An option that holds an integer.
 class __attribute__((visibility("default"))) AdvancedIntegerOption : public AdvancedOption {
  public:
-  // The current value. May throw Braxo::Lib::BraxoException.
+  /// The current value. May throw Braxo::Lib::BraxoException.
   virtual long GetValue() const = 0;
 };
 

@@ -7,13 +7,14 @@
 #include <string_view>
 #include <type_traits>
 
+/// Texts.
 namespace Braxo::Misc {
 namespace Detail {
 
 template <class T, class... Others>
 concept AnyOf = (std::same_as<T, Others> || ...);
 
-// A type that is an integer to the language but a letter or a truth value to the reader.
+/// A type that is an integer to the language but a letter or a truth value to the reader.
 // clang-format off
 template <class T>
 concept Ambiguous =
@@ -40,12 +41,12 @@ void AppendPiece(std::string& text, T piece) {
 
 }  // namespace Detail
 
-// What can be joined: a `std::string`, a `std::string_view`, a C string (not null) or an integer.
-// `char` and `bool` are refused: whether a number or a letter was meant cannot be told.
+/// What can be joined: a `std::string`, a `std::string_view`, a C string (not null) or an integer.
+/// `char` and `bool` are refused: whether a number or a letter was meant cannot be told.
 template <class T>
 concept Piece = Detail::Text<T> || Detail::Number<T>;
 
-// Returns the pieces joined in order. Integers are written in decimal, whatever the locale is.
+/// Returns the pieces joined in order. Integers are written in decimal, whatever the locale is.
 template <Piece... Pieces>
 std::string StrCat(const Pieces&... pieces) {
   std::string text;

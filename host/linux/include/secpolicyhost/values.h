@@ -2,11 +2,12 @@
 
 #include "teskctl/security.h"
 
-// What the numbers of the runtime interface mean on this host. Policy files write the words
-// instead: "cap_kill" for kCapKill, "bind_port" for kCheckBindPort.
+/// What the numbers of the runtime interface mean on this host. Policy files write the words
+/// instead: "cap_kill" for kCapKill, "bind_port" for kCheckBindPort.
 namespace LinuxHost {
 
-// Capabilities. They are Linux's by name; the numbers are this host's own.
+/// A capability, by its name in Linux; the number is this host's own.
+/// @{
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapChown{0};
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapDacOverride{1};
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapDacReadSearch{2};
@@ -26,8 +27,10 @@ inline constexpr TeskCtl::Security::TeskAccess_Capability kCapSysChroot{15};
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapSysPtrace{16};
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapSysAdmin{17};
 inline constexpr TeskCtl::Security::TeskAccess_Capability kCapSysBoot{18};
+/// @}
 
-// Parameter checks.
+/// A parameter check.
+/// @{
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckSocketFamily{0};
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckSocketType{1};
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckBindPort{2};
@@ -38,10 +41,13 @@ inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckCloneFlags{6};
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckKillSignal{7};
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckSetUid{8};
 inline constexpr TeskCtl::Security::TeskAccess_ParamCheck kCheckSetGid{9};
+/// @}
 
-// What a file policy may permit, the letters "r", "w" and "x"; joined by `|`.
+/// What a file policy may permit, the letters "r", "w" and "x"; joined by `|`.
+/// @{
 inline constexpr unsigned int kPermitRead = 0x1;
 inline constexpr unsigned int kPermitWrite = 0x2;
 inline constexpr unsigned int kPermitExecute = 0x10;
+/// @}
 
 }  // namespace LinuxHost
