@@ -1,13 +1,18 @@
 """How Sphinx makes the site. Its pages are the files of the repository as they are, so that their links lead
 to the same places in the repository and in the site. scripts/docs runs it."""
 
+import os
 import pathlib
 import re
+import subprocess
+
+from docutils import nodes
+from docutils.parsers.rst import Directive
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 
 project = html_title = "libsecpolicy"
-extensions = ["myst_parser"]
+extensions = ["myst_parser", "breathe"]
 
 root_doc = "docs/index"
 include_patterns = ["*.md", "docs/*.md"]
@@ -17,13 +22,31 @@ exclude_patterns = [entry.name for entry in ROOT.iterdir() if entry.is_dir() and
 myst_heading_anchors = 4
 highlight_language = "none"
 
+# What Doxygen has read in the public headers.
+breathe_projects = {project: os.environ["DOXYGEN_XML"]}
+breathe_default_project = project
+
 html_theme = "furo"
+html_static_path = ["static"]
+html_css_files = ["site.css"]
 html_copy_source = False
 html_show_copyright = False
 html_show_sphinx = False
 # The way in, where one looks for it.
 html_additional_pages = {"index": "way-in.html"}
 templates_path = ["templates"]
+
+
+class Manual(Directive):
+    """Shows a manual page, which is named as seen from docs/, as a terminal does."""
+
+    required_arguments = 1
+
+    def run(self):
+        shown = subprocess.run(["mandoc", "-T", "utf8", "-O", "width=88", ROOT / "docs" / self.arguments[0]],
+                               check=True, capture_output=True, text=True).stdout
+        text = re.sub(".\\x08", "", shown)  # what a terminal would show bold or underlined
+        return [nodes.literal_block(text, text, language="none")]
 
 
 def mend_theme(app, _failure):
@@ -41,4 +64,5 @@ def mend_theme(app, _failure):
 
 
 def setup(app):
+    app.add_directive("manual", Manual)
     app.connect("build-finished", mend_theme)
