@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "policy/call_set.h"
+#include "policy/mention.h"
 
 namespace Policy {
 namespace {
@@ -84,12 +85,6 @@ Votes AnyOf(Votes votes) {
 }
 
 // ---- Files
-
-// A path rule is about the path and everything beneath it.
-bool Covers(const std::string& rulePath, const std::string& path) {
-  if (rulePath == path || rulePath == "/") return true;
-  return path.starts_with(rulePath) && (rulePath.ends_with('/') || path[rulePath.size()] == '/');
-}
 
 // Of the rules around a path, the nearest one, which decides alone; null when there is none.
 const Rule* FindNearest(const InstalledDomain& domain, const std::string& path) {

@@ -166,3 +166,33 @@ END
   secpolicy diff installed
   wrong_usage diff "B is required"
 }
+
+@test "--stat counts what differs" {
+  secpolicy diff --stat /etc/zorvan/secpolicy /new
+  exits 0
+  [[ -z $output ]]
+  echo "-c cap_net_raw grant" >>"$policy/domains/appDom"
+  echo "-c cap_net_admin grant" >>"$policy/domains/appDom"
+  sed -i '/listen/d; s/^\(-c cap_net_bind_service\) grant/\1 revoke/' "$policy/domains/sshDom"
+  echo "-r /srv rw" >"$policy/domains/newDom"
+  : >"$policy/domains/emptyDom"
+  echo "newObject" >>"$policy/objects/base"
+  sed -i '/host_key/d; s|^\(/var/lib/vms/\*\) .*|\1 vmProgram|' "$policy/fileLabels/base"
+  secpolicy diff --stat /etc/zorvan/secpolicy /new
+  answers 1 \
+    "domain appDom: 2 rules added" \
+    "domain emptyDom (only in /new)" \
+    "domain newDom (only in /new): 1 rule added" \
+    "domain sshDom: 1 rule removed, 1 rule changed" \
+    "objects: 1 object added" \
+    "file labels: 1 line removed, 1 line changed"
+  [[ $stderr == "secpolicy: diff: different" ]]
+  secpolicy save good
+  secpolicy settings enforcement appDom permissive
+  secpolicy restore
+  secpolicy capability grant appDom cap_net_raw
+  secpolicy diff --stat good installed
+  answers 1 "domain appDom: level enforcing -> permissive, 1 rule added"
+  secpolicy diff --stat --format json good installed
+  wrong_usage diff "--format excludes --stat"
+}

@@ -485,3 +485,43 @@ index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
   secpolicy load
   exits 0
 }
+
+@test "get, verify and relabel tell the same as JSON" {
+  boot
+  touch "$root/etc/new"
+  secpolicy label get /etc/new /usr/sbin/sshd /nowhere --format json
+  exits 1
+  says "Error: /nowhere: No such file or directory"
+  fits_schema labels
+  jq -e '.files == [{path: "/etc/new", label: "hostConfig", inherited: true},
+    {path: "/usr/sbin/sshd", label: "sshProgram", inherited: false}]' <<<"$output"
+
+  secpolicy label verify --format json
+  exits 0
+  fits_schema label-verify
+  jq -e '.files > 10 and .differences == []' <<<"$output"
+  secpolicy label set vmDisk /etc/ssh/host_key
+  local line
+  line=$(grep -n /etc/ssh/host_key "$policy/fileLabels/base" | cut -d: -f1)
+  secpolicy label verify --format json /etc/ssh
+  exits 1
+  fits_schema label-verify
+  jq -e --argjson line "$line" '.differences == [{path: "/etc/ssh/host_key", label: "vmDisk", inherited: false,
+    policy: "sshKey", file: "/etc/zorvan/secpolicy/fileLabels/base", line: $line}]' <<<"$output"
+  unlabel / /etc /etc/ssh /etc/ssh/host_key
+  secpolicy label verify --format json /etc/ssh/host_key
+  jq -e '.differences[0].label == null' <<<"$output"
+  boot
+
+  secpolicy label set vmDisk /etc/ssh/host_key
+  secpolicy label relabel --dry-run --format json /etc/ssh
+  exits 0
+  fits_schema label-relabel
+  jq -e '.dryRun and (.labels | any(. == {label: "sshKey", files: 1, changed: 1})) and
+    (.changes[0] | .before == "vmDisk" and .after == "sshKey" and .line > 0)' <<<"$output"
+  secpolicy label relabel --format json /etc/ssh
+  exits 0
+  fits_schema label-relabel
+  jq -e '(.dryRun | not) and .changes == []' <<<"$output"
+  [[ $(the_label /etc/ssh/host_key) == sshKey ]]
+}

@@ -314,3 +314,73 @@ refuses() {
   exits 2
   [[ $stderr == "secpolicy: diff: Unable to examine $root/run/secpolicy: Permission denied" ]]
 }
+
+@test "history tells as JSON what is saved, and what cannot be used" {
+  secpolicy history --format json
+  exits 0
+  fits_schema history
+  jq -e '.states == []' <<<"$output"
+  secpolicy save good
+  touch -d '2026-01-02 03:04:05 UTC' "$saved/good.db"
+  echo broken >"$saved/bad.db"
+  secpolicy history --format json
+  exits 1
+  fits_schema history
+  jq -e '.states | length == 2 and (.[0] | .name == "good" and .time == "2026-01-02T03:04:05Z" and .rules > 100) and
+    (.[1] | .name == "bad" and (.problem | startswith("Unable to copy the saved state")))' <<<"$output"
+}
+
+@test "saved show shows what was saved, as display does what is installed" {
+  secpolicy display
+  local before=$output
+  secpolicy display --format json
+  local document=$output
+  secpolicy save good
+  secpolicy domain create job7
+  secpolicy saved show good
+  exits 0
+  [[ $stderr == "secpolicy: saved show: done" && $output != *job7* ]]
+  diff <(sed '/^Tardisk Path/,$d; /^-*$/d' <<<"$before") <(sed '/^-*$/d' <<<"$output")
+  secpolicy saved show good --format json
+  exits 0
+  fits_schema saved
+  diff <(jq '{domains, objects}' <<<"$document") <(jq '{domains, objects}' <<<"$output")
+  [[ $(jq -r .name <<<"$output") == good ]]
+  secpolicy display
+  [[ $output == *job7* ]]
+}
+
+@test "saved delete deletes one saved state, and no other" {
+  secpolicy save good
+  secpolicy save other
+  secpolicy saved delete good
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: saved delete: done" ]]
+  [[ ! -e $saved/good.db && -f $saved/other.db ]]
+  for verb in delete show; do
+    secpolicy saved "$verb" good
+    exits 1
+    [[ $stderr == "secpolicy: saved $verb: there is no saved state 'good'. 'secpolicy --root $root history' lists what is saved." ]]
+    secpolicy saved "$verb" ../config
+    wrong_usage "saved" "NAME: '../config' cannot be a name: it takes 1 to 64 of A-Z a-z 0-9 . _ -, and begins with neither . nor -"
+  done
+  ln -s other.db "$saved/link.db"
+  secpolicy saved delete link
+  exits 0
+  [[ ! -L $saved/link.db && -f $saved/other.db ]]
+  mkdir "$saved/dir.db"
+  secpolicy saved delete dir
+  exits 1
+  ends_with "secpolicy: saved delete: cannot delete /var/lib/secpolicy/saved/dir.db: Is a directory"
+}
+
+@test "a saved state that cannot be used is shown as little as put back, and can be deleted" {
+  mkdir -p "$saved"
+  echo broken >"$saved/bad.db"
+  secpolicy saved show bad
+  exits 1
+  [[ -z $output ]]
+  ends_with "secpolicy: saved show: Unable to copy the saved state /var/lib/secpolicy/saved/bad.db: file is not a database"
+  secpolicy saved delete bad
+  exits 0
+}

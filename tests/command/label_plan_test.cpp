@@ -74,7 +74,7 @@ class LabelPlanTest : public testing::Test {
   TemporaryDirectory directory;
   LinuxHost::UsedState state{directory / "host.db"};
   ErrorList errors;
-  LabelRun run{errors};
+  LabelRun run{errors, false};
   PolicyTree policy;
   PolicyTree files{{"a/one", ""}, {"a/b/two", ""}, {"c", ""}};
 };

@@ -14,6 +14,7 @@ struct Options {
   std::string before;
   std::string after;
   std::string format;
+  bool stat = false;
 };
 
 ExitCode Compare(const Options& options) {
@@ -27,11 +28,10 @@ ExitCode Compare(const Options& options) {
               "labels only, and a state the transitions");
   }
   const Comparison diff = Diff(std::move(before), std::move(after));
-  if (options.format == "json") {
-    WriteDiffJson(diff, std::cout);
-  } else {
-    WriteDiffText(diff, std::cout);
-  }
+  const auto write = options.stat               ? WriteDiffStat
+                     : options.format == "json" ? WriteDiffJson
+                                                : WriteDiffText;
+  write(diff, std::cout);
   Summarize("diff", diff.IsSame() ? "the same" : "different");
   return diff.IsSame() ? kWell : kFailed;
 }
@@ -51,7 +51,8 @@ Action Define(Syntax& syntax) {
   syntax.AddOption("A", options->before, "A policy directory, 'installed', or a saved state")
       .Require();
   syntax.AddOption("B", options->after, "What it is compared with; the same").Require();
-  syntax.AddFormat(options->format, "the differences", {"text", "json"});
+  const Option format = syntax.AddFormat(options->format, "the differences", {"text", "json"});
+  syntax.AddFlag("--stat", options->stat, "Only count what differs").Exclude(format);
   return [options] { return CompareOrRefuse(*options); };
 }
 
@@ -70,6 +71,7 @@ const Verb kDiff = {
     "Examples:\n"
     "  secpolicy diff installed /etc/zorvan/secpolicy     what was edited since the load?\n"
     "  secpolicy diff ./old ./new                         two directories\n"
+    "  secpolicy diff --stat ./old ./new                  how much, and where?\n"
     "  secpolicy diff before-upgrade installed            since 'secpolicy save before-upgrade'",
     Define};
 

@@ -3,7 +3,9 @@
 #include <iomanip>
 #include <iostream>
 
+#include "command_line.h"
 #include "ending.h"
+#include "json.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_state.h"
 #include "text/format.h"
@@ -13,38 +15,67 @@
 namespace SecPolicyCli {
 namespace {
 
-std::string Describe(const Policy::InstalledPolicy& policy) {
+// A saved state, and what is in it.
+struct Entry {
+  SavedState state;
+  std::size_t domains = 0;
   std::size_t rules = 0;
-  for (const Policy::InstalledDomain& domain : policy.domains) rules += domain.rules.size();
-  return CountOf(policy.domains.size(), "domain") + ", " + CountOf(rules, "rule");
-}
+  std::string problem;  // why it cannot be used; empty when it can
+};
 
-// What is saved, or why it cannot be used; `isUsable` becomes false then.
-std::string DescribeSaved(const std::string& name, bool& isUsable) {
+Entry ReadEntry(const SavedState& state) {
+  Entry entry;
+  entry.state = state;
   try {
-    return Describe(ReadStateAt(SavedStatePath(name), LinuxHost::CopyOf::kSavedState));
+    const auto policy = ReadStateAt(SavedStatePath(state.name), LinuxHost::CopyOf::kSavedState);
+    entry.domains = policy.domains.size();
+    for (const Policy::InstalledDomain& domain : policy.domains) entry.rules += domain.rules.size();
   } catch (const std::exception& failure) {
-    isUsable = false;
-    return failure.what();
+    entry.problem = failure.what();
   }
+  return entry;
 }
 
-ExitCode ShowHistory() {
-  const std::vector<SavedState> states = ListSavedStates();
+void WriteText(const std::vector<Entry>& entries) {
   std::size_t width = 0;
-  for (const SavedState& state : states) width = std::max(width, state.name.size());
-  bool allUsable = true;
-  for (const SavedState& state : states) {
+  for (const Entry& entry : entries) width = std::max(width, entry.state.name.size());
+  for (const auto& [state, domains, rules, problem] : entries) {
     std::cout << std::left << std::setw(static_cast<int>(width)) << state.name << "  "
-              << UtcTime(state.time) << "  " << Visible(DescribeSaved(state.name, allUsable))
+              << UtcTime(state.time) << "  "
+              << (problem.empty() ? CountOf(domains, "domain") + ", " + CountOf(rules, "rule")
+                                  : Visible(problem))
               << '\n';
   }
-  Summarize("history", states.empty() ? "nothing is saved" : CountOf(states.size(), "saved state"));
+}
+
+void WriteJson(const std::vector<Entry>& entries) {
+  Json states = Json::Array();
+  for (const auto& [state, domains, rules, problem] : entries) {
+    Json json = {{"name", state.name}, {"time", IsoTime(state.time)}};
+    if (problem.empty()) {
+      json.Add({{"domains", domains}, {"rules", rules}});
+    } else {
+      json["problem"] = problem;
+    }
+    states.Append(json);
+  }
+  std::cout << Json{{"schema", "secpolicy.history/1"}, {"states", states}}.Text();
+}
+
+ExitCode ShowHistory(const std::string& format) {
+  std::vector<Entry> entries;
+  for (const SavedState& state : ListSavedStates()) entries.push_back(ReadEntry(state));
+  (format == "json" ? WriteJson : WriteText)(entries);
+  Summarize("history",
+            entries.empty() ? "nothing is saved" : CountOf(entries.size(), "saved state"));
+  const bool allUsable = std::ranges::all_of(entries, &std::string::empty, &Entry::problem);
   return allUsable ? kWell : kFailed;
 }
 
-Action Define(Syntax&) {
-  return [] { return RunOrRefuse("history", ShowHistory); };
+Action Define(Syntax& syntax) {
+  const auto format = std::make_shared<std::string>();
+  syntax.AddFormat(*format, "the list", {"text", "json"});
+  return [format] { return RunOrRefuse("history", [&] { return ShowHistory(*format); }); };
 }
 
 }  // namespace
@@ -54,10 +85,11 @@ const Verb kHistory = {
     "Prints the saved states, the oldest first: name, when it was saved (UTC), and how many "
     "domains\n"
     "and rules it holds. One that can no longer be used says why, and the exit status is 1.\n"
-    "They lie in /var/lib/secpolicy/saved: to be rid of one, remove its file.\n"
+    "'saved' shows what one holds, and deletes it.\n"
     "\n"
     "Examples:\n"
     "  secpolicy history\n"
+    "  secpolicy history --format json | jq -r '.states[-1].name'\n"
     "  secpolicy diff nightly installed     what happened since that one?",
     Define};
 

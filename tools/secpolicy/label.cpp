@@ -18,6 +18,7 @@ struct Arguments {
   std::string policy = SecPolicy::kPolicyRoot;
   bool wholeTrees = false;
   bool dryRun = false;
+  std::string format;
 
   std::string LabelDir() const { return policy + "/" + SecPolicy::kFileLabelsDir; }
 };
@@ -45,6 +46,10 @@ void AddPolicy(Syntax& syntax, Arguments& arguments) {
       .ShowDefault();
 }
 
+void AddFormat(Syntax& syntax, Arguments& arguments) {
+  syntax.AddFormat(arguments.format, "it", {"text", "json"});
+}
+
 constexpr LabelKind kLabelKinds[] = {
     {"get", "Print the labels of files",
      "Prints 'PATH: LABEL' for each file, and '(inherited)' where that is the label of a "
@@ -53,8 +58,10 @@ constexpr LabelKind kLabelKinds[] = {
      "\n"
      "Examples:\n"
      "  secpolicy label get /usr/sbin/sshd\n"
-     "  secpolicy label get -R /etc | grep -v ': unlabeled'",
+     "  secpolicy label get -R /etc | grep -v ': unlabeled'\n"
+     "  secpolicy label get -R /etc --format json | jq -r '.files[] | select(.inherited) | .path'",
      [](Syntax& syntax, Arguments& arguments) {
+       AddFormat(syntax, arguments);
        AddWholeTrees(syntax, arguments);
        AddPaths(syntax, arguments, "The files", true);
      },
@@ -87,6 +94,7 @@ constexpr LabelKind kLabelKinds[] = {
      "  secpolicy label verify                    all files that the policy names\n"
      "  secpolicy label verify /etc /usr/sbin     those that are there",
      [](Syntax& syntax, Arguments& arguments) {
+       AddFormat(syntax, arguments);
        AddPolicy(syntax, arguments);
        AddPaths(syntax, arguments, "Only what is at or below one of these", false);
      },
@@ -103,6 +111,7 @@ constexpr LabelKind kLabelKinds[] = {
      "  secpolicy label relabel\n"
      "  secpolicy label relabel /var              only what is at or below /var",
      [](Syntax& syntax, Arguments& arguments) {
+       AddFormat(syntax, arguments);
        AddPolicy(syntax, arguments);
        syntax.AddFlag("-n,--dry-run", arguments.dryRun,
                       "Print what would change, and change nothing");
@@ -124,7 +133,7 @@ ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   return CallLibrary(
       verb,
       [&](ErrorList& errors) {
-        LabelRun run(errors);
+        LabelRun run(errors, arguments.format == "json");
         ending = kind.run(run, arguments);
       },
       AdviseOnPrivilege, [&] { return ending; });

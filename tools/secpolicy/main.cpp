@@ -23,10 +23,10 @@ const VerbGroup kVerbs[] = {
     {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords}},
     {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
     {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff}},
-    {"Ask about it", {&kWhy, &kWhoCan, &kFeatures}},
+    {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
     {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
     {"Run programs in it", {&kRun, &kExec, &kObserve}},
-    {"Go back", {&kSave, &kHistory, &kRollback}}};
+    {"Go back", {&kSave, &kHistory, &kSaved, &kRollback}}};
 
 constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
@@ -45,6 +45,8 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r features --for appDom       what becomes of its rules on this kernel?\n"
     "  secpolicy --root ./r why sshDom read /etc/ssh    may it, and which rule says so?\n"
     "  secpolicy --root ./r who-can use cap_sys_boot    which domains may?\n"
+    "  secpolicy --root ./r rules --label sshKey        which rules speak of it?\n"
+    "  secpolicy --root ./r path hostDom sshDom         by which transitions is it reached?\n"
     "  secpolicy --root ./r words calls                 what can stand behind -s?\n"
     "  secpolicy --root ./r graph --format svg >g.svg   the domains and their transitions\n"
     "  secpolicy --root ./r check                       find every problem of the policy files\n"
@@ -57,6 +59,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r diff ./old installed        how do two policies differ?\n"
     "  secpolicy --root ./r save good                   keep what is installed under a name\n"
     "  secpolicy --root ./r history                     what is saved?\n"
+    "  secpolicy --root ./r saved show good             and what does it hold?\n"
     "  secpolicy --root ./r rollback good               put it back\n"
     "  secpolicy --root ./r settings enforcement appDom permissive\n"
     "  secpolicy --root ./r restore                     apply the stored level\n"

@@ -29,10 +29,7 @@ void PutBack(const std::string& name) {
 
 ExitCode RollBack(const std::string& name) {
   if (LinuxHost::IsStateMissing()) return RefuseWithoutState("rollback");
-  if (!IsSaved(name)) {
-    return Refuse("rollback", "there is no saved state '" + name + "'. " + Call("history") +
-                                  " lists what is saved.");
-  }
+  if (!IsSaved(name)) return RefuseUnsaved("rollback", name);
   return CallLibrary(
       "rollback",
       [&](ErrorList&) {

@@ -43,6 +43,7 @@ extern const Verb kDisplay;
 extern const Verb kDiff;
 extern const Verb kSave;
 extern const Verb kHistory;
+extern const Verb kSaved;
 extern const Verb kRollback;
 extern const Verb kSettings;
 extern const Verb kGraph;
@@ -57,6 +58,8 @@ extern const Verb kExec;
 extern const Verb kObserve;
 extern const Verb kFeatures;
 extern const Verb kWhoCan;
+extern const Verb kRules;
+extern const Verb kPath;
 extern const Verb kWhy;
 extern const Verb kWords;
 

@@ -43,12 +43,6 @@ std::map<Policy::Rule, RulePair, Policy::BySubject> PairsOf(const DomainDifferen
   return pairs;
 }
 
-std::string TitleOf(const DomainDifference& domain, const Comparison& diff) {
-  const std::string title = "domain " + domain.name;
-  if (domain.IsNew()) return title + " (only in " + diff.after + ")";
-  return domain.IsGone() ? title + " (only in " + diff.before + ")" : title;
-}
-
 std::string LevelLine(Policy::Level level) { return std::string("level ") + TextOf(level); }
 
 void WriteDomain(const DomainDifference& domain, const Comparison& diff, std::ostream& output) {
@@ -65,6 +59,12 @@ void WriteDomain(const DomainDifference& domain, const Comparison& diff, std::os
 }
 
 }  // namespace
+
+std::string TitleOf(const DomainDifference& domain, const Comparison& diff) {
+  const std::string title = "domain " + domain.name;
+  if (domain.IsNew()) return title + " (only in " + diff.after + ")";
+  return domain.IsGone() ? title + " (only in " + diff.before + ")" : title;
+}
 
 void WriteDiffText(const Comparison& diff, std::ostream& output) {
   if (diff.IsSame()) return;

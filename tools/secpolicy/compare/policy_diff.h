@@ -34,6 +34,12 @@ Comparison Diff(Side before, Side after);
 // Nothing when there is no difference.
 void WriteDiffText(const Comparison& diff, std::ostream& output);
 
+// The same in numbers: a line for each domain, for objects and for file labels.
+void WriteDiffStat(const Comparison& diff, std::ostream& output);
+
+// "domain sshDom", and which side alone has it.
+std::string TitleOf(const Policy::DomainDifference& domain, const Comparison& diff);
+
 // For programs.
 void WriteDiffJson(const Comparison& diff, std::ostream& output);
 

@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <cstring>
 #include <iostream>
+#include <utility>
 
 #include "braxo/misc/strcat.h"
 #include "root.h"
@@ -15,6 +16,13 @@ using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 void LabelRun::Print(const std::string& line) {
   progress.Clear();
   std::cout << Visible(line) << '\n';
+}
+
+void LabelRun::PrintDocument(Json document, const char* list) {
+  if (!isJson) return;
+  document[list] = std::move(findings);
+  progress.Clear();
+  std::cout << document.Text();
 }
 
 void LabelRun::Error(const std::string& message) {

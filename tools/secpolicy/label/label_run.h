@@ -5,6 +5,7 @@
 #include <string>
 
 #include "error_list.h"
+#include "json.h"
 #include "progress_line.h"
 #include "secpolicy/secpolicy.h"
 
@@ -16,11 +17,15 @@ constexpr std::uint32_t kNoSuchLabel = 1;
 // One use of the verb: the connection to the host, and the way to the terminal. Throws what the
 // host throws.
 struct LabelRun {
-  // `errorList` gets every error that is written.
-  explicit LabelRun(ErrorList& errorList) : errors(errorList) {}
+  // `errorList` gets every error that is written. With `asJson`, a document takes the place of what
+  // is printed.
+  LabelRun(ErrorList& errorList, bool asJson) : isJson(asJson), errors(errorList) {}
 
   // Writes a line to standard output, control characters as ^I and the like.
   void Print(const std::string& line);
+
+  // Writes the document, and the findings into it by the name `list`; nothing but for `isJson`.
+  void PrintDocument(Json document, const char* list);
 
   // Writes an error to standard error.
   void Error(const std::string& message);
@@ -31,6 +36,8 @@ struct LabelRun {
   // The name of the label `id`, or what can be said of a label that is gone.
   std::string NameOf(std::uint32_t id);
 
+  const bool isJson;
+  Json findings = Json::Array();  // for the document: an object for each file
   SecPolicy::TeskAccessInterfaceImpl access;
   ProgressLine progress;
   ErrorList& errors;

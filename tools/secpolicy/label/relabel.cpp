@@ -31,7 +31,14 @@ class Relabelling {
     const auto before = LinuxHost::ReadLabel(file.name);
     if (before && before->id == line.id) return;
     if (!before) return run.Error(file.path + ": " + WhyNoLabel(errno));
-    if (dryRun) {
+    if (dryRun && run.isJson) {
+      run.findings.Append({{"path", file.path},
+                           {"before", run.NameOf(before->id)},
+                           {"inherited", before->isInherited},
+                           {"after", line.label.label},
+                           {"file", line.label.policyFile},
+                           {"line", line.label.lineNumber}});
+    } else if (dryRun) {
       run.Print(StrCat(file.path, ": ", run.NameOf(before->id),
                        before->isInherited ? " (inherited)" : "", " -> ", line.label.label, " (",
                        line.Place(), ")"));
@@ -45,12 +52,18 @@ class Relabelling {
   std::string Summarize() {
     const std::string verb = dryRun ? "would be relabelled" : "relabelled";
     Count all;
+    Json labels = Json::Array();
     for (const auto& [label, count] : counts) {
-      run.Print(
-          StrCat(label, ": ", count.changed, " of ", CountOf(count.files, "file"), " ", verb));
+      const std::string line =
+          StrCat(label, ": ", count.changed, " of ", CountOf(count.files, "file"), " ", verb);
+      if (!run.isJson) run.Print(line);
+      labels.Append({{"label", label}, {"files", count.files}, {"changed", count.changed}});
       all.files += count.files;
       all.changed += count.changed;
     }
+    run.PrintDocument(
+        {{"schema", "secpolicy.label-relabel/1"}, {"dryRun", dryRun}, {"labels", labels}},
+        "changes");
     return StrCat("done (", all.changed, " of ", CountOf(all.files, "file"), " ", verb, ")");
   }
 

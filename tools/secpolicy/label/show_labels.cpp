@@ -16,7 +16,8 @@ void ShowLabel(LabelRun& run, const LinuxHost::WalkedFile& file) {
   try {
     const std::string name =
         run.access.GetLabel(label->id, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
-    run.Print(file.path + ": " + name + inherited);
+    if (!run.isJson) return run.Print(file.path + ": " + name + inherited);
+    run.findings.Append({{"path", file.path}, {"label", name}, {"inherited", label->isInherited}});
   } catch (const Braxo::Lib::BraxoException&) {
     run.Error(file.path + ": has " + run.NameOf(label->id) + inherited);
   }
@@ -32,6 +33,7 @@ std::string ShowLabels(LabelRun& run, const std::vector<std::string>& paths, boo
         [&](const LinuxHost::WalkedFile& file) { ShowLabel(run, file); },
         [&](const std::string& failed, const std::string& why) { run.Error(failed + ": " + why); });
   }
+  run.PrintDocument({{"schema", "secpolicy.labels/1"}}, "files");
   return "done";
 }
 

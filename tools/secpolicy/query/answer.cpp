@@ -17,14 +17,7 @@ std::string PlaceOf(const std::string& file, unsigned int line) {
   return file + ":" + std::to_string(line) + ": ";
 }
 
-// The rule behind its place, in the form that editors and grep know.
-std::string Cite(const Rule& rule) {
-  const std::string place =
-      rule.origin.file.empty() ? "(no policy file): " : PlaceOf(rule.origin.file, rule.origin.line);
-  return place + rule.Text();
-}
-
-std::string Cite(const LinuxHost::LabelOrigin& origin) {
+std::string CiteOrigin(const LinuxHost::LabelOrigin& origin) {
   return PlaceOf(origin.file, origin.line) + origin.path + (origin.isTree ? "/* " : " ") +
          origin.label;
 }
@@ -79,7 +72,7 @@ void WriteFile(const Question& question, std::ostream& output) {
     return;
   }
   WriteLine(output, whose + file.label + (file.labelIsInherited ? " (inherited)" : ""));
-  if (file.labelOrigin) WriteLine(output, Cite(*file.labelOrigin));
+  if (file.labelOrigin) WriteLine(output, CiteOrigin(*file.labelOrigin));
 }
 
 // Why a check is passed that no rule speaks of.
@@ -108,6 +101,12 @@ std::string ReasonOf(const InstalledDomain& domain, const Decision& decision) {
 }
 
 }  // namespace
+
+std::string Cite(const Rule& rule) {
+  const std::string place =
+      rule.origin.file.empty() ? "(no policy file): " : PlaceOf(rule.origin.file, rule.origin.line);
+  return place + rule.Text();
+}
 
 void WriteAnswer(const Question& question, const InstalledDomain& domain, const Decision& decision,
                  std::ostream& output) {

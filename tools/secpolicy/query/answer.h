@@ -17,6 +17,9 @@ void WriteAnswer(const Question& question, const Policy::InstalledDomain& domain
 void WriteAnswerLine(const Policy::InstalledDomain& domain, const Policy::Decision& decision,
                      std::ostream& output);
 
+// The rule behind its place, in the form that editors and grep know: "FILE:LINE: RULE".
+std::string Cite(const Policy::Rule& rule);
+
 // The same for programs; see docs/json.md.
 Json QuestionToJson(const Question& question);
 Json AnswerToJson(const Policy::InstalledDomain& domain, const Policy::Decision& decision);

@@ -82,12 +82,16 @@ void RequireNumber(const std::string& word) {
   }
 }
 
+}  // namespace
+
 void RequireWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
   if (kind == kPath) return RequirePath(word);
   if (kind == kNumber) return RequireNumber(word);
   if (IsKnown(kind, word, access)) return;
   RefuseWord(FormOf(kind).plainNoun, word, KnownWords(kind, access));
 }
+
+namespace {
 
 const QuestionForm& FindForm(const std::string& action) {
   std::vector<std::string> actions;
@@ -98,10 +102,14 @@ const QuestionForm& FindForm(const std::string& action) {
   RefuseWord("question", action, actions);
 }
 
+}  // namespace
+
 std::string WithoutTrailingSlashes(std::string path) {
   while (path.size() > 1 && path.ends_with('/')) path.pop_back();
   return path;
 }
+
+namespace {
 
 // The path that it resolves to; empty when it leads nowhere.
 std::string RealPathOf(const std::string& path) {
@@ -131,6 +139,8 @@ std::optional<LabelOrigin> FindOriginOf(const FileFacts& file) {
   return file.labelIsInherited ? FindOriginAbove(file) : std::nullopt;
 }
 
+}  // namespace
+
 FileFacts ExamineFile(const std::string& path, TeskAccessInterfaceImpl& access) {
   FileFacts file;
   file.paths = {path};
@@ -150,6 +160,8 @@ FileFacts ExamineFile(const std::string& path, TeskAccessInterfaceImpl& access) 
   file.labelOrigin = FindOriginOf(file);
   return file;
 }
+
+namespace {
 
 std::string DirectoryOf(const std::string& path) {
   return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));

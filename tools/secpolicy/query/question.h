@@ -63,6 +63,16 @@ std::vector<std::string> KnownWords(Policy::WordKind kind,
 [[noreturn]] void RefuseWord(const std::string& noun, const std::string& word,
                              const std::vector<std::string>& known);
 
+// What there is at `path`, which has no slash at its end but for the root's.
+FileFacts ExamineFile(const std::string& path, SecPolicy::TeskAccessInterfaceImpl& access);
+
+// `path` without slashes at its end.
+std::string WithoutTrailingSlashes(std::string path);
+
+// Throws QuestionError for a word that cannot stand for what it is to stand for.
+void RequireWord(Policy::WordKind kind, const std::string& word,
+                 SecPolicy::TeskAccessInterfaceImpl& access);
+
 // Throws QuestionError for a path that does not begin at the root.
 void RequirePath(const std::string& path);
 

@@ -75,7 +75,13 @@ std::string SavedStatePath(const std::string& name) {
   return std::string(kSavedStatesDir) + "/" + name + kEnding;
 }
 
-bool IsSaved(const std::string& name) { return Examine(SavedStatePath(name)).has_value(); }
+std::optional<SavedState> FindSaved(const std::string& name) {
+  const std::optional<struct stat> status = Examine(SavedStatePath(name));
+  if (!status) return std::nullopt;
+  return SavedState{.name = name, .time = status->st_mtim.tv_sec};
+}
+
+bool IsSaved(const std::string& name) { return FindSaved(name).has_value(); }
 
 std::vector<SavedState> ListSavedStates() {
   std::vector<SavedState> states;
@@ -90,6 +96,11 @@ std::vector<SavedState> ListSavedStates() {
   std::ranges::sort(states, {},
                     [](const SavedState& state) { return std::tie(state.time, state.name); });
   return states;
+}
+
+ExitCode RefuseUnsaved(const std::string& verb, const std::string& name) {
+  return Refuse(
+      verb, "there is no saved state '" + name + "'. " + Call("history") + " lists what is saved.");
 }
 
 std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning) {

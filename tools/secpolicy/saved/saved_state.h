@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -23,12 +24,17 @@ std::string WhyNoSavedName(const std::string& name);
 // The file of the saved state `name`, which may not be there.
 std::string SavedStatePath(const std::string& name);
 
-// Throws std::runtime_error, with what to do about it, when this user may not look.
+// The saved state `name`; nothing when there is none. Throws std::runtime_error, with what to do
+// about it, when this user may not look.
+std::optional<SavedState> FindSaved(const std::string& name);
 bool IsSaved(const std::string& name);
 
 // The saved states, the oldest first. Throws std::runtime_error, with what to do about it, when
 // they cannot be listed.
 std::vector<SavedState> ListSavedStates();
+
+// Refuses what needs the saved state `name` where there is none.
+ExitCode RefuseUnsaved(const std::string& verb, const std::string& name);
 
 // Adds the required argument NAME, the name of a saved state, to `syntax`.
 std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning);

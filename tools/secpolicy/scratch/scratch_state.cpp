@@ -57,11 +57,14 @@ std::string ScratchState::WhyNoCopy() const {
   return "";
 }
 
-Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
-  const ScratchDirectory scratch;
-  const std::string copy = scratch.File("host.db");
+CopiedState::CopiedState(const std::string& path, LinuxHost::CopyOf what) {
+  const std::string copy = directory.File(kState);
   LinuxHost::CopyDatabase(path, what, copy);
-  const LinuxHost::UsedCopy used(copy, path);
+  used.emplace(copy, path);
+}
+
+Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what) {
+  const CopiedState copied(path, what);
   SecPolicy::TeskAccessInterfaceImpl access;
   return ReadInstalledPolicy(access);
 }

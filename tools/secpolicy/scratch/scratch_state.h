@@ -53,8 +53,19 @@ class ScratchState {
   LinuxHost::UsedCopy used;
 };
 
-// Reads the state at `path` from a copy, since even reading leaves traces beside a state. Throws
-// Braxo::Lib::BraxoException when it cannot be copied or used.
+// As long as it lives, this process works with a copy of the state at `path`, since even reading
+// leaves traces beside a state. Throws Braxo::Lib::BraxoException when that cannot be copied or
+// used.
+class CopiedState {
+ public:
+  CopiedState(const std::string& path, LinuxHost::CopyOf what);
+
+ private:
+  const ScratchDirectory directory;
+  std::optional<LinuxHost::UsedCopy> used;
+};
+
+// Reads the state at `path` from a copy. Throws as that does.
 Policy::InstalledPolicy ReadStateAt(const std::string& path, LinuxHost::CopyOf what);
 
 }  // namespace SecPolicyCli
