@@ -42,20 +42,32 @@ load helper
   shows "Policy set in the kernel"
 }
 
-@test "a domain is named by its number" {
+@test "a domain is named by its name or its number" {
   boot
+  secpolicy display sshDom
+  exits 0
+  local by_name=$output
+  [[ $(grep '^Domain Name: ' <<<"$output") == "Domain Name: sshDom "* ]]
+  secpolicy display "$(domain_id sshDom)"
+  [[ $output == "$by_name" ]]
+  secpolicy display --format json sshDom
+  [[ $(jq -c '.domains | map(.name)' <<<"$output") == '["sshDom"]' ]]
   for word in 3x 0x3 -3 +3 " 3" "" 4294967296; do
-    secpolicy display "$word"
-    wrong_usage display "DOMAIN_ID: '$word' is not the number of a domain; 'secpolicy display' shows the numbers"
+    secpolicy display -- "$word"
+    exits 2
+    [[ -z $output && $stderr == "secpolicy: display: there is no domain '$word'"* ]]
   done
   secpolicy display 4294967295
   exits 1
   says "Error: Failed to get policy for domain :domain 4294967295 is beyond the last slot 511"
-  secpolicy display sshDom
-  wrong_usage display "DOMAIN_ID: 'sshDom' is not the number of a domain; 'secpolicy display' shows the numbers"
+  secpolicy display sshDmo
+  wrong_usage display "display: there is no domain 'sshDmo'; did you mean 'sshDom'?"
 }
 
 @test "display where nothing was booted says what to do" {
+  secpolicy display sshDom
+  exits 1
+  [[ $stderr == "secpolicy: display: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]
   rm -r "$root/tardisks"
   secpolicy display
   exits 1

@@ -120,3 +120,12 @@ load helper
   secpolicy graph --format png
   wrong_usage graph "--format: png not in {dot,svg}"
 }
+
+@test "a domain is drawn by its number as by its name" {
+  boot
+  secpolicy graph --domain sshDom
+  exits 0
+  local by_name=$output
+  secpolicy graph --domain "$(domain_id sshDom)"
+  [[ $output == "$by_name" && $output == *sshDom* ]]
+}

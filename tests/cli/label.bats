@@ -525,3 +525,15 @@ index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
   jq -e '(.dryRun | not) and .changes == []' <<<"$output"
   [[ $(the_label /etc/ssh/host_key) == sshKey ]]
 }
+
+@test "a label can be given by its number" {
+  boot
+  local number
+  number=$("$SECPOLICY" --root "$root" display 2>/dev/null | sed -n 's/^sshKey (\([0-9]*\))$/\1/p')
+  secpolicy label set "$number" /etc/services.conf
+  exits 0
+  [[ $(the_label /etc/services.conf) == sshKey ]]
+  secpolicy label set 4000 /etc/services.conf
+  exits 1
+  ends_with "secpolicy: label set: there is no object label '4000'. 'secpolicy --root $root display' shows all labels"
+}

@@ -241,11 +241,11 @@ all" ]]
     secpolicy status --format json
     [[ $(jq -r .latestLoad.directory <<<"$output") == /other ]]
     secpolicy why sshDom call listen
-    [[ $output == *$'\n'"/other/domains/sshDom:"* ]]
+    [[ $output == *$'\n'"$root/other/domains/sshDom:"* ]]
   done
   secpolicy load link/../zorvan/secpolicy/
   secpolicy why sshDom call listen
-  [[ $output == *$'\n'"/link/../zorvan/secpolicy//domains/sshDom:"* ]]
+  [[ $output == *$'\n'"$root/link/../zorvan/secpolicy//domains/sshDom:"* ]]
 }
 
 # without_memory STATEMENT: sets `breakage`, below which no memory is left when the state is asked this.

@@ -55,9 +55,47 @@ as_nobody() {
 @test "an ordinary user without a root is told what to do" {
   [[ $(id -u) -eq 0 ]] || skip "needs root to become an ordinary user without a state"
   share_command
-  run --separate-stderr as_nobody "$SECPOLICY" restore
+  run --separate-stderr as_nobody "$SECPOLICY" settings enforcement appDom permissive
   exits 1
   [[ ${stderr##*$'\n'} == *"You are not root: run it as root, or give --root DIR to work below a directory of yours." ]]
+}
+
+@test "an ordinary user below another user's root is told that once, and nothing else" {
+  [[ $(id -u) -eq 0 ]] || skip "needs root to own the root"
+  as_nobody unshare --user true || skip "this machine allows no user namespaces"
+  boot
+  share_command
+  local verb unreadable="Unable to use the host state /run/secpolicy/host.db: unable to open database file"
+  local cause="This root is another user's: run it as that user, or as root."
+  for verb in status graph "why sshDom read /etc" "domain list" "rules --call mount" "path hostDom sshDom" \
+    "file-policy list sshDom" "domain show sshDom"; do
+    # shellcheck disable=SC2086
+    run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb
+    exits 1
+    [[ -z $output && $stderr == "secpolicy: $unreadable. $cause" ]]
+  done
+  for verb in restore display "domain create job7" "label get /etc" boot "boot --plan"; do
+    # shellcheck disable=SC2086
+    run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb
+    exits 1
+    [[ -z $output && $stderr == "secpolicy: "*": $unreadable. $cause" && $(wc -l <<<"$stderr") -eq 1 ]]
+  done
+  run --separate-stderr as_nobody "$SECPOLICY" --root "$root" domain of 1
+  exits 1
+  [[ $stderr == "secpolicy: domain of: Unable to get domain ID: "*". $cause" ]]
+  run --separate-stderr as_nobody "$SECPOLICY" --root "$root" new domain webDom
+  ends_with "secpolicy: new domain: cannot make /etc/zorvan/secpolicy/domains/webDom: Permission denied. $cause"
+  # A root of the user's own that was never booted is no matter of rights.
+  mkdir -p "$BATS_TEST_TMPDIR/own/run"
+  chown -R 65534:65534 "$BATS_TEST_TMPDIR/own"
+  for verb in restore "domain list" graph; do
+    # shellcheck disable=SC2086
+    run --separate-stderr as_nobody "$SECPOLICY" --root "$BATS_TEST_TMPDIR/own" $verb
+    exits 1
+    [[ $stderr == "secpolicy: $verb: nothing is installed below this root. "* && $stderr != *"not root"* ]]
+  done
+  run --separate-stderr as_nobody "$SECPOLICY" --root "$root" settings unset enforcement appDom
+  [[ $stderr != *"nothing is stored"*"user's"* ]]
 }
 
 @test "SECPOLICY_HOST_STATE moves the state" {

@@ -5,10 +5,9 @@ load helper
 
 setup() {
   make_root
+  domains=$policy/domains
   boot
 }
-
-domains=/etc/zorvan/secpolicy/domains
 
 # places DOMAIN PATTERN...: the lines of its policy file that match, as they are told.
 places() {

@@ -192,3 +192,27 @@ kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 
   secpolicy settings list
   answers 0 "enforcement notYet permissive"
 }
+
+@test "a domain that is installed can be named by its number" {
+  boot
+  secpolicy settings enforcement "$(domain_id appDom)" permissive
+  exits 0
+  secpolicy settings list
+  answers 0 "enforcement appDom permissive"
+  secpolicy settings enforcement "$(domain_id appDom)"
+  answers 0 permissive
+  secpolicy settings unset enforcement "$(domain_id appDom)"
+  exits 0
+  secpolicy settings list
+  [[ -z $output ]]
+  secpolicy settings enforcement 400 permissive
+  exits 1
+  ends_with "secpolicy: settings: there is no domain '400', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
+}
+
+@test "restore where nothing is installed says what to do" {
+  secpolicy restore
+  exits 1
+  [[ $stderr == "secpolicy: restore: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]
+  [[ ! -e $root/run/secpolicy ]]
+}

@@ -2,10 +2,8 @@
 
 load helper
 
-shown=/etc/zorvan/secpolicy
-
 # at FILE TEXT: the place of the line of the policy that begins with the text.
-at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tail -n 1 | cut -d : -f 1)"; }
+at() { printf '%s/%s:%s: ' "$policy" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tail -n 1 | cut -d : -f 1)"; }
 
 @test "the domains that may, each with its rule" {
   boot

@@ -2,11 +2,9 @@
 
 load helper
 
-shown=/etc/zorvan/secpolicy
-
 # at FILE TEXT: the place of the line of the policy that begins with the text, and what follows a
 # place in an answer.
-at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tail -n 1 | cut -d : -f 1)"; }
+at() { printf '%s/%s:%s: ' "$policy" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tail -n 1 | cut -d : -f 1)"; }
 
 @test "yes, with the rules and the label of a file" {
   boot
@@ -35,7 +33,7 @@ at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tai
   boot
   secpolicy why sshDom read /etc/services.conf/
   answers 1 "no: sshDom may not read /etc/services.conf/" \
-    "missing in $shown/domains/sshDom, one of:" \
+    "missing in $policy/domains/sshDom, one of:" \
     "  -r /etc/services.conf r" \
     "  -a hostConfig read grant" \
     "label: hostConfig" \
@@ -50,7 +48,7 @@ at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tai
     exits 1
     rule=$(sed -n 's/^  instead: //p; s/^  \(-\)/\1/p' <<<"$output" | head -n 1)
     [[ -n $rule ]]
-    line=$(sed -n "2s|^$shown/domains/$domain:\([0-9]*\): .*|\1|p" <<<"$output")
+    line=$(sed -n "2s|^$policy/domains/$domain:\([0-9]*\): .*|\1|p" <<<"$output")
     # The file stays the same one, with its label.
     { sed "${line:-999}d" "$policy/domains/$domain"; echo "$rule"; } >"$BATS_TEST_TMPDIR/edited"
     cat "$BATS_TEST_TMPDIR/edited" >"$policy/domains/$domain"
@@ -58,7 +56,7 @@ at() { printf '%s/%s:%s: ' "$shown" "$1" "$(grep -nE -- "^$2" "$policy/$1" | tai
     secpolicy why "$domain" $question
     exits 0
     shows "yes: $domain may $question"
-    shows "$shown/domains/$domain:$(wc -l <"$policy/domains/$domain"): $rule"
+    shows "$policy/domains/$domain:$(wc -l <"$policy/domains/$domain"): $rule"
   done <<'END'
 sshDom|read /etc/services.conf
 monitorDom|exec /opt/monitor/spool
@@ -151,7 +149,7 @@ END
   boot
   secpolicy why hostDom call mount
   answers 0 "yes: hostDom may call mount: it is permissive, so nothing is refused to it; its rules would refuse this" \
-    "missing in $shown/domains/hostDom:" "  -s mount grant"
+    "missing in $policy/domains/hostDom:" "  -s mount grant"
   "$SECPOLICY" --root "$root" settings enforcement sshDom disabled
   "$SECPOLICY" --root "$root" restore 2>/dev/null
   secpolicy why sshDom use cap_setuid
@@ -166,7 +164,7 @@ END
     "$(at domains/sshDom '-r /etc/ssh')-r /etc/ssh r" \
     "file: there is nothing at /etc/ssh/none under this root"
   secpolicy why sshDom read /opt
-  answers 1 "no: sshDom may not read /opt" "missing in $shown/domains/sshDom:" "  -r /opt r" "label: unlabeled"
+  answers 1 "no: sshDom may not read /opt" "missing in $policy/domains/sshDom:" "  -r /opt r" "label: unlabeled"
 }
 
 @test "a rule that no file brought, and partner and early domains" {
@@ -174,16 +172,16 @@ END
   secpolicy why daemonFrameworkDom enter appDom
   answers 0 "yes: daemonFrameworkDom may enter appDom" "(no policy file): -d tardiskDefault appDom tardisk_exec grant"
   secpolicy why plugin-cache call mount
-  shows "missing in $shown/domains/plugins/cache:"
+  shows "missing in $policy/domains/plugins/cache:"
   secpolicy why bootDom call mount
-  shows "missing in $shown/early/domains/bootDom:"
+  shows "missing in $policy/early/domains/bootDom:"
 }
 
 @test "entering a domain that nobody enters names the place for an object" {
   : >"$policy/domains/lonelyDom"
   boot
   secpolicy why sshDom enter lonelyDom
-  answers 1 "no: sshDom may not enter lonelyDom" "missing in $shown/domains/sshDom:" "  -d OBJECT lonelyDom exec grant"
+  answers 1 "no: sshDom may not enter lonelyDom" "missing in $policy/domains/sshDom:" "  -d OBJECT lonelyDom exec grant"
 }
 
 @test "one transition is enough, and a revoked one alone is not" {
@@ -316,4 +314,11 @@ END
   secpolicy why appDom call mmap
   exits 1
   shows "  instead: -s mmap grant"
+}
+
+@test "a domain is named by its name or its number, and what was written by its place in the root" {
+  boot
+  secpolicy why "$(domain_id sshDom)" use cap_net_bind_service
+  answers 0 "yes: sshDom may use cap_net_bind_service" \
+    "$root/etc/zorvan/secpolicy/domains/sshDom:$(grep -n cap_net_bind "$policy/domains/sshDom" | cut -d: -f1): -c cap_net_bind_service grant"
 }

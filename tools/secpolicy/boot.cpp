@@ -12,6 +12,7 @@
 #include "kitlibs/file.h"
 #include "load/load_run.h"
 #include "policy_dir.h"
+#include "root.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
@@ -81,7 +82,7 @@ ExitCode Plan(const Options& options) {
       WriteBootPlanText(plan, MostShown(options), std::cout);
     }
   } catch (const Braxo::Lib::BraxoException& failure) {
-    return Refuse("boot", failure.what());
+    return Refuse("boot", WithAdvice(failure.what()));
   }
   Summarize("boot", "this was a plan: nothing was changed");
   return kWell;

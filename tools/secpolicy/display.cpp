@@ -10,6 +10,8 @@
 #include "installed/installed_json.h"
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
+#include "query/ask.h"
+#include "query/question.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
@@ -18,14 +20,14 @@
 namespace SecPolicyCli {
 namespace {
 
-// The library shows domain 0 for every text that is not a number, which is no answer to a misspelt
-// question.
-std::string CheckDomainId(const std::string& text) {
+// The library knows domains by their numbers, and shows nothing for one that no domain has.
+std::string NumberOf(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access) {
   unsigned int id = 0;
-  const char* const end = text.data() + text.size();
-  const auto read = std::from_chars(text.data(), end, id);
-  if (read.ec == std::errc() && read.ptr == end) return "";
-  return "'" + text + "' is not the number of a domain; 'secpolicy display' shows the numbers";
+  if (access.FindDomain(word, &id)) return std::to_string(id);
+  const char* const end = word.data() + word.size();
+  const auto read = std::from_chars(word.data(), end, id);
+  if (read.ec != std::errc() || read.ptr != end) RefuseDomain(word, access);
+  return word;
 }
 
 std::string Advise() {
@@ -57,23 +59,32 @@ void WriteJson(const std::string& domainId, SecPolicy::PolicyObserver& observer)
   std::cout << json.Text();
 }
 
+ExitCode Display(const std::string& domainId, const std::string& format) {
+  return CallLibrary(
+      "display",
+      [&](ErrorList& errors) {
+        // A load may end meanwhile.
+        const LinuxHost::StableView view(LinuxHost::CurrentState());
+        if (format == "json") return WriteJson(domainId, errors);
+        SecPolicy::DisplayPolicy(domainId, errors);
+      },
+      Advise);
+}
+
+ExitCode DisplayDomain(const std::string& word, const std::string& format) {
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return Display(NumberOf(word, access), format);
+}
+
 Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
   const auto format = std::make_shared<std::string>();
-  syntax.AddOption("DOMAIN_ID", *domain, "The number of one domain; all domains without it")
-      .Check(CheckDomainId);
+  const Option given = syntax.AddOption(
+      "DOMAIN", *domain, "One domain, by its name or its number; all domains without it");
   syntax.AddFormat(*format, "it", {"text", "json"});
-  return [domain, format] {
-    void (*show)(const std::string&, SecPolicy::PolicyObserver&) = SecPolicy::DisplayPolicy;
-    if (*format == "json") show = WriteJson;
-    return CallLibrary(
-        "display",
-        [&](ErrorList& errors) {
-          // A load may end meanwhile.
-          const LinuxHost::StableView view(LinuxHost::CurrentState());
-          show(*domain, errors);
-        },
-        Advise);
+  return [=] {
+    if (!given.IsGiven()) return Display("", *format);
+    return Ask("display", [=] { return DisplayDomain(*domain, *format); });
   };
 }
 
@@ -87,7 +98,7 @@ const Verb kDisplay = {
     "\n"
     "Examples:\n"
     "  secpolicy display                    everything\n"
-    "  secpolicy display 3                  only the domain with the identifier 3\n"
+    "  secpolicy display sshDom             only one domain, or by its number: display 8\n"
     "  secpolicy display | grep '^-c'       all capability rules\n"
     "  secpolicy display --format json | jq '.objects | length'",
     Define};

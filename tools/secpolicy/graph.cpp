@@ -9,6 +9,7 @@
 #include "graph/policy_graph.h"
 #include "installed/installed_policy.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "query/question.h"
 #include "verb.h"
 
@@ -18,7 +19,8 @@ namespace {
 DotGraph Draw(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
   const Policy::InstalledPolicy policy = ReadInstalledPolicy(access);
   if (name.empty()) return DrawDomains(policy);
-  const auto domain = std::ranges::find(policy.domains, name, &Policy::InstalledDomain::name);
+  const unsigned int id = FindDomain(name, access).id;
+  const auto domain = std::ranges::find(policy.domains, id, &Policy::InstalledDomain::id);
   if (domain == policy.domains.end()) RefuseDomain(name, access);
   return DrawDomain(*domain, policy);
 }
@@ -41,7 +43,9 @@ ExitCode Graph(const std::string& name, const std::string& format) {
 Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
   const auto format = std::make_shared<std::string>();
-  syntax.AddOption("--domain", *domain, "Draw only this domain, with all that it may reach")
+  syntax
+      .AddOption("--domain", *domain,
+                 "Draw only this domain, by its name or its number, with all that it may reach")
       .NameValue("DOMAIN");
   syntax.AddFormat(*format, "the graph", {"dot", "svg"});
   return [=] { return Ask("graph", [=] { return Graph(*domain, *format); }); };

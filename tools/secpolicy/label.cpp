@@ -79,7 +79,8 @@ constexpr LabelKind kLabelKinds[] = {
      "  secpolicy label set -R ioFilterData /var/cache/io-filters",
      [](Syntax& syntax, Arguments& arguments) {
        AddWholeTrees(syntax, arguments);
-       syntax.AddOption("LABEL", arguments.label, "The object label").Require();
+       syntax.AddOption("LABEL", arguments.label, "The object label, by its name or its number")
+           .Require();
        AddPaths(syntax, arguments, "The files", true);
      },
      [](LabelRun& run, const Arguments& arguments) {

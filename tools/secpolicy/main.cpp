@@ -97,9 +97,8 @@ int Run(int argc, char** argv) {
     if (commandLine.IsVerbose()) shown.emplace();
     return FlushOutput(commandLine.Act());
   } catch (const std::exception& failure) {
-    const std::string advice = isInRoot ? AdviseOnPrivilege() : "";
-    std::cerr << "secpolicy: " << VisibleLines(failure.what()) << (advice.empty() ? "" : ". ")
-              << advice << std::endl;
+    const std::string message = isInRoot ? WithAdvice(failure.what()) : failure.what();
+    std::cerr << "secpolicy: " << VisibleLines(message) << std::endl;
     return kFailed;
   }
 }

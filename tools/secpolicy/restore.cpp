@@ -2,7 +2,6 @@
 #include <map>
 #include <vector>
 
-#include "braxo/lib/exception.h"
 #include "ending.h"
 #include "enforce/published.h"
 #include "error_list.h"
@@ -32,14 +31,9 @@ void TellOfOlderLevels() {
             << Call("status") << " lists each, and a new start takes the new level" << std::endl;
 }
 
-// None of a state that cannot be read, which the library tells.
 std::vector<Policy::InstalledDomain> ListDomains() {
-  try {
-    SecPolicy::TeskAccessInterfaceImpl access;
-    return Policy::ListDomains(access);
-  } catch (const Braxo::Lib::BraxoException&) {
-    return {};
-  }
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return Policy::ListDomains(access);
 }
 
 // Writes a line for each domain that has another level than it had in `before`, and returns how
@@ -59,6 +53,7 @@ std::size_t TellOfChanges(const std::vector<Policy::InstalledDomain>& before) {
 }
 
 ExitCode Restore() {
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState("restore");
   std::size_t changed = 0;
   const ExitCode end = CallLibrary(
       "restore",

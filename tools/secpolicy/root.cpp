@@ -1,6 +1,7 @@
 #include "root.h"
 
 #include <sched.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -19,6 +20,9 @@ using LinuxHost::ThrowErrno;
 
 // As it was given; nothing while none was entered.
 std::optional<std::string> enteredRoot;
+
+// Whether another user has that directory; to be asked before a namespace hides who.
+bool isRootOfOther = false;
 
 void WriteProcFile(const char* path, const std::string& text) {
   std::ofstream file(path);
@@ -52,6 +56,8 @@ bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
 
 void EnterRoot(const std::string& directory) {
   if (chdir(directory.c_str()) != 0) ThrowErrno("cannot enter the root ", directory);
+  struct stat status {};
+  isRootOfOther = stat(".", &status) == 0 && status.st_uid != geteuid();
   if (!MakeRoot()) {
     if (errno != EPERM) ThrowErrno("cannot enter the root ", directory);
     EnterUserNamespace();
@@ -75,8 +81,15 @@ std::string OutsidePath(const std::string& path) {
 }
 
 std::string AdviseOnPrivilege() {
-  if (enteredRoot || geteuid() == 0) return "";
+  if (geteuid() == 0) return "";
+  if (isRootOfOther) return "This root is another user's: run it as that user, or as root.";
+  if (enteredRoot) return "";
   return "You are not root: run it as root, or give --root DIR to work below a directory of yours.";
+}
+
+std::string WithAdvice(const std::string& failure) {
+  const std::string advice = AdviseOnPrivilege();
+  return advice.empty() ? failure : failure + ". " + advice;
 }
 
 }  // namespace SecPolicyCli

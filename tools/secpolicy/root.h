@@ -16,8 +16,11 @@ std::string Call(const std::string& words);
 // The path by which a file below the root that was entered is known to whom the command is for.
 std::string OutsidePath(const std::string& path);
 
-// What to try after a failure that the rights of the user can explain; nothing for root and for
-// who has entered a root.
+// What to try after a failure that the rights of the user can explain; nothing for root, and for
+// who has entered a root of its own.
 std::string AdviseOnPrivilege();
+
+// The message of a failure with that behind it.
+std::string WithAdvice(const std::string& failure);
 
 }  // namespace SecPolicyCli

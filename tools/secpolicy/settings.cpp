@@ -11,6 +11,8 @@
 #include "host/linux/operation/state_use.h"
 #include "json.h"
 #include "policy/installed_policy.h"
+#include "query/named.h"
+#include "query/question.h"
 #include "root.h"
 #include "secpolicy/secpolicy.h"
 #include "text/suggestion.h"
@@ -49,23 +51,47 @@ void StoreOption(const std::string& path, const std::string& value) {
   LinuxHost::StoreWantedOption(path, LinuxHost::ParseOptionValue(value));
 }
 
+// The name of the domain that has the number `word`; any other word names itself.
+std::string NameOf(const std::string& word) {
+  const bool isNumber = word.find_first_not_of("0123456789") == std::string::npos;
+  if (!isNumber || LinuxHost::IsStateMissing()) return word;
+  SecPolicy::TeskAccessInterfaceImpl access;
+  try {
+    return FindDomain(word, access).name;
+  } catch (const QuestionError&) {
+    return word;
+  }
+}
+
+// What is stored by a word comes before what the word names: that domain may have gone.
+std::optional<std::string> FindEnforcement(const std::string& domain) {
+  const auto level = LinuxHost::FindWantedEnforcement(domain);
+  return level ? level : LinuxHost::FindWantedEnforcement(NameOf(domain));
+}
+
+bool RemoveEnforcement(const std::string& domain) {
+  return LinuxHost::RemoveWantedEnforcement(domain) ||
+         LinuxHost::RemoveWantedEnforcement(NameOf(domain));
+}
+
 // A level may be stored for a domain that a boot is to bring, but hardly for one that none brought.
 void StoreEnforcement(const std::string& domain, const std::string& level) {
+  const std::string name = NameOf(domain);
   if (!LinuxHost::IsStateMissing()) {
     SecPolicy::TeskAccessInterfaceImpl access;
     std::vector<std::string> names;
     for (const Policy::InstalledDomain& installed : Policy::ListDomains(access)) {
       names.push_back(installed.name);
     }
-    if (std::ranges::find(names, domain) == names.end()) {
-      const std::string nearest = NearestWord(domain, names);
+    if (std::ranges::find(names, name) == names.end()) {
+      const std::string nearest = NearestWord(name, names);
       throw Braxo::Lib::BraxoException(
-          "there is no domain '" + domain + "', so nothing was stored. " +
+          "there is no domain '" + name + "', so nothing was stored. " +
           (nearest.empty() ? Call("status") + " counts those that there are"
                            : "Did you mean '" + nearest + "'?"));
     }
   }
-  LinuxHost::StoreWantedEnforcement(domain, level);
+  LinuxHost::StoreWantedEnforcement(name, level);
 }
 
 Offer OfferOptions(const std::vector<std::string>& /*before*/) {
@@ -83,9 +109,10 @@ constexpr Setting kSettingKinds[] = {
      "The option, such as /UserVars/CheckAccessTemplateEnabled", "VALUE",
      "What to store: a whole number, or any other text", FindOption, StoreOption,
      LinuxHost::RemoveWantedOption, OfferOptions},
-    {"enforcement", "The level that 'restore' gives a domain", "DOMAIN", "The name of the domain",
-     "LEVEL", "What to store: enforcing, permissive or disabled", LinuxHost::FindWantedEnforcement,
-     StoreEnforcement, LinuxHost::RemoveWantedEnforcement, OfferDomains},
+    {"enforcement", "The level that 'restore' gives a domain", "DOMAIN",
+     "The domain, by its name or its number", "LEVEL",
+     "What to store: enforcing, permissive or disabled", FindEnforcement, StoreEnforcement,
+     RemoveEnforcement, OfferDomains},
 };
 
 ExitCode Show(const Setting& setting, const std::string& key) {
@@ -118,13 +145,11 @@ Action DefineSetting(const Setting& setting, Syntax& syntax) {
 
 ExitCode Unset(const std::string& kind, const std::string& key) {
   const auto setting = std::ranges::find(kSettingKinds, kind, &Setting::name);
+  if (!setting->find(key)) {
+    return Refuse("settings unset", "nothing is stored for " + kind + " " + key);
+  }
   return CallLibrary(
-      "settings unset",
-      [&](ErrorList&) {
-        if (setting->remove(key)) return;
-        throw Braxo::Lib::BraxoException("nothing is stored for " + kind + " " + key);
-      },
-      AdviseOnPrivilege);
+      "settings unset", [&](ErrorList&) { setting->remove(key); }, AdviseOnPrivilege);
 }
 
 std::string CheckSettingKind(const std::string& kind) {

@@ -8,6 +8,7 @@
 #include "installed/installed_policy.h"
 #include "query/answer.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "query/question.h"
 #include "verb.h"
 
@@ -17,7 +18,7 @@ namespace {
 ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
                 const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const auto domain = ReadInstalledDomain(name, access);
+  const auto domain = ReadInstalledDomain(FindDomain(name, access).name, access);
   if (!domain) RefuseDomain(name, access);
   const Question question = ReadQuestion(words, access);
   const Policy::Decision decision = Policy::Decide(question.asked, *domain);
@@ -32,7 +33,8 @@ ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
 Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
   const auto words = std::make_shared<std::vector<std::string>>();
-  syntax.AddOption("DOMAIN", *domain, "The domain that is asked about").Require();
+  syntax.AddOption("DOMAIN", *domain, "The domain that is asked about, by its name or its number")
+      .Require();
   syntax.AddList("WHAT", *words, "What it does, see below").Require();
   const auto format = AddAnswerFormat(syntax);
   return [=] { return Ask("why", [=] { return Answer(*domain, *words, *format); }); };

@@ -5,6 +5,7 @@
 #include "enforce/published.h"
 #include "host/linux/operation/label_index.h"
 #include "label_actions.h"
+#include "query/named.h"
 #include "root.h"
 #include "secpolicy/observed/policy_lines.h"
 #include "text/suggestion.h"
@@ -31,6 +32,12 @@ using Braxo::Lib::BraxoException;
                                                   : ". Did you mean '" + nearest + "'?"));
 }
 
+std::string NameOf(LabelRun& run, const std::string& label, const std::vector<std::string>& paths) {
+  if (run.FindLabel(label) != kNoSuchLabel) return label;
+  if (const auto name = FindObjectByNumber(label, run.access)) return *name;
+  RefuseLabel(run, label, paths);
+}
+
 void GiveLabelTo(LabelRun& run, const std::string& label, const std::string& path,
                  bool wholeTrees) {
   std::error_code ignored;
@@ -51,8 +58,8 @@ void GiveLabelTo(LabelRun& run, const std::string& label, const std::string& pat
 
 std::string GiveLabel(LabelRun& run, const std::string& label,
                       const std::vector<std::string>& paths, bool wholeTrees) {
-  if (run.FindLabel(label) == kNoSuchLabel) RefuseLabel(run, label, paths);
-  for (const std::string& path : paths) GiveLabelTo(run, label, path, wholeTrees);
+  const std::string name = NameOf(run, label, paths);
+  for (const std::string& path : paths) GiveLabelTo(run, name, path, wholeTrees);
   LinuxHost::RefreshLabelIndex();
   PublishPlansOrTell("label set");
   return "done";

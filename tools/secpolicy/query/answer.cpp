@@ -2,6 +2,7 @@
 
 #include "installed/installed_json.h"
 #include "policy_dir.h"
+#include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/visible.h"
 
@@ -14,7 +15,7 @@ using Policy::Rule;
 using Policy::Vote;
 
 std::string PlaceOf(const std::string& file, unsigned int line) {
-  return file + ":" + std::to_string(line) + ": ";
+  return OutsidePath(file) + ":" + std::to_string(line) + ": ";
 }
 
 std::string CiteOrigin(const LinuxHost::LabelOrigin& origin) {
@@ -50,7 +51,8 @@ std::string PolicyFileOf(const InstalledDomain& domain) {
 void WriteMissing(const InstalledDomain& domain, const Decision& decision, std::ostream& output) {
   if (decision.missing.empty()) return;
   const bool choice = decision.missing.size() > 1;
-  WriteLine(output, "missing in " + PolicyFileOf(domain) + (choice ? ", one of:" : ":"));
+  WriteLine(output,
+            "missing in " + OutsidePath(PolicyFileOf(domain)) + (choice ? ", one of:" : ":"));
   for (const Rule& rule : decision.missing) WriteLine(output, "  " + rule.Text());
 }
 

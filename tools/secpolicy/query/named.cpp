@@ -11,6 +11,8 @@ namespace {
 
 using SecPolicy::TeskAccessInterfaceImpl;
 
+constexpr auto kObjects = TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
+
 std::optional<unsigned int> ReadNumber(const std::string& word) {
   unsigned int number = 0;
   const char* const end = word.data() + word.size();
@@ -40,15 +42,23 @@ NamedDomain FindDomain(const std::string& word, TeskAccessInterfaceImpl& access)
   RefuseDomain(word, access);
 }
 
-std::string FindObject(const std::string& word, TeskAccessInterfaceImpl& access) {
-  const auto objects = access.GetKeywordsMap(TeskCtl::Security::TESKACCESS_KEYWORD_LABEL);
-  if (objects.contains(word)) return word;
+std::optional<std::string> FindObjectByNumber(const std::string& word,
+                                              TeskAccessInterfaceImpl& access) {
   const auto number = ReadNumber(word);
-  std::vector<std::string> names;
-  for (const auto& [name, id] : objects) {
-    if (number && id == static_cast<long>(*number)) return name;
-    names.push_back(name);
+  if (!number) return std::nullopt;
+  for (const auto& [name, id] : access.GetKeywordsMap(kObjects)) {
+    if (id == static_cast<long>(*number)) return name;
   }
+  return std::nullopt;
+}
+
+std::string FindObject(const std::string& word, TeskAccessInterfaceImpl& access) {
+  const auto objects = access.GetKeywordsMap(kObjects);
+  if (objects.contains(word)) return word;
+  if (const auto name = FindObjectByNumber(word, access)) return *name;
+  std::vector<std::string> names;
+  names.reserve(objects.size());
+  for (const auto& [name, id] : objects) names.push_back(name);
   RefuseWord("object", word, names);
 }
 

@@ -1,11 +1,13 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "secpolicy/secpolicy.h"
 
 // What people name by its name or its number. A name counts before a number that is written the
-// same. Both throw QuestionError, with the nearest name, when there is no such thing.
+// same. What returns no optional throws QuestionError, with the nearest name, when there is no such
+// thing.
 namespace SecPolicyCli {
 
 struct NamedDomain {
@@ -14,6 +16,10 @@ struct NamedDomain {
 };
 
 NamedDomain FindDomain(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The name of the object label with the number `word`; nothing when there is none.
+std::optional<std::string> FindObjectByNumber(const std::string& word,
+                                              SecPolicy::TeskAccessInterfaceImpl& access);
 
 // The name of an object label.
 std::string FindObject(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);

@@ -32,9 +32,7 @@ bool IsMissing(const std::error_code& failure) {
 }
 
 [[noreturn]] void ThrowUnreadable(const std::string& path, const std::error_code& failure) {
-  const std::string advice = AdviseOnPrivilege();
-  throw std::runtime_error("cannot look for " + path + ": " + failure.message() +
-                           (advice.empty() ? "" : ". " + advice));
+  throw std::runtime_error(WithAdvice("cannot look for " + path + ": " + failure.message()));
 }
 
 // What lies at `path`; nothing when nothing does.
