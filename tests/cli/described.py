@@ -13,7 +13,7 @@ problems = []
 # Values whose words are nobody's to know: numbers, letters, any text; and new names.
 FREE = {"N", "NUMBER", "PERMISSIONS", "PID", "SERVICE", "VALUE"}
 NAMES = {"new domain", "domain create"}
-GLOBAL = {"help", "version", "root", "verbose"}
+GLOBAL = {"help", "version", "root", "verbose", "color", "no-pager"}
 
 
 def output_of(*words):

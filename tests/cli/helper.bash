@@ -142,3 +142,15 @@ complete_line() {
   COMP_POINT=${#COMP_LINE}
   _secpolicy "$SECPOLICY" "${*: -1}"
 }
+
+# on_terminal ARGUMENT...: runs the verb with both outputs on a terminal of $size, after which $keys are
+# typed, and keeps in `screen` what came there. Ends as the verb does.
+on_terminal() {
+  TERM=xterm timeout 60 python3 "$SOURCE/tests/cli/on_terminal.py" "$BATS_TEST_TMPDIR/screen" "${size-0x0}" "${keys-}" \
+    "$SECPOLICY" --root "$root" "$@"
+}
+
+# without_colors FILE: what is in it beside colors.
+without_colors() {
+  sed $'s/\e\\[[0-9;]*m//g' "$1"
+}

@@ -38,29 +38,6 @@ is_quiet() {
   is_safe "$BATS_TEST_TMPDIR/out" "$BATS_TEST_TMPDIR/err"
 }
 
-# on_terminal ARGUMENT...: runs the verb with both outputs on a terminal, and keeps in `screen` what
-# came there.
-on_terminal() {
-  python3 - "$BATS_TEST_TMPDIR/screen" "$SECPOLICY" --root "$root" "$@" <<'END'
-import os, pty, sys
-child, terminal = pty.fork()
-if child == 0:
-    os.execv(sys.argv[2], sys.argv[2:])
-shown = b""
-while True:
-    try:
-        piece = os.read(terminal, 65536)
-    except OSError:
-        break
-    if not piece:
-        break
-    shown += piece
-os.waitpid(child, 0)
-# The terminal itself makes a carriage return of every line end.
-open(sys.argv[1], "wb").write(shown.replace(b"\r\n", b"\n"))
-END
-}
-
 @test "display keeps every byte where it does not go to a terminal" {
   "$SECPOLICY" --root "$root" display >"$BATS_TEST_TMPDIR/out" 2>/dev/null
   for bytes in "$ESCAPE" "$SECOND" "$BYTE" "$TURN"; do
@@ -69,7 +46,7 @@ END
 }
 
 @test "on a terminal, display shows them" {
-  on_terminal display
+  on_terminal --no-pager display
   is_safe "$BATS_TEST_TMPDIR/screen"
   for shown in '^[]0;x^G' '<U+009B>31m' '<9B>31m' '<U+202E>'; do
     grep -qF -- "-r /x$shown r" "$BATS_TEST_TMPDIR/screen"
@@ -79,19 +56,29 @@ END
 @test "on a terminal, the errors and the progress of a load show them" {
   printf '%s\n' "/nope$SECOND unlabeled" "/nope$ESCAPE unlabeled" >"$policy/fileLabels/odd"
   echo "-s x$TURN grant" >>"$policy/domains/appDom"
-  on_terminal -v load
+  on_terminal -v load || true
   is_safe "$BATS_TEST_TMPDIR/screen"
   grep -qF 'for file /nope<U+009B>31m' "$BATS_TEST_TMPDIR/screen"
   grep -qF "x<U+202E>" "$BATS_TEST_TMPDIR/screen"
 }
 
-@test "on a terminal, everything else is as elsewhere" {
+@test "on a terminal that is wide enough, everything else is as elsewhere but colored" {
   local verb
-  for verb in "who-can use cap_net_bind_service" status "why sshDom read /etc/ssh" --help "check --format json"; do
-    on_terminal $verb
+  for verb in "who-can use cap_net_bind_service" status "why sshDom read /etc/ssh" --help "check --format json" check; do
+    size=200x500 on_terminal $verb || true
     "$SECPOLICY" --root "$root" $verb >"$BATS_TEST_TMPDIR/out" 2>&1 || true
+    diff "$BATS_TEST_TMPDIR/out" <(without_colors "$BATS_TEST_TMPDIR/screen")
+    size=200x500 NO_COLOR=1 on_terminal $verb || true
     diff "$BATS_TEST_TMPDIR/out" "$BATS_TEST_TMPDIR/screen"
   done
+}
+
+@test "colored or not, a name commands no terminal" {
+  on_terminal why "sshDom" read "/x$ESCAPE$SECOND" || true
+  is_safe <(without_colors "$BATS_TEST_TMPDIR/screen")
+  "$SECPOLICY" --root "$root" --color always check >"$BATS_TEST_TMPDIR/out" 2>&1 || true
+  grep -q $'\e' "$BATS_TEST_TMPDIR/out"
+  is_safe <(without_colors "$BATS_TEST_TMPDIR/out")
 }
 
 @test "what the verbs write themselves is safe everywhere" {

@@ -6,6 +6,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <iostream>
 
 namespace {
 
@@ -93,7 +94,8 @@ class CommandLineTest : public testing::Test {
                    [](std::string& word) { return word.data(); });
     testing::internal::CaptureStdout();
     testing::internal::CaptureStderr();
-    const auto end = line->Read(static_cast<int>(words.size()), arguments.data());
+    const auto end = line->Read(static_cast<int>(words.size()), arguments.data(),
+                                [](const std::string& text) { std::cout << text; });
     output = testing::internal::GetCapturedStdout();
     error = testing::internal::GetCapturedStderr();
     return end;
@@ -109,6 +111,8 @@ TEST_F(CommandLineTest, LeavesWhatIsNotGiven) {
   EXPECT_EQ(&line->AskedVerb(), &kPaint);
   EXPECT_EQ(line->Root(), std::nullopt);
   EXPECT_FALSE(line->IsVerbose());
+  EXPECT_EQ(line->ColorChoice(), "auto");
+  EXPECT_TRUE(line->IsPagerWanted());
   EXPECT_EQ(line->Act(), kFailed);
   EXPECT_FALSE(given.isVerbose);
   EXPECT_FALSE(given.thick);
@@ -143,7 +147,8 @@ TEST_F(CommandLineTest, TellsWhatStandsBehindTheFirstDashes) {
 }
 
 TEST_F(CommandLineTest, TakesTheCommonOptionsBehindTheVerb) {
-  EXPECT_EQ(Read({"paint", "north", "--root", "", "-v"}), std::nullopt);
+  EXPECT_EQ(Read({"paint", "north", "--root", "", "-v", "--no-pager"}), std::nullopt);
+  EXPECT_FALSE(line->IsPagerWanted());
   EXPECT_EQ(line->Root(), "");
   EXPECT_TRUE(line->IsVerbose());
   line->Act();
@@ -187,7 +192,7 @@ TEST_F(CommandLineTest, KnowsWhatCanStandOnALineThatIsNotComplete) {
       {{"paint", ""}, {"door"}, {}},
       {{"paint", "north", "--thin", "--root", "/r", "south", ""}, {"door"}, {"north", "south"}},
       {{"paint", "north", "--", "-"}, {"door"}, {}},
-      {{"carve", "bowl", "oak", ""}, {"--help"}, {}},
+      {{"carve", "bowl", "oak", ""}, {"--help", "--color"}, {}},
   };
   for (const auto& [words, offered, before] : table) {
     line.emplace(SecPolicyCli::Description{"Tests.", "The end.", "secpolicy 1.2.3"}, kVerbs);
@@ -199,7 +204,7 @@ TEST_F(CommandLineTest, KnowsWhatCanStandOnALineThatIsNotComplete) {
         found.push_back(place.fixed + each.word);
     }
     std::erase_if(found, [](const std::string& word) {
-      return word == "--root" || word == "--verbose" || word == "--version";
+      return word == "--root" || word == "--verbose" || word == "--version" || word == "--no-pager";
     });
     EXPECT_EQ(found, offered) << testing::PrintToString(words);
     EXPECT_EQ(place.before, before) << testing::PrintToString(words);

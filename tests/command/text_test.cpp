@@ -9,6 +9,7 @@
 
 #include "text/format.h"
 #include "text/visible.h"
+#include "text/wrap.h"
 
 namespace {
 
@@ -18,6 +19,7 @@ using SecPolicyCli::IsoTime;
 using SecPolicyCli::UtcTime;
 using SecPolicyCli::Visible;
 using SecPolicyCli::VisibleLines;
+using SecPolicyCli::Wrap;
 using SecPolicyCli::WriteSection;
 
 struct Shown {
@@ -78,6 +80,32 @@ TEST(WriteSection, ShowsNoMoreThanItMay) {
   EXPECT_EQ(Section({"a", "b"}, 2), "files (2):\n  a\n  b\n");
   EXPECT_EQ(Section({"a", "b\x1b", "c"}, 2),
             "files (3):\n  a\n  b^[\n  ... and 1 more; -v shows all\n");
+}
+
+struct Wrapped {
+  const char* text;
+  const char* wrapped;
+};
+
+TEST(WrappedText, FitsAndKeepsItsColumns) {
+  const Wrapped table[] = {
+      {"", ""},
+      {"all of this\nfits well\n", "all of this\nfits well\n"},
+      {"prose that is too wide\nfor it\n\nnext\n", "prose that is too\nwide for it\n\nnext\n"},
+      {"prose that is too wide", "prose that is too\nwide"},
+      {"  indented and too wide", "  indented and too\n  wide"},
+      {"a  what a does is to sort", "a  what a does is to\n   sort"},
+      {"too-far-right  what is meant", "too-far-right  what\nis meant"},
+      {"averyveryverylongwordthat stays", "averyveryverylongwordthat\nstays"},
+      {"```\na line of a program is not wrapped\n```",
+       "```\na line of a program is not wrapped\n```"},
+      {"- one item\n- another item that is wide", "- one item\n- another item that\nis wide"},
+      {"\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4 \xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4 1234 "
+       "5678",
+       "\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4 \xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4\xc3\xa4 "
+       "1234\n5678"},
+  };
+  for (const auto& [text, wrapped] : table) EXPECT_EQ(Wrap(text, 20), wrapped);
 }
 
 }  // namespace

@@ -118,7 +118,8 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kCheck = {
-    "check", "Look for every problem of the policy files, and change nothing",
+    "check",
+    "Look for every problem of the policy files, and change nothing",
     "Reads the whole policy as a load would, against a copy of what is installed, and prints "
     "every\n"
     "problem with its file, line and column: what a load refuses (errors), and then what it\n"
@@ -133,6 +134,8 @@ const Verb kCheck = {
     "  secpolicy check --errors-only --max 20     what to mend first\n"
     "  secpolicy check ./my-policy/domains/webDom one file, beside the others\n"
     "  secpolicy check --format sarif >check.sarif",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

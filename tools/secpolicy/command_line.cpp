@@ -4,6 +4,8 @@
 #include <CLI/Config.hpp>
 #include <CLI/Formatter.hpp>
 #include <algorithm>
+#include <iostream>
+#include <sstream>
 #include <string_view>
 
 #include "text/format.h"
@@ -148,6 +150,12 @@ CommandLine::CommandLine(const Description& description, std::span<const VerbGro
   rootOption = app->add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
                    ->type_name("DIR");
   app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
+  const std::vector<std::string> choices = {"auto", "always", "never"};
+  offerings.emplace(app->add_option("--color", color, "Show colors: " + ListOf(choices, "or"))
+                        ->check(CLI::IsMember(choices))
+                        ->type_name("WHEN"),
+                    OfferWords(choices));
+  app->add_flag("--no-pager", withoutPager, "Show long output without a pager");
   for (const VerbGroup& group : groups) {
     for (const Verb* each : group.verbs) AddVerb(*each, group.name);
   }
@@ -182,7 +190,8 @@ WordPlace CommandLine::FindPlace(const std::vector<std::string>& words) {
   return SecPolicyCli::FindPlace(*app, define, offerings, words);
 }
 
-std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {
+std::optional<ExitCode> CommandLine::Read(
+    int argc, char** argv, const std::function<void(const std::string& text)>& show) {
   const std::span<char*> words(argv, static_cast<std::size_t>(argc));
   const auto dashes = std::ranges::find(words, std::string_view("--"));
   wordsBehindDashes =
@@ -193,7 +202,10 @@ std::optional<ExitCode> CommandLine::Read(int argc, char** argv) {
     app->parse(std::move(plain));
     return std::nullopt;
   } catch (const CLI::ParseError& error) {
-    return app->exit(error) == 0 ? kWell : kUsage;
+    std::ostringstream text;
+    const bool isWell = app->exit(error, text, std::cerr) == 0;
+    if (isWell) show(text.str());
+    return isWell ? kWell : kUsage;
   }
 }
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <span>
@@ -113,9 +114,10 @@ class CommandLine {
   CommandLine& operator=(const CommandLine&) = delete;
   ~CommandLine();
 
-  // Returns the exit code when there is nothing to do: help is printed, or what is wrong with the
-  // usage.
-  std::optional<ExitCode> Read(int argc, char** argv);
+  // Returns the exit code when there is nothing to do: `show` was given what was asked for, help or
+  // the version, or what is wrong with the usage is printed.
+  std::optional<ExitCode> Read(int argc, char** argv,
+                               const std::function<void(const std::string& text)>& show);
 
   // What can stand for the last of `words`, which are those behind the command's name and need not
   // be complete.
@@ -124,6 +126,8 @@ class CommandLine {
   // What was read.
   std::optional<std::string> Root() const;
   bool IsVerbose() const { return verbose; }
+  const std::string& ColorChoice() const { return color; }
+  bool IsPagerWanted() const { return !withoutPager; }
   const Verb& AskedVerb() const { return *verb; }
   ExitCode Act() const { return action(); }
 
@@ -137,6 +141,8 @@ class CommandLine {
   CLI::Option* rootOption = nullptr;
   std::string root;
   bool verbose = false;
+  std::string color = "auto";
+  bool withoutPager = false;
   std::size_t wordsBehindDashes = 0;
   const Verb* verb = nullptr;
   Action action;

@@ -59,7 +59,8 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kDiff = {
-    "diff", "Compare two policies: directories, what is installed, saved states",
+    "diff",
+    "Compare two policies: directories, what is installed, saved states",
     "Prints how B differs from A: domains, enforcement levels, rules, objects, and of two\n"
     "directories the file labels. A name with a slash is a policy directory; 'installed' is what\n"
     "is installed now; any other name is a saved state or, where there is none of that name, a\n"
@@ -73,6 +74,8 @@ const Verb kDiff = {
     "  secpolicy diff ./old ./new                         two directories\n"
     "  secpolicy diff --stat ./old ./new                  how much, and where?\n"
     "  secpolicy diff before-upgrade installed            since 'secpolicy save before-upgrade'",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

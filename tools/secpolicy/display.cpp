@@ -91,7 +91,8 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kDisplay = {
-    "display", "Show the installed domains, objects and tardisk labels",
+    "display",
+    "Show the installed domains, objects and tardisk labels",
     "Prints what is installed now to standard output: every domain with its rules, written like\n"
     "the policy lines that made them, the objects with their identifiers, and each tardisk with\n"
     "its label.\n"
@@ -101,6 +102,8 @@ const Verb kDisplay = {
     "  secpolicy display sshDom             only one domain, or by its number: display 8\n"
     "  secpolicy display | grep '^-c'       all capability rules\n"
     "  secpolicy display --format json | jq '.objects | length'",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

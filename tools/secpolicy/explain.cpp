@@ -7,6 +7,7 @@
 #include "check/diagnostic.h"
 #include "check/diagnostic_pages.h"
 #include "command_line.h"
+#include "terminal/size.h"
 #include "text/suggestion.h"
 #include "verb.h"
 
@@ -39,7 +40,7 @@ void ListCodes() {
     line.resize(kNameWidth, ' ');
     line += SeverityName(code->severity);
     line.resize(kNameWidth + kSeverityWidth, ' ');
-    std::cout << line << code->summary << '\n';
+    std::cout << FitTerminal(line + code->summary) << '\n';
   }
 }
 
@@ -51,7 +52,7 @@ Action Define(Syntax& syntax) {
     if (code->empty()) {
       ListCodes();
     } else {
-      std::cout << PageOf(*code);
+      std::cout << FitTerminal(std::string(PageOf(*code)));
     }
     return kWell;
   };
@@ -60,13 +61,16 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kExplain = {
-    "explain", "Explain a problem that check has found",
+    "explain",
+    "Explain a problem that check has found",
     "Prints what a problem means, what a load does about it and how to mend it.\n"
     "Without CODE, lists all problems.\n"
     "\n"
     "Examples:\n"
     "  secpolicy explain unknown-word\n"
     "  secpolicy explain",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

@@ -81,7 +81,8 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kHistory = {
-    "history", "List the saved states",
+    "history",
+    "List the saved states",
     "Prints the saved states, the oldest first: name, when it was saved (UTC), and how many "
     "domains\n"
     "and rules it holds. One that can no longer be used says why, and the exit status is 1.\n"
@@ -91,6 +92,8 @@ const Verb kHistory = {
     "  secpolicy history\n"
     "  secpolicy history --format json | jq -r '.states[-1].name'\n"
     "  secpolicy diff nightly installed     what happened since that one?",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

@@ -6,12 +6,16 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "command_line.h"
 #include "complete/completion.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
 #include "root.h"
+#include "terminal/color.h"
+#include "terminal/pager.h"
+#include "terminal/size.h"
 #include "text/terminal_guard.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -73,6 +77,35 @@ constexpr char kFooter[] =
     "Exit status: 0 all well, 1 something failed, 2 wrong usage, 3 stopped because a domain that\n"
     "every host needs is missing.";
 
+// What the command writes to.
+class Terminal {
+ public:
+  // The guards are there first, so that every text is safe.
+  void Prepare(const CommandLine& line, bool isLong) {
+    const std::optional<TerminalSize> size = SizeOfTerminal(STDOUT_FILENO);
+    if (size && isLong && line.IsPagerWanted()) StartPager(*size);
+    if (WantsColors(line.ColorChoice(), size.has_value())) AllowColors(std::cout, output.Target());
+  }
+
+  ExitCode End(ExitCode code) {
+    std::cout.flush();
+    return !pager || pager->End() || code != kWell ? code : kFailed;
+  }
+
+ private:
+  void StartPager(const TerminalSize& size) {
+    const std::vector<std::string> command = PagerCommand();
+    if (command.empty()) return;
+    pager.emplace(command, size);
+    output.ForwardTo(*pager);
+    if (IsSameTerminal(STDOUT_FILENO, STDERR_FILENO)) errors.ForwardTo(*pager);
+  }
+
+  std::optional<Pager> pager;
+  TerminalGuard output{std::cout, STDOUT_FILENO};
+  TerminalGuard errors{std::cerr, STDERR_FILENO};
+};
+
 // A verb that ended well has failed all the same when its output is lost.
 ExitCode FlushOutput(ExitCode code) {
   std::cout.flush();
@@ -82,14 +115,19 @@ ExitCode FlushOutput(ExitCode code) {
   return code == kWell ? kFailed : code;
 }
 
-int Run(int argc, char** argv) {
+ExitCode Run(int argc, char** argv, Terminal& terminal) {
   CommandLine commandLine({kAbout, kFooter, "secpolicy " SECPOLICY_VERSION}, kVerbs);
   if (argc > 1 && std::string_view(argv[1]) == kAskForWords) {
     return Complete(commandLine, {argv + 2, argv + argc});
   }
-  if (const auto end = commandLine.Read(argc, argv)) return *end;
+  const auto showHelp = [&](const std::string& text) {
+    terminal.Prepare(commandLine, true);
+    std::cout << FitTerminal(text);
+  };
+  if (const auto end = commandLine.Read(argc, argv, showHelp)) return *end;
   bool isInRoot = false;
   try {
+    terminal.Prepare(commandLine, commandLine.AskedVerb().isLong);
     if (const auto prepare = commandLine.AskedVerb().prepare) prepare();
     if (const auto root = commandLine.Root()) EnterRoot(*root);
     isInRoot = true;
@@ -118,7 +156,6 @@ void TakeClosedDescriptors() {
 int main(int argc, char** argv) {
   SecPolicyCli::TakeClosedDescriptors();
   LinuxHost::OwnProcess();
-  const SecPolicyCli::TerminalGuard output(std::cout, STDOUT_FILENO);
-  const SecPolicyCli::TerminalGuard errors(std::cerr, STDERR_FILENO);
-  return SecPolicyCli::Run(argc, argv);
+  SecPolicyCli::Terminal terminal;
+  return terminal.End(SecPolicyCli::Run(argc, argv, terminal));
 }

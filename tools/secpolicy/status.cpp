@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <iomanip>
 #include <iostream>
 #include <map>
 #include <optional>
@@ -15,6 +14,8 @@
 #include "installed/installed_policy.h"
 #include "root.h"
 #include "scratch/scratch_state.h"
+#include "terminal/color.h"
+#include "terminal/size.h"
 #include "text/format.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -25,7 +26,7 @@ namespace {
 // Of the errors of a load, as many as fit the screen.
 constexpr std::size_t kShownErrors = 10;
 
-constexpr int kTitleWidth = 13;
+constexpr std::size_t kTitleWidth = 13;
 
 struct Status {
   Policy::InstalledPolicy policy;
@@ -63,9 +64,38 @@ Status ReadStatus() {
   return status;
 }
 
+Color ColorOf(Policy::Level level) {
+  switch (level) {
+    case Policy::Level::kEnforcing:
+      return Color::kGood;
+    case Policy::Level::kPermissive:
+      return Color::kDoubtful;
+    case Policy::Level::kDisabled:
+      break;
+  }
+  return Color::kBad;
+}
+
+void WriteWord(const std::string& word) {
+  for (const Policy::Level level : Policy::kLevels) {
+    if (word != TextOf(level)) continue;
+    std::cout << Painted{ColorOf(level), word};
+    return;
+  }
+  std::cout << word;
+}
+
 // A line of the screen: what it is about, and what there is to say.
 void WriteLine(const std::string& title, const std::string& text) {
-  std::cout << std::left << std::setw(kTitleWidth) << title << Visible(text) << '\n';
+  std::string padded = title;
+  padded.resize(std::max(title.size(), kTitleWidth), ' ');
+  const std::string line = FitTerminal(padded + Visible(text)) + "\n";
+  for (std::size_t begin = 0; begin < line.size();) {
+    const std::size_t end = std::min(line.find_first_of(" ,\n", begin), line.size());
+    WriteWord(line.substr(begin, end - begin));
+    if (end < line.size()) std::cout << line[end];
+    begin = end + 1;
+  }
 }
 
 std::string DescribeLoad(const LinuxHost::LoadRecord& load) {

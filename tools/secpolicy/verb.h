@@ -29,6 +29,9 @@ struct Verb {
 
   // What has to be done before the root is entered, if anything; may throw as an action may.
   void (*prepare)() = nullptr;
+
+  // Its output may be longer than a terminal.
+  bool isLong = false;
 };
 
 extern const Verb kInit;

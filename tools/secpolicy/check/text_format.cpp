@@ -5,6 +5,7 @@
 
 #include "report_format.h"
 #include "root.h"
+#include "terminal/color.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -33,16 +34,19 @@ void WriteExcerpt(const Diagnostic& diagnostic, std::ostream& output) {
   }
   if (!rest.empty()) excerpt += "...";
   marks.erase(marks.find_last_not_of(' ') + 1);
-  output << "    " << excerpt << "\n    " << marks << '\n';
+  output << "    " << excerpt << "\n    " << Painted{Color::kGood, marks} << '\n';
+}
+
+Painted Paint(Severity severity) {
+  return {severity == Severity::kError ? Color::kBad : Color::kDoubtful, SeverityName(severity)};
 }
 
 void WriteTally(const DiagnosticList& diagnostics, std::ostream& output) {
   if (diagnostics.Count() <= kFewProblems) return;
   output << '\n';
   for (const auto& [code, count] : diagnostics.Tally()) {
-    output << std::setw(6) << count << ' ' << std::left << std::setw(8)
-           << SeverityName(code->severity) << std::setw(20) << code->name << std::right
-           << code->summary << '\n';
+    output << std::setw(6) << count << ' ' << std::left << std::setw(8) << Paint(code->severity)
+           << std::setw(20) << code->name << std::right << code->summary << '\n';
   }
 }
 
@@ -52,8 +56,8 @@ void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
   for (const Diagnostic& diagnostic : diagnostics.Shown()) {
     output << Visible(OutsidePath(diagnostic.file)) << ':';
     if (diagnostic.line > 0) output << diagnostic.line << ':' << diagnostic.column << ':';
-    output << ' ' << SeverityName(diagnostic.code->severity) << ": " << Visible(diagnostic.message)
-           << " [" << diagnostic.code->name << "]\n";
+    output << ' ' << Paint(diagnostic.code->severity) << ": " << Visible(diagnostic.message) << " ["
+           << diagnostic.code->name << "]\n";
     if (diagnostic.line > 0) WriteExcerpt(diagnostic, output);
     if (!diagnostic.hint.empty()) output << "    hint: " << Visible(diagnostic.hint) << '\n';
   }

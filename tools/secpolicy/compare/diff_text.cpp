@@ -1,6 +1,7 @@
 #include <map>
 
 #include "policy_diff.h"
+#include "terminal/color.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -13,18 +14,19 @@ class Section {
  public:
   Section(const std::string& title, std::ostream& stream) : heading(title), output(stream) {}
 
-  void Removed(const std::string& text) { Write("- ", text); }
-  void Added(const std::string& text) { Write("+ ", text); }
+  void Removed(const std::string& text) { Write(Color::kBad, "- " + Visible(text)); }
+  void Added(const std::string& text) { Write(Color::kGood, "+ " + Visible(text)); }
 
   void Heading() {
-    if (!heading.empty()) output << "@@ " << Visible(heading) << '\n';
+    if (heading.empty()) return;
+    output << Painted{Color::kPlace, "@@ " + Visible(heading)} << '\n';
     heading.clear();
   }
 
  private:
-  void Write(const char* mark, const std::string& text) {
+  void Write(Color color, const std::string& line) {
     Heading();
-    output << mark << Visible(text) << '\n';
+    output << Painted{color, line} << '\n';
   }
 
   std::string heading;

@@ -6,8 +6,9 @@ namespace {
 
 using Lines = std::vector<std::string>;
 
-void WriteSection(const std::string& heading, const Lines& lines, std::ostream& output) {
-  SecPolicyCli::WriteSection(heading, lines, lines.size(), output);
+void WriteSection(const std::string& heading, const Lines& lines, std::ostream& output,
+                  std::optional<Color> color = std::nullopt) {
+  SecPolicyCli::WriteSection(heading, lines, lines.size(), output, color);
 }
 
 std::string Arrow(const std::string& before, const std::string& after) {
@@ -41,13 +42,13 @@ void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& ou
     labels.push_back(path + ": " + Arrow(before, after));
   }
 
-  WriteSection("domains to create", newDomains, output);
-  WriteSection("domains to remove", goneDomains, output);
-  WriteSection("objects to add", plan.difference.objectsAdded, output);
-  WriteSection("objects to remove", plan.difference.objectsRemoved, output);
-  WriteSection("rules to add", added, output);
-  WriteSection("rules to change", changed, output);
-  WriteSection("rules to remove", removed, output);
+  WriteSection("domains to create", newDomains, output, Color::kGood);
+  WriteSection("domains to remove", goneDomains, output, Color::kBad);
+  WriteSection("objects to add", plan.difference.objectsAdded, output, Color::kGood);
+  WriteSection("objects to remove", plan.difference.objectsRemoved, output, Color::kBad);
+  WriteSection("rules to add", added, output, Color::kGood);
+  WriteSection("rules to change", changed, output, Color::kDoubtful);
+  WriteSection("rules to remove", removed, output, Color::kBad);
   WriteSection("files to label anew", labels, maxLabels, output);
   WriteSection("domains that stay installed although no file defines them", plan.stayingDomains,
                output);

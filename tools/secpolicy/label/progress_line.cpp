@@ -1,6 +1,5 @@
 #include "progress_line.h"
 
-#include <sys/ioctl.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -8,6 +7,7 @@
 #include <cstdio>
 
 #include "braxo/misc/strcat.h"
+#include "terminal/size.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -17,13 +17,6 @@ using Braxo::Misc::StrCat;
 constexpr std::chrono::milliseconds kBetweenDrawings{100};
 constexpr std::size_t kStepsBetweenLooks = 64;  // at the clock
 constexpr std::size_t kBarWidth = 16;
-constexpr std::size_t kUsualColumns = 80;
-
-std::size_t TerminalColumns() {
-  winsize size{};
-  const bool isKnown = ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0;
-  return isKnown ? size.ws_col : kUsualColumns;
-}
 
 // Not by way of a stream: the errors on it are counted line by line, and this is no line of them.
 void WriteTerminal(const std::string& text) {
@@ -71,7 +64,8 @@ void ProgressLine::Clear() {
 
 void ProgressLine::Draw() {
   // The last column stays free: some terminals go to the next line after it.
-  const std::string text = Text().substr(0, TerminalColumns() - 1);
+  const TerminalSize size = SizeOfTerminal(STDERR_FILENO).value_or(TerminalSize());
+  const std::string text = Text().substr(0, size.columns - 1);
   const std::size_t rest = width - std::min(width, text.size());
   WriteTerminal("\r" + text + std::string(rest, ' '));
   width = text.size() + rest;

@@ -4,6 +4,7 @@
 #include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
+#include "terminal/color.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -24,6 +25,13 @@ std::string CiteOrigin(const LinuxHost::LabelOrigin& origin) {
 }
 
 void WriteLine(std::ostream& output, const std::string& text) { output << Visible(text) << '\n'; }
+
+// "yes: …" or "no: …"
+void WriteVerdict(std::ostream& output, const std::string& text, bool isYes) {
+  const std::string word = text.substr(0, text.find(':'));
+  output << Painted{isYes ? Color::kGood : Color::kBad, word};
+  WriteLine(output, text.substr(word.size()));
+}
 
 std::string AnswerText(const Question& question, const InstalledDomain& domain,
                        const Decision& decision) {
@@ -112,7 +120,7 @@ std::string Cite(const Rule& rule) {
 
 void WriteAnswer(const Question& question, const InstalledDomain& domain, const Decision& decision,
                  std::ostream& output) {
-  WriteLine(output, AnswerText(question, domain, decision));
+  WriteVerdict(output, AnswerText(question, domain, decision), decision.IsAllowed());
   for (const Vote& vote : decision.votes) {
     WriteLine(output, Cite(vote.rule));
     if (vote.instead) WriteLine(output, "  instead: " + vote.instead->Text());

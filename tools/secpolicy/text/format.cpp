@@ -39,12 +39,17 @@ std::string UtcTime(std::int64_t seconds) { return FormatTime(seconds, "%Y-%m-%d
 std::string IsoTime(std::int64_t seconds) { return FormatTime(seconds, "%Y-%m-%dT%H:%M:%SZ"); }
 
 void WriteSection(const std::string& heading, const std::vector<std::string>& lines,
-                  std::size_t maximum, std::ostream& output) {
+                  std::size_t maximum, std::ostream& output, std::optional<Color> color) {
   if (lines.empty()) return;
   output << heading << " (" << lines.size() << "):\n";
   const std::size_t shown = std::min(lines.size(), maximum);
   for (std::size_t index = 0; index < shown; ++index) {
-    output << "  " << Visible(lines[index]) << '\n';
+    const std::string line = "  " + Visible(lines[index]);
+    if (color) {
+      output << Painted{*color, line} << '\n';
+    } else {
+      output << line << '\n';
+    }
   }
   if (shown == lines.size()) return;
   output << "  ... and " << lines.size() - shown << " more; -v shows all\n";

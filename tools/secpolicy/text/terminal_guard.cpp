@@ -10,13 +10,13 @@
 namespace SecPolicyCli {
 
 TerminalGuard::TerminalGuard(std::ostream& guarded, int descriptor)
-    : stream(guarded), terminal(guarded.rdbuf()) {
+    : stream(guarded), original(guarded.rdbuf()), terminal(original) {
   if (isatty(descriptor) == 1) stream.rdbuf(this);
 }
 
 TerminalGuard::~TerminalGuard() {
   stream.flush();
-  stream.rdbuf(terminal);
+  stream.rdbuf(original);
 }
 
 TerminalGuard::int_type TerminalGuard::overflow(int_type letter) {

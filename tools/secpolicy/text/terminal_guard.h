@@ -15,6 +15,12 @@ class TerminalGuard : public std::streambuf {
   TerminalGuard& operator=(const TerminalGuard&) = delete;
   ~TerminalGuard() override;
 
+  // Where everything goes, guarded or not.
+  std::streambuf& Target() { return *terminal; }
+
+  // What is guarded goes to `other` from now on, which lasts longer than this object.
+  void ForwardTo(std::streambuf& other) { terminal = &other; }
+
  protected:
   int_type overflow(int_type letter) override;
   std::streamsize xsputn(const char* text, std::streamsize size) override;
@@ -22,7 +28,8 @@ class TerminalGuard : public std::streambuf {
 
  private:
   std::ostream& stream;
-  std::streambuf* const terminal;
+  std::streambuf* const original;
+  std::streambuf* terminal;
 };
 
 }  // namespace SecPolicyCli
