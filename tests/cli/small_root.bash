@@ -6,10 +6,12 @@ ordinary=(/usr/bin/setpriv --reuid 65534 --regid 65534 --clear-groups)
 # copy_programs FILE...: the command, its launcher and these files are in $programs, where anybody can
 # reach them.
 copy_programs() {
-  export programs=$BATS_FILE_TMPDIR/programs
+  export programs=$BATS_FILE_TMPDIR/bin
   chmod 755 "$BATS_RUN_TMPDIR" "$BATS_FILE_TMPDIR"
-  mkdir "$programs"
+  mkdir "$programs" "$BATS_FILE_TMPDIR/lib"
   cp "$SECPOLICY" "$(dirname "$SECPOLICY")/secpolicy-run" "$@" "$programs"
+  # Which boot unpacks tardisks with.
+  cp -P "$BUILD_DIR"/lib/libsecpolicyhost-archive.so.* "$BATS_FILE_TMPDIR/lib"
 }
 
 # works_as USER: from here on programs are those of this user, or of whoever runs the tests where it is

@@ -91,8 +91,12 @@ def check_as(user, check_root, options, tally):
 
 def copy_programs(options, programs):
     """So that an ordinary user reaches them, who need not reach the directory that all was built in."""
+    built = os.path.dirname(os.path.dirname(options.command))
+    shutil.copytree(os.path.join(built, "lib"), os.path.join(programs, "lib"), symlinks=True)
+    binaries = os.path.join(programs, "bin")
+    os.mkdir(binaries)
     for name in ("command", "launcher", "probe", "well"):
-        setattr(options, name, shutil.copy(getattr(options, name), programs))
+        setattr(options, name, shutil.copy(getattr(options, name), binaries))
     if options.example:
         example = os.path.join(programs, "example")
         subprocess.run([options.example, example], check=True)
