@@ -29,6 +29,20 @@ has() {
   exits 1
 }
 
+@test "a capability may be named as other tools do, without what they all begin with" {
+  secpolicy capability grant job7 net_raw
+  exits 0
+  has "-c cap_net_raw grant"
+  secpolicy why job7 use net_raw
+  answers 0 "yes: job7 may use cap_net_raw
+(no policy file): -c cap_net_raw grant"
+  secpolicy rules --capability net_raw
+  answers 0 "job7: (no policy file): -c cap_net_raw grant"
+  secpolicy capability revoke job7 net_raw
+  exits 0
+  has "-c cap_net_raw revoke"
+}
+
 @test "each capability that can be granted is the one that was named" {
   local names capability
   names=$(sed -n 's/^| capabilities | \(.*\) |$/\1/p' "$SOURCE/docs/linux-host.md")
@@ -50,8 +64,8 @@ has() {
 @test "an unknown word is refused with the nearest" {
   secpolicy capability grant job7 cap_net_rwa
   wrong_usage "capability grant" "capability grant: there is no capability 'cap_net_rwa'; did you mean 'cap_net_raw'?"
-  secpolicy capability grant job7 net_raw
-  wrong_usage "capability grant" "capability grant: there is no capability 'net_raw'; did you mean 'cap_net_raw'?"
+  secpolicy capability grant job7 net_rwa
+  wrong_usage "capability grant" "capability grant: there is no capability 'net_rwa'; did you mean 'net_raw'?"
   secpolicy capability revoke 11 cap_kill
   exits 2
   [[ $stderr == "secpolicy: capability revoke: there is no domain '11'; "* ]]

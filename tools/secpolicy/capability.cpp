@@ -5,6 +5,7 @@
 #include "policy_dir.h"
 #include "query/ask.h"
 #include "query/named.h"
+#include "query/question.h"
 #include "root.h"
 #include "runtime/change.h"
 #include "secpolicy/policy_root.h"
@@ -23,10 +24,11 @@ std::string WhyNotSet(const NamedDomain& domain, const std::string& capability, 
          " and load it";
 }
 
-ExitCode Set(const std::string& verb, const std::string& word, const std::string& capability,
+ExitCode Set(const std::string& verb, const std::string& domainWord, const std::string& word,
              bool grant) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const NamedDomain domain = FindDomain(word, access);
+  const NamedDomain domain = FindDomain(domainWord, access);
+  const std::string capability = FindWord(Policy::WordKind::kCapability, word, access);
   const unsigned int number = NumberOf(Policy::WordKind::kCapability, capability, access);
   return Change(
       verb,

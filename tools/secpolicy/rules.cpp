@@ -77,8 +77,7 @@ std::vector<Subject> ReadSubjects(WordKind kind, const std::string& word,
                                   TeskAccessInterfaceImpl& access) {
   if (kind == WordKind::kPath) return SubjectsOfFile(word, access);
   if (kind == WordKind::kLabel) return SubjectsOfLabel(word, access);
-  RequireWord(kind, word, access);
-  return {{kind, word}};
+  return {{kind, FindWord(kind, word, access)}};
 }
 
 std::vector<Found> Find(const Policy::InstalledPolicy& policy,

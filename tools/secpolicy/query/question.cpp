@@ -24,6 +24,8 @@ using SecPolicy::TeskAccessInterfaceImpl;
 // A table that is told as a whole when no word of it is near.
 constexpr std::size_t kShortTable = 16;
 
+const std::string kCapabilityPrefix = "cap_";
+
 bool CanBeDomain(WordKind kind) { return kind == kDomain || kind == kLabel; }
 
 bool IsKnown(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
@@ -53,9 +55,7 @@ std::vector<std::string> KnownWords(WordKind kind, TeskAccessInterfaceImpl& acce
 void RefuseWord(const std::string& noun, const std::string& word,
                 const std::vector<std::string>& known) {
   std::string text = "there is no " + noun + " '" + word + "'";
-  // Other tools take capabilities by their names alone.
-  const bool lacksPrefix = std::ranges::find(known, "cap_" + word) != known.end();
-  const std::string nearest = lacksPrefix ? "cap_" + word : NearestWord(word, known);
+  const std::string nearest = NearestWord(word, known);
   if (!nearest.empty()) throw QuestionError(text + "; did you mean '" + nearest + "'?");
   if (known.size() <= kShortTable) {
     const char* separator = "; there are ";
@@ -84,14 +84,24 @@ void RequireNumber(const std::string& word) {
 
 }  // namespace
 
-void RequireWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
-  if (kind == kPath) return RequirePath(word);
-  if (kind == kNumber) return RequireNumber(word);
-  if (IsKnown(kind, word, access)) return;
-  RefuseWord(FormOf(kind).plainNoun, word, KnownWords(kind, access));
+std::string FindWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
+  if (IsKnown(kind, word, access)) return word;
+  std::vector<std::string> known = KnownWords(kind, access);
+  if (kind == kCapability && !word.starts_with(kCapabilityPrefix)) {
+    std::string name = kCapabilityPrefix + word;
+    if (IsKnown(kind, name, access)) return name;
+    for (std::string& other : known) other.erase(0, kCapabilityPrefix.size());
+  }
+  RefuseWord(FormOf(kind).plainNoun, word, known);
 }
 
 namespace {
+
+std::string ReadWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
+  if (kind != kPath && kind != kNumber) return FindWord(kind, word, access);
+  kind == kPath ? RequirePath(word) : RequireNumber(word);
+  return word;
+}
 
 const QuestionForm& FindForm(const std::string& action) {
   std::vector<std::string> actions;
@@ -243,9 +253,8 @@ Question ReadQuestion(const std::vector<std::string>& words, TeskAccessInterface
   }
   Question question;
   question.form = &form;
-  question.words.assign(words.begin() + 1, words.end());
   for (std::size_t index = 0; index < form.words.size(); ++index) {
-    RequireWord(form.words[index], question.words[index], access);
+    question.words.push_back(ReadWord(form.words[index], words[index + 1], access));
   }
   if (form.words.front() != kPath) {
     question.asked = AskRules(question, access);

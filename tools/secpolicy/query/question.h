@@ -69,9 +69,11 @@ FileFacts ExamineFile(const std::string& path, SecPolicy::TeskAccessInterfaceImp
 // `path` without slashes at its end.
 std::string WithoutTrailingSlashes(std::string path);
 
-// Throws QuestionError for a word that cannot stand for what it is to stand for.
-void RequireWord(Policy::WordKind kind, const std::string& word,
-                 SecPolicy::TeskAccessInterfaceImpl& access);
+// The word of the host's table, or the domain, that `word` stands for: itself, but that
+// capabilities may lack the prefix that policy files write, as they do in other tools. Throws
+// QuestionError for a word that is not known.
+std::string FindWord(Policy::WordKind kind, const std::string& word,
+                     SecPolicy::TeskAccessInterfaceImpl& access);
 
 // Throws QuestionError for a path that does not begin at the root.
 void RequirePath(const std::string& path);

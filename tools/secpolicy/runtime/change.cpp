@@ -57,12 +57,8 @@ int ReadProcess(const std::string& word) {
 
 unsigned int NumberOf(Policy::WordKind kind, const std::string& word,
                       SecPolicy::TeskAccessInterfaceImpl& access) {
-  std::vector<std::string> known;
-  for (const auto& [name, id] : access.GetKeywordsMap(*FormOf(kind).table)) {
-    if (name == word) return static_cast<unsigned int>(id);
-    known.push_back(name);
-  }
-  RefuseWord(FormOf(kind).plainNoun, word, known);
+  const std::string name = FindWord(kind, word, access);
+  return static_cast<unsigned int>(access.GetKeywordsMap(*FormOf(kind).table).at(name));
 }
 
 }  // namespace SecPolicyCli
