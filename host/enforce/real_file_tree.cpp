@@ -7,19 +7,35 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <cstring>
 #include <memory>
 
+#include "braxo/lib/exception.h"
+#include "braxo/misc/strcat.h"
 #include "host/enforce/features.h"
 
 namespace Enforce {
 namespace {
 
-// Opens what is at the path and only there: a link on the way leads nowhere.
+// True where the system refused to look, at whatever it is: what a filter of system calls answers,
+// and where there is no room for another file.
+bool IsAboutThisProcess(int error) {
+  return error == ENOSYS || error == EPERM || error == EMFILE || error == ENFILE || error == ENOMEM;
+}
+
+// Opens what is at the path and only there: a link on the way leads nowhere. Throws BraxoException
+// where this process cannot look, which does not mean that there is nothing.
 int OpenPlainly(const std::string& path, std::uint64_t flags) {
   open_how how{};
   how.flags = flags | O_NOFOLLOW | O_CLOEXEC;
   how.resolve = RESOLVE_NO_SYMLINKS;
-  return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how));
+  const auto file = syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how);
+  if (file < 0 && IsAboutThisProcess(errno)) {
+    throw Braxo::Lib::BraxoException(
+        Braxo::Misc::StrCat("Unable to look for ", path, ": ", std::strerror(errno)));
+  }
+  return static_cast<int>(file);
 }
 
 FileKind KindOfMode(mode_t mode) {

@@ -9,7 +9,8 @@
 namespace Enforce {
 
 // The files below the root directory of this process, each as it was when it was first asked for:
-// domains mostly name the same.
+// domains mostly name the same. Its functions throw Braxo::Lib::BraxoException where this process
+// cannot look, as under a filter of system calls.
 class RealFileTree : public FileTree {
  public:
   FileKind KindOf(const std::string& path) override;
