@@ -25,21 +25,38 @@ sources() {
     'Created-By: Packages' 'Origin: Debian' | sort -u
 }
 
-# A Debian without anything of ours but what our packages need of others, and then with them.
+# download_debian PACKAGE,...: a clean Debian with these. What a network refuses once it may give later.
+download_debian() {
+  local try
+  # Images of machines come without apt's lists.
+  [[ -n $(sources) ]] || apt-get --quiet update >&2 || true
+  for try in 1 2 3; do
+    rm -rf "$DEBIAN"
+    # shellcheck source=/dev/null
+    sources | mmdebstrap --quiet --mode=root --variant=apt --format=directory --aptopt='Acquire::Retries "5"' \
+      --include="$1" "$(. /etc/os-release && echo "$VERSION_CODENAME")" "$DEBIAN" - && return
+    echo "# no clean Debian could be had, try $try of 3" >&3
+    sleep $((10 * try))
+  done
+  rm -rf "$DEBIAN"
+}
+
+# A Debian without anything of ours but what our packages need of others, and then with them. None
+# where it cannot be had.
 make_debian() {
   local needed=libarchive13,libseccomp2,libsqlite3-0,libstdc++6,zlib1g
-  # Images of machines come without apt's lists.
-  [[ -n $(sources) ]] || apt-get --quiet update >&2
-  # shellcheck source=/dev/null
-  sources | mmdebstrap --quiet --mode=root --variant=apt --format=directory \
-    --include="$needed,busybox-static,systemd" "$(. /etc/os-release && echo "$VERSION_CODENAME")" "$DEBIAN" -
+  download_debian "$needed,busybox-static,systemd"
+  [[ -d $DEBIAN ]] || return 0
   files >"$BATS_FILE_TMPDIR/clean"
   mkdir "$DEBIAN/srv/packages"
   cp "$PACKAGES"/{lib,}secpolicy*.deb "$DEBIAN/srv/packages"
   inside sh -c 'apt-get --yes --quiet install /srv/packages/*.deb' >"$BATS_FILE_TMPDIR/install.log" 2>&1
 }
 
-needs_debian() { [[ -d $DEBIAN ]] || skip "only root can install packages into a Debian of its own"; }
+needs_debian() {
+  [[ $(id -u) -eq 0 ]] || skip "only root can install packages into a Debian of its own"
+  [[ -d $DEBIAN ]] || skip "a clean Debian to install packages into could not be had"
+}
 
 # inside COMMAND...: runs it in that Debian. What it mounts and starts ends with it.
 inside() {
