@@ -6,6 +6,8 @@
 
 #include "broker.h"
 #include "domain_plan.h"
+#include "environment.h"
+#include "host/enforce/broker/message.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
@@ -71,6 +73,10 @@ ExitCode TellFailure(const std::string& verb, const std::function<ExitCode()>& e
 }
 
 }  // namespace
+
+std::vector<std::string> EnvironmentOf(const Entry& entry) {
+  return EnvironmentWith(entry.environment, {Enforce::kBrokerVariable});
+}
 
 void AddEntryOptions(Syntax& syntax, EntryOptions& options) {
   syntax.AddFlag("--best-effort", options.bestEffort,

@@ -31,6 +31,10 @@ struct Entry {
   bool isForAnother = false;                  // who waits for its end, and at whose end it ends
 };
 
+// The variables of the program of the entry: those of this process, but for that of its own broker,
+// with the entry's in place of those that have the same names.
+std::vector<std::string> EnvironmentOf(const Entry& entry);
+
 // Becomes the program of the entry, or runs and watches it where the domain is permissive. Whoever
 // may not read the state enters by a published plan. Returns only then, and where nothing was
 // started, with what to end with; why has been told.

@@ -11,7 +11,7 @@
 #include <filesystem>
 #include <utility>
 
-#include "enforce/environment.h"
+#include "environment.h"
 #include "host/enforce/broker/message.h"
 #include "host/enforce/kernel.h"
 #include "host/enforce/plan_file.h"

@@ -4,7 +4,7 @@
 #include <vector>
 
 #include "asked_rules.h"
-#include "enforce/environment.h"
+#include "environment.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/operation/log_use.h"
 #include "installed/installed_policy.h"

@@ -13,6 +13,7 @@
 #include <tuple>
 #include <utility>
 
+#include "environment.h"
 #include "host/linux/common/host_error.h"
 
 namespace SecPolicyCli {
@@ -28,23 +29,6 @@ bool WriteAll(int descriptor, std::string_view text) {
   return true;
 }
 
-// A pager can start a shell, which whoever may only run this command as root should not get.
-std::vector<std::string> PagerEnvironment() {
-  std::vector<std::string> variables = {"LESSSECURE=1"};
-  for (char* const* variable = environ; *variable != nullptr; ++variable) {
-    if (!std::string_view(*variable).starts_with("LESSSECURE=")) variables.emplace_back(*variable);
-  }
-  return variables;
-}
-
-std::vector<char*> PointersTo(std::vector<std::string>& words) {
-  std::vector<char*> pointers;
-  pointers.reserve(words.size() + 1);
-  for (std::string& word : words) pointers.push_back(word.data());
-  pointers.push_back(nullptr);
-  return pointers;
-}
-
 // In place of the pager.
 void Copy() {
   std::array<char, 4096> piece{};
@@ -56,7 +40,8 @@ void Copy() {
 
 // Becomes the pager as soon as there is something to read.
 [[noreturn]] void BecomePager(std::vector<std::string>& command, int input) {
-  std::vector<std::string> environment = PagerEnvironment();
+  // A pager can start a shell, which whoever may only run this command as root should not get.
+  std::vector<std::string> environment = EnvironmentWith({"LESSSECURE=1"});
   pollfd text{.fd = input, .events = POLLIN, .revents = 0};
   while (poll(&text, 1, -1) < 0 && errno == EINTR) {
   }

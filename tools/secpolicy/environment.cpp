@@ -1,10 +1,6 @@
-#include "enforce/environment.h"
+#include "environment.h"
 
 #include <unistd.h>
-
-#include <set>
-
-#include "host/enforce/broker/message.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -13,12 +9,11 @@ std::string NameOf(const std::string& variable) { return variable.substr(0, vari
 
 }  // namespace
 
-std::vector<std::string> EnvironmentOf(const Entry& entry) {
-  std::vector<std::string> variables = entry.environment;
-  std::set<std::string> names = {Enforce::kBrokerVariable};
-  for (const std::string& variable : variables) names.insert(NameOf(variable));
+std::vector<std::string> EnvironmentWith(std::vector<std::string> variables,
+                                         std::set<std::string> dropped) {
+  for (const std::string& variable : variables) dropped.insert(NameOf(variable));
   for (char* const* variable = environ; *variable != nullptr; ++variable) {
-    if (!names.contains(NameOf(*variable))) variables.emplace_back(*variable);
+    if (!dropped.contains(NameOf(*variable))) variables.emplace_back(*variable);
   }
   return variables;
 }
