@@ -99,7 +99,7 @@ def usages_of_manual():
 
 
 aliases = {"-v": "--verbose"}
-listed = re.findall(r"^  ([a-z-]+) ", output_of("--help").partition("Write a policy:")[2].partition("A first session")[0],
+listed = re.findall(r"^  ([a-z-]+) ", output_of("--help").partition("Write a policy:")[2].partition("For example")[0],
                     re.MULTILINE)
 offered = [word for word in words_at("") if word != "help"]
 if sorted(listed) != sorted(offered) or len(listed) < 24:

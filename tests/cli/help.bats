@@ -54,6 +54,12 @@ load helper
   run --separate-stderr "$SECPOLICY" help why
   exits 0
   [[ $output == "$one" ]]
+  for words in "--root / help why" "--no-pager --color never help why" "--root=/ help why"; do
+    run --separate-stderr "$SECPOLICY" $words
+    answers 0 "$one"
+  done
+  run --separate-stderr "$SECPOLICY" --root / help
+  answers 0 "$all"
   run --separate-stderr "$SECPOLICY" help nothing
   wrong_usage "" "there is no verb or option 'nothing'"
 }

@@ -50,15 +50,26 @@ std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
   return "secpolicy: " + VisibleLines(problem) + "\n'" + command + " --help' explains the usage.\n";
 }
 
+// The first that is no option of all verbs, nor the value of one.
+std::vector<std::string>::iterator FirstWord(std::vector<std::string>& words) {
+  auto word = words.begin();
+  while (word != words.end() && word->starts_with('-')) {
+    const bool takesNext = *word == "--root" || *word == "--color";
+    word += takesNext && word + 1 != words.end() ? 2 : 1;
+  }
+  return word;
+}
+
 // "help" and nothing at all ask for the list of verbs, "help VERB" for what "VERB --help" tells.
 std::vector<std::string> Unabbreviated(std::span<char*> words, const CLI::App& app) {
   std::vector<std::string> plain(words.begin() + 1, words.end());
-  if (plain.empty() || plain == std::vector<std::string>{"help"}) return {"--help"};
-  if (plain.front() == "help") {
-    plain.erase(plain.begin());
-    const std::vector<std::string> verbs = VerbNames(app);
-    if (std::ranges::find(verbs, plain.front()) != verbs.end()) plain.emplace_back("--help");
-  }
+  if (plain.empty()) return {"--help"};
+  const auto help = FirstWord(plain);
+  if (help == plain.end() || *help != "help") return plain;
+  const auto verb = plain.erase(help);
+  if (verb == plain.end()) return {"--help"};
+  const std::vector<std::string> verbs = VerbNames(app);
+  if (std::ranges::find(verbs, *verb) != verbs.end()) plain.emplace_back("--help");
   return plain;
 }
 

@@ -36,7 +36,7 @@ constexpr char kAbout[] =
     "Installs a host's security policy from plain-text files and shows what is installed.";
 
 constexpr char kFooter[] =
-    "A first session, as an ordinary user, on a root of your own:\n"
+    "For example, as an ordinary user, on a root of your own (mkdir r):\n"
     "  secpolicy --root ./r init                        write a first policy, to begin with\n"
     "  secpolicy --root ./r new domain webDom           and a domain for what you want to confine\n"
     "  secpolicy --root ./r boot                        unpack the tardisks and install the "

@@ -37,7 +37,7 @@ Action Define(Syntax& syntax) {
 const Verb kSave = {
     "save", "Keep what is installed now under a name",
     "Copies the installed state, domains, rules, objects and all, to a file of its own in\n"
-    "/var/lib/secpolicy/saved, which outlives a boot. 'history' lists what is saved, 'diff' \n"
+    "/var/lib/secpolicy/saved, which outlives a boot. 'history' lists what is saved, 'diff'\n"
     "compares with it, and 'rollback' puts it back. The labels that files carry are not saved.\n"
     "\n"
     "Examples:\n"
