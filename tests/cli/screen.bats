@@ -101,3 +101,10 @@ setup() {
   size=80x24 SECPOLICY_PAGER="env" on_terminal display
   grep -qx LESSSECURE=1 "$BATS_TEST_TMPDIR/screen"
 }
+
+@test "less shows colors also where it is named without a word of them" {
+  size=80x24 PAGER=env on_terminal display
+  grep -qx LESS=FRX "$BATS_TEST_TMPDIR/screen"
+  size=80x24 PAGER=env LESS=M on_terminal display
+  grep -qx LESS=M "$BATS_TEST_TMPDIR/screen"
+}

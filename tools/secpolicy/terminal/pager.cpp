@@ -38,10 +38,17 @@ void Copy() {
   }
 }
 
+// A pager can start a shell, which whoever may only run this command as root should not get. And
+// less shows colors only where it is told to.
+std::vector<std::string> PagerEnvironment() {
+  std::vector<std::string> variables = {"LESSSECURE=1"};
+  if (getenv("LESS") == nullptr) variables.emplace_back("LESS=FRX");
+  return EnvironmentWith(variables);
+}
+
 // Becomes the pager as soon as there is something to read.
 [[noreturn]] void BecomePager(std::vector<std::string>& command, int input) {
-  // A pager can start a shell, which whoever may only run this command as root should not get.
-  std::vector<std::string> environment = EnvironmentWith({"LESSSECURE=1"});
+  std::vector<std::string> environment = PagerEnvironment();
   pollfd text{.fd = input, .events = POLLIN, .revents = 0};
   while (poll(&text, 1, -1) < 0 && errno == EINTR) {
   }
