@@ -82,15 +82,17 @@ pid_t Fork() {
   return fork();
 }
 
-// No handler of the interpreter's runs in the child. Keys are for the interpreter to act on, which
-// shares its terminal with the child.
+// No handler of the interpreter's runs in the child, which ends when it is asked to also where the
+// interpreter does not. Keys are for the interpreter to act on: it shares its terminal with the
+// child.
 void ForgetHandlers() {
   struct sigaction usual {};
   usual.sa_handler = SIG_DFL;
   for (int number = 1; number < NSIG; ++number) {
     struct sigaction present {};
     const bool isKnown = sigaction(number, nullptr, &present) == 0;
-    if (isKnown && present.sa_handler != SIG_IGN) sigaction(number, &usual, nullptr);
+    const bool isKept = present.sa_handler == SIG_IGN && number != SIGTERM;
+    if (isKnown && !isKept) sigaction(number, &usual, nullptr);
   }
   sigset_t keys;
   sigemptyset(&keys);

@@ -5,8 +5,8 @@ verb of `secpolicy` with its name does, returns what that verb would print as va
 exception of the class `Error` where that would fail. Nothing is written to standard output or error.
 
 The work is done in a process of its own, so that calls on different roots may run at the same time,
-in as many threads as wanted. An interrupt ends it: what the call was about to change is left as it
-was, or is done.
+in as many threads as wanted. An interrupt ends it: what was installed before is left, or all that is
+new; files that a load has labelled meanwhile keep their labels.
 """
 
 from __future__ import annotations

@@ -131,6 +131,20 @@ def test_interrupt_ends_the_call(waiting):
         os.waitpid(-1, os.WNOHANG)
 
 
+def test_interrupt_ends_the_call_of_who_is_not_to_be_asked(waiting):
+    program = """
+        import os, secpolicy, signal, sys, threading
+        signal.signal(signal.SIGTERM, signal.SIG_IGN)
+        threading.Timer(0.3, os.kill, (os.getpid(), signal.SIGINT)).start()
+        try:
+            secpolicy.load(root=sys.argv[1])
+        except KeyboardInterrupt:
+            print("interrupted")
+        """
+    ended = python(program, waiting, timeout=10)
+    assert (ended.stdout, ended.returncode) == ("interrupted\n", 0)
+
+
 def test_handler_that_goes_on(booted):
     """A call goes on when the handler says nothing."""
     seen = []
