@@ -39,7 +39,7 @@ struct SubjectOption {
 };
 
 constexpr SubjectOption kOptions[] = {
-    {"--label", "LABEL", "Rules for an object label or a domain, by its name or its number",
+    {"--label", "LABEL", "Rules for an object label, by its name or its number, or for a domain",
      WordKind::kLabel},
     {"--path", "PATH", "Rules for a path, for directories above it, and for the label of the file",
      WordKind::kPath},

@@ -22,9 +22,7 @@ namespace SecPolicyCli {
 namespace {
 
 [[noreturn]] void ThrowForbidden() {
-  const std::string advice = AdviseOnPrivilege();
-  throw std::runtime_error("this user may not read the installed state " + LinuxHost::StatePath() +
-                           (advice.empty() ? "" : ". " + advice));
+  throw std::runtime_error("this user may not read the installed state " + LinuxHost::StatePath());
 }
 
 void Redirect(int descriptor, const std::string& path) {

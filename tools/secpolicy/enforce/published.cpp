@@ -18,6 +18,7 @@
 #include "host/linux/operation/published_plans.h"
 #include "host/linux/operation/world_records.h"
 #include "policy/installed_policy.h"
+#include "root.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
@@ -98,8 +99,8 @@ bool PublishPlans() {
     LetOthersGoFirst(tries);
   }
   throw HostError(EBUSY,
-                  "Unable to make plans for ordinary users: the policy changes all the time. Run "
-                  "\"secpolicy load\" again");
+                  "Unable to make plans for ordinary users: the policy changes all the time. Run " +
+                      Call("load") + " again");
 }
 
 void PublishPlansOrTell(const std::string& verb) {

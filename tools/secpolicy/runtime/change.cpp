@@ -16,8 +16,8 @@ namespace {
 // A cause that cannot be found out is no second failure.
 std::string Advise(const std::function<std::string()>& whyNot) {
   try {
-    const std::string cause = whyNot();
-    return cause.empty() ? AdviseOnPrivilege() : cause;
+    const std::string advice = AdviseOnPrivilege();
+    return advice.empty() ? whyNot() : advice;
   } catch (const Braxo::Lib::BraxoException&) {
     return AdviseOnPrivilege();
   }
