@@ -176,7 +176,7 @@ print(report.errors[0].code, report.errors[0].line)' "$SOURCE/examples/broken"
 
 # Runs /started.sh of a copy of that Debian under systemd, and shows what it writes.
 under_systemd() {
-  timeout --signal=KILL 60 unshare --mount --pid --cgroup --uts --ipc --net --fork --kill-child \
+  timeout --signal=KILL 300 unshare --mount --pid --cgroup --uts --ipc --net --fork --kill-child \
     "$BATS_TEST_DIRNAME/systemd_in" "$1" >"$BATS_TEST_TMPDIR/systemd.log" 2>&1 || true
   cat "$1/started.out"
 }
@@ -189,6 +189,8 @@ plans_of() {
 
 @test "under systemd the hardened units do all that the command does without them" {
   needs_debian
+  unshare --mount --cgroup sh -ec 'mount -t tmpfs tmpfs /mnt; mkdir /mnt/groups; mount -t cgroup2 cgroup2 /mnt/groups' ||
+    skip "systemd needs control groups of its own, which this machine does not give"
   local host=$BATS_TEST_TMPDIR/host
   cp -a "$DEBIAN" "$host"
   cp -a "$host/srv/host/tardisks" "$host/"
