@@ -8,11 +8,9 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
-#include <thread>
 #include <utility>
 #include <vector>
 
@@ -22,6 +20,7 @@
 #include "host/linux/files/file_walk.h"
 #include "host/linux/files/labelled_places.h"
 #include "host/linux/files/security_attribute.h"
+#include "host/linux/operation/contention.h"
 #include "host/linux/state/host_state.h"
 
 namespace LinuxHost {
@@ -105,12 +104,6 @@ bool MakeIndex(HostState& state) {
   index.Write(state.LabelIndexPath());
   transaction.Commit();
   return true;
-}
-
-// Two that make one at the same time would spoil each other's for ever if they kept pace.
-void LetOthersGoFirst(int tries) {
-  const std::int64_t longest = std::int64_t{8} << tries;
-  std::this_thread::sleep_for(std::chrono::milliseconds(NewSerial() % longest));
 }
 
 }  // namespace

@@ -3,10 +3,8 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
 #include <limits>
 #include <map>
-#include <thread>
 #include <utility>
 
 #include "domain_plan.h"
@@ -14,6 +12,7 @@
 #include "host/enforce/features.h"
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/operation/contention.h"
 #include "host/linux/operation/label_index.h"
 #include "host/linux/operation/published_plans.h"
 #include "host/linux/operation/world_records.h"
@@ -70,12 +69,6 @@ bool TryToPublish() {
   return making.Publish(plans);
 }
 
-// Two that make plans at the same time would be in each other's way for ever if they kept pace.
-void LetOthersGoFirst(int tries) {
-  const int share = getpid() % 8;
-  std::this_thread::sleep_for(std::chrono::milliseconds(share << tries));
-}
-
 Enforce::Plan Verified(const std::string& domain, const std::string& bytes,
                        const std::string& serial) {
   Enforce::Plan plan;
@@ -96,7 +89,7 @@ bool PublishPlans() {
   for (int tries = 1; tries <= kMostTries; ++tries) {
     if (LinuxHost::ArePlansPublished()) return false;
     if (TryToPublish()) return true;
-    LetOthersGoFirst(tries);
+    LinuxHost::LetOthersGoFirst(tries);
   }
   throw HostError(EBUSY,
                   "Unable to make plans for ordinary users: the policy changes all the time. Run " +
