@@ -15,6 +15,7 @@
 #include "kitlibs/file.h"
 #include "load/full_load.h"
 #include "query/answer.h"
+#include "query/named.h"
 #include "query/search.h"
 #include "root.h"
 
@@ -129,11 +130,10 @@ void Load(const std::string& dir, bool keep, bool allOrNothing, const Send& send
 void Why(const std::string& domain, const std::vector<std::string>& words, const Send& send) {
   RequireState();
   SecPolicy::TeskAccessInterfaceImpl access;
-  const auto installed = SecPolicyCli::ReadInstalledDomain(domain, access);
-  if (!installed) SecPolicyCli::RefuseDomain(domain, access);
+  const Policy::InstalledDomain installed = SecPolicyCli::RequireInstalledDomain(domain, access);
   const SecPolicyCli::Question question = SecPolicyCli::ReadQuestion(words, access);
-  const Policy::Decision decision = Policy::Decide(question.asked, *installed);
-  send({"answer", WhyToJson(question, *installed, decision).Text()});
+  const Policy::Decision decision = Policy::Decide(question.asked, installed);
+  send({"answer", WhyToJson(question, installed, decision).Text()});
 }
 
 void WhoCan(const std::vector<std::string>& words, const Send& send) {

@@ -8,11 +8,7 @@ setup() {
   secpolicy domain create job7
 }
 
-fails() {
-  exits 1
-  [[ -z $output ]]
-  ends_with "secpolicy: file-policy $1: $2"
-}
+fails() { fails_with "file-policy $1" "$2"; }
 
 # policies LINE...: these are all that there are.
 policies() {

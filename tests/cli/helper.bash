@@ -61,6 +61,14 @@ answers() {
   diff <(printf '%s\n' "$@") - <<<"$output"
 }
 
+# fails_with VERB TEXT: the latest command, of this verb, failed, wrote nothing to standard output, and
+# ended with this.
+fails_with() {
+  exits 1 || return
+  [[ -z $output ]] || return
+  ends_with "secpolicy: $1: $2"
+}
+
 # says LINE: the latest command wrote this whole line to standard error.
 says() { has_line "$stderr" "$1"; }
 

@@ -8,11 +8,7 @@ setup() {
   secpolicy domain create job7
 }
 
-fails() {
-  exits 1
-  [[ -z $output ]]
-  ends_with "secpolicy: param-check $1: $2"
-}
+fails() { fails_with "param-check $1" "$2"; }
 
 # has RULE...: the rules for parameter checks that the domain has.
 has() {

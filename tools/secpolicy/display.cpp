@@ -1,4 +1,3 @@
-#include <charconv>
 #include <iostream>
 #include <list>
 
@@ -11,6 +10,7 @@
 #include "installed/installed_policy.h"
 #include "kitlibs/file.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "query/question.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
@@ -24,9 +24,7 @@ namespace {
 std::string NumberOf(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access) {
   unsigned int id = 0;
   if (access.FindDomain(word, &id)) return std::to_string(id);
-  const char* const end = word.data() + word.size();
-  const auto read = std::from_chars(word.data(), end, id);
-  if (read.ec != std::errc() || read.ptr != end) RefuseDomain(word, access);
+  if (!ReadNumber(word)) RefuseDomain(word, access);
   return word;
 }
 

@@ -103,9 +103,7 @@ Action DefineDestroy(Syntax& syntax) {
 ExitCode AddService(const std::string& word, const std::string& service) {
   TeskAccessInterfaceImpl access;
   const NamedDomain domain = FindDomain(word, access);
-  return Change(
-      "domain add-service", [&] { SecPolicy::AddGcomService(domain.id, service); },
-      [] { return std::string(); });
+  return Change("domain add-service", [&] { SecPolicy::AddGcomService(domain.id, service); });
 }
 
 Action DefineAddService(Syntax& syntax) {
@@ -192,10 +190,9 @@ Action DefineLeaked(Syntax& syntax) {
 }
 
 void WriteDomainJson(const NamedDomain& domain, TeskAccessInterfaceImpl& access) {
-  const auto installed = ReadInstalledDomain(domain.name, access);
-  if (!installed) RefuseDomain(domain.name, access);
+  const InstalledDomain installed = RequireInstalledDomain(domain.name, access);
   Json json = {{"schema", "secpolicy.domain/1"}};
-  json.Add(ToJson(*installed));
+  json.Add(ToJson(installed));
   std::cout << json.Text();
 }
 

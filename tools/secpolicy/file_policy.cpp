@@ -112,14 +112,11 @@ ExitCode Add(const std::string& word, const std::string& letters,
     rules.push_back(ToFileRule(path, permissions));
   }
   unsigned int added = 0;
-  return Change(
-      "file-policy add",
-      [&] {
-        SecPolicy::AddFilePolicyBatch(world, domain.id, rules.data(),
-                                      static_cast<unsigned int>(rules.size()), &added);
-        TellOfLinks(rules);
-      },
-      [] { return std::string(); });
+  return Change("file-policy add", [&] {
+    SecPolicy::AddFilePolicyBatch(world, domain.id, rules.data(),
+                                  static_cast<unsigned int>(rules.size()), &added);
+    TellOfLinks(rules);
+  });
 }
 
 Action DefineAdd(Syntax& syntax) {

@@ -17,6 +17,7 @@
 #include "observe/watch.h"
 #include "policy/call_set.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "query/question.h"
 #include "text/format.h"
 #include "text/visible.h"
@@ -98,11 +99,7 @@ std::string TextOf(const Options& options, const std::vector<std::string>& lines
 ExitCode Propose(const Options& options) {
   SecPolicy::TeskAccessInterfaceImpl access;
   Policy::InstalledDomain domain;
-  if (!options.domain.empty()) {
-    auto installed = ReadInstalledDomain(options.domain, access);
-    if (!installed) RefuseDomain(options.domain, access);
-    domain = std::move(*installed);
-  }
+  if (!options.domain.empty()) domain = RequireInstalledDomain(options.domain, access);
   const Descriptor file = CreateFile(options.file);
   ExitCode end = kWell;
   const Observations observations = Observe(options, access, end);

@@ -52,10 +52,9 @@ ExitCode Set(const std::string& word, const std::string& check, std::vector<std:
   const bool grant = ReadGrant(words.back());
   words.pop_back();
   const CheckedNumbers rule = ReadNumbers(check, words, access);
-  return Change(
-      "param-check set",
-      [&] { SecPolicy::SetParamCheckRule(domain.id, rule.check, &rule.numbers, grant ? 1 : 0); },
-      [] { return std::string(); });
+  return Change("param-check set", [&] {
+    SecPolicy::SetParamCheckRule(domain.id, rule.check, &rule.numbers, grant ? 1 : 0);
+  });
 }
 
 Action DefineSet(Syntax& syntax) {

@@ -18,14 +18,14 @@ namespace {
 ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
                 const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const auto domain = ReadInstalledDomain(FindDomain(name, access).name, access);
-  if (!domain) RefuseDomain(name, access);
+  const Policy::InstalledDomain domain =
+      RequireInstalledDomain(FindDomain(name, access).name, access);
   const Question question = ReadQuestion(words, access);
-  const Policy::Decision decision = Policy::Decide(question.asked, *domain);
+  const Policy::Decision decision = Policy::Decide(question.asked, domain);
   if (format == "json") {
-    std::cout << WhyToJson(question, *domain, decision).Text();
+    std::cout << WhyToJson(question, domain, decision).Text();
   } else {
-    WriteAnswer(question, *domain, decision, std::cout);
+    WriteAnswer(question, domain, decision, std::cout);
   }
   return decision.IsAllowed() ? kWell : kFailed;
 }

@@ -5,7 +5,7 @@
 
 #include "host/linux/operation/label_index.h"
 #include "installed/installed_policy.h"
-#include "query/question.h"
+#include "query/named.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -34,13 +34,6 @@ LabelIndex ReadNewestIndex() {
   return LinuxHost::ReadLabelIndex();
 }
 
-Policy::InstalledDomain FindDomain(const std::string& name,
-                                   SecPolicy::TeskAccessInterfaceImpl& access) {
-  auto domain = ReadInstalledDomain(name, access);
-  if (!domain) RefuseDomain(name, access);
-  return std::move(*domain);
-}
-
 }  // namespace
 
 PlanSources::PlanSources(SecPolicy::TeskAccessInterfaceImpl& access,
@@ -61,12 +54,12 @@ std::string PlanSources::Explain(const Policy::InstalledDomain& domain) {
 }
 
 Enforce::CompiledPlan PlanOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain domain = FindDomain(name, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
   return PlanSources(access, Enforce::ProbeFeatures()).Compile(domain);
 }
 
 std::string ExplanationOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain domain = FindDomain(name, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
   return PlanSources(access, Enforce::ProbeFeatures()).Explain(domain);
 }
 

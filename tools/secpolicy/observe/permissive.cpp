@@ -9,7 +9,7 @@
 #include "host/linux/operation/log_use.h"
 #include "installed/installed_policy.h"
 #include "proposal.h"
-#include "query/question.h"
+#include "query/named.h"
 #include "text/visible.h"
 #include "watch.h"
 
@@ -35,15 +35,14 @@ void TellRefused(const std::string& verb, const std::string& domain,
 
 ExitCode RunPermissive(const std::string& verb, const Entry& entry,
                        SecPolicy::TeskAccessInterfaceImpl& access) {
-  const auto domain = ReadInstalledDomain(entry.domain, access);
-  if (!domain) RefuseDomain(entry.domain, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(entry.domain, access);
   Observations seen;
   const auto judge = [&](const Policy::Question& question, const std::string& program) {
-    if (!seen.Note(question, program) || IsGranted(question, *domain)) return;
+    if (!seen.Note(question, program) || IsGranted(question, domain)) return;
     TellRefused(verb, entry.domain, question);
   };
   const auto isNoticed = [&](std::string_view call) {
-    return Enforce::AsksMore(call) || !Decide(AskCall(call), *domain).granted;
+    return Enforce::AsksMore(call) || !Decide(AskCall(call), domain).granted;
   };
   const auto notice = [&](const Enforce::Attempt& attempt) {
     if (!attempt.isStart) judge(AskCall(attempt.call), attempt.program);

@@ -2,8 +2,10 @@
 
 #include <charconv>
 #include <optional>
+#include <utility>
 #include <vector>
 
+#include "installed/installed_policy.h"
 #include "question.h"
 
 namespace SecPolicyCli {
@@ -12,14 +14,6 @@ namespace {
 using SecPolicy::TeskAccessInterfaceImpl;
 
 constexpr auto kObjects = TeskCtl::Security::TESKACCESS_KEYWORD_LABEL;
-
-std::optional<unsigned int> ReadNumber(const std::string& word) {
-  unsigned int number = 0;
-  const char* const end = word.data() + word.size();
-  const auto read = std::from_chars(word.data(), end, number);
-  if (read.ec != std::errc() || read.ptr != end) return std::nullopt;
-  return number;
-}
 
 // Empty when there is none.
 std::string NameOfDomain(unsigned int id) {
@@ -31,6 +25,21 @@ std::string NameOfDomain(unsigned int id) {
 }
 
 }  // namespace
+
+std::optional<unsigned int> ReadNumber(const std::string& word) {
+  unsigned int number = 0;
+  const char* const end = word.data() + word.size();
+  const auto read = std::from_chars(word.data(), end, number);
+  if (read.ec != std::errc() || read.ptr != end) return std::nullopt;
+  return number;
+}
+
+Policy::InstalledDomain RequireInstalledDomain(const std::string& name,
+                                               TeskAccessInterfaceImpl& access) {
+  auto domain = ReadInstalledDomain(name, access);
+  if (!domain) RefuseDomain(name, access);
+  return std::move(*domain);
+}
 
 NamedDomain FindDomain(const std::string& word, TeskAccessInterfaceImpl& access) {
   unsigned int id = 0;

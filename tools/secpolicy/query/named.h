@@ -3,6 +3,7 @@
 #include <optional>
 #include <string>
 
+#include "policy/installed_policy.h"
 #include "secpolicy/secpolicy.h"
 
 // What people name by its name or its number. A name counts before a number that is written the
@@ -16,6 +17,13 @@ struct NamedDomain {
 };
 
 NamedDomain FindDomain(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The installed domain with this very name, with its rules.
+Policy::InstalledDomain RequireInstalledDomain(const std::string& name,
+                                               SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The number that the word is in decimal; nothing when it is none.
+std::optional<unsigned int> ReadNumber(const std::string& word);
 
 // The name of the object label with the number `word`; nothing when there is none.
 std::optional<std::string> FindObjectByNumber(const std::string& word,

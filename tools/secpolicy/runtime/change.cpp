@@ -1,6 +1,6 @@
 #include "change.h"
 
-#include <charconv>
+#include <climits>
 #include <memory>
 #include <vector>
 
@@ -48,10 +48,8 @@ bool ReadGrant(const std::string& word) {
 }
 
 int ReadProcess(const std::string& word) {
-  int process = 0;
-  const char* const end = word.data() + word.size();
-  const auto read = std::from_chars(word.data(), end, process);
-  if (read.ec == std::errc() && read.ptr == end && process > 0) return process;
+  const auto process = ReadNumber(word);
+  if (process && *process > 0 && *process <= INT_MAX) return static_cast<int>(*process);
   throw QuestionError("'" + word + "' is not the number of a process");
 }
 

@@ -13,8 +13,9 @@ namespace SecPolicyCli {
 
 // Makes one call that changes what is installed, and ends `verb` with a summary. After a failure,
 // `whyNot` is asked for its cause and what to do, of which it may know nothing.
-ExitCode Change(const std::string& verb, const std::function<void()>& change,
-                const std::function<std::string()>& whyNot);
+ExitCode Change(
+    const std::string& verb, const std::function<void()>& change,
+    const std::function<std::string()>& whyNot = [] { return std::string(); });
 
 // Adds the required argument DOMAIN, a name or a number, to `syntax`.
 std::shared_ptr<const std::string> AddDomain(Syntax& syntax);
