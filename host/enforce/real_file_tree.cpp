@@ -10,32 +10,57 @@
 #include <cerrno>
 #include <cstring>
 #include <memory>
+#include <string_view>
 
 #include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
 #include "host/enforce/features.h"
+#include "host/enforce/supervise/file_descriptor.h"
 
 namespace Enforce {
 namespace {
 
-// True where the system refused to look, at whatever it is: what a filter of system calls answers,
-// and where there is no room for another file.
+// What a filter of system calls answers to those that it does not know.
+bool IsRefusedCall(int error) { return error == ENOSYS || error == EPERM; }
+
+// True where the system refused to look, at whatever it is.
 bool IsAboutThisProcess(int error) {
-  return error == ENOSYS || error == EPERM || error == EMFILE || error == ENFILE || error == ENOMEM;
+  return IsRefusedCall(error) || error == EMFILE || error == ENFILE || error == ENOMEM;
+}
+
+int OpenAtOnce(const std::string& path, int flags) {
+  open_how how{};
+  how.flags = static_cast<unsigned>(flags);
+  how.resolve = RESOLVE_NO_SYMLINKS;
+  return static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how));
+}
+
+// As OpenAtOnce, for processes whose filter of system calls is older than openat2.
+int OpenNameByName(std::string_view path, int flags) {
+  FileDescriptor directory(open("/", O_PATH | O_CLOEXEC));
+  path.remove_prefix(1);
+  for (auto slash = path.find('/'); slash != path.npos; slash = path.find('/')) {
+    const std::string name(path.substr(0, slash));
+    directory =
+        FileDescriptor(openat(directory.Number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+    if (!directory.IsOpen()) return -1;
+    path.remove_prefix(slash + 1);
+  }
+  const std::string last(path.empty() ? "." : path);
+  return openat(directory.Number(), last.c_str(), flags);
 }
 
 // Opens what is at the path and only there: a link on the way leads nowhere. Throws BraxoException
 // where this process cannot look, which does not mean that there is nothing.
-int OpenPlainly(const std::string& path, std::uint64_t flags) {
-  open_how how{};
-  how.flags = flags | O_NOFOLLOW | O_CLOEXEC;
-  how.resolve = RESOLVE_NO_SYMLINKS;
-  const auto file = syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how);
+int OpenPlainly(const std::string& path, int flags) {
+  flags |= O_NOFOLLOW | O_CLOEXEC;
+  int file = OpenAtOnce(path, flags);
+  if (file < 0 && IsRefusedCall(errno)) file = OpenNameByName(path, flags);
   if (file < 0 && IsAboutThisProcess(errno)) {
     throw Braxo::Lib::BraxoException(
         Braxo::Misc::StrCat("Unable to look for ", path, ": ", std::strerror(errno)));
   }
-  return static_cast<int>(file);
+  return file;
 }
 
 FileKind KindOfMode(mode_t mode) {

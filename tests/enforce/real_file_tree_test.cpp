@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <initializer_list>
 #include <iostream>
 
 #include "braxo/lib/exception.h"
@@ -12,11 +13,18 @@
 namespace EnforceTest {
 namespace {
 
-// Ends this process, which may no longer call openat2, with 0 where the tree says so.
-[[noreturn]] void LookWithoutTheCall() {
+// From now on the kernel does not know these calls, as far as this process can tell.
+void Refuse(std::initializer_list<int> calls) {
   const scmp_filter_ctx filter = seccomp_init(SCMP_ACT_ALLOW);
-  if (seccomp_rule_add(filter, SCMP_ACT_ERRNO(ENOSYS), SCMP_SYS(openat2), 0) != 0) _exit(2);
+  for (const int call : calls) {
+    if (seccomp_rule_add(filter, SCMP_ACT_ERRNO(ENOSYS), call, 0) != 0) _exit(2);
+  }
   if (seccomp_load(filter) != 0) _exit(3);
+}
+
+// Ends this process with 0 where the tree says that it cannot look.
+[[noreturn]] void LookWithoutAnyCall() {
+  Refuse({SCMP_SYS(openat2), SCMP_SYS(openat)});
   try {
     Enforce::RealFileTree().KindOf("/");
   } catch (const Braxo::Lib::BraxoException& failure) {
@@ -26,16 +34,31 @@ namespace {
   _exit(1);
 }
 
-TEST(RealFileTree, TellsWhatIsThere) {
+void ExpectKnownPlaces() {
   Enforce::RealFileTree tree;
   EXPECT_EQ(tree.KindOf("/"), Enforce::FileKind::kDirectory);
   EXPECT_EQ(tree.KindOf("/dev/null"), Enforce::FileKind::kFile);
+  EXPECT_EQ(tree.KindOf("/proc/self"), Enforce::FileKind::kLink);
+  EXPECT_EQ(tree.KindOf("/proc/self/status"), Enforce::FileKind::kNothing);
   EXPECT_EQ(tree.KindOf("/no/such/place"), Enforce::FileKind::kNothing);
+}
+
+// Ends this process with 0 where the tree is the same to it without openat2.
+[[noreturn]] void LookNameByName() {
+  Refuse({SCMP_SYS(openat2)});
+  ExpectKnownPlaces();
+  _exit(testing::Test::HasFailure() ? 1 : 0);
+}
+
+TEST(RealFileTree, TellsWhatIsThere) { ExpectKnownPlaces(); }
+
+TEST(RealFileTree, LooksNameByNameWhereAFilterIsOlderThanTheCall) {
+  EXPECT_EXIT(LookNameByName(), testing::ExitedWithCode(0), "");
 }
 
 // As if nothing were there, plans would name no path at all.
 TEST(RealFileTree, DoesNotTakeWhatItMayNotLookForAsMissing) {
-  EXPECT_EXIT(LookWithoutTheCall(), testing::ExitedWithCode(0),
+  EXPECT_EXIT(LookWithoutAnyCall(), testing::ExitedWithCode(0),
               "^Unable to look for /: Function not implemented$");
 }
 
