@@ -1,3 +1,5 @@
+#include "host/linux/files/real_path.h"
+
 #include <fcntl.h>
 #include <linux/openat2.h>
 #include <sys/syscall.h>
@@ -5,12 +7,16 @@
 #include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <functional>
+#include <optional>
+#include <set>
+#include <string>
 #include <string_view>
 
 #include "host/linux/common/descriptor.h"
 #include "zorvan/kernel.h"
 
-namespace Zorvan::Kernel {
+namespace LinuxHost {
 namespace {
 
 constexpr std::size_t kResolvedSize = 1984;  // as in the kernel's own file records
@@ -27,12 +33,27 @@ bool IsOfNames(std::string_view path) {
   return true;
 }
 
-bool LeadsOverNoLink(const char* path) {
+// Those that were found to lead over no link, where they are remembered.
+std::optional<std::set<std::string, std::less<>>>& Remembered() {
+  thread_local std::optional<std::set<std::string, std::less<>>> paths;
+  return paths;
+}
+
+bool IsOpenedWithoutLinks(const char* path) {
   open_how how{};
   how.flags = O_PATH | O_CLOEXEC;
   how.resolve = RESOLVE_NO_SYMLINKS;
   const auto opened = syscall(SYS_openat2, AT_FDCWD, path, &how, sizeof how);
-  return LinuxHost::Descriptor(static_cast<int>(opened)).IsOpen();
+  return Descriptor(static_cast<int>(opened)).IsOpen();
+}
+
+bool LeadsOverNoLink(const char* path) {
+  auto& remembered = Remembered();
+  if (!remembered) return IsOpenedWithoutLinks(path);
+  if (remembered->contains(path)) return true;
+  if (!IsOpenedWithoutLinks(path)) return false;
+  remembered->emplace(path);
+  return true;
 }
 
 int Take(const char* path, char* resolved) {
@@ -44,12 +65,22 @@ int Take(const char* path, char* resolved) {
 
 }  // namespace
 
+OneLook::OneLook() { Remembered().emplace(); }
+
+OneLook::~OneLook() { Remembered().reset(); }
+
+}  // namespace LinuxHost
+
+namespace Zorvan::Kernel {
+
 // Most paths are written as they resolve, which the kernel tells in one step.
 int RealPath(const char* path, char* resolved) {
-  if (IsOfNames(path) && LeadsOverNoLink(path)) return Take(path, resolved);
+  if (LinuxHost::IsOfNames(path) && LinuxHost::LeadsOverNoLink(path)) {
+    return LinuxHost::Take(path, resolved);
+  }
   char canonical[PATH_MAX];
   if (realpath(path, canonical) == nullptr) return -1;
-  return Take(canonical, resolved);
+  return LinuxHost::Take(canonical, resolved);
 }
 
 }  // namespace Zorvan::Kernel

@@ -123,14 +123,16 @@ FilePolicy ToFilePolicy(const TeskAccess_FileRule& rule, unsigned int domainId, 
           .permission = rule.permission};
 }
 
-std::vector<FilePolicy> ReadFilePolicies(std::uint64_t address, std::uint32_t count,
-                                         unsigned int domainId, int world) {
+// Says `count` to the caller as soon as it can be said.
+std::vector<FilePolicy> TakeFilePolicies(std::uint64_t address, std::uint32_t count,
+                                         unsigned int domainId, int world, std::uint64_t told) {
   std::vector<FilePolicy> policies;
   policies.reserve(count);
   std::array<TeskAccess_FileRule, kPiece> piece;
   while (policies.size() < count) {
     const std::size_t size = std::min(kPiece, count - policies.size());
-    ReadUser(address + policies.size() * sizeof piece[0], piece.data(), size * sizeof piece[0]);
+    ReadAndWriteUser(address + policies.size() * sizeof piece[0], piece.data(),
+                     size * sizeof piece[0], told, &count, sizeof count);
     for (std::size_t index = 0; index < size; ++index) {
       policies.push_back(ToFilePolicy(piece[index], domainId, world));
     }
@@ -141,10 +143,11 @@ std::vector<FilePolicy> ReadFilePolicies(std::uint64_t address, std::uint32_t co
 std::uint32_t AddFilePolicies(HostState& state, Args args) {
   const std::uint32_t count = Unsigned(args[3]);
   if (count == 0 || count > kMaxBatch) throw HostError(EINVAL, "bad number of file policies");
-  auto policies = ReadFilePolicies(args[2], count, Unsigned(args[1]), Signed(args[0]));
-  for (FilePolicy& policy : policies) policy.line = state.CurrentLine();
-  Store(args[4], count);
+  const unsigned int domainId = Unsigned(args[1]);
+  const int world = Signed(args[0]);
   try {
+    auto policies = TakeFilePolicies(args[2], count, domainId, world, args[4]);
+    for (FilePolicy& policy : policies) policy.line = state.CurrentLine();
     state.FilePolicies().Install(policies);
   } catch (...) {
     Store(args[4], std::uint32_t{0});

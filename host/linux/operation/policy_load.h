@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "host/linux/files/real_path.h"
+
 // A policy that is installed from files as a whole. Everything throws Braxo::Lib::BraxoException
 // when the state cannot be used.
 namespace LinuxHost {
@@ -67,6 +69,7 @@ class PolicyTransaction {
  private:
   std::shared_ptr<HostState> state;
   std::unique_ptr<Transaction> transaction;
+  const OneLook look;
   LoadKind kind = LoadKind::kFull;
   std::vector<std::string> defined;
 };

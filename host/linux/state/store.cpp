@@ -7,7 +7,6 @@
 #include "host/linux/state/store.h"
 
 #include <fcntl.h>
-#include <pthread.h>
 #include <sqlite3.h>
 #include <sys/file.h>
 #include <sys/stat.h>
@@ -26,6 +25,7 @@
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
+#include "host/linux/common/this_process.h"
 
 using Braxo::Misc::StrCat;
 
@@ -73,15 +73,6 @@ const char* RemedyFor(int result) {
 void Abandon(sqlite3* database) {
   static auto* abandoned = new std::vector<sqlite3*>;
   abandoned->push_back(database);
-}
-
-// How often this process, or the one that it is a copy of, was forked into what it is. To ask the
-// system for the process would cost a call for each statement.
-unsigned int ForksUntilNow() {
-  static std::atomic<unsigned int> forks = 0;
-  [[maybe_unused]] static const int registered =
-      pthread_atfork(nullptr, nullptr, [] { forks.fetch_add(1, std::memory_order_relaxed); });
-  return forks.load(std::memory_order_relaxed);
 }
 
 // Held while a database is set up, so that one process does it and the others wait.

@@ -4,6 +4,7 @@
 
 #include <climits>
 
+#include "host/linux/files/real_path.h"
 #include "kitlibs/file.h"
 #include "scratch_root.h"
 #include "zorvan/kernel.h"
@@ -48,6 +49,31 @@ TEST_F(Files, RealPathFailsForWhatCannotBeResolved) {
   EXPECT_EQ(RealPath(Directory() + "/missing"), "(none)");
   EXPECT_EQ(RealPath(Directory() + "/root/loop"), "(none)");
   EXPECT_EQ(RealPath(""), "(none)");
+}
+
+TEST_F(Files, RealPathLooksOnceForWhatIsNoLinkWhileALoadLasts) {
+  scratch.Write("file", "text");
+  const std::string real = Directory() + "/root/file";
+  {
+    const LinuxHost::OneLook look;
+    EXPECT_EQ(RealPath(real), real);
+    std::filesystem::remove(real);
+    EXPECT_EQ(RealPath(real), real);
+  }
+  EXPECT_EQ(RealPath(real), "(none)");
+}
+
+TEST_F(Files, RealPathFollowsEachLinkAnewWhileALoadLasts) {
+  scratch.Write("first", "text");
+  scratch.Write("second", "text");
+  const std::filesystem::path link = scratch.Root() / "link";
+  const LinuxHost::OneLook look;
+  for (const std::string target : {"missing", "first", "second"}) {
+    std::filesystem::remove(link);
+    std::filesystem::create_symlink(target, link);
+    const std::string real = Directory() + "/root/" + target;
+    EXPECT_EQ(RealPath(Directory() + "/root/link"), target == "missing" ? "(none)" : real);
+  }
 }
 
 TEST_F(Files, RealPathFillsTheBufferAndNoMore) {

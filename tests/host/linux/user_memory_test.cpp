@@ -8,12 +8,15 @@
 
 #include <cerrno>
 #include <cstring>
+#include <stdexcept>
 
+#include "child_process.h"
 #include "host/linux/common/host_error.h"
 
 namespace LinuxHostTest {
 namespace {
 
+using LinuxHost::ReadAndWriteUser;
 using LinuxHost::ReadUser;
 using LinuxHost::ReadUserText;
 using LinuxHost::WriteUser;
@@ -52,6 +55,36 @@ TEST_F(UserMemory, IsReadAndWritten) {
   char copy[5];
   ReadUser(Address(page), copy, 5);
   EXPECT_EQ(std::string(copy, 5), "12345");
+}
+
+TEST_F(UserMemory, IsReadAndWrittenInOneStep) {
+  WriteUser(Address(page), "12345", 5);
+  char copy[5];
+  ReadAndWriteUser(Address(page), copy, 5, Address(page + 2), "abc", 3);
+  EXPECT_EQ(std::string(copy, 5), "12345");
+  EXPECT_EQ(std::string(page, 5), "12abc");
+}
+
+TEST_F(UserMemory, IsNotWrittenWhereItCannotBeRead) {
+  char copy[5];
+  const auto exchange = [&](const char* source, const char* target) {
+    return CodeOf([&] { ReadAndWriteUser(Address(source), copy, 5, Address(target), "abc", 3); });
+  };
+  EXPECT_EQ(exchange(page + kPage, page), EFAULT);
+  EXPECT_EQ(std::string(page, 3), std::string(3, '\0'));
+  EXPECT_EQ(exchange(page, page + kPage - 2), EFAULT);
+  EXPECT_EQ(exchange(page, nullptr), EFAULT);
+}
+
+TEST_F(UserMemory, IsTheOwnOneAlsoAfterAFork) {
+  WriteUser(Address(page), "parent", 7);
+  EXPECT_EQ(RunInChild([&] {
+              WriteUser(Address(page), "child!", 7);
+              if (ReadUserText(Address(page), 10) != "child!")
+                throw std::runtime_error("another's");
+            }),
+            "");
+  EXPECT_EQ(ReadUserText(Address(page), 10), "parent");
 }
 
 TEST_F(UserMemory, EndsWhereThePageEnds) {
