@@ -2,17 +2,21 @@
 # be precompiled; a compiler cache does better without.
 option(SECPOLICY_PRECOMPILE "Precompile the standard headers that most units include" OFF)
 
-function(precompile_standard_headers target)
-  if(SECPOLICY_PRECOMPILE)
-    target_precompile_headers(${target} PRIVATE
-      <algorithm> <array> <cerrno> <cstring> <exception> <filesystem> <fstream> <functional> <iostream>
-      <map> <memory> <optional> <set> <sstream> <stdexcept> <string> <string_view> <variant> <vector>)
-  endif()
-endfunction()
-
 # For a target that is compiled as `other` is.
 function(share_precompiled_headers target other)
   if(SECPOLICY_PRECOMPILE)
     target_precompile_headers(${target} REUSE_FROM ${other})
   endif()
+endfunction()
+
+# All targets that are no programs of their own are compiled alike, and so read the same.
+function(precompile_standard_headers target)
+  if(SECPOLICY_PRECOMPILE AND NOT TARGET standard_headers)
+    file(WRITE "${PROJECT_BINARY_DIR}/standard_headers.cpp" "")
+    add_library(standard_headers OBJECT "${PROJECT_BINARY_DIR}/standard_headers.cpp")
+    target_precompile_headers(standard_headers PRIVATE
+      <algorithm> <array> <cerrno> <cstring> <exception> <filesystem> <fstream> <functional> <iostream>
+      <map> <memory> <optional> <set> <sstream> <stdexcept> <string> <string_view> <variant> <vector>)
+  endif()
+  share_precompiled_headers(${target} standard_headers)
 endfunction()
