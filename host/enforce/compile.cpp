@@ -175,6 +175,8 @@ CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts
   plan.capabilities = parts.capabilities.kept;
   plan.filter = std::move(parts.calls.program);
   plan.secret = parts.calls.secret;
+  plan.mayEnd = parts.calls.mayEnd;
+  plan.mayMap = parts.calls.mayMap;
   return compiled;
 }
 

@@ -139,7 +139,7 @@ inline int OpenPlace(const char* path) { return OpenWithoutLinks(path, O_PATH); 
 // No way of opening a file waits, and no terminal becomes this process's.
 inline constexpr int kForReading = O_RDONLY | O_NONBLOCK | O_NOCTTY;
 
-// execve and execveat with `secret` where a filter looks for it. Return only when they fail.
+// execve and execveat with `secret` where a filter looks for it. They return only when they fail.
 inline int Execute(const char* path, char* const* arguments, char* const* environment,
                    std::uint64_t secret) {
   return static_cast<int>(syscall(SYS_execve, path, arguments, environment, 0, 0, secret));
@@ -149,6 +149,15 @@ inline int ExecuteDescriptor(int program, char* const* arguments, char* const* e
                              std::uint64_t secret) {
   return static_cast<int>(
       syscall(SYS_execveat, program, "", arguments, environment, AT_EMPTY_PATH, secret));
+}
+
+// write to standard error, and exit_group, likewise.
+inline void Tell(const char* text, std::size_t size, std::uint64_t secret) {
+  syscall(SYS_write, STDERR_FILENO, text, size, 0, 0, secret);
+}
+
+inline void End(int exitStatus, std::uint64_t secret) {
+  syscall(SYS_exit_group, exitStatus, 0, 0, 0, 0, secret);
 }
 
 }  // namespace Enforce::Kernel

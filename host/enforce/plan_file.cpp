@@ -10,7 +10,7 @@ namespace Enforce {
 namespace {
 
 constexpr std::string_view kMagic = "secpolicy-plan\n";
-constexpr std::uint32_t kVersion = 2;
+constexpr std::uint32_t kVersion = 3;
 
 class Writer {
  public:
@@ -167,6 +167,8 @@ void ReadPlan(Reader& reader, Plan* plan) {
   plan->capabilities = reader.Take<std::uint64_t>();
   plan->filter = reader.TakeAll<sock_filter>();
   plan->secret = ReadSecret(reader);
+  plan->mayEnd = reader.TakeFlag();
+  plan->mayMap = reader.TakeFlag();
 }
 
 bool IsAbsolute(const std::string& path) {
@@ -238,6 +240,8 @@ std::string Serialize(const Plan& plan) {
   writer.Put(plan.capabilities);
   writer.PutAll(plan.filter);
   Write(writer, plan.secret);
+  writer.Put(static_cast<std::uint8_t>(plan.mayEnd));
+  writer.Put(static_cast<std::uint8_t>(plan.mayMap));
   writer.Put(Checksum(writer.bytes));
   return std::move(writer.bytes);
 }

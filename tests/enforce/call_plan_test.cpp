@@ -105,8 +105,22 @@ TEST(PlanCalls, LetsOneExecvePassWithASecret) {
   EXPECT_EQ(Ask(plan, "execveat"), "EPERM");
 }
 
-TEST(PlanCalls, NeedsNoSecretWhereBothAreGranted) {
-  const CallPlan plan = PlanOf({"-s execve grant", "-s execveat grant"});
+// Or nobody would be told that the program could not be executed.
+TEST(PlanCalls, LetsTheLauncherTellAndEndWithTheSecret) {
+  CallPlan plan = PlanOf({"-s read grant", "-s write revoke"});
+  const Arguments guess = {0, 0, 0, 0, 0, 42};
+  ASSERT_TRUE(plan.secret);
+  SetSecret(plan.program.data(), *plan.secret, 42);
+  for (const char* const call : {"write", "exit_group"}) {
+    EXPECT_EQ(Ask(plan, call, guess), "allowed") << call;
+    EXPECT_EQ(Ask(plan, call), "EPERM") << call;
+  }
+  EXPECT_EQ(Ask(plan, "exit", guess), "EPERM");
+}
+
+TEST(PlanCalls, NeedsNoSecretWhereAllIsGrantedThatTheLauncherCalls) {
+  const CallPlan plan =
+      PlanOf({"-s execve grant", "-s execveat grant", "-s exit_group grant", "-s write grant"});
   EXPECT_FALSE(plan.secret);
   EXPECT_EQ(Ask(plan, "execve"), "allowed");
   EXPECT_EQ(Ask(plan, "execveat"), "allowed");

@@ -76,6 +76,21 @@ TEST(Compile, TakesWhatEachPartHas) {
   EXPECT_TRUE(compiled.plan.secret.has_value());
 }
 
+// What says that nothing can start there.
+TEST(Compile, KnowsWhetherProgramsMayEndAndMapFiles) {
+  const auto of = [](const std::vector<std::string>& lines) {
+    const CompiledPlan compiled = CompileOn(NewKernel(), lines);
+    return std::pair(compiled.plan.mayEnd, compiled.plan.mayMap);
+  };
+  EXPECT_EQ(of({"-s @start grant"}), std::pair(true, true));
+  EXPECT_EQ(of({"-s @io grant"}), std::pair(false, false));
+  EXPECT_EQ(of({"-s exit grant"}), std::pair(true, false));
+  EXPECT_EQ(of({"-s exit_group grant", "-s mmap grant"}), std::pair(true, true));
+  EXPECT_EQ(of({"-s @start grant", "-s mmap revoke"}), std::pair(true, false));
+  EXPECT_EQ(of({"-s @start grant", "-s exit revoke", "-s exit_group revoke"}),
+            std::pair(false, true));
+}
+
 TEST(Compile, TellsWhatAKernelWithoutLandlockCannotRefuse) {
   for (const int version : {0, 1, 2}) {
     Features features = NewKernel();

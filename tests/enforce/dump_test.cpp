@@ -31,7 +31,7 @@ TEST(Dump, ShowsCalls) {
       "allowed where argument 2 in 1-8 10-15: kill\n"
       "allowed where argument 2 in 21505 0x80045430: ioctl\n"
       "allowed where argument 3 in 1-8 10-15: tgkill\n"
-      "refused but to enter: execve execveat\n"
+      "refused but to enter: execve execveat exit_group write\n"
       "refused: all others\n");
 }
 
@@ -47,7 +47,7 @@ TEST(Dump, ShowsWhatIsClosedBesides) {
       "3-9 11-0xffffffff or argument 2 & 255 in 1, and argument 1 in 0-1 3-9 11-0xffffffff or "
       "argument 3 in 0 6: socket\n"
       "allowed where argument 4 & 0x20000000 in 0: sendto\n"
-      "refused but to enter: execveat\n"
+      "refused but to enter: execveat exit_group write\n"
       "refused: all others\n");
 }
 

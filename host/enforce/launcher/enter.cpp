@@ -6,12 +6,14 @@
 
 #include <algorithm>
 #include <limits>
+#include <utility>
 
 #include "host/enforce/kernel.h"
 #include "host/enforce/launcher/masking.h"
 #include "host/enforce/launcher/privileges.h"
 #include "host/enforce/launcher/refuse.h"
 #include "host/enforce/launcher/ruleset.h"
+#include "host/enforce/launcher/startable.h"
 
 namespace Enforce {
 namespace {
@@ -64,7 +66,12 @@ std::uint64_t FilterCalls(Plan* plan) {
 }  // namespace
 
 void Enter(Plan plan, const Program& program, std::vector<int> keptDescriptors) {
-  if (plan.level != Policy::Level::kEnforcing) Start(program, 0, "");
+  const std::string failure = "cannot execute " + program.path;
+  if (plan.level != Policy::Level::kEnforcing) {
+    Start(program, 0);
+    RefuseForErrno(failure);
+  }
+  RequireStartable(plan, program);
   if (program.descriptor >= 0) keptDescriptors.push_back(program.descriptor);
   CloseAllBut(keptDescriptors);
   keptDescriptors.insert(keptDescriptors.end(), {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO});
@@ -72,10 +79,12 @@ void Enter(Plan plan, const Program& program, std::vector<int> keptDescriptors) 
   const std::uint64_t kept = plan.capabilities & OwnCapabilities();
   ApplyMasks(plan.masks, keptDescriptors);
   const int ruleset = PrepareRuleset(plan);
-  const std::string surroundings = " in the domain " + plan.domain;
+  std::string refusal = PrepareRefusal(failure + " in the domain " + plan.domain);
   KeepCapabilities(kept);
   Restrict(ruleset);
-  Start(program, FilterCalls(&plan), surroundings);
+  const std::uint64_t secret = FilterCalls(&plan);
+  Start(program, secret);
+  RefuseForErrno(std::move(refusal), secret);
 }
 
 }  // namespace Enforce

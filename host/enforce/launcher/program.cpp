@@ -11,6 +11,7 @@
 #include <cstring>
 #include <string_view>
 
+#include "host/enforce/interpreter.h"
 #include "host/enforce/kernel.h"
 #include "host/enforce/launcher/refuse.h"
 
@@ -70,12 +71,6 @@ Found SearchPath(const std::string& name, Executed where) {
   Refuse("cannot execute " + name + ": " + std::strerror(reason));
 }
 
-bool IsScript(int program) {
-  char beginning[2] = {};
-  return pread(program, beginning, sizeof(beginning), 0) == sizeof(beginning) &&
-         std::string_view(beginning, sizeof(beginning)) == "#!";
-}
-
 }  // namespace
 
 Program FindProgram(char* const* arguments, char* const* environment, Executed where) {
@@ -93,13 +88,12 @@ Program ProgramOf(int descriptor, char* const* arguments, char* const* environme
   return {name, descriptor, arguments, environment};
 }
 
-void Start(const Program& program, std::uint64_t secret, const std::string& surroundings) {
+void Start(const Program& program, std::uint64_t secret) {
   if (program.descriptor >= 0) {
     Kernel::ExecuteDescriptor(program.descriptor, program.arguments, program.environment, secret);
   } else {
     Kernel::Execute(program.path.c_str(), program.arguments, program.environment, secret);
   }
-  RefuseForErrno("cannot execute " + program.path + surroundings);
 }
 
 }  // namespace Enforce

@@ -26,9 +26,8 @@ Program FindProgram(char* const* arguments, char* const* environment,
 // by the descriptor, and so is given what was meant here.
 Program ProgramOf(int descriptor, char* const* arguments, char* const* environment);
 
-// Becomes the program, with `secret` where a filter looks for it. Refuses when that fails;
-// `surroundings` says in the message where.
-[[noreturn]] void Start(const Program& program, std::uint64_t secret,
-                        const std::string& surroundings);
+// Becomes the program, with `secret` where a filter looks for it. Returns only when that fails,
+// with errno set.
+void Start(const Program& program, std::uint64_t secret);
 
 }  // namespace Enforce

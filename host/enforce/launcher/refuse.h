@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 namespace Enforce {
@@ -14,5 +15,10 @@ inline constexpr int kNotFound = 127;
 
 // The same for a system call that has just failed: "MESSAGE: SYSTEM ERROR".
 [[noreturn]] void RefuseForErrno(const std::string& message);
+
+// The beginning of that line, for a time when this process can be refused more memory, and when
+// only calls with `secret` may pass.
+std::string PrepareRefusal(const std::string& message);
+[[noreturn]] void RefuseForErrno(std::string prepared, std::uint64_t secret);
 
 }  // namespace Enforce

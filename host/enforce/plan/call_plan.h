@@ -16,7 +16,9 @@ namespace Enforce {
 struct CallPlan {
   std::map<int, CallVerdict> verdicts;  // on every known call, by its number
   std::vector<sock_filter> program;     // the same for the kernel
-  std::optional<SecretPlaces> secret;   // of the one execve that enters the domain
+  std::optional<SecretPlaces> secret;   // of the calls of the launcher that enters the domain
+  bool mayEnd = false;                  // by exit or exit_group
+  bool mayMap = false;                  // by mmap
   std::vector<RuleFate> fates;          // of the rules about calls and their arguments, in order
 };
 
@@ -24,9 +26,9 @@ struct CallPlan {
 // bind_port and connect_port: of these only what goes past a check of ports is closed. The level of
 // the domain has no say.
 //
-// Where execve is not granted, the program lets execve pass with the secret that SetSecret puts in,
-// and execveat too unless it is granted anyhow: so the domain is entered, and whoever was started
-// does not know the secret any more.
+// Where they are not granted, the program lets execve, execveat, write and exit_group pass with the
+// secret that SetSecret puts in: so the domain is entered, or its launcher tells why it could not
+// be, and whoever was started does not know the secret any more.
 //
 // The program is for the architecture that this is compiled for, and never longer than
 // kMostInstructions: of checks with more values than there is room for, all values are refused.

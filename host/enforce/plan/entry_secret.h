@@ -6,7 +6,8 @@
 #include <cstdint>
 #include <utility>
 
-// What lets the one program pass that a domain begins with, where no rule grants to execute.
+// What lets the one program pass that a domain begins with, where no rule grants to execute, and
+// the launcher tell that it could not be executed.
 namespace Enforce {
 
 // The instructions of a program that compare the last argument with the secret.
@@ -15,7 +16,7 @@ struct SecretPlaces {
   std::size_t upper = 0;
 };
 
-// The argument that carries the secret: neither execve nor execveat uses it.
+// The argument that carries the secret: no call that it is for uses it.
 constexpr unsigned int kSecretArgument = 5;
 
 // Makes the program let the calls pass that carry `secret`.

@@ -36,6 +36,8 @@ struct Plan {
 
   std::vector<sock_filter> filter;     // of system calls; none when empty
   std::optional<SecretPlaces> secret;  // in the filter, where it lets one program start
+  bool mayEnd = true;                  // the filter lets exit or exit_group pass
+  bool mayMap = true;                  // and mmap
 };
 
 }  // namespace Enforce

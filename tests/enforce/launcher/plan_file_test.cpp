@@ -40,6 +40,7 @@ Plan SamplePlan() {
                  BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, 1, 2, 3),
                  BPF_STMT(BPF_RET | BPF_K, 0x7fff'0000)};
   plan.secret = {1, 2};
+  plan.mayMap = false;
   return plan;
 }
 
@@ -78,6 +79,8 @@ TEST(PlanFile, KeepsAllOfAPlan) {
   ASSERT_TRUE(plan.secret);
   EXPECT_EQ(plan.secret->lower, 1);
   EXPECT_EQ(plan.secret->upper, 2);
+  EXPECT_TRUE(plan.mayEnd);
+  EXPECT_FALSE(plan.mayMap);
 }
 
 TEST(PlanFile, KeepsAPlanOfNothing) {
