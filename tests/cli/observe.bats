@@ -2,6 +2,7 @@
 # which it runs, and what rules would refuse is told and not refused.
 
 load helper
+load small_root
 
 setup() {
   needs_landlock
@@ -36,7 +37,7 @@ secpolicy_in_time() {
   make_service
   secpolicy_in_time observe --write "$domain" -- /opt/journal/bin/journal
   exits 0
-  [[ -z $output && $stderr == "secpolicy: observe: "*" lines proposed in $domain" ]]
+  [[ -z $output && $stderr == "secpolicy: observe: "*" lines proposed in $root$domain" ]]
   [[ $(head -n 1 "$root$domain") == "# Proposed from one run of /opt/journal/bin/journal" ]]
   grep -qx -- '-s @start grant   # what every program needs to start' "$root$domain"
   grep -qx -- '-a hostConfig read grant   # 1 file, first /etc/services.conf' "$root$domain"
@@ -93,6 +94,20 @@ secpolicy_in_time() {
   wrong_usage observe "observe: CMD is required, behind --"
 }
 
+@test "a root that was not booted, and one of another user" {
+  secpolicy observe -- /bin/sh
+  exits 126
+  ends_with "secpolicy: observe: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
+  [[ $(id -u) -eq 0 ]] || skip "only root can become another user"
+  boot
+  copy_programs
+  chmod 755 "$BATS_TEST_TMPDIR" "$root"
+  local user="This root is another user's: run it as that user, or as root."
+  run --separate-stderr "${ordinary[@]}" "$programs/secpolicy" --root "$root" observe -- /bin/sh
+  exits 126
+  [[ $stderr == "secpolicy: observe: Unable to use the host state "*". $user" ]]
+}
+
 @test "ports and what binds them" {
   boot
   secpolicy_in_time observe -- /bin/sh -c 'nc 127.0.0.1 9 || true'
@@ -124,11 +139,22 @@ secpolicy_in_time() {
   says "secpolicy: observe: cannot start /etc/services.conf: Permission denied"
 }
 
+@test "what cannot be started is proposed nothing" {
+  boot
+  run -127 --separate-stderr "$SECPOLICY" --root "$root" observe -- nothing
+  [[ -z $output && $stderr == "secpolicy: observe: cannot start nothing: No such file or directory" ]]
+  secpolicy observe --write "$domain" -- /etc/services.conf
+  exits 126
+  [[ $stderr == "secpolicy: observe: cannot start /etc/services.conf: Permission denied" && ! -e $root$domain ]]
+  run -127 --separate-stderr "$SECPOLICY" --root "$root" observe --write "$domain" -- nothing
+  [[ $stderr == "secpolicy: observe: cannot start nothing: No such file or directory" && ! -e $root$domain ]]
+}
+
 @test "a proposal never takes the place of a file" {
   boot
   secpolicy observe --write /etc/zorvan/secpolicy/domains/sshDom -- /bin/sh -c 'echo started'
   exits 126
-  [[ -z $output && $stderr == "secpolicy: observe: cannot make /etc/zorvan/secpolicy/domains/sshDom: File exists" ]]
+  [[ -z $output && $stderr == "secpolicy: observe: $policy/domains/sshDom is there already, and stays as it is: name a new file, or leave --write out and copy the lines that are printed" ]]
   cmp "$policy/domains/sshDom" "$SOURCE/examples/host/etc/zorvan/secpolicy/domains/sshDom"
 }
 

@@ -1,13 +1,16 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <iostream>
 #include <memory>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "command_line.h"
+#include "ending.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
@@ -19,6 +22,7 @@
 #include "query/ask.h"
 #include "query/named.h"
 #include "query/question.h"
+#include "root.h"
 #include "text/format.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -35,23 +39,46 @@ struct Options {
   std::vector<std::string> command;
 };
 
-// A proposal never takes the place of a policy file.
-Descriptor CreateFile(const std::string& file) {
-  if (file.empty()) return Descriptor(-1);
-  constexpr mode_t kMode = 0644;
-  Descriptor created(open(file.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
-  if (!created.IsOpen()) ThrowErrno("cannot make ", file);
-  return created;
-}
-
-void WriteFile(const std::string& file, const Descriptor& to, const std::string& text) {
-  std::size_t written = 0;
-  while (written < text.size()) {
-    const ssize_t count = write(to.Number(), text.data() + written, text.size() - written);
-    if (count < 0) ThrowErrno("cannot write ", file);
-    written += static_cast<std::size_t>(count);
+// A file that is made before anything is watched, so that nothing is watched in vain. It goes again
+// when nothing was written, and never takes the place of another.
+class NewFile {
+ public:
+  explicit NewFile(const std::string& file)
+      : path(file),
+        name(OutsidePath(file)),
+        created(open(file.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode)) {
+    if (created.IsOpen()) return;
+    if (errno != EEXIST) ThrowErrno("cannot make ", name);
+    throw LinuxHost::HostError(
+        EEXIST, name + " is there already, and stays as it is: name a new file, or leave --write " +
+                    "out and copy the lines that are printed");
   }
-}
+  NewFile(const NewFile&) = delete;
+  NewFile& operator=(const NewFile&) = delete;
+  ~NewFile() {
+    if (!isWritten) unlink(path.c_str());
+  }
+
+  const std::string& Name() const { return name; }
+
+  void Write(const std::string& text) {
+    std::size_t written = 0;
+    while (written < text.size()) {
+      const ssize_t count = write(created.Number(), text.data() + written, text.size() - written);
+      if (count < 0) ThrowErrno("cannot write ", name);
+      written += static_cast<std::size_t>(count);
+    }
+    isWritten = true;
+  }
+
+ private:
+  static constexpr mode_t kMode = 0644;
+
+  const std::string path;
+  const std::string name;  // for people
+  const Descriptor created;
+  bool isWritten = false;
+};
 
 // Not what every program does and nothing can be learnt from.
 bool IsNoticed(std::string_view call) {
@@ -69,9 +96,8 @@ bool IsOnlyTried(const Enforce::Attempt& attempt, const Policy::Question& questi
          ((isPair || attempt.call == "socket") && asked->check == "socket_type");
 }
 
-Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl& access,
-                     ExitCode& end) {
-  Observations observations;
+WatchedEnd Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl& access,
+                   Observations& observations) {
   const auto notice = [&](const Enforce::Attempt& attempt) {
     if (!attempt.isStart) {
       observations.Note(Policy::WordsQuestion{.kind = Policy::RuleKind::kSyscall,
@@ -84,8 +110,7 @@ Observations Observe(const Options& options, SecPolicy::TeskAccessInterfaceImpl&
       observations.Note(WithLabel(asked, access), program);
     }
   };
-  end = RunWatched("observe", options.command, {.isNoticed = IsNoticed, .notice = notice});
-  return observations;
+  return RunWatched("observe", options.command, {.isNoticed = IsNoticed, .notice = notice});
 }
 
 std::string TextOf(const Options& options, const std::vector<std::string>& lines) {
@@ -100,28 +125,31 @@ ExitCode Propose(const Options& options) {
   SecPolicy::TeskAccessInterfaceImpl access;
   Policy::InstalledDomain domain;
   if (!options.domain.empty()) domain = RequireInstalledDomain(options.domain, access);
-  const Descriptor file = CreateFile(options.file);
-  ExitCode end = kWell;
-  const Observations observations = Observe(options, access, end);
+  std::optional<NewFile> file;
+  if (!options.file.empty()) file.emplace(options.file);
+  Observations observations;
+  const WatchedEnd end = Observe(options, access, observations);
+  if (!end.isStarted) return end.exitCode;
   const std::vector<std::string> lines = SecPolicyCli::Propose(observations, domain);
   const std::string text = TextOf(options, lines);
-  if (!file.IsOpen()) {
+  if (!file) {
     std::cout << text;
-    return end;
+    return end.exitCode;
   }
-  WriteFile(options.file, file, text);
-  std::cerr << "secpolicy: observe: " << CountOf(lines.size(), "line") << " proposed in "
-            << Visible(options.file) << std::endl;
-  return end;
+  file->Write(text);
+  Summarize("observe", CountOf(lines.size(), "line") + " proposed in " + file->Name());
+  return end.exitCode;
 }
 
 ExitCode Start(const Options& options) {
   try {
     return Propose(options);
+  } catch (const LinuxHost::HostError& failure) {
+    Summarize("observe", WithAdvice(failure.what()));
   } catch (const Braxo::Lib::BraxoException& failure) {
-    std::cerr << "secpolicy: observe: " << Visible(failure.what()) << std::endl;
-    return kNotConfined;
+    Summarize("observe", failure.what());
   }
+  return kNotConfined;
 }
 
 // All that was given may stand behind "--": then there is no domain.
@@ -136,7 +164,10 @@ Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
   syntax.AddOption("DOMAIN", options->domain, "Leave out what the rules of this domain grant");
   syntax.AddList("CMD", options->command, "The program and its arguments, behind --");
-  syntax.AddOption("--write", options->file, "Write the lines to a new file").NameValue("FILE");
+  syntax
+      .AddOption("--write", options->file,
+                 "Write the lines to a new file, whose path begins at the root")
+      .NameValue("FILE");
   return [=, wordsBehindDashes = syntax.WordsBehindDashes()] {
     const auto start = [=] {
       TellDomainFromCommand(*options, wordsBehindDashes);
@@ -155,6 +186,8 @@ const Verb kObserve = {
     "prints the lines of a policy file by which a domain could have run it: system calls, checks,\n"
     "capabilities, and files by their labels, where they have one, else by their paths. Behind\n"
     "each line stands why it is there. With DOMAIN, what its installed rules grant is left out.\n"
+    "The root has to be booted, as the labels of its files are looked at, and FILE is seen from\n"
+    "there, as CMD is: with --root r, /etc/x is r/etc/x.\n"
     "A run shows only what it did: look at every line, and let the domain be permissive for a\n"
     "while.\n"
     "\n"

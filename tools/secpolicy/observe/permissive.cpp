@@ -52,12 +52,13 @@ ExitCode RunPermissive(const std::string& verb, const Entry& entry,
   };
   std::vector<std::string> variables = EnvironmentOf(entry);
   const std::vector<char*> environment = PointersTo(variables);
-  return RunWatched(verb, entry.command,
-                    {.program = entry.program.Number(),
-                     .environment = environment.data(),
-                     .isKilledAlong = entry.isForAnother,
-                     .isNoticed = isNoticed,
-                     .notice = notice});
+  const WatchedEnd end = RunWatched(verb, entry.command,
+                                    {.program = entry.program.Number(),
+                                     .environment = environment.data(),
+                                     .isKilledAlong = entry.isForAnother,
+                                     .isNoticed = isNoticed,
+                                     .notice = notice});
+  return end.exitCode;
 }
 
 }  // namespace SecPolicyCli

@@ -23,8 +23,8 @@ void OpenProc() { proc = open("/proc", O_PATH | O_DIRECTORY | O_CLOEXEC); }
 
 int ProcDirectory() { return proc; }
 
-ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& command,
-                    Enforce::Supervision supervision) {
+WatchedEnd RunWatched(const std::string& verb, const std::vector<std::string>& command,
+                      Enforce::Supervision supervision) {
   if (proc < 0) throw Braxo::Lib::BraxoException("programs cannot be watched without /proc");
   if (!Enforce::ProbeFeatures().notifies) {
     throw Braxo::Lib::BraxoException("this kernel has no filters that ask a supervisor");
@@ -32,10 +32,10 @@ ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& com
   std::cout << std::flush;
   supervision.procDirectory = proc;
   const Enforce::SupervisedEnd end = Enforce::Supervise(command, supervision);
-  if (end.startError == 0) return static_cast<ExitCode>(end.exitStatus);
+  if (end.startError == 0) return {true, static_cast<ExitCode>(end.exitStatus)};
   std::cerr << "secpolicy: " << verb << ": cannot start " << Visible(command.front()) << ": "
             << std::strerror(end.startError) << std::endl;
-  return end.startError == ENOENT ? static_cast<ExitCode>(kNotFound) : kNotConfined;
+  return {false, end.startError == ENOENT ? static_cast<ExitCode>(kNotFound) : kNotConfined};
 }
 
 }  // namespace SecPolicyCli

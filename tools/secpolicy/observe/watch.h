@@ -14,11 +14,15 @@ void OpenProc();
 // The number of that descriptor; -1 where there is no /proc.
 int ProcDirectory();
 
-// Runs `command` for the verb `verb` as `supervision` says, and returns what to end with: the exit
-// status of the program, 127 when there is none, 126 when it could not be started, both of which
-// are told. The descriptor of /proc is put in. Throws Braxo::Lib::BraxoException when it cannot be
-// watched.
-ExitCode RunWatched(const std::string& verb, const std::vector<std::string>& command,
-                    Enforce::Supervision supervision);
+struct WatchedEnd {
+  bool isStarted = false;  // the program; why it was not has been told
+  ExitCode exitCode =
+      kWell;  // of the program; 127 where there is none, 126 where it was not started
+};
+
+// Runs `command` for the verb `verb` as `supervision` says. The descriptor of /proc is put in.
+// Throws Braxo::Lib::BraxoException when it cannot be watched.
+WatchedEnd RunWatched(const std::string& verb, const std::vector<std::string>& command,
+                      Enforce::Supervision supervision);
 
 }  // namespace SecPolicyCli
