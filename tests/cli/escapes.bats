@@ -813,13 +813,14 @@ reaches() {
 
 @test "42 exec of a program that the domain which it leads to has a mask over" {
   too_many
-  domain narrowDom "${calls[@]}" '-r /t rx' '-r /t/secret r'
+  # Where rules cannot be kept to they are not asked beforehand: it is the mask that refuses.
+  domain narrowDom "${calls[@]}" '-r /t rx' '-r /t/secret r' '-p connect_port 25 revoke'
   domain wideDom "${calls[@]}" '-r /t rx'
   printf '%s\n' '-d secret narrowDom exec grant' '-d public wideDom exec grant' >>"$policy/domains/hostDom"
   boot_root
   as_machine
   is_masked "mounted so that nothing is executed: /t/secret"
-  secpolicy exec -- /t/secret/program read=/t/public/file
+  secpolicy exec --best-effort -- /t/secret/program read=/t/public/file
   exits 126
   [[ -z $output && $stderr == *"cannot execute /t/secret/program in the domain narrowDom: Permission denied"* ]]
   secpolicy exec -- /t/public/program read=/t/public/file

@@ -79,6 +79,9 @@ secpolicy_in_time() {
   exits 0
   [[ ${output##*$'\n'} == "-a vmDisk read grant   # 1 file, first /var/lib/vms/demo/disk" ]]
   [[ $(grep -c '^-' <<<"$output") -eq 1 ]]
+  secpolicy_in_time observe "$(domain_id monitorDom)" -- /bin/sh -c 'cat /opt/monitor/etc/agent.conf'
+  exits 0
+  ! grep -q '^-' <<<"$output" || return
   secpolicy observe monitordom -- /bin/sh
   wrong_usage observe "observe: there is no domain 'monitordom'; did you mean 'monitorDom'?"
 }
@@ -106,6 +109,11 @@ secpolicy_in_time() {
   run --separate-stderr "${ordinary[@]}" "$programs/secpolicy" --root "$root" observe -- /bin/sh
   exits 126
   [[ $stderr == "secpolicy: observe: Unable to use the host state "*". $user" ]]
+  run --separate-stderr "${ordinary[@]}" "$programs/secpolicy" --root "$root" run monitorDom -- /bin/sh
+  exits 126
+  [[ $stderr == "secpolicy: run: "*"; nothing was started. $user" ]]
+  run --separate-stderr "${ordinary[@]}" "$programs/secpolicy" --root "$root" features
+  shows "mounts of one's own: in a user namespace"
 }
 
 @test "ports and what binds them" {

@@ -68,8 +68,81 @@ not_confined() {
   run -127 --separate-stderr "$SECPOLICY" --root "$root" run monitorDom -- /nowhere/program
   [[ $stderr == *"/nowhere/program"* ]]
   secpolicy run monitorDom -- /usr/sbin/sshd
+  not_confined run
+  [[ $stderr == "secpolicy: run: monitorDom may not execute /usr/sbin/sshd: '-r /usr/sbin/sshd rx' is missing in $policy/domains/monitorDom; nothing was started" ]]
+  # Of what is no program, no rule is missing.
+  secpolicy run monitorDom -- /etc/services.conf
   exits 126
-  [[ $stderr == *"/usr/sbin/sshd"* ]]
+  [[ $stderr == "secpolicy-run: cannot execute /etc/services.conf: Permission denied" ]]
+}
+
+# grant_app LINE...: these are the rules of appDom.
+grant_app() {
+  printf '%s\n' "$@" >"$policy/domains/appDom"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+}
+
+@test "what a program is executed by has to be allowed as well" {
+  boot
+  printf '#!/bin/sh\n' >"$root/script"
+  cp /bin/true "$root/true"
+  chmod +x "$root/script"
+  grant_app '-s @start grant' '-s @io grant' '-r /script rx' '-r /bin r' '-r /true rx'
+  secpolicy run appDom -- /script
+  not_confined run
+  [[ $stderr == *": appDom may not execute /bin/busybox, the interpreter of /script: $policy/domains/appDom:4: -r /bin r; '-r /bin rx' in its place would let it; "* ]]
+  local loader
+  loader=$(readelf -lW "$root/true" | sed -n 's/.*interpreter: \(.*\)\]/\1/p')
+  mkdir -p "$root${loader%/*}"
+  cp "$loader" "$root$loader"
+  secpolicy run appDom -- /true
+  not_confined run
+  [[ $stderr == *": appDom may not execute $(readlink -f "$root$loader" | sed "s|^$root||"), the loader of /true: "* ]]
+  # What is given up for is not asked about.
+  without_landlock "$SECPOLICY" --root "$root" run appDom --best-effort -- /script
+  exits 0
+}
+
+@test "a program whose label leads elsewhere is not started where it leads away from" {
+  boot
+  grant_app '-s @start grant' '-r / rx' '-d sshProgram sshDom exec grant'
+  secpolicy run appDom -- /usr/sbin/sshd
+  not_confined run
+  [[ $stderr == *": appDom may not execute /usr/sbin/sshd itself: its label sshProgram leads to sshDom, where 'secpolicy --root $root run sshDom -- /usr/sbin/sshd' starts it; "* ]]
+}
+
+@test "where nothing can start, what is missing is told and nothing is started" {
+  boot
+  cp /bin/true "$root/true"
+  grant_app '-s @file grant' '-s @io grant' '-r / rx'
+  secpolicy run appDom -- /bin/sh -c 'echo started'
+  exits 126
+  [[ -z $output && $stderr == "secpolicy-run: no program can end in the domain appDom, which may call neither exit nor exit_group; '-s @start grant' grants both where no rule revokes them" ]]
+  secpolicy run appDom --best-effort -- /bin/sh
+  exits 126
+  grant_app '-s @start grant' '-s mmap revoke' '-r / rx'
+  secpolicy run appDom -- /true
+  exits 126
+  [[ $stderr == "secpolicy-run: /true cannot start in the domain appDom, as its loader "*" needs mmap, which the domain may not call; '-s @start grant' grants it where no rule revokes it" ]]
+  # What is linked statically starts without.
+  secpolicy run appDom -- /bin/sh -c 'echo started'
+  answers 0 started
+  grant_app '-s @file grant'
+  secpolicy settings enforcement appDom permissive
+  secpolicy restore
+  secpolicy run appDom -- /bin/sh -c 'echo started'
+  exits 0
+  [[ $output == started ]]
+}
+
+@test "what fails when all is taken away is told as well" {
+  boot
+  echo text >"$root/text"
+  chmod +x "$root/text"
+  grant_app '-s exit grant' '-r / rx'
+  secpolicy run appDom -- /text
+  exits 126
+  [[ -z $output && $stderr == "secpolicy-run: cannot execute /text in the domain appDom: Exec format error" ]]
 }
 
 @test "a domain that there is not, and no program" {
@@ -107,7 +180,7 @@ not_confined() {
   "$SECPOLICY" --root "$root" load 2>/dev/null
   secpolicy run appDom -- /bin/sh -c 'echo started'
   not_confined run
-  [[ $stderr == "notExpressible: /etc/zorvan/secpolicy/domains/appDom:"*": -p connect_port 25 revoke (Landlock is told each port"* ]]
+  [[ $stderr == "notExpressible: $policy/domains/appDom:"*": -p connect_port 25 revoke (Landlock is told each port"* ]]
   secpolicy run appDom --best-effort -- /bin/sh -c 'echo started'
   exits 0
   [[ $output == started && $stderr == "notExpressible: "* ]]
@@ -164,7 +237,7 @@ END
   secpolicy restore
   secpolicy exec -- /opt/monitor/bin/agent
   not_confined exec
-  [[ $stderr == *"hostDom may not execute /opt/monitor/bin/agent: 'secpolicy --root $root why hostDom exec /opt/monitor/bin/agent' says which rule would grant it"* ]]
+  [[ $stderr == *": hostDom may not execute /opt/monitor/bin/agent: '-r /opt/monitor/bin/agent rx' is missing in $policy/domains/hostDom; "* ]]
 }
 
 @test "features tells what becomes of every rule" {
@@ -173,12 +246,36 @@ END
   exits 0
   local rules
   rules=$(grep -c '^-' "$policy/domains/monitorDom")
-  [[ $(grep -cE '^(enforced|narrowed): /etc/zorvan/secpolicy/domains/monitorDom:[0-9]+: -' <<<"$output") -eq $rules ]]
-  shows "enforced: /etc/zorvan/secpolicy/domains/monitorDom:$(grep -n -- '-s @file' "$policy/domains/monitorDom" | cut -d : -f 1): -s @file grant"
+  [[ $(grep -cE "^(enforced|narrowed): $policy/domains/monitorDom:[0-9]+: -" <<<"$output") -eq $rules ]]
+  shows "enforced: $policy/domains/monitorDom:$(grep -n -- '-s @file' "$policy/domains/monitorDom" | cut -d : -f 1): -s @file grant"
   secpolicy features --for monitorDom --format json
   exits 0
   fits_schema features
   [[ $(jq '.rules | length' <<<"$output") -eq $rules ]]
+  [[ $(jq -r '.rules[0].file' <<<"$output") == /etc/zorvan/secpolicy/domains/monitorDom ]]
+}
+
+@test "features says of a domain without rules that it has none" {
+  boot
+  grant_app
+  secpolicy features --for appDom
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: features: appDom has no rules, so it is granted nothing" ]]
+}
+
+@test "a domain is known by its number, too" {
+  boot
+  local number
+  number=$(domain_id monitorDom)
+  secpolicy run "$number" -- /bin/sh -c 'echo started'
+  answers 0 started
+  secpolicy run "$number" --explain
+  shows "connect_port: 6514"
+  secpolicy features --for "$number" --format json
+  [[ $(jq -r .domain <<<"$output") == monitorDom ]]
+  secpolicy run 4711 -- /bin/sh
+  not_confined run
+  [[ $stderr == *"there is no domain '4711'"* ]]
 }
 
 @test "features without a domain needs no state" {
@@ -194,6 +291,7 @@ END
   secpolicy run monitorDom --explain
   exits 0
   shows "connect_port: 6514"
+  [[ $output == *$'\n'"enforced: $policy/domains/monitorDom:"* ]]
   shows "capabilities: cap_dac_read_search"
   [[ $output == *$'\n'"  /opt/monitor/spool: write-file "* ]]
 }

@@ -116,6 +116,11 @@ def test_why(booted):
         check_question(why.question, written["question"])
 
 
+def test_why_of_a_number(booted):
+    domain = next(each for each in document(booted, "display")["domains"] if each["name"] == "sshDom")
+    assert secpolicy.why(str(domain["id"]), "read", "/etc/ssh/host_key", root=booted).domain == "sshDom"
+
+
 def test_who_can(booted):
     who_can = secpolicy.who_can("read", booted.parent.parent / "nowhere", root=booted)
     assert who_can.question.file is not None and not who_can.question.file.exists

@@ -1,12 +1,16 @@
 #include "host/enforce/features.h"
 
+#include <unistd.h>
+
 #include <iostream>
 #include <memory>
 #include <string>
 
 #include "command_line.h"
+#include "ending.h"
 #include "enforce/domain_plan.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "text/visible.h"
 #include "verb.h"
 
@@ -18,7 +22,8 @@ using Enforce::Features;
 const char* TextOf(Enforce::Namespace mounts) {
   switch (mounts) {
     case Enforce::Namespace::kPrivileged:
-      return "as root";
+      // Of others, below a root of their own.
+      return geteuid() == 0 ? "as root" : "in a user namespace";
     case Enforce::Namespace::kUser:
       return "in a user namespace";
     case Enforce::Namespace::kNone:
@@ -54,25 +59,31 @@ ExitCode ShowFeatures(const std::string& format) {
   return kWell;
 }
 
-ExitCode ShowFates(const std::string& domain, const std::string& format) {
+ExitCode ShowFates(const std::string& word, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
+  const Policy::InstalledDomain domain = RequireInstalledDomain(word, access);
   const Enforce::CompiledPlan compiled = PlanOf(domain, access);
   if (format == "json") {
     std::cout << Json{{"schema", "secpolicy.features/1"},
                       {"features", ToJson(Enforce::ProbeFeatures())},
-                      {"domain", domain},
+                      {"domain", domain.name},
                       {"gaps", compiled.gaps},
                       {"rules", FatesToJson(compiled.fates)}}
                      .Text();
   } else {
-    for (const std::string& line : CoverageOf(compiled)) std::cout << Visible(line) << '\n';
+    for (const std::string& line : LinesOf(compiled)) std::cout << Visible(line) << '\n';
   }
+  if (domain.rules.empty())
+    Summarize("features", domain.name + " has no rules, so it is granted nothing");
   return KeepsAllRules(compiled) ? kWell : kFailed;
 }
 
 Action Define(Syntax& syntax) {
   const auto domain = std::make_shared<std::string>();
-  syntax.AddOption("--for", *domain, "What becomes of each rule of a domain").NameValue("DOMAIN");
+  syntax
+      .AddOption("--for", *domain,
+                 "What becomes of each rule of a domain, by its name or its number")
+      .NameValue("DOMAIN");
   const auto format = AddAnswerFormat(syntax);
   return [=] {
     if (domain->empty()) return ShowFeatures(*format);

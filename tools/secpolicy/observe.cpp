@@ -162,7 +162,8 @@ void TellDomainFromCommand(Options& options, std::size_t wordsBehindDashes) {
 
 Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  syntax.AddOption("DOMAIN", options->domain, "Leave out what the rules of this domain grant");
+  syntax.AddOption("DOMAIN", options->domain,
+                   "Leave out what the rules of this domain grant, by its name or its number");
   syntax.AddList("CMD", options->command, "The program and its arguments, behind --");
   syntax
       .AddOption("--write", options->file,

@@ -80,9 +80,14 @@ std::string OutsidePath(const std::string& path) {
   return (*enteredRoot + "/").append(path, path.starts_with('/') ? 1 : 0);
 }
 
+std::string AdviseOnForeignRoot() {
+  if (geteuid() == 0 || !isRootOfOther) return "";
+  return "This root is another user's: run it as that user, or as root.";
+}
+
 std::string AdviseOnPrivilege() {
   if (geteuid() == 0) return "";
-  if (isRootOfOther) return "This root is another user's: run it as that user, or as root.";
+  if (isRootOfOther) return AdviseOnForeignRoot();
   if (enteredRoot) return "";
   return "You are not root: run it as root, or give --root DIR to work below a directory of yours.";
 }

@@ -20,7 +20,10 @@ std::string OutsidePath(const std::string& path);
 // who has entered a root of its own.
 std::string AdviseOnPrivilege();
 
-// The message of a failure with that behind it.
+// The same where all that can be said is that the root which was entered is another user's.
+std::string AdviseOnForeignRoot();
+
+// The message of a failure with what AdviseOnPrivilege() says behind it.
 std::string WithAdvice(const std::string& failure);
 
 }  // namespace SecPolicyCli

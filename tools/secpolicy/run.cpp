@@ -7,6 +7,7 @@
 #include "enforce/domain_plan.h"
 #include "enforce/entry.h"
 #include "query/ask.h"
+#include "query/named.h"
 #include "query/question.h"
 #include "verb.h"
 
@@ -22,7 +23,7 @@ struct Options {
 
 ExitCode Explain(const std::string& domain) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  std::cout << ExplanationOf(domain, access);
+  std::cout << ExplanationOf(RequireInstalledDomain(domain, access), access);
   return kWell;
 }
 
@@ -34,7 +35,8 @@ ExitCode Run(const Options& options) {
 
 Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  syntax.AddOption("DOMAIN", options->domain, "The domain to run in").Require();
+  syntax.AddOption("DOMAIN", options->domain, "The domain to run in, by its name or its number")
+      .Require();
   syntax.AddList("CMD", options->command, "The program and its arguments, behind --");
   AddEntryOptions(syntax, options->entry);
   syntax.AddFlag("--explain", options->explain,

@@ -4,8 +4,7 @@
 #include <utility>
 
 #include "host/linux/operation/label_index.h"
-#include "installed/installed_policy.h"
-#include "query/named.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -34,6 +33,11 @@ LabelIndex ReadNewestIndex() {
   return LinuxHost::ReadLabelIndex();
 }
 
+void NameOutside(Policy::Rule& rule) {
+  std::string& file = rule.origin.file;
+  if (!file.empty()) file = OutsidePath(file);
+}
+
 }  // namespace
 
 PlanSources::PlanSources(SecPolicy::TeskAccessInterfaceImpl& access,
@@ -53,14 +57,25 @@ std::string PlanSources::Explain(const Policy::InstalledDomain& domain) {
   return Enforce::Explain(domain, All());
 }
 
-Enforce::CompiledPlan PlanOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
+Enforce::CompiledPlan PlanOf(const Policy::InstalledDomain& domain,
+                             SecPolicy::TeskAccessInterfaceImpl& access) {
   return PlanSources(access, Enforce::ProbeFeatures()).Compile(domain);
 }
 
-std::string ExplanationOf(const std::string& name, SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
+std::string ExplanationOf(Policy::InstalledDomain domain,
+                          SecPolicy::TeskAccessInterfaceImpl& access) {
+  for (Policy::Rule& rule : domain.rules) NameOutside(rule);
   return PlanSources(access, Enforce::ProbeFeatures()).Explain(domain);
+}
+
+RuleFate NamedOutside(RuleFate fate) {
+  NameOutside(fate.rule);
+  return fate;
+}
+
+std::vector<std::string> LinesOf(Enforce::CompiledPlan compiled) {
+  for (RuleFate& fate : compiled.fates) NameOutside(fate.rule);
+  return CoverageOf(compiled);
 }
 
 Json FatesToJson(const std::vector<RuleFate>& fates) {

@@ -37,12 +37,20 @@ class PlanSources {
   Enforce::RealFileTree files;
 };
 
-// The plan of an installed domain on this kernel, from the label index. Throws QuestionError when
-// there is no such domain, and what the host throws.
-Enforce::CompiledPlan PlanOf(const std::string& domain, SecPolicy::TeskAccessInterfaceImpl& access);
+// The plan of an installed domain on this kernel, from the label index. Throws what the host
+// throws.
+Enforce::CompiledPlan PlanOf(const Policy::InstalledDomain& domain,
+                             SecPolicy::TeskAccessInterfaceImpl& access);
 
 // The same plan, for people.
-std::string ExplanationOf(const std::string& domain, SecPolicy::TeskAccessInterfaceImpl& access);
+std::string ExplanationOf(Policy::InstalledDomain domain,
+                          SecPolicy::TeskAccessInterfaceImpl& access);
+
+// The fate with the file of its rule by the name that it has outside of the root, for people.
+Enforce::RuleFate NamedOutside(Enforce::RuleFate fate);
+
+// CoverageOf() with these names.
+std::vector<std::string> LinesOf(Enforce::CompiledPlan compiled);
 
 Json FatesToJson(const std::vector<Enforce::RuleFate>& fates);
 

@@ -7,6 +7,7 @@
 #include "broker.h"
 #include "domain_plan.h"
 #include "environment.h"
+#include "execution.h"
 #include "host/enforce/broker/message.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
@@ -15,7 +16,10 @@
 #include "launcher.h"
 #include "observe/permissive.h"
 #include "observe/watch.h"
+#include "program_file.h"
 #include "published.h"
+#include "query/named.h"
+#include "root.h"
 #include "teskctl/system.h"
 #include "text/visible.h"
 
@@ -29,7 +33,7 @@ bool MaySurrender(const std::string& verb, const Enforce::CompiledPlan& compiled
   if (compiled.plan.level != Policy::Level::kEnforcing || KeepsAllRules(compiled)) return true;
   for (const std::string& gap : compiled.gaps) std::cerr << Enforce::LineOfGap(gap) << '\n';
   for (const Enforce::RuleFate& fate : NotExpressible(compiled.fates)) {
-    std::cerr << Visible(LineOf(fate)) << '\n';
+    std::cerr << Visible(LineOf(NamedOutside(fate))) << '\n';
   }
   if (options.bestEffort) return true;
   std::cerr << "secpolicy: " << verb << ": the rules of " << compiled.plan.domain
@@ -38,20 +42,36 @@ bool MaySurrender(const std::string& verb, const Enforce::CompiledPlan& compiled
   return false;
 }
 
+// Nothing where there is none.
+std::optional<std::string> ProgramOf(const Entry& entry) {
+  return entry.program.IsOpen() ? entry.programPath : FindProgram(entry.command.front());
+}
+
 ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
                           SecPolicy::TeskAccessInterfaceImpl& access, const EntryOptions& options) {
-  const Enforce::CompiledPlan compiled = PlanOf(entry.domain, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(entry.domain, access);
+  const Enforce::CompiledPlan compiled = PlanOf(domain, access);
   if (!MaySurrender(verb, compiled, options)) return kNotConfined;
+  const auto program = ProgramOf(entry);
+  if (program && KeepsAllRules(compiled)) RequireExecutable(*program, domain, access);
   LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
   std::cerr << std::flush;
   if (compiled.plan.level == Policy::Level::kPermissive) {
-    return RunPermissive(verb, entry, access);
+    return RunPermissive(verb, entry, domain, access);
   }
   StartConfined(compiled.plan, entry, KeepBroker(compiled.plan));
 }
 
+// Plans go by the names of their domains.
+std::string NameOf(const std::string& domain) {
+  if (!ReadNumber(domain)) return domain;
+  const PublishedState state;
+  SecPolicy::TeskAccessInterfaceImpl access;
+  return FindDomain(domain, access).name;
+}
+
 ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
-  const Enforce::Plan plan = ReadPublishedPlan(entry.domain);
+  const Enforce::Plan plan = ReadPublishedPlan(NameOf(entry.domain));
   LinuxHost::RecordWorld(plan.domain, TextOf(plan.level));
   if (plan.level != Policy::Level::kPermissive) StartConfined(plan, entry, KeepBroker(plan));
   // Of ordinary users only the daemon takes lines.
@@ -59,15 +79,16 @@ ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
   if (!TeskCtl::System::SyslogIsRunning()) withoutLog.emplace();
   const PublishedState state;
   SecPolicy::TeskAccessInterfaceImpl access;
-  return RunPermissive(verb, entry, access);
+  return RunPermissive(verb, entry, RequireInstalledDomain(plan.domain, access), access);
 }
 
 ExitCode TellFailure(const std::string& verb, const std::function<ExitCode()>& enter) {
   try {
     return enter();
   } catch (const std::exception& failure) {
+    const std::string advice = AdviseOnForeignRoot();
     std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
-              << std::endl;
+              << (advice.empty() ? "" : ". " + advice) << std::endl;
     return kNotConfined;
   }
 }

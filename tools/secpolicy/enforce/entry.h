@@ -21,7 +21,7 @@ void AddEntryOptions(Syntax& syntax, EntryOptions& options);
 // What has to be done for an entry before the root is entered.
 void PrepareEntry();
 
-// What is to be started, and the name of the domain that it is started in.
+// What is to be started, and the domain that it is started in, by its name or its number.
 struct Entry {
   std::string domain;
   std::vector<std::string> command;

@@ -2,6 +2,8 @@
 
 #include <unistd.h>
 
+#include <algorithm>
+#include <cstdlib>
 #include <filesystem>
 #include <string_view>
 #include <system_error>
@@ -12,10 +14,32 @@
 #include "observe/watch.h"
 
 namespace SecPolicyCli {
+namespace {
 
 using Braxo::Lib::BraxoException;
 using LinuxHost::Descriptor;
 namespace Kernel = Enforce::Kernel;
+
+}  // namespace
+
+bool IsProgram(const std::string& path) {
+  std::error_code error;
+  return std::filesystem::is_regular_file(path, error) && access(path.c_str(), X_OK) == 0;
+}
+
+std::optional<std::string> FindProgram(const std::string& program) {
+  if (program.find('/') != std::string::npos) return program;
+  const char* const variable = std::getenv("PATH");
+  std::string_view path = variable == nullptr ? "/bin:/usr/bin" : variable;
+  while (!path.empty()) {
+    const std::string_view directory = path.substr(0, path.find(':'));
+    path.remove_prefix(std::min(directory.size() + 1, path.size()));
+    const std::string candidate =
+        std::filesystem::path(directory.empty() ? "." : directory) / program;
+    if (IsProgram(candidate)) return candidate;
+  }
+  return std::nullopt;
+}
 
 ProgramFile OpenProgram(const std::string& path) {
   std::error_code error;
@@ -34,12 +58,6 @@ ProgramFile SeeProgram(int received) {
     throw BraxoException("there is no program " + seen.path + ", or it may not be read");
   }
   return {.file = Descriptor(seen.file.Release()), .path = std::move(seen.path)};
-}
-
-bool IsScript(const ProgramFile& program) {
-  char beginning[2] = {};
-  return pread(program.file.Number(), beginning, sizeof beginning, 0) == sizeof beginning &&
-         std::string_view(beginning, sizeof beginning) == "#!";
 }
 
 }  // namespace SecPolicyCli

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "host/linux/common/descriptor.h"
@@ -12,6 +13,13 @@ struct ProgramFile {
   std::string path;            // that it was opened by: from the root on, without a link
 };
 
+// True where the path leads to a file that this user may execute.
+bool IsProgram(const std::string& path);
+
+// The path of the program, as a shell finds it; nothing where PATH has no such name. A path is
+// returned as it is.
+std::optional<std::string> FindProgram(const std::string& program);
+
 // Opens the program that `path` leads to. Throws Braxo::Lib::BraxoException when there is none, or
 // this user may not read it: then nobody knows its label.
 ProgramFile OpenProgram(const std::string& path);
@@ -19,8 +27,5 @@ ProgramFile OpenProgram(const std::string& path);
 // The program that somebody else has opened, as this process sees it. Throws
 // Braxo::Lib::BraxoException where it sees no such program.
 ProgramFile SeeProgram(int received);
-
-// True for a script. Its interpreter opens it again, and so is told its path.
-bool IsScript(const ProgramFile& program);
 
 }  // namespace SecPolicyCli

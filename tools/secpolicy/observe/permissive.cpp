@@ -7,9 +7,7 @@
 #include "environment.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/operation/log_use.h"
-#include "installed/installed_policy.h"
 #include "proposal.h"
-#include "query/named.h"
 #include "text/visible.h"
 #include "watch.h"
 
@@ -34,12 +32,12 @@ void TellRefused(const std::string& verb, const std::string& domain,
 }  // namespace
 
 ExitCode RunPermissive(const std::string& verb, const Entry& entry,
+                       const Policy::InstalledDomain& domain,
                        SecPolicy::TeskAccessInterfaceImpl& access) {
-  const Policy::InstalledDomain domain = RequireInstalledDomain(entry.domain, access);
   Observations seen;
   const auto judge = [&](const Policy::Question& question, const std::string& program) {
     if (!seen.Note(question, program) || IsGranted(question, domain)) return;
-    TellRefused(verb, entry.domain, question);
+    TellRefused(verb, domain.name, question);
   };
   const auto isNoticed = [&](std::string_view call) {
     return Enforce::AsksMore(call) || !Decide(AskCall(call), domain).granted;

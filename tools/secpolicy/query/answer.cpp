@@ -43,19 +43,6 @@ std::string AnswerText(const Question& question, const InstalledDomain& domain,
          (decision.granted ? "" : "; its rules would refuse this");
 }
 
-// The policy file in which rules of the domain are written. A domain that the early policy has as
-// well has its full policy in the usual place.
-std::string PolicyFileOf(const InstalledDomain& domain) {
-  std::string file = DomainFile(domain.name, SecPolicy::kPolicyRoot);
-  const std::string name = file.substr(file.rfind('/'));
-  std::string elsewhere;
-  for (const Rule& rule : domain.rules) {
-    if (rule.origin.file == file) return file;
-    if (rule.origin.file.ends_with(name)) elsewhere = rule.origin.file;
-  }
-  return elsewhere.empty() ? file : elsewhere;
-}
-
 void WriteMissing(const InstalledDomain& domain, const Decision& decision, std::ostream& output) {
   if (decision.missing.empty()) return;
   const bool choice = decision.missing.size() > 1;
@@ -111,6 +98,18 @@ std::string ReasonOf(const InstalledDomain& domain, const Decision& decision) {
 }
 
 }  // namespace
+
+// A domain that the early policy has as well has its full policy in the usual place.
+std::string PolicyFileOf(const InstalledDomain& domain) {
+  std::string file = DomainFile(domain.name, SecPolicy::kPolicyRoot);
+  const std::string name = file.substr(file.rfind('/'));
+  std::string elsewhere;
+  for (const Rule& rule : domain.rules) {
+    if (rule.origin.file == file) return file;
+    if (rule.origin.file.ends_with(name)) elsewhere = rule.origin.file;
+  }
+  return elsewhere.empty() ? file : elsewhere;
+}
 
 std::string Cite(const Rule& rule) {
   const std::string place =

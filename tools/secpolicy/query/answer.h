@@ -17,6 +17,9 @@ void WriteAnswer(const Question& question, const Policy::InstalledDomain& domain
 void WriteAnswerLine(const Policy::InstalledDomain& domain, const Policy::Decision& decision,
                      std::ostream& output);
 
+// The policy file, as the policy names it, in which rules of the domain are written.
+std::string PolicyFileOf(const Policy::InstalledDomain& domain);
+
 // The rule behind its place, in the form that editors and grep know: "FILE:LINE: RULE".
 std::string Cite(const Policy::Rule& rule);
 

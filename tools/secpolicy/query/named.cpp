@@ -34,13 +34,6 @@ std::optional<unsigned int> ReadNumber(const std::string& word) {
   return number;
 }
 
-Policy::InstalledDomain RequireInstalledDomain(const std::string& name,
-                                               TeskAccessInterfaceImpl& access) {
-  auto domain = ReadInstalledDomain(name, access);
-  if (!domain) RefuseDomain(name, access);
-  return std::move(*domain);
-}
-
 NamedDomain FindDomain(const std::string& word, TeskAccessInterfaceImpl& access) {
   unsigned int id = 0;
   if (access.FindDomain(word, &id)) return {id, word};
@@ -49,6 +42,14 @@ NamedDomain FindDomain(const std::string& word, TeskAccessInterfaceImpl& access)
     if (!name.empty()) return {*number, name};
   }
   RefuseDomain(word, access);
+}
+
+Policy::InstalledDomain RequireInstalledDomain(const std::string& word,
+                                               TeskAccessInterfaceImpl& access) {
+  auto domain = ReadInstalledDomain(FindDomain(word, access).name, access);
+  // Destroyed in between.
+  if (!domain) RefuseDomain(word, access);
+  return std::move(*domain);
 }
 
 std::optional<std::string> FindObjectByNumber(const std::string& word,

@@ -18,8 +18,8 @@ struct NamedDomain {
 
 NamedDomain FindDomain(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access);
 
-// The installed domain with this very name, with its rules.
-Policy::InstalledDomain RequireInstalledDomain(const std::string& name,
+// The installed domain with this name or number, with its rules.
+Policy::InstalledDomain RequireInstalledDomain(const std::string& word,
                                                SecPolicy::TeskAccessInterfaceImpl& access);
 
 // The number that the word is in decimal; nothing when it is none.
