@@ -161,6 +161,33 @@ by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let 
   [[ -z $(ls "$root/tmp") ]]
 }
 
+# copies: the copies of the state that users have beside their records.
+copies() {
+  find "$root/run/secpolicy/worlds" -mindepth 2 -type d
+}
+
+@test "the copy of the state of who was killed goes with the next entry, and that of who runs stays" {
+  by_root settings enforcement monitorDom permissive
+  by_root restore
+  # shellcheck disable=SC2016
+  by_user_in monitorDom 'kill -9 $PPID'
+  exits 137
+  [[ $(copies | wc -l) -eq 1 ]]
+  local killed
+  killed=$(copies)
+  # shellcheck disable=SC2016
+  on_machine "${ordinary[@]}" /programs/secpolicy run monitorDom -- \
+    /bin/sh -c 'echo $$ >/tmp/started; exec sleep 60' 2>/dev/null 3>&- &
+  until_true '[[ -s $root/tmp/started ]]'
+  [[ ! -e $killed && $(copies | wc -l) -eq 1 ]]
+  by_user_in monitorDom 'echo started'
+  exits 0
+  [[ $(copies | wc -l) -eq 1 ]]
+  kill "$(<"$root/tmp/started")"
+  wait
+  [[ -z $(copies) ]]
+}
+
 @test "exec of an ordinary user enters the domain that the label leads to" {
   mkdir "$root/srv"
   printf '%s\n' '#!/bin/sh' 'cat /opt/monitor/etc/agent.conf' >"$root/srv/look"

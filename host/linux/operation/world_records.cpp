@@ -42,9 +42,13 @@ struct UserDirectory {
   std::string path;
 };
 
-std::optional<UserDirectory> OpenUserDirectory(const Descriptor& records, const std::string& name) {
-  Descriptor opened(openat(records.Number(), name.c_str(),
+Descriptor OpenIn(const Descriptor& directory, const std::string& name) {
+  return Descriptor(openat(directory.Number(), name.c_str(),
                            O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+}
+
+std::optional<UserDirectory> OpenUserDirectory(const Descriptor& records, const std::string& name) {
+  Descriptor opened = OpenIn(records, name);
   struct stat status {};
   if (!opened.IsOpen() || fstat(opened.Number(), &status) != 0) return std::nullopt;
   return UserDirectory{.opened = std::move(opened),
@@ -84,10 +88,30 @@ std::optional<WorldRecord> ReadRecord(const UserDirectory& directory, const std:
   return record;
 }
 
+// True for the directory of a process that still is the one that has made it.
+bool IsOfLiving(const std::string& directory) {
+  std::istringstream words(directory);
+  int process = 0;
+  std::int64_t started = 0;
+  words >> process;
+  words.get();
+  words >> started;
+  return words && IsStill(process, started);
+}
+
+void RemoveDirectory(const UserDirectory& own, const std::string& name) {
+  const auto directory = OpenIn(own.opened, name);
+  if (!directory.IsOpen()) return;
+  for (const std::string& file : NamesIn(directory)) unlinkat(directory.Number(), file.c_str(), 0);
+  unlinkat(own.opened.Number(), name.c_str(), AT_REMOVEDIR);
+}
+
 // Makes room for more: nobody else may remove them.
 void RemoveOld(const UserDirectory& own) {
   for (const std::string& name : NamesIn(own.opened)) {
-    if (!ReadRecord(own, name)) unlinkat(own.opened.Number(), name.c_str(), 0);
+    if (ReadRecord(own, name) || IsOfLiving(name)) continue;
+    const bool isDirectory = unlinkat(own.opened.Number(), name.c_str(), 0) != 0 && errno == EISDIR;
+    if (isDirectory) RemoveDirectory(own, name);
   }
 }
 
@@ -134,7 +158,12 @@ void RecordWorld(const std::string& domain, const std::string& level) {
   ThrowErrno("Unable to record the domain in ", path);
 }
 
-std::string OwnRecordsPath() { return OpenOwnDirectory().path; }
+std::string MakeOwnDirectory() {
+  std::string path =
+      StrCat(OpenOwnDirectory().path, "/", getpid(), ".", StartOf(getpid()), ".XXXXXX");
+  if (mkdtemp(path.data()) == nullptr) ThrowErrno("Unable to make ", path);
+  return path;
+}
 
 std::vector<WorldRecord> ReadWorldRecords() {
   std::vector<WorldRecord> found;

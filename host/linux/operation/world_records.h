@@ -24,9 +24,11 @@ void MakeWorldRecords();
 // `level`. Throws HostError when it cannot be recorded.
 void RecordWorld(const std::string& domain, const std::string& level);
 
-// The directory of this user's own records, made if there is none: what only those of this user may
-// write that are confined by no rule about other files. Throws HostError when it cannot be made.
-std::string OwnRecordsPath();
+// A new directory of this process beside the records of its user: what only those of this user may
+// write that are confined by no rule about other files. Whose process has ended without removing it
+// finds it removed with old records, by then with nothing but files in it. Throws HostError when it
+// cannot be made.
+std::string MakeOwnDirectory();
 
 // The records of living processes that their own users have made, as far as this user may read
 // them, in ascending order of their identifiers.

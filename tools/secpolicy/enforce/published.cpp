@@ -116,7 +116,7 @@ Enforce::Plan ReadPublishedPlan(const std::string& domain) {
 }
 
 // Where programs have rights for their own files, those of a domain could change what is judged.
-PublishedState::PublishedState() : directory(LinuxHost::OwnRecordsPath()) {
+PublishedState::PublishedState() : directory(LinuxHost::MakeOwnDirectory()) {
   const std::string serial = LinuxHost::PublishedSerial();
   const std::string copy = directory.File("host.db");
   LinuxHost::CopyPublishedState(copy);

@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "host/linux/common/host_error.h"
@@ -19,8 +20,8 @@ std::vector<std::string> UsualPlaces() {
   return places;
 }
 
-std::string MakePrivateDirectory(const std::vector<std::string>& places) {
-  for (const std::string& place : places) {
+std::string MakePrivateDirectory() {
+  for (const std::string& place : UsualPlaces()) {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
   }
@@ -36,10 +37,9 @@ std::optional<LinuxHost::StateCopy> CopyUnless(bool fresh, const std::string& to
 
 }  // namespace
 
-ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory(UsualPlaces())) {}
+ScratchDirectory::ScratchDirectory() : path(MakePrivateDirectory()) {}
 
-ScratchDirectory::ScratchDirectory(const std::string& place)
-    : path(MakePrivateDirectory({place})) {}
+ScratchDirectory::ScratchDirectory(std::string made) : path(std::move(made)) {}
 
 ScratchDirectory::~ScratchDirectory() {
   std::error_code ignored;

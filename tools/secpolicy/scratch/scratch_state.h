@@ -14,8 +14,8 @@ class ScratchDirectory {
  public:
   // Throws Braxo::Lib::BraxoException when there is no place for it.
   ScratchDirectory();
-  // In the directory `place`.
-  explicit ScratchDirectory(const std::string& place);
+  // Takes over the directory `made`.
+  explicit ScratchDirectory(std::string made);
   ScratchDirectory(const ScratchDirectory&) = delete;
   ScratchDirectory& operator=(const ScratchDirectory&) = delete;
   ~ScratchDirectory();
