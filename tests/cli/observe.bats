@@ -31,7 +31,7 @@ secpolicy_in_time() {
   run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" "$@"
 }
 
-# The steps of docs/enforcement.md, "A service in five minutes".
+# The steps of docs/confine-a-service.md.
 @test "from nothing to enforcing" {
   boot
   make_service
