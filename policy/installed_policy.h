@@ -12,11 +12,11 @@
 // What is installed, as values. Everything throws what the access-control module throws.
 namespace Policy {
 
-// Bits of the state word of a domain: the parts that it plays, and how it came to be.
-inline constexpr unsigned int kPlaysGlobalVm = 0x1;
-inline constexpr unsigned int kPlaysIoFilter = 0x2;
-inline constexpr unsigned int kPlaysDaemonFramework = 0x4;
-inline constexpr unsigned int kParts = kPlaysGlobalVm | kPlaysIoFilter | kPlaysDaemonFramework;
+// Bits of the state word of a domain: its roles, and how it came to be.
+inline constexpr unsigned int kRoleGlobalVm = 0x1;
+inline constexpr unsigned int kRoleIoFilter = 0x2;
+inline constexpr unsigned int kRoleDaemonFramework = 0x4;
+inline constexpr unsigned int kRoles = kRoleGlobalVm | kRoleIoFilter | kRoleDaemonFramework;
 inline constexpr unsigned int kCreatedAtRunTime = 0x8;
 
 struct InstalledDomain {
@@ -31,8 +31,8 @@ struct InstalledDomain {
   bool isGone = false;      // a load installed it, and the latest one has not found its file
   std::vector<Rule> rules;  // by kind; of one kind, as they were installed
 
-  // Whether it plays a part that a host has one domain for.
-  bool PlaysPart() const { return (state & kParts) != 0; }
+  // Whether it has a role, which a host has one domain for.
+  bool HasRole() const { return (state & kRoles) != 0; }
   bool IsCreatedAtRunTime() const { return (state & kCreatedAtRunTime) != 0; }
 };
 

@@ -11,7 +11,7 @@
 #include <cerrno>
 #include <cstring>
 
-// The header of older C libraries does not say itself that it is one of C.
+// In older C libraries this header has no `extern "C"` of its own.
 extern "C" {
 #include <sys/pidfd.h>
 }
@@ -31,8 +31,8 @@ using LinuxHost::ThrowErrno;
 
 using Work = std::function<void(const Send&)>;
 
-// A file without a name, and never in the place of a standard descriptor that the interpreter has
-// closed.
+// A file without a name. Not by the number 0, 1 or 2, should the interpreter have closed these: the
+// child puts another file there.
 Descriptor MakeFile() {
   Descriptor file(memfd_create("secpolicy", MFD_CLOEXEC));
   if (file.IsOpen()) file = Descriptor(fcntl(file.Number(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
@@ -40,7 +40,7 @@ Descriptor MakeFile() {
   return file;
 }
 
-// There is nobody else to be told that this cannot be done.
+// The file is all by which the child tells its parent anything, also that it has failed.
 void WriteOrExit(const Descriptor& file, const std::string& text) {
   for (std::size_t written = 0; written < text.size();) {
     const ssize_t size = write(file.Number(), text.data() + written, text.size() - written);
@@ -60,8 +60,8 @@ std::string ReadAll(const Descriptor& file) {
   }
 }
 
-// Nothing reaches the calling thread while this lives: a handler of the interpreter is not to run
-// in the child.
+// No signal reaches the calling thread while this lives, so that no handler of the interpreter runs
+// in the child before ForgetHandlers().
 class BlockedSignals {
  public:
   BlockedSignals() {
@@ -82,9 +82,9 @@ pid_t Fork() {
   return fork();
 }
 
-// No handler of the interpreter's runs in the child, which ends when it is asked to also where the
-// interpreter does not. Keys are for the interpreter to act on: it shares its terminal with the
-// child.
+// No handler of the interpreter runs in the child. What the interpreter ignores the child ignores,
+// but for SIGTERM, by which it is ended. Signals of the terminal's keys stay blocked: they reach
+// the interpreter as well, and whether it ends the child is for it to say.
 void ForgetHandlers() {
   struct sigaction usual {};
   usual.sa_handler = SIG_DFL;
@@ -118,7 +118,8 @@ class Child {
     if (id < 0) ThrowErrno("cannot fork");
     if (id == 0) Act(parent, root, work);
     end = Descriptor(pidfd_open(id, 0));
-    // One that is gone has ended, in a program that ignores SIGCHLD.
+    // ESRCH: the child has ended already, in a program that ignores SIGCHLD, where nobody waits for
+    // it.
     if (!end.IsOpen() && errno != ESRCH) GiveUp();
   }
   Child(const Child&) = delete;
@@ -133,7 +134,7 @@ class Child {
   Reply Reap(const std::function<void()>& checkSignals) {
     Await(checkSignals);
     isOver = true;
-    // A program that ignores SIGCHLD, or waits for all its children, leaves nothing to be told.
+    // In a program that ignores SIGCHLD, or waits for all its children, the status is lost.
     int status = 0;
     const bool isKnown = waitpid(id, &status, 0) == id;
     const std::string text = ReadAll(sent);
@@ -156,7 +157,7 @@ class Child {
 
   // Until it has ended.
   void Await(const std::function<void()>& checkSignals) const {
-    // A signal may come to another thread, or just before the wait.
+    // poll is not interrupted by a signal that another thread takes, or that comes just before it.
     constexpr int kMostMilliseconds = 100;
     pollfd ended{.fd = end.Number(), .events = POLLIN, .revents = 0};
     while (end.IsOpen() && poll(&ended, 1, kMostMilliseconds) <= 0) checkSignals();
@@ -172,7 +173,7 @@ class Child {
       WriteOrExit(sent, reply.kind + "\n" + reply.document);
     };
     if (root) Enter(*root, send);
-    // What enters a user namespace has forgotten an earlier wish.
+    // After the root was entered: to enter a user namespace takes this back.
     prctl(PR_SET_PDEATHSIG, SIGTERM);
     if (getppid() != parent) _exit(SecPolicyCli::kFailed);
     SecPolicyCli::RunAndExit([&] {

@@ -81,7 +81,7 @@ std::string WhyNotDestroyed(const NamedDomain& domain) {
     return "In " + domain.name + " runs " + ListOf(worlds, "and") + ": end " +
            (worlds.size() == 1 ? "it" : "them") + " first";
   }
-  if (!installed->PlaysPart()) return "";
+  if (!installed->HasRole()) return "";
   return domain.name + " is one of the domains that every host needs";
 }
 
@@ -289,7 +289,7 @@ const Kind kShow = {"show", "Show a domain with its rules",
 
 const Kind kLeaked = {
     "leaked", "List the domains that were created at run time and that nothing refers to",
-    "No process runs in such a domain, none can enter it by a transition, and it plays no part:\n"
+    "No process runs in such a domain, none can enter it by a transition, and it has no role:\n"
     "whoever created it has forgotten it, or has not used it yet.\n"
     "\n"
     "Example:\n"

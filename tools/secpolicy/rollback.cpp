@@ -52,7 +52,7 @@ Action Define(Syntax& syntax) {
 
 const Verb kRollback = {
     "rollback", "Put a saved state back in place of what is installed",
-    "Domains, their enforcement levels, rules and parts, and the objects become what they were\n"
+    "Domains, their enforcement levels, rules and roles, and the objects become what they were\n"
     "when the state was saved, in one step: killed on the way, it leaves the old or the new.\n"
     "Running processes stay in their domains; it is refused while any runs in a domain that the\n"
     "saved state does not have. Files keep their labels, and objects their numbers; an object "

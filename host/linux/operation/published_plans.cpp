@@ -29,7 +29,8 @@ using Braxo::Misc::StrCat;
 constexpr char kNew[] = ".new";
 constexpr char kStateCopy[] = ".state";
 
-// A letter that is itself in the name of a file; a dot begins names that are no domain's.
+// A letter that stands for itself in the name of a plan's file. A dot does not: files whose names
+// begin with one are no plans.
 bool IsPlain(char letter) {
   constexpr std::string_view kMarks = "-_+,=@";
   return (letter >= 'a' && letter <= 'z') || (letter >= 'A' && letter <= 'Z') ||
@@ -52,7 +53,7 @@ std::string FileNameOf(const std::string& domain) {
   return name;
 }
 
-// Another state beside the same plans is another file. Empty where there is no state.
+// Tells the file of the state from another that was put in its place. Empty where there is none.
 std::string IdentityOfState() {
   struct stat status {};
   if (stat(StatePath().c_str(), &status) != 0) return "";
@@ -63,7 +64,7 @@ std::string CurrentText(const std::string& serial) {
   return StrCat(serial, " ", IdentityOfState(), "\n");
 }
 
-// In its place until the plans are there; nobody takes it for a number.
+// What the mark is while plans are in the making: it is the text of no number, so no plan counts.
 std::string MakingText(const std::string& serial) { return StrCat("making ", CurrentText(serial)); }
 
 std::string NewSerial() {
@@ -79,7 +80,7 @@ class PlanDirectory {
  public:
   PlanDirectory() : path(PlansOf(StatePath())), opened(MakeSharedDirectory(path, kMode)) {}
 
-  // In place of the file of the name, whole.
+  // Replaces the file with this name in one step.
   void Write(const std::string& name, std::string_view content) {
     unlinkat(opened.Number(), kNew, 0);
     constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
@@ -93,7 +94,7 @@ class PlanDirectory {
     Write(current.substr(current.rfind('/') + 1), content);
   }
 
-  // What others have to find there under another name first.
+  // The path for a file that somebody else writes, before TakeNewFile() gives it its name.
   std::string NewFile() {
     unlinkat(opened.Number(), kNew, 0);
     return StrCat(path, "/", kNew);
@@ -139,7 +140,7 @@ class PlanDirectory {
   const Descriptor opened;
 };
 
-// What only its owner, the superuser or this user, can have written.
+// The content of a file that belongs to the superuser or this user, and that nobody else may write.
 std::string ReadTrusted(const std::string& path) {
   // Without waiting for the other end, should it be a pipe.
   const Descriptor file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
@@ -159,7 +160,7 @@ std::string ReadTrusted(const std::string& path) {
   return content;
 }
 
-// Nothing where nobody says so who is to be believed.
+// Nothing where there is no mark, it is of another state, or somebody else may have written it.
 std::optional<std::string> FindSerial() {
   try {
     const std::string current = ReadTrusted(CurrentPlansOf(StatePath()));
@@ -173,7 +174,8 @@ std::optional<std::string> FindSerial() {
 
 }  // namespace
 
-// Who commits has taken the mark away by then, and it is not put back before that commit ends.
+// Whoever commits removes the mark first. It is written while nobody can commit, so that it stands
+// for the state as the last commit has left it, and no commit that is under way removes it.
 PlansInTheMaking::PlansInTheMaking()
     : state(HostState::Current().shared_from_this()), serial(NewSerial()) {
   PlanDirectory directory;
@@ -193,7 +195,7 @@ bool PlansInTheMaking::IsLatest() const {
 bool PlansInTheMaking::Publish(const std::map<std::string, std::string>& plans) {
   PlanDirectory directory;
   MakeWorldRecords();
-  // As a lock: who commits waits until the plans are there, and this ends without a commit.
+  // Only as a lock, which ends without a commit: others wait with theirs until the plans are there.
   const Transaction others(state->Database());
   if (!IsLatest()) return false;
   CopyDatabase(StatePath(), CopyOf::kPublicState, directory.NewFile());

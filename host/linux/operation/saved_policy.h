@@ -11,7 +11,7 @@ namespace LinuxHost {
 // already, unless `replace` is set.
 void SaveState(const std::string& from, const std::string& to, bool replace);
 
-// Puts the domains, their parts, services and rules, the file policies, the labels, and the origins
+// Puts the domains, their roles, services and rules, the file policies, the labels, and the origins
 // of rules back as they are in `copy`, in one step: whoever dies on the way leaves the old or the
 // new. Worlds stay in the domains that they are in, by name, and keep their own file policies;
 // labels that are still there keep their numbers, since files carry them, and those that are gone

@@ -7,7 +7,8 @@
 namespace LinuxHost {
 namespace {
 
-// In the order in which the engine itself takes one while it has another.
+// The locks of the engine that belong to no single connection. In the order in which the engine
+// nests them itself: two threads that take locks in different orders wait for each other for ever.
 constexpr int kSharedLocks[] = {SQLITE_MUTEX_STATIC_OPEN, SQLITE_MUTEX_STATIC_PRNG,
                                 SQLITE_MUTEX_STATIC_MAIN, SQLITE_MUTEX_STATIC_VFS1,
                                 SQLITE_MUTEX_STATIC_LRU,  SQLITE_MUTEX_STATIC_PMEM,
@@ -16,7 +17,8 @@ constexpr int kSharedLocks[] = {SQLITE_MUTEX_STATIC_OPEN, SQLITE_MUTEX_STATIC_PR
 }  // namespace
 
 StoresAtRest::StoresAtRest() {
-  // Nobody is at it any more when this returns.
+  // It has a lock of its own for this, which would be left held where another thread is
+  // initializing the engine; it is done with when this returns, and never taken again.
   sqlite3_initialize();
   for (const int lock : kSharedLocks) sqlite3_mutex_enter(sqlite3_mutex_alloc(lock));
 }

@@ -19,7 +19,7 @@ constexpr unsigned int kStartDomain = 0;
 // kernel has for it.
 constexpr std::size_t kMaxDomainName = 63;
 
-// A part that one domain of the host plays.
+// What one domain of the host is for.
 enum class DomainRole : unsigned int { GlobalVm = 1, IoFilter = 2, DaemonFramework = 3 };
 
 struct Domain {
@@ -41,7 +41,7 @@ struct DomainReference {
 struct DomainReferences {
   unsigned int worlds = 0;       // living worlds that were placed in it
   unsigned int transitions = 0;  // granted transitions into it from other domains
-  unsigned int roles = 0;        // parts that it plays: bit n - 1 for the one with the number n
+  unsigned int roles = 0;        // that it has: bit n - 1 for the one with the number n
 
   unsigned int Sum() const {
     return worlds + transitions + static_cast<unsigned int>(std::popcount(roles));
@@ -53,7 +53,7 @@ struct DomainDescription {
   Domain domain;
   DomainReferences references;
 
-  // The parts that it plays; bit 3 is set when it was created at run time.
+  // Its roles; bit 3 is set when it was created at run time.
   unsigned int StateWord() const;
 };
 

@@ -26,16 +26,16 @@ constexpr TextLimit kService = {.noun = "guest-communication service",
                                 .whenEmpty = "a guest-communication service must not be empty",
                                 .maxSize = 255};
 
-// The bit of the state word, and the name in the state, of a part.
+// The bit of the state word, and the name in the state, of a role.
 struct RoleName {
   DomainRole role;
   unsigned int bit;
   const char* name;
 };
 constexpr std::array<RoleName, 3> kRoles = {{
-    {DomainRole::GlobalVm, Policy::kPlaysGlobalVm, "global VM"},
-    {DomainRole::IoFilter, Policy::kPlaysIoFilter, "IO filter"},
-    {DomainRole::DaemonFramework, Policy::kPlaysDaemonFramework, "daemon framework"},
+    {DomainRole::GlobalVm, Policy::kRoleGlobalVm, "global VM"},
+    {DomainRole::IoFilter, Policy::kRoleIoFilter, "IO filter"},
+    {DomainRole::DaemonFramework, Policy::kRoleDaemonFramework, "daemon framework"},
 }};
 
 const RoleName& RowOf(DomainRole role) {

@@ -42,7 +42,7 @@ class DomainTable {
                       bool createdAtRunTime);
 
   // Destroys a domain, its rules and policies, and the rules of others that name it. Throws for
-  // the start domain and for one in which worlds run or that plays a part.
+  // the start domain and for one in which worlds run or that has a role.
   void Destroy(unsigned int id);
 
   // Creates those domains that do not exist, and destroys those that do (the start domain is left
@@ -53,7 +53,7 @@ class DomainTable {
   // Throws for a word that is no enforcement level.
   void SetLevel(const std::string& name, const std::string& level);
 
-  // The domain takes the part over from the one that had it.
+  // The domain takes the role over from the one that had it.
   void SetRole(DomainRole role, unsigned int id);
   bool HasRole(DomainRole role, unsigned int id);
 

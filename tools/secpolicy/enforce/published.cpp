@@ -32,26 +32,29 @@ std::string MarkOf(const std::string& serial, const Features& features) {
          " seccomp=" + std::to_string(features.seccomp);
 }
 
-// The launcher keeps no capability that whoever enters does not have.
+// Plans are for any user: they keep all capabilities that rules grant, of which the launcher drops
+// those that whoever enters does not have.
 Features FeaturesForAnybody() {
   Features features = Enforce::ProbeFeatures();
   features.capabilities = std::numeric_limits<std::uint64_t>::max();
   return features;
 }
 
-// Nothing for a domain whose rules cannot be kept to: to give that up is for who may see them.
+// Nothing for a domain whose rules cannot be kept to: only root, who is told which these are, may
+// enter it all the same.
 std::optional<Enforce::Plan> PlanForAnybody(const Policy::InstalledDomain& domain,
                                             PlanSources& sources) {
   Enforce::CompiledPlan compiled = sources.Compile(domain);
   if (domain.level == Policy::Level::kEnforcing && !KeepsAllRules(compiled)) return std::nullopt;
-  // It is entered later, and by users who do not get everywhere.
+  // The plan is used later, when files may be gone, and by users who may not reach all of them.
   for (Enforce::PathRight& right : compiled.plan.paths) right.mayBeMissing = true;
   return std::move(compiled.plan);
 }
 
 // False when the policy was changed meanwhile.
 bool TryToPublish() {
-  // Or to make it would be a change.
+  // Before plans are in the making: a new index is a change of the state, by which they would not
+  // count any more.
   LinuxHost::RefreshLabelIndex();
   LinuxHost::PlansInTheMaking making;
   SecPolicy::TeskAccessInterfaceImpl access;
@@ -108,14 +111,15 @@ Enforce::Plan ReadPublishedPlan(const std::string& domain) {
   std::string serial = LinuxHost::PublishedSerial();
   while (true) {
     const std::string bytes = LinuxHost::ReadPublishedPlan(domain);
-    // Others may have been published in between.
+    // Others may have been published between these two, and the plan be one of them.
     const std::string now = LinuxHost::PublishedSerial();
     if (now == serial) return Verified(domain, bytes, serial);
     serial = now;
   }
 }
 
-// Where programs have rights for their own files, those of a domain could change what is judged.
+// Not in /tmp or the like, where domains are often granted to write: who can change the copy
+// decides which domains this user enters.
 PublishedState::PublishedState() : directory(LinuxHost::MakeOwnDirectory()) {
   const std::string serial = LinuxHost::PublishedSerial();
   const std::string copy = directory.File("host.db");
