@@ -54,6 +54,11 @@ by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let 
   by_user_in monitorDom 'cat /var/lib/vms/demo/disk'
   exits 1
   [[ $stderr == *"/var/lib/vms/demo/disk': Permission denied"* ]]
+  by_user run "$(domain_id monitorDom)" -- /bin/sh -c 'echo started'
+  answers 0 started
+  by_user run 4711 -- /bin/sh
+  exits 126
+  [[ $stderr == "secpolicy: run: there is no domain '4711'; there are "* ]]
   # As the user that it is.
   chmod 600 "$root/opt/monitor/etc/agent.conf"
   by_user_in monitorDom 'cat /opt/monitor/etc/agent.conf'
@@ -131,9 +136,12 @@ by_load='There are no plans of the policy as it is in /run/secpolicy/plans. Let 
   not_started "There is no plan of a domain 'appDom'. $advice appDom\", which tells whether there is such a domain and what of its rules this kernel cannot keep to"
   by_user run appDom --best-effort -- /bin/sh -c true
   exits 126
-  echo '-s @start grant' >"$policy/domains/appDom"
+  printf '%s\n' '-s @file grant' '-r / rx' >"$policy/domains/appDom"
   by_root load
   [[ -f $plans/appDom ]]
+  by_user_in appDom true
+  exits 126
+  [[ $stderr == "secpolicy-run: no program can end in the domain appDom, "* ]]
   rm "$policy/domains/appDom"
 }
 
