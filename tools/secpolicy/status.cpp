@@ -1,19 +1,18 @@
 #include <algorithm>
 #include <iostream>
-#include <map>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "command_line.h"
 #include "ending.h"
-#include "host/linux/operation/load_record.h"
 #include "host/linux/operation/state_use.h"
-#include "host/linux/operation/world_entry.h"
 #include "installed/installed_json.h"
-#include "installed/installed_policy.h"
+#include "monitor/metrics.h"
 #include "root.h"
 #include "scratch/scratch_state.h"
+#include "status/host_status.h"
+#include "status/status_metrics.h"
 #include "terminal/color.h"
 #include "terminal/size.h"
 #include "text/format.h"
@@ -27,42 +26,6 @@ namespace {
 constexpr std::size_t kShownErrors = 10;
 
 constexpr std::size_t kTitleWidth = 13;
-
-struct Status {
-  Policy::InstalledPolicy policy;
-  std::vector<InstalledTardisk> tardisks;
-  std::optional<LinuxHost::LoadRecord> load;
-  std::map<Policy::Level, std::vector<std::string>> domainsByLevel;
-  std::map<Policy::RuleKind, std::size_t> rulesByKind;
-  std::size_t ruleCount = 0;
-  std::vector<std::string>
-      domainsWithoutFile;  // what loads have installed and no file has any more
-  std::size_t rulesWithoutLine = 0;
-  std::vector<LinuxHost::PlacedWorld> worlds;
-
-  // Beside the one that is built in, there are domains only when something was loaded.
-  bool IsLoaded() const { return policy.domains.size() > 1; }
-  bool HasProblems() const { return load && load->ending != "done"; }
-};
-
-Status ReadStatus() {
-  SecPolicy::TeskAccessInterfaceImpl access;
-  Status status;
-  status.policy = ReadInstalledPolicy(access);
-  status.tardisks = ReadTardisks(access);
-  status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
-  status.worlds = LinuxHost::ListWorlds(LinuxHost::CurrentState());
-  for (const Policy::InstalledDomain& domain : status.policy.domains) {
-    status.domainsByLevel[domain.level].push_back(domain.name);
-    status.ruleCount += domain.rules.size();
-    if (domain.isGone) status.domainsWithoutFile.push_back(domain.name);
-    for (const Policy::Rule& rule : domain.rules) {
-      if (rule.origin.isGone) ++status.rulesWithoutLine;
-      ++status.rulesByKind[rule.kind];
-    }
-  }
-  return status;
-}
 
 Color ColorOf(Policy::Level level) {
   switch (level) {
@@ -104,7 +67,7 @@ std::string DescribeLoad(const LinuxHost::LoadRecord& load) {
 }
 
 // The domains that are not enforcing are named: nothing is refused to them.
-std::string DescribeDomains(const Status& status) {
+std::string DescribeDomains(const HostStatus& status) {
   std::string text = std::to_string(status.policy.domains.size());
   const char* separator = ": ";
   for (const Policy::Level level : Policy::kLevels) {
@@ -122,14 +85,15 @@ std::string DescribeDomains(const Status& status) {
   return text;
 }
 
-const Policy::InstalledDomain* DomainOf(const LinuxHost::PlacedWorld& world, const Status& status) {
+const Policy::InstalledDomain* DomainOf(const LinuxHost::PlacedWorld& world,
+                                        const HostStatus& status) {
   const auto found =
       std::ranges::find(status.policy.domains, world.domainId, &Policy::InstalledDomain::id);
   return found == status.policy.domains.end() ? nullptr : &*found;
 }
 
 // Who is confined keeps the level of the entry.
-std::string DescribeWorld(const LinuxHost::PlacedWorld& world, const Status& status) {
+std::string DescribeWorld(const LinuxHost::PlacedWorld& world, const HostStatus& status) {
   const Policy::InstalledDomain* const domain = DomainOf(world, status);
   std::string text = std::to_string(world.id) + " ";
   if (domain == nullptr) return text + "(no domain)";
@@ -148,7 +112,7 @@ void WriteErrors(const LinuxHost::LoadRecord& load) {
   }
 }
 
-void WriteText(const Status& status) {
+void WriteText(const HostStatus& status) {
   WriteLine("policy", status.IsLoaded() ? "loaded" : "not loaded");
   WriteLine("latest load", status.load ? DescribeLoad(*status.load) : "none by this command");
   if (status.load) WriteErrors(*status.load);
@@ -187,7 +151,7 @@ Json ToJson(const LinuxHost::LoadRecord& load) {
           {"removed", {{"domains", load.removedDomains}, {"rules", load.removedRules}}}};
 }
 
-Json WorldsToJson(const Status& status) {
+Json WorldsToJson(const HostStatus& status) {
   Json worlds = Json::Array();
   for (const LinuxHost::PlacedWorld& world : status.worlds) {
     Json json = {{"id", world.id}};
@@ -198,7 +162,7 @@ Json WorldsToJson(const Status& status) {
   return worlds;
 }
 
-void WriteJson(const Status& status) {
+void WriteJson(const HostStatus& status) {
   Json levels = Json::Object();
   for (const Policy::Level level : Policy::kLevels) levels[TextOf(level)] = Json::Array();
   for (const auto& [level, names] : status.domainsByLevel) levels[TextOf(level)] = names;
@@ -222,7 +186,7 @@ void WriteJson(const Status& status) {
   std::cout << screen.Text();
 }
 
-ExitCode EndWith(const Status& status, bool isBooted) {
+ExitCode EndWith(const HostStatus& status, bool isBooted) {
   const bool problems = status.HasProblems();
   std::string text = "the policy is loaded";
   if (!status.IsLoaded()) {
@@ -236,18 +200,65 @@ ExitCode EndWith(const Status& status, bool isBooted) {
   return problems || !status.IsLoaded() ? kFailed : kWell;
 }
 
+struct Options {
+  std::string format;
+  std::string output;
+};
+
+ExitCode Show(const Options& options) {
+  const bool isBooted = !LinuxHost::IsStateMissing();
+  // The host would make a state of its own.
+  std::optional<ScratchState> scratch;
+  if (!isBooted) scratch.emplace(true);
+  const HostStatus status = ReadStatus();
+  (options.format == "json" ? WriteJson : WriteText)(status);
+  return EndWith(status, isBooted);
+}
+
+void WriteMetrics(const std::string& metrics, const std::string& file) {
+  if (file.empty()) {
+    std::cout << metrics;
+  } else {
+    ReplaceFile(file, metrics);
+  }
+}
+
+// Metrics say themselves how it is, so it has gone well when they are written.
+ExitCode Measure(const std::string& file) {
+  if (LinuxHost::IsStateMissing()) {
+    WriteMetrics(MetricsWithoutState(), file);
+    Summarize("status", "nothing is installed below this root, and the metrics say so");
+    return kWell;
+  }
+  std::string metrics;
+  std::string summary = "done";
+  try {
+    metrics = MetricsOf(ReadStatus());
+  } catch (const std::exception& failure) {
+    metrics = MetricsWithoutStatus();
+    summary = WithAdvice(failure.what());
+  }
+  WriteMetrics(metrics, file);
+  Summarize("status", summary);
+  return kWell;
+}
+
+ExitCode Answer(const Options& options) {
+  if (options.format == "prometheus") return Measure(options.output);
+  if (options.output.empty()) return Show(options);
+  Summarize("status", "--output is for --format prometheus");
+  return kUsage;
+}
+
 Action Define(Syntax& syntax) {
-  const auto format = std::make_shared<std::string>();
-  syntax.AddFormat(*format, "it", {"text", "json"});
-  return [format] {
-    const bool isBooted = !LinuxHost::IsStateMissing();
-    // The host would make a state of its own.
-    std::optional<ScratchState> scratch;
-    if (!isBooted) scratch.emplace(true);
-    const Status status = ReadStatus();
-    (*format == "json" ? WriteJson : WriteText)(status);
-    return EndWith(status, isBooted);
-  };
+  const auto options = std::make_shared<Options>();
+  const Option format = syntax.AddFormat(options->format, "it", {"text", "json", "prometheus"});
+  syntax
+      .AddOption("-o,--output", options->output,
+                 "Put the metrics into FILE, which others see whole, old or new")
+      .NameValue("FILE")
+      .Need(format);
+  return [options] { return Answer(*options); };
 }
 
 }  // namespace
@@ -257,10 +268,16 @@ const Verb kStatus = {
     "Prints the latest load with its errors, the domains by enforcement level, and how many\n"
     "objects, rules of each kind and tardisks there are. Exit status: 0 the policy is loaded,\n"
     "1 it is not, or the latest load did not end well.\n"
+    "With --format prometheus it writes metrics in the text format of that monitoring system; "
+    "they\n"
+    "say themselves whether the host was booted and how the load went, so the exit status is 0 "
+    "when\n"
+    "they are written.\n"
     "\n"
     "Examples:\n"
     "  secpolicy status\n"
-    "  secpolicy status --format json | jq .latestLoad",
+    "  secpolicy status --format json | jq .latestLoad\n"
+    "  secpolicy status --format prometheus -o /var/lib/prometheus/node-exporter/secpolicy.prom",
     Define};
 
 }  // namespace SecPolicyCli

@@ -1,0 +1,30 @@
+#pragma once
+
+#include <span>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace SecPolicyCli {
+
+// One value of a metric, and the labels that tell it from the others.
+struct Sample {
+  std::vector<std::pair<const char*, std::string>> labels;
+  double value = 0;
+};
+
+// A metric that may go up and down. Its name ends in the unit, if there is one.
+struct Gauge {
+  const char* name;
+  const char* help;  // one line
+  std::vector<Sample> samples;
+};
+
+// The metrics in the text format that Prometheus and its collectors read, version 0.0.4.
+std::string TextOf(std::span<const Gauge> gauges);
+
+// Puts a file with this text in place of `path`, which everybody may read and others see whole: the
+// old or the new. Throws BraxoException.
+void ReplaceFile(const std::string& path, const std::string& text);
+
+}  // namespace SecPolicyCli
