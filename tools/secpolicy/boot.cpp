@@ -11,6 +11,7 @@
 #include "host/linux/operation/mend_state.h"
 #include "kitlibs/file.h"
 #include "load/load_run.h"
+#include "monitor/journal.h"
 #include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
@@ -55,12 +56,14 @@ void Mend() {
 
 ExitCode BootNow(const Options& options) {
   LinuxHost::AssembledRoot root;
+  JournalledLoad journal("boot", SecPolicy::kPolicyRoot);
   return RunLoad(
       {.verb = "boot",
        .policyDir = SecPolicy::kPolicyRoot,
        .steps = {{LinuxHost::LoadKind::kEarly, SecPolicy::kEarlyPolicyRoot, LoadEarly},
                  {LinuxHost::LoadKind::kFull, SecPolicy::kPolicyRoot, SecPolicy::LoadPolicy}},
        .timing = options.timing,
+       .watcher = &journal,
        .mend = Mend,
        .prepare =
            [&](LoadTiming& phases) {

@@ -1,6 +1,7 @@
 #include "command_line.h"
 #include "dry_run/planned_load.h"
 #include "load/full_load.h"
+#include "monitor/journal.h"
 #include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 #include "verb.h"
@@ -22,7 +23,10 @@ ExitCode Load(const std::string& dir, const Options& options) {
   load.keep = options.keep;
   load.allOrNothing = options.allOrNothing;
   load.timing = options.timing;
-  return options.plan ? PlanLoad(load, options.planOptions) : RunLoad(load);
+  if (options.plan) return PlanLoad(load, options.planOptions);
+  JournalledLoad journal(load.verb, dir);
+  load.watcher = &journal;
+  return RunLoad(load);
 }
 
 Action Define(Syntax& syntax) {

@@ -1,4 +1,5 @@
 #include "load/load_run.h"
+#include "monitor/journal.h"
 #include "policy_dir.h"
 #include "secpolicy/observed/loading.h"
 #include "secpolicy/policy_root.h"
@@ -14,11 +15,13 @@ struct Options {
 
 ExitCode LoadEarly(const std::string& dir, const Options& options) {
   if (const auto refusal = RefuseMissingDir("load-early", dir)) return *refusal;
+  JournalledLoad journal("load-early", dir);
   return RunLoad({.verb = "load-early",
                   .policyDir = dir,
                   .steps = {{LinuxHost::LoadKind::kEarly, dir, SecPolicy::LoadPolicyEarly}},
                   .keep = options.keep,
                   .timing = options.timing,
+                  .watcher = &journal,
                   .mend = {},
                   .prepare = {},
                   .begin = {}});

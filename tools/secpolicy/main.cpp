@@ -26,7 +26,7 @@ namespace {
 const VerbGroup kVerbs[] = {
     {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords}},
     {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
-    {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff}},
+    {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff, &kDrift}},
     {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
     {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
     {"Run programs in it", {&kRun, &kExec, &kObserve}},
@@ -61,6 +61,7 @@ constexpr char kFooter[] =
     "  secpolicy --root ./r label verify                which files have another label than they "
     "should?\n"
     "  secpolicy --root ./r diff ./old installed        how do two policies differ?\n"
+    "  secpolicy --root ./r drift                       what is no longer as the policy says?\n"
     "  secpolicy --root ./r save good                   keep what is installed under a name\n"
     "  secpolicy --root ./r history                     what is saved?\n"
     "  secpolicy --root ./r saved show good             and what does it hold?\n"

@@ -1,5 +1,7 @@
 #include "policy_dir.h"
 
+#include <filesystem>
+
 #include "ending.h"
 #include "kitlibs/file.h"
 #include "secpolicy/policy_root.h"
@@ -36,6 +38,13 @@ std::string DomainFile(std::string_view domain, const std::string& policyDir) {
     return SecPolicy::kPartnerDomainsDir + ("/" + std::string(domain));
   }
   return policyDir + "/" + SecPolicy::kDomainsDir + "/" + std::string(domain);
+}
+
+std::string DomainOfFile(const std::string& file) {
+  const std::filesystem::path path = file;
+  const std::string name = path.filename();
+  if (path.parent_path() == SecPolicy::kPartnerDomainsDir) return SecPolicy::kPartnerPrefix + name;
+  return path.parent_path().filename() == SecPolicy::kDomainsDir ? name : "";
 }
 
 }  // namespace SecPolicyCli

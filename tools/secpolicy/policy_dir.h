@@ -25,4 +25,7 @@ std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::str
 // The file that a load of the policy directory `policyDir` takes the domain's policy from.
 std::string DomainFile(std::string_view domain, const std::string& policyDir);
 
+// The domain whose policy the file of a policy directory holds; empty for other files.
+std::string DomainOfFile(const std::string& file);
+
 }  // namespace SecPolicyCli

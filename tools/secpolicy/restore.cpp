@@ -7,6 +7,7 @@
 #include "error_list.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
+#include "monitor/journal.h"
 #include "policy/installed_policy.h"
 #include "root.h"
 #include "secpolicy/observed/loading.h"
@@ -36,17 +37,23 @@ std::vector<Policy::InstalledDomain> ListDomains() {
   return Policy::ListDomains(access);
 }
 
-// Writes a line for each domain that has another level than it had in `before`, and returns how
+// Writes a line for each domain that has another level than it had `earlier`, and returns how
 // many there are.
-std::size_t TellOfChanges(const std::vector<Policy::InstalledDomain>& before) {
+std::size_t TellOfChanges(const std::vector<Policy::InstalledDomain>& earlier) {
   std::map<unsigned int, Policy::Level> levels;
-  for (const Policy::InstalledDomain& domain : before) levels.emplace(domain.id, domain.level);
+  for (const Policy::InstalledDomain& domain : earlier) levels.emplace(domain.id, domain.level);
   std::size_t count = 0;
   for (const Policy::InstalledDomain& domain : ListDomains()) {
     const auto had = levels.find(domain.id);
     if (had == levels.end() || had->second == domain.level) continue;
-    std::cout << Visible(domain.name) << ": " << Policy::TextOf(had->second) << " -> "
-              << Policy::TextOf(domain.level) << '\n';
+    const std::string before = Policy::TextOf(had->second);
+    const std::string after = Policy::TextOf(domain.level);
+    const std::string line = domain.name + ": " + before + " -> " + after;
+    std::cout << Visible(line) << '\n';
+    TellJournal(Event::kLevelChanged, line,
+                {{"SECPOLICY_DOMAIN", domain.name},
+                 {"SECPOLICY_LEVEL_BEFORE", before},
+                 {"SECPOLICY_LEVEL", after}});
     ++count;
   }
   return count;

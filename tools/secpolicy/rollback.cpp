@@ -6,6 +6,7 @@
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/store_copy.h"
 #include "load/load_record.h"
+#include "monitor/journal.h"
 #include "root.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_state.h"
@@ -25,6 +26,8 @@ void PutBack(const std::string& name) {
                              "' cannot be put back, so nothing was changed: " + reason.what());
   }
   RecordRollback(name);
+  TellJournal(Event::kRolledBack, "the saved state '" + name + "' was put back",
+              {{"SECPOLICY_SAVED_STATE", name}});
 }
 
 ExitCode RollBack(const std::string& name) {

@@ -52,6 +52,7 @@ extern const Verb kSettings;
 extern const Verb kGraph;
 extern const Verb kLabel;
 extern const Verb kStatus;
+extern const Verb kDrift;
 extern const Verb kDomain;
 extern const Verb kFilePolicy;
 extern const Verb kCapability;

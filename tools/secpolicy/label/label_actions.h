@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -17,8 +18,19 @@ std::string ShowLabels(LabelRun& run, const std::vector<std::string>& paths, boo
 std::string GiveLabel(LabelRun& run, const std::string& label,
                       const std::vector<std::string>& paths, bool wholeTrees);
 
+// How many files a file label policy names, and how many of them differ from it.
+struct LabelTally {
+  std::size_t files = 0;
+  std::size_t different = 0;     // those without a label included
+  std::size_t withoutLabel = 0;  // neither their own nor an inherited one
+};
+
 // Prints every file whose label is not that of the file label policy in `dir`. `paths` limits it to
 // what is at or below one of them, unless it is empty.
+LabelTally CompareLabels(LabelRun& run, const std::string& dir,
+                         const std::vector<std::string>& paths);
+
+// The same as a use of the verb, which fails where any file differs.
 std::string VerifyLabels(LabelRun& run, const std::string& dir,
                          const std::vector<std::string>& paths);
 

@@ -7,6 +7,7 @@
 #include "environment.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/operation/log_use.h"
+#include "monitor/journal.h"
 #include "proposal.h"
 #include "text/visible.h"
 #include "watch.h"
@@ -27,6 +28,8 @@ void TellRefused(const std::string& verb, const std::string& domain,
   const std::string line = domain + " would be refused: " + Visible(TextOf(question));
   std::cerr << "secpolicy: " + verb + ": " + line + "\n" << std::flush;
   LinuxHost::LogLine(line);
+  TellJournal(Event::kWouldBeRefused, line,
+              {{"SECPOLICY_DOMAIN", domain}, {"SECPOLICY_QUESTION", TextOf(question)}});
 }
 
 }  // namespace
