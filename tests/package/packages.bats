@@ -199,7 +199,8 @@ plans_of() {
   cat >"$host/started.sh" <<'END'
 systemctl is-active secpolicy-boot secpolicy-restore
 cp -r /run/secpolicy/plans /srv/by-boot
-systemctl start secpolicy-load
+touch /opt/monitor/etc/new # which has the label of its directory
+systemctl start secpolicy-load && echo loaded
 cp -r /run/secpolicy/plans /srv/by-load
 secpolicy load
 cp -r /run/secpolicy/plans /srv/without
@@ -209,7 +210,7 @@ secpolicy status
 END
   run under_systemd "$host"
   echo "$output"
-  [[ $output == active$'\n'active$'\n'* && $output == *"2 permissive (hostDom sshDom)"* ]]
+  [[ $output == active$'\n'active$'\nloaded\n'* && $output == *"2 permissive (hostDom sshDom)"* ]]
 
   # Who is told less of the kernel publishes other plans, or none.
   plans_of "$host/srv/without" | grep -qx 'monitorDom /opt/monitor/bin'
