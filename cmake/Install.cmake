@@ -5,6 +5,8 @@ include(CMakePackageConfigHelpers)
 set(SECPOLICY_HEADERS "${CMAKE_INSTALL_INCLUDEDIR}/libsecpolicy")
 set(SECPOLICY_CMAKE "${CMAKE_INSTALL_LIBDIR}/cmake/secpolicy")
 set(SECPOLICY_UNITS "lib/systemd/system" CACHE STRING "Where systemd units go, below the prefix")
+set(SECPOLICY_CATALOG "lib/systemd/catalog" CACHE STRING
+  "Where explanations of journal entries go, below the prefix")
 
 # Libraries and headers. A caller's include paths begin at the public header, at the contract headers
 # that it includes, and at those of the Linux host.
@@ -54,17 +56,20 @@ install(FILES completions/_secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
 install(FILES completions/secpolicy.fish
   DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d")
-foreach(unit boot restore load)
+foreach(unit boot restore load metrics drift)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
+install(FILES packaging/systemd/secpolicy-metrics.timer packaging/systemd/secpolicy-drift.timer
+  DESTINATION "${SECPOLICY_UNITS}")
+install(FILES packaging/systemd/secpolicy.catalog DESTINATION "${SECPOLICY_CATALOG}")
 install(FILES README.md CHANGELOG.md SECURITY.md
   docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
   docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
-  docs/messages.md docs/queries.md docs/runtime.md docs/graph.svg
+  docs/messages.md docs/monitoring.md docs/queries.md docs/runtime.md docs/graph.svg
   DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}")
-install(DIRECTORY examples/host examples/systemd
+install(DIRECTORY examples/host examples/systemd packaging/monitoring
   DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples" USE_SOURCE_PERMISSIONS)
 install(PROGRAMS scripts/pack-example DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
 

@@ -26,6 +26,7 @@ set(CPACK_RPM_EXCLUDE_FROM_AUTO_FILELIST_ADDITION
   "${prefix}/${CMAKE_INSTALL_LIBDIR}/pkgconfig"
   "${prefix}/${CMAKE_INSTALL_LIBEXECDIR}"
   "${prefix}/lib/systemd"
+  "${prefix}/lib/systemd/catalog"
   "${prefix}/lib/systemd/system"
   "${prefix}/share/man"
   "${prefix}/share/man/man5"

@@ -98,6 +98,10 @@ EOF
   for unit in boot restore load; do
     grep -q "^ExecStart=/.*/secpolicy $unit$" "$PREFIX/lib/systemd/system/secpolicy-$unit.service"
   done
+  for unit in metrics drift; do
+    [[ -f $PREFIX/lib/systemd/system/secpolicy-$unit.service && -f $PREFIX/lib/systemd/system/secpolicy-$unit.timer ]]
+  done
+  [[ -f $PREFIX/lib/systemd/catalog/secpolicy.catalog && -f $PREFIX/share/doc/secpolicy/examples/monitoring/alerts.yaml ]]
 }
 
 @test "installed headers stand alone" {

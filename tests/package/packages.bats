@@ -83,7 +83,7 @@ listed() { for package; do dpkg-deb --fsys-tarfile "$package" | tar --list; done
   diff <(listed "$PACKAGES"/*.deb | uniq -d) /dev/null
   local tree=$BATS_TEST_TMPDIR/tree
   DESTDIR=$tree cmake --install "$BUILD" >/dev/null
-  (cd "$tree" && find . ! -type d ! -name LICENSE) | sed 's#/usr/lib/systemd/#/lib/systemd/#' |
+  (cd "$tree" && find . ! -type d ! -name LICENSE) | sed 's#/usr/lib/systemd/system/#/lib/systemd/system/#' |
     sort >"$BATS_TEST_TMPDIR/installed"
   # Debian's own, and what Debian wants compressed.
   listed "$PACKAGES"/*.deb | sed 's/\.gz$//' | grep -vE '/(copyright|changelog)$|/lintian/' |
@@ -130,12 +130,14 @@ rpm_files() {
 @test "the units can be verified, expose little, and none is enabled" {
   needs_debian
   local unit
-  for unit in boot load restore; do
+  for unit in boot load restore metrics drift; do
     run inside systemd-analyze verify --man=no "secpolicy-$unit.service"
     [[ $status -eq 0 && -z $output ]]
     inside systemd-analyze security --offline=true --threshold=40 --no-pager \
       "/lib/systemd/system/secpolicy-$unit.service"
   done
+  inside systemd-analyze verify --man=no secpolicy-metrics.timer secpolicy-drift.timer
+  [[ $(inside journalctl --list-catalog) == *" secpolicy: The host has drifted from its security policy"* ]]
   run -1 bash -c "find '$DEBIAN/etc/systemd' -name 'secpolicy*' | grep ."
 }
 
@@ -195,7 +197,7 @@ plans_of() {
   cp -a "$DEBIAN" "$host"
   cp -a "$host/srv/host/tardisks" "$host/"
   cp -a "$host/srv/host/etc/zorvan" "$host/etc/"
-  chroot "$host" systemctl --quiet enable secpolicy-boot secpolicy-restore
+  chroot "$host" systemctl --quiet enable secpolicy-boot secpolicy-restore secpolicy-metrics.timer secpolicy-drift.timer
   cat >"$host/started.sh" <<'END'
 systemctl is-active secpolicy-boot secpolicy-restore
 cp -r /run/secpolicy/plans /srv/by-boot
@@ -204,9 +206,18 @@ systemctl start secpolicy-load && echo loaded
 cp -r /run/secpolicy/plans /srv/by-load
 secpolicy load
 cp -r /run/secpolicy/plans /srv/without
+systemctl is-active secpolicy-metrics.timer secpolicy-drift.timer
+mkdir -p /var/lib/prometheus/node-exporter
+touch /opt/monitor/etc/newer
+systemctl start secpolicy-metrics secpolicy-drift
+cp -r /var/lib/prometheus/node-exporter /srv/metrics
 secpolicy settings enforcement sshDom permissive
 systemctl restart secpolicy-restore
 secpolicy status
+systemctl start secpolicy-drift
+systemctl is-failed secpolicy-drift
+journalctl --sync
+journalctl --no-pager -x SECPOLICY_DOMAIN=sshDom >/srv/journal
 END
   run under_systemd "$host"
   echo "$output"
@@ -216,6 +227,15 @@ END
   plans_of "$host/srv/without" | grep -qx 'monitorDom /opt/monitor/bin'
   diff <(plans_of "$host/srv/by-boot") <(plans_of "$host/srv/without")
   diff <(plans_of "$host/srv/by-load") <(plans_of "$host/srv/without")
+
+  # Metrics tell of the host, drift is seen, and the journal has and explains the fields.
+  [[ $output == *$'\nactive\nactive\n'* && ${output##*$'\n'} == failed ]]
+  grep -qx 'secpolicy_policy_loaded 1' "$host/srv/metrics/secpolicy.prom"
+  grep -qx 'secpolicy_drift_check_success 1' "$host/srv/metrics/secpolicy-drift.prom"
+  run ! grep -E '^secpolicy_drift_(files|domains|objects).* [^0]' "$host/srv/metrics/secpolicy-drift.prom"
+  grep -qx 'secpolicy_drift_domains 1' "$host/var/lib/prometheus/node-exporter/secpolicy-drift.prom"
+  grep -q 'secpolicy\[[0-9]*\]: sshDom: enforcing -> permissive$' "$host/srv/journal"
+  grep -q 'Subject: A security domain has another enforcement level$' "$host/srv/journal"
 }
 
 @test "removal leaves what was kept, and purging leaves nothing but the policy" {
@@ -228,7 +248,12 @@ END
   [[ ! -e $DEBIAN/usr/bin/secpolicy ]]
   [[ -f $DEBIAN/run/secpolicy/host.db && -f $DEBIAN/var/lib/secpolicy/config.db ]]
 
+  [[ $(inside journalctl --list-catalog) != *" secpolicy: "* ]]
+
+  mkdir -p "$DEBIAN/var/lib/prometheus/node-exporter"
+  touch "$DEBIAN/var/lib/prometheus/node-exporter/secpolicy.prom" "$DEBIAN/var/lib/prometheus/node-exporter/secpolicy-drift.prom"
   inside dpkg --purge secpolicy >/dev/null
+  rmdir -p "$DEBIAN/var/lib/prometheus/node-exporter" 2>/dev/null || true
   [[ -f $DEBIAN/etc/zorvan/secpolicy/domains/hostDom ]]
   rm -r "$DEBIAN/etc/zorvan"
   files | diff "$BATS_FILE_TMPDIR/clean" -

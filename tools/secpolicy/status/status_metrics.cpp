@@ -35,7 +35,7 @@ std::vector<Gauge> HostGauges(bool isBooted, bool isReadable) {
            "1 when this host has a state, which a boot makes.",
            {{{}, isBooted ? 1.0 : 0.0}}},
           {"secpolicy_state_readable",
-           "1 when that state could be read; without it there are no other metrics.",
+           "1 when that state could be read.",
            {{{}, isReadable ? 1.0 : 0.0}}}};
 }
 
