@@ -221,6 +221,11 @@ TEST_F(PrivilegesTest, TellsSignalsAndLimits) {
   EXPECT_EQ(!taken.empty(), mayRaise);
 }
 
+TEST_F(PrivilegesTest, TellsWhatProcessesTakeFromThemselves) {
+  EXPECT_THAT(Taken("setpriv --no-new-privs true"), IsEmpty());
+  EXPECT_THAT(Taken("setpriv --bounding-set=-sys_boot true"), ElementsAre("cap_setpcap"));
+}
+
 TEST_F(PrivilegesTest, TellsNobodyElseOfAny) {
   MakeOthers("closed", 0600);
   const std::string script = "cd " + directory + "; cat closed; chmod 777 closed; kill -0 1";
