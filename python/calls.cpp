@@ -17,6 +17,7 @@
 #include "query/answer.h"
 #include "query/named.h"
 #include "query/search.h"
+#include "refusal.h"
 #include "root.h"
 
 namespace SecPolicyPython {

@@ -1,9 +1,8 @@
 #include "reply.h"
 
-#include "check/policy_check.h"
-#include "compare/side.h"
 #include "json.h"
 #include "query/question.h"
+#include "refusal.h"
 
 namespace SecPolicyPython {
 namespace {
@@ -28,8 +27,6 @@ void SendFailureOf(const std::function<void()>& step, const Send& send) {
   } catch (const SecPolicyCli::NothingInstalled& failure) {
     send(ToReply("not-installed", failure));
   } catch (const SecPolicyCli::NoSuchPolicy& failure) {
-    send(ToReply("missing", failure));
-  } catch (const SecPolicyCli::CheckRefusal& failure) {
     send(ToReply("missing", failure));
   } catch (const LinuxHost::HostError& failure) {
     send(ToReply("host", failure));

@@ -586,18 +586,18 @@ END
   chmod 666 "$state"
   secpolicy check
   exits 1
-  [[ $stderr == "secpolicy: Refusing the host state: other users may write /run/secpolicy/host.db. Take that right from them (chmod go-w), and make it anew" ]]
+  [[ $stderr == "secpolicy: check: Refusing the host state: other users may write /run/secpolicy/host.db. Take that right from them (chmod go-w), and make it anew" ]]
   rm "$state"
   mkfifo -m 600 "$state"
   run --separate-stderr timeout 10 "$SECPOLICY" --root "$root" check
   exits 1
-  [[ $stderr == "secpolicy: Refusing the host state: /run/secpolicy/host.db is not a regular file. Remove it, and make it anew" ]]
+  [[ $stderr == "secpolicy: check: Refusing the host state: /run/secpolicy/host.db is not a regular file. Remove it, and make it anew" ]]
   rm "$state"
   echo garbage >"$state"
   chmod 600 "$state"
   secpolicy check
   exits 1
-  [[ $stderr == "secpolicy: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
+  [[ $stderr == "secpolicy: check: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
   [[ $(cat "$state") == garbage ]]
 }
 

@@ -68,6 +68,7 @@ load helper
   secpolicy display sshDom
   exits 1
   [[ $stderr == "secpolicy: display: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]
+  boot
   rm -r "$root/tardisks"
   secpolicy display
   exits 1
@@ -147,12 +148,13 @@ END
   [[ $(jq -c '.tardisks[] | select(.path == "/tardisks/late.tgz") | .label' <<<"$output") == null ]]
 }
 
-@test "--format json where nothing was booted says what to do, and an unknown format is wrong usage" {
+@test "--format json where the tardisks have gone says what to do, and an unknown format is wrong usage" {
+  boot
   rm -r "$root/tardisks"
   secpolicy display --format json
   exits 1
   [[ -z $output ]]
   ends_with "secpolicy: display: Could not open tardisk dir /tardisks/. There is no directory /tardisks/ below this root: name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
   secpolicy display --format xml
-  wrong_usage display "--format: xml not in {text,json}"
+  wrong_usage display "--format: there is no 'xml'; there are text and json"
 }

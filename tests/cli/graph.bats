@@ -118,7 +118,7 @@ load helper
   secpolicy graph --domain sshdom
   wrong_usage graph "graph: there is no domain 'sshdom'; did you mean 'sshDom'?"
   secpolicy graph --format png
-  wrong_usage graph "--format: png not in {dot,svg}"
+  wrong_usage graph "--format: there is no 'png'; there are dot and svg"
 }
 
 @test "a domain is drawn by its number as by its name" {

@@ -66,27 +66,27 @@ load helper
 
 @test "no verb, an unknown verb and an unknown option are wrong usage" {
   secpolicy
-  wrong_usage "" "A subcommand is required"
+  wrong_usage "" "a verb is required"
   run --separate-stderr "$SECPOLICY" lod
   wrong_usage "" "there is no verb or option 'lod'; did you mean 'load'?"
   run --separate-stderr "$SECPOLICY" load --rot /x
-  wrong_usage load "The following argument was not expected: --rot"
+  wrong_usage load "there is no option '--rot'; did you mean '--root'?"
 }
 
 @test "a word too many and a word too few are wrong usage" {
   run --separate-stderr "$SECPOLICY" load a b
-  wrong_usage load "The following argument was not expected: b"
+  wrong_usage load "'b' is one word too many"
   run --separate-stderr "$SECPOLICY" settings
-  wrong_usage settings "A subcommand is required: one of list, unset, option, enforcement"
+  wrong_usage settings "one of list, unset, option, enforcement is required"
   run --separate-stderr "$SECPOLICY" settings enforcement
-  wrong_usage settings "DOMAIN is required"
+  wrong_usage "settings enforcement" "DOMAIN is required"
   run --separate-stderr "$SECPOLICY" --root
-  wrong_usage "" "--root: 1 required DIR missing"
+  wrong_usage "" "--root needs a value"
 }
 
 @test "wrong usage changes nothing" {
   secpolicy boot extra
-  wrong_usage boot "The following argument was not expected: extra"
+  wrong_usage boot "'extra' is one word too many"
   [[ ! -e $root/usr ]]
 }
 

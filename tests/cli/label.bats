@@ -403,22 +403,24 @@ END
   for kind in "get /etc" "set sshKey /etc" verify relabel; do
     secpolicy label $kind
     exits 1
-    [[ $stderr == "secpolicy: label ${kind%% *}: nothing is installed below this root, so there are no labels. Run 'secpolicy --root $root boot' first, or name the root that was booted (--root DIR)." ]]
+    [[ $stderr == "secpolicy: label ${kind%% *}: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first." ]]
   done
   [[ ! -e $root/run/secpolicy ]]
 }
 
 @test "label without a kind, a file or a label is wrong usage" {
-  local kinds="A subcommand is required: one of get, set, verify, relabel" arguments message
-  while IFS='|' read -r arguments message; do
+  local kinds="get, set, verify, relabel" arguments command message
+  while IFS='|' read -r arguments command message; do
+    # shellcheck disable=SC2086
     secpolicy label $arguments
-    wrong_usage label "$message"
+    wrong_usage "$command" "$message"
   done <<END
-|$kinds
-lod /etc|$kinds
-get|PATH is required
-set|LABEL is required
-set sshKey|PATH is required
+|label|one of $kinds is required
+gte /etc|label|there is no 'label gte'; did you mean 'get'?
+lod /etc|label|there is no 'label lod'; there are $kinds
+get|label get|PATH is required
+set|label set|LABEL is required
+set sshKey|label set|PATH is required
 END
   secpolicy label get --help
   exits 0

@@ -235,14 +235,14 @@ secpolicy: load: nothing would change" ]]
   secpolicy load --format json
   wrong_usage load "--format requires --plan"
   plan --format xml
-  wrong_usage load "--format: xml not in {text,json}"
+  wrong_usage load "--format: there is no 'xml'; there are text and json"
 }
 
 @test "a state that cannot be read, and a directory that is not there" {
   echo garbage >"$root/run/secpolicy/host.db"
   plan
   exits 1
-  [[ $stderr == "secpolicy: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
+  [[ $stderr == "secpolicy: load: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
   [[ $(cat "$root/run/secpolicy/host.db") == garbage ]]
   secpolicy load --plan /no/such
   exits 1

@@ -65,21 +65,42 @@ as_nobody() {
   as_nobody unshare --user true || skip "this machine allows no user namespaces"
   boot
   share_command
-  local verb unreadable="Unable to use the host state /run/secpolicy/host.db: unable to open database file"
+  local verb words unreadable="Unable to use the host state /run/secpolicy/host.db: unable to open database file"
   local cause="This root is another user's: run it as that user, or as root."
-  for verb in status graph "why sshDom read /etc" "domain list" "rules --call mount" "path hostDom sshDom" \
-    "file-policy list sshDom" "domain show sshDom"; do
+  while IFS='|' read -r verb words; do
     # shellcheck disable=SC2086
-    run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb
+    run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb $words
     exits 1
-    [[ -z $output && $stderr == "secpolicy: $unreadable. $cause" ]]
-  done
-  for verb in restore display "domain create job7" "label get /etc" boot "boot --plan"; do
+    [[ -z $output && $stderr == "secpolicy: $verb: $unreadable. $cause" ]] || ends_with "that of $verb"
+  done <<END
+status|
+graph|
+why|sshDom read /etc
+domain list|
+rules|--call mount
+path|hostDom sshDom
+file-policy list|sshDom
+domain show|sshDom
+restore|
+display|
+domain create|job7
+label get|/etc
+boot|
+boot|--plan
+END
+  local policy=/etc/zorvan/secpolicy
+  unreadable="there is no place for a copy of the policy to work with: /tmp, /var/tmp, /run and / below this root cannot be written; TMPDIR can name another: Permission denied"
+  while IFS='|' read -r verb words code; do
     # shellcheck disable=SC2086
-    run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb
-    exits 1
-    [[ -z $output && $stderr == "secpolicy: "*": $unreadable. $cause" && $(wc -l <<<"$stderr") -eq 1 ]]
-  done
+    TMPDIR='' run --separate-stderr as_nobody "$SECPOLICY" --root "$root" $verb $words
+    exits "$code"
+    [[ -z $output && $stderr == "secpolicy: $verb: $unreadable. $cause" ]] || ends_with "that of $verb"
+  done <<END
+check||1
+load|--plan|1
+diff|installed $policy|2
+diff|$policy $policy|2
+END
   run --separate-stderr as_nobody "$SECPOLICY" --root "$root" domain of 1
   exits 1
   [[ $stderr == "secpolicy: domain of: Unable to get domain ID: "*". $cause" ]]
@@ -148,7 +169,7 @@ State: 8 RefCount: 0 WorldRefCount: 0 defaultDom: 0
 
 @test "where nothing is installed, the verbs that look say what to do and make nothing" {
   mkdir -p "$BATS_TEST_TMPDIR/empty/run"
-  for verb in "why sshDom read /etc" "who-can read /etc" graph; do
+  for verb in "why sshDom read /etc" "who-can read /etc" graph display; do
     run --separate-stderr "$SECPOLICY" --root "$BATS_TEST_TMPDIR/empty" $verb
     exits 1
     ends_with "secpolicy: ${verb%% *}: nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $BATS_TEST_TMPDIR/empty boot' first."
@@ -158,6 +179,21 @@ State: 8 RefCount: 0 WorldRefCount: 0 defaultDom: 0
   exits 1
   ends_with "secpolicy: status: no policy is loaded. 'secpolicy --root $BATS_TEST_TMPDIR/empty boot' loads one"
   [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
+}
+
+@test "a load before the first boot tells of that" {
+  local unbooted="nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
+  rmdir "$root/run"
+  for verb in load load-early "load --all-or-nothing"; do
+    # shellcheck disable=SC2086
+    secpolicy $verb
+    fails_with "${verb%% *}" "$unbooted"
+  done
+  [[ ! -e $root/run ]]
+  mkdir "$root/run"
+  secpolicy load
+  exits 1
+  [[ ${stderr##*$'\n'} == "secpolicy: load: There were some problems encountered in setting the policy ("*" problems above). This root was not booted: 'secpolicy --root $root boot' labels its files and loads the policy" ]]
 }
 
 @test "output that cannot be written is an error of every verb" {

@@ -312,7 +312,7 @@ refuses() {
   run --separate-stderr setpriv --reuid=65534 --clear-groups env SECPOLICY_HOST_STATE="$root/run/secpolicy/host.db" \
     "$SECPOLICY" diff installed "$SOURCE/examples/host/etc/zorvan/secpolicy"
   exits 2
-  [[ $stderr == "secpolicy: diff: Unable to examine $root/run/secpolicy: Permission denied" ]]
+  [[ $stderr == "secpolicy: diff: Unable to examine $root/run/secpolicy: Permission denied. You are not root: run it as root, or give --root DIR to work below a directory of yours." ]]
 }
 
 @test "history tells as JSON what is saved, and what cannot be used" {
@@ -362,7 +362,7 @@ refuses() {
     exits 1
     [[ $stderr == "secpolicy: saved $verb: there is no saved state 'good'. 'secpolicy --root $root history' lists what is saved." ]]
     secpolicy saved "$verb" ../config
-    wrong_usage "saved" "NAME: '../config' cannot be a name: it takes 1 to 64 of A-Z a-z 0-9 . _ -, and begins with neither . nor -"
+    wrong_usage "saved $verb" "NAME: '../config' cannot be a name: it takes 1 to 64 of A-Z a-z 0-9 . _ -, and begins with neither . nor -"
   done
   ln -s other.db "$saved/link.db"
   secpolicy saved delete link

@@ -176,7 +176,7 @@ kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 
   exits 1
   ends_with "secpolicy: settings unset: nothing is stored for enforcement appDom"
   secpolicy settings unset level appDom
-  wrong_usage settings "KIND: 'level' is no kind of setting: option or enforcement"
+  wrong_usage "settings unset" "KIND: 'level' is no kind of setting: option or enforcement"
 }
 
 @test "a level is stored for no domain that an installed policy lacks" {

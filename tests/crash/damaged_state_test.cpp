@@ -221,8 +221,9 @@ TEST(MissingRun, IsToldByWhatNeedsItAndMadeByBoot) {
     EXPECT_EQ(outcome.exitStatus, 1);
     EXPECT_EQ(outcome.errors,
               std::string("secpolicy: ") + verb +
-                  ": Unable to create the directory /run/secpolicy for the host state: No such "
-                  "file or directory. Make /run first, or choose another place\n");
+                  ": nothing is installed below this root. Name the root that was booted "
+                  "(--root DIR), or run 'secpolicy --root " +
+                  root.Path().string() + " boot' first.\n");
     EXPECT_FALSE(std::filesystem::exists(root.Path() / "run"));
   }
   EXPECT_EQ(RunCommand(root.Path(), {"boot"}).exitStatus, 0);

@@ -77,15 +77,11 @@ ExitCode BootNow(const Options& options) {
 }
 
 ExitCode Plan(const Options& options) {
-  try {
-    const LinuxHost::BootPlan plan = LinuxHost::PlanBoot(RulesOf(options));
-    if (options.format == "json") {
-      WriteBootPlanJson(plan, std::cout);
-    } else {
-      WriteBootPlanText(plan, MostShown(options), std::cout);
-    }
-  } catch (const Braxo::Lib::BraxoException& failure) {
-    return Refuse("boot", WithAdvice(failure.what()));
+  const LinuxHost::BootPlan plan = LinuxHost::PlanBoot(RulesOf(options));
+  if (options.format == "json") {
+    WriteBootPlanJson(plan, std::cout);
+  } else {
+    WriteBootPlanText(plan, MostShown(options), std::cout);
   }
   Summarize("boot", "this was a plan: nothing was changed");
   return kWell;

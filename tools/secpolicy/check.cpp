@@ -59,16 +59,12 @@ ExitCode Report(const CheckReport& report, const Options& options) {
 }
 
 ExitCode Check(const Options& options) {
-  try {
-    CheckReport report = CheckPolicy({.path = options.path,
-                                      .fresh = options.fresh,
-                                      .content = options.fromStandardInput ? &std::cin : nullptr,
-                                      .unwanted = options.unwanted});
-    report.diagnostics.Select(SelectionOf(options));
-    return Report(report, options);
-  } catch (const CheckRefusal& refusal) {
-    return Refuse("check", refusal.what());
-  }
+  CheckReport report = CheckPolicy({.path = options.path,
+                                    .fresh = options.fresh,
+                                    .content = options.fromStandardInput ? &std::cin : nullptr,
+                                    .unwanted = options.unwanted});
+  report.diagnostics.Select(SelectionOf(options));
+  return Report(report, options);
 }
 
 std::string CheckCodeName(const std::string& name) {

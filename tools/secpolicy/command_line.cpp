@@ -9,46 +9,10 @@
 #include <string_view>
 
 #include "text/format.h"
-#include "text/suggestion.h"
-#include "text/visible.h"
+#include "usage_error.h"
 
 namespace SecPolicyCli {
 namespace {
-
-// ": one of A, B" for a verb that has kinds and was given none; else nothing.
-std::string KindsOf(const CLI::App& verb) {
-  if (!verb.get_subcommands().empty()) return "";
-  std::string kinds;
-  for (const CLI::App* kind : verb.get_subcommands([](const CLI::App*) { return true; })) {
-    kinds += (kinds.empty() ? ": one of " : ", ") + kind->get_name();
-  }
-  return kinds;
-}
-
-std::vector<std::string> VerbNames(const CLI::App& app) {
-  std::vector<std::string> names;
-  for (const CLI::App* verb : app.get_subcommands([](const CLI::App*) { return true; })) {
-    names.push_back(verb->get_name());
-  }
-  return names;
-}
-
-// The message for a command line that cannot be understood, and where to read on.
-std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
-  std::string command = "secpolicy";
-  for (const CLI::App* verb : app->get_subcommands())
-    command += std::string(" ") + verb->get_name();
-  const std::vector<std::string> unknown = app->remaining();
-  std::string problem = error.what();
-  if (app->get_subcommands().empty() && !unknown.empty()) {
-    problem = "there is no verb or option '" + unknown.front() + "'";
-    const std::string nearest = NearestWord(unknown.front(), VerbNames(*app));
-    if (!nearest.empty()) problem += "; did you mean '" + nearest + "'?";
-  } else if (!app->get_subcommands().empty() && error.get_name() == "RequiredError") {
-    problem += KindsOf(*app->get_subcommands().front());
-  }
-  return "secpolicy: " + VisibleLines(problem) + "\n'" + command + " --help' explains the usage.\n";
-}
 
 // The first that is no option of all verbs, nor the value of one.
 std::vector<std::string>::iterator FirstWord(std::vector<std::string>& words) {
@@ -68,9 +32,17 @@ std::vector<std::string> Unabbreviated(std::span<char*> words, const CLI::App& a
   if (help == plain.end() || *help != "help") return plain;
   const auto verb = plain.erase(help);
   if (verb == plain.end()) return {"--help"};
-  const std::vector<std::string> verbs = VerbNames(app);
+  const std::vector<std::string> verbs = SubcommandNames(app);
   if (std::ranges::find(verbs, *verb) != verbs.end()) plain.emplace_back("--help");
   return plain;
+}
+
+CLI::Validator OneOf(const std::vector<std::string>& choices) {
+  const auto whyNot = [choices](const std::string& word) -> std::string {
+    if (std::ranges::find(choices, word) != choices.end()) return "";
+    return "there is no '" + word + "'; there are " + ListOf(choices, "and");
+  };
+  return {whyNot, ""};
 }
 
 }  // namespace
@@ -132,7 +104,7 @@ Option Syntax::AddFormat(std::string& value, const std::string& what,
   value = formats.front();
   CLI::Option* const format =
       app.add_option("--format", value, "How to write " + what + ": " + ListOf(formats, "or"));
-  format->check(CLI::IsMember(formats))->type_name("FORMAT")->capture_default_str();
+  format->check(OneOf(formats))->type_name("FORMAT")->capture_default_str();
   return Option(*format, offerings).Offer(OfferWords(formats));
 }
 
@@ -163,7 +135,7 @@ CommandLine::CommandLine(const Description& description, std::span<const VerbGro
   app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
   const std::vector<std::string> choices = {"auto", "always", "never"};
   offerings.emplace(app->add_option("--color", color, "Show colors: " + ListOf(choices, "or"))
-                        ->check(CLI::IsMember(choices))
+                        ->check(OneOf(choices))
                         ->type_name("WHEN"),
                     OfferWords(choices));
   app->add_flag("--no-pager", withoutPager, "Show long output without a pager");
@@ -223,6 +195,11 @@ std::optional<ExitCode> CommandLine::Read(
 std::optional<std::string> CommandLine::Root() const {
   if (rootOption->count() == 0) return std::nullopt;
   return root;
+}
+
+std::string CommandLine::AskedCommand() const {
+  const std::string command = CommandOf(*app);
+  return command.substr(command.find(' ') + 1);
 }
 
 }  // namespace SecPolicyCli

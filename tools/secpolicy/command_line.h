@@ -11,8 +11,7 @@
 #include "complete/word_place.h"
 #include "verb.h"
 
-// The only file that knows the library for command lines is command_line.cpp: its headers cost
-// seconds to compile.
+// Few files know the library for command lines: its headers cost seconds to compile.
 namespace CLI {
 class App;
 class Option;
@@ -129,6 +128,8 @@ class CommandLine {
   const std::string& ColorChoice() const { return color; }
   bool IsPagerWanted() const { return !withoutPager; }
   const Verb& AskedVerb() const { return *verb; }
+  // The verb and its kind, if it has any: "label get".
+  std::string AskedCommand() const;
   ExitCode Act() const { return action(); }
 
  private:

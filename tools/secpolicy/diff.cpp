@@ -5,6 +5,8 @@
 #include "compare/policy_diff.h"
 #include "ending.h"
 #include "host/linux/operation/log_use.h"
+#include "refusal.h"
+#include "root.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -40,10 +42,12 @@ ExitCode Compare(const Options& options) {
 ExitCode CompareOrRefuse(const Options& options) {
   try {
     return Compare(options);
+  } catch (const Refusal& refusal) {
+    Summarize("diff", refusal.what());
   } catch (const std::exception& failure) {
-    Summarize("diff", failure.what());
-    return kUsage;
+    Summarize("diff", WithAdvice(failure.what()));
   }
+  return kUsage;
 }
 
 Action Define(Syntax& syntax) {

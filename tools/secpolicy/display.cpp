@@ -58,6 +58,7 @@ void WriteJson(const std::string& domainId, SecPolicy::PolicyObserver& observer)
 }
 
 ExitCode Display(const std::string& domainId, const std::string& format) {
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState("display");
   return CallLibrary(
       "display",
       [&](ErrorList& errors) {

@@ -43,11 +43,12 @@ ExitCode Refuse(const std::string& verb, const std::string& why) {
   return kFailed;
 }
 
-ExitCode RefuseWithoutState(const std::string& verb) {
-  return Refuse(verb,
-                "nothing is installed below this root. Name the root that was booted (--root "
-                "DIR), or run " +
-                    Call("boot") + " first.");
+std::string WhyWithoutState() {
+  return "nothing is installed below this root. Name the root that was booted (--root DIR), or "
+         "run " +
+         Call("boot") + " first.";
 }
+
+ExitCode RefuseWithoutState(const std::string& verb) { return Refuse(verb, WhyWithoutState()); }
 
 }  // namespace SecPolicyCli

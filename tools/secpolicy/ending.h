@@ -24,6 +24,9 @@ ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList
 // Prints the summary line of a verb that was not done.
 ExitCode Refuse(const std::string& verb, const std::string& why);
 
+// What is said of a root that was not booted.
+std::string WhyWithoutState();
+
 // Refuses what needs an installed state where there is none.
 ExitCode RefuseWithoutState(const std::string& verb);
 

@@ -75,7 +75,7 @@ ExitCode ShowHistory(const std::string& format) {
 Action Define(Syntax& syntax) {
   const auto format = std::make_shared<std::string>();
   syntax.AddFormat(*format, "the list", {"text", "json"});
-  return [format] { return RunOrRefuse("history", [&] { return ShowHistory(*format); }); };
+  return [format] { return ShowHistory(*format); };
 }
 
 }  // namespace

@@ -125,11 +125,7 @@ constexpr LabelKind kLabelKinds[] = {
 
 ExitCode Run(const LabelKind& kind, const Arguments& arguments) {
   const std::string verb = std::string("label ") + kind.name;
-  if (LinuxHost::IsStateMissing()) {
-    return Refuse(verb, "nothing is installed below this root, so there are no labels. Run " +
-                            Call("boot") +
-                            " first, or name the root that was booted (--root DIR).");
-  }
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState(verb);
   std::string ending;
   return CallLibrary(
       verb,

@@ -10,8 +10,10 @@
 
 #include "command_line.h"
 #include "complete/completion.h"
+#include "ending.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
+#include "refusal.h"
 #include "root.h"
 #include "terminal/color.h"
 #include "terminal/pager.h"
@@ -135,9 +137,12 @@ ExitCode Run(int argc, char** argv, Terminal& terminal) {
     std::optional<LinuxHost::ShownLog> shown;
     if (commandLine.IsVerbose()) shown.emplace();
     return FlushOutput(commandLine.Act());
+  } catch (const Refusal& refusal) {
+    return Refuse(commandLine.AskedCommand(), refusal.what());
   } catch (const std::exception& failure) {
+    const std::string verb = isInRoot ? commandLine.AskedCommand() + ": " : "";
     const std::string message = isInRoot ? WithAdvice(failure.what()) : failure.what();
-    std::cerr << "secpolicy: " << VisibleLines(message) << std::endl;
+    std::cerr << "secpolicy: " << verb << VisibleLines(message) << std::endl;
     return kFailed;
   }
 }

@@ -48,7 +48,7 @@ ExitCode RollBack(const std::string& name) {
 
 Action Define(Syntax& syntax) {
   const auto name = AddSavedName(syntax, "The saved state to put back");
-  return [name] { return RunOrRefuse("rollback", [&] { return RollBack(*name); }); };
+  return [name] { return RollBack(*name); };
 }
 
 }  // namespace

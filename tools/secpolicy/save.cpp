@@ -29,7 +29,7 @@ Action Define(Syntax& syntax) {
   const auto name = AddSavedName(syntax, "The name to save it under");
   const auto force = std::make_shared<bool>(false);
   syntax.AddFlag("--force", *force, "Replace a saved state of this name");
-  return [name, force] { return RunOrRefuse("save", [&] { return Save(*name, *force); }); };
+  return [name, force] { return Save(*name, *force); };
 }
 
 }  // namespace

@@ -52,7 +52,7 @@ ExitCode Show(const std::string& name, const std::string& format) {
 Action DefineShow(Syntax& syntax) {
   const auto name = AddSavedName(syntax, "The saved state to show");
   const auto format = AddAnswerFormat(syntax);
-  return [=] { return RunOrRefuse("saved show", [&] { return Show(*name, *format); }); };
+  return [=] { return Show(*name, *format); };
 }
 
 // A link goes, and not what it leads to.
@@ -69,7 +69,7 @@ ExitCode Delete(const std::string& name) {
 
 Action DefineDelete(Syntax& syntax) {
   const auto name = AddSavedName(syntax, "The saved state to delete");
-  return [=] { return RunOrRefuse("saved delete", [&] { return Delete(*name); }); };
+  return [=] { return Delete(*name); };
 }
 
 const Kind kShow = {"show", "Show the domains, rules and objects of a saved state",

@@ -13,6 +13,7 @@
 #include "host/linux/operation/policy_load.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
+#include "refusal.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -96,12 +97,12 @@ void TakeContent(CheckRun& run, const std::string& file, std::istream& input) {
 CheckReport CheckPolicy(const CheckRequest& request) {
   const std::optional<Subject> subject = FindSubject(request.path);
   if (!subject) {
-    throw CheckRefusal("there is no policy at " + request.path +
+    throw NoSuchPolicy("there is no policy at " + request.path +
                        " below this root. Name the directory of the policy or a file in it, or "
                        "the root that it is in (--root DIR).");
   }
   if (request.content != nullptr && subject->file.empty()) {
-    throw CheckRefusal("name the file that standard input holds the content of.");
+    throw NoSuchPolicy("name the file that standard input holds the content of.");
   }
   CheckRun run(request.fresh, request.unwanted);
   if (request.content != nullptr) TakeContent(run, subject->file, *request.content);
@@ -110,7 +111,7 @@ CheckReport CheckPolicy(const CheckRequest& request) {
   CheckFiles(run, subject->dir);
   if (!subject->file.empty()) {
     if (!run.diagnostics.Knows(subject->file)) {
-      throw CheckRefusal("a load does not read " + subject->file +
+      throw NoSuchPolicy("a load does not read " + subject->file +
                          ": it is in none of the directories of a policy.");
     }
     run.diagnostics.KeepFile(subject->file);

@@ -1,19 +1,12 @@
 #pragma once
 
 #include <istream>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "diagnostic.h"
 
 namespace SecPolicyCli {
-
-// There is nothing to check; the message says why.
-class CheckRefusal : public std::runtime_error {
- public:
-  using std::runtime_error::runtime_error;
-};
 
 // What is to be checked, and how.
 struct CheckRequest {
@@ -29,7 +22,8 @@ struct CheckReport {
 };
 
 // Reads the policy as a load would, against a copy of what is installed, and finds its problems.
-// Of a file, only its own are told. Throws CheckRefusal, and what the host throws.
+// Of a file, only its own are told. Throws NoSuchPolicy where there is nothing
+// to check, and what the host throws.
 CheckReport CheckPolicy(const CheckRequest& request);
 
 }  // namespace SecPolicyCli

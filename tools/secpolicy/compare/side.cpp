@@ -1,10 +1,11 @@
 #include "side.h"
 
-#include <stdexcept>
-
 #include "compare/policy_directory.h"
+#include "ending.h"
+#include "host/linux/common/host_error.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
+#include "refusal.h"
 #include "root.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_state.h"
@@ -33,12 +34,7 @@ Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::Co
 }
 
 Side ReadInstalled() {
-  if (LinuxHost::IsStateMissing()) {
-    throw NothingInstalled(
-        "nothing is installed below this root. Name the root that was booted (--root DIR), or "
-        "run " +
-        Call("boot") + " first.");
-  }
+  if (LinuxHost::IsStateMissing()) throw NothingInstalled(WhyWithoutState());
   return ReadStateOf(kInstalled, LinuxHost::StatePath(), LinuxHost::CopyOf::kState);
 }
 
@@ -55,7 +51,7 @@ Side ReadSaved(const std::string& name) {
 bool IsKnownToBeSaved(const std::string& name) {
   try {
     return IsSaved(name);
-  } catch (const std::runtime_error&) {
+  } catch (const LinuxHost::HostError&) {
     return false;
   }
 }

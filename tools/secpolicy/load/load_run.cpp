@@ -10,6 +10,7 @@
 #include <iostream>
 #include <map>
 #include <optional>
+#include <system_error>
 
 #include "ending.h"
 #include "enforce/published.h"
@@ -91,6 +92,14 @@ class BlockedSignals {
   sigset_t before;
 };
 
+// Without /run there was no boot. The host makes but the directory of the state there.
+bool HasPlaceForState() {
+  const std::filesystem::path state = LinuxHost::StatePath();
+  std::error_code unknown;
+  return state.is_relative() ||
+         std::filesystem::exists(state.parent_path().parent_path(), unknown) || unknown;
+}
+
 class LoadRun;
 
 // A terminate handler cannot be handed anything.
@@ -141,6 +150,7 @@ class LoadRun {
   bool WentWell() const { return failure.empty() && listener.Count() == 0; }
 
   void Install() {
+    isUnbooted = !request.prepare && LinuxHost::IsStateMissing();
     if (request.mend) request.mend();
     if (!request.dryRun) {
       PutBackLeftOver();
@@ -312,6 +322,13 @@ class LoadRun {
     return End(kWell, "", DescribeDone(request.verb) + DescribeRemainder(ending, request.keep));
   }
 
+  // Only a boot gives files their first label, without which the policy's cannot be given.
+  std::string Advise() const {
+    std::string advice = AdviseOnPrivilege();
+    if (!advice.empty() || !isUnbooted || request.dryRun) return advice;
+    return "This root was not booted: " + Call("boot") + " labels its files and loads the policy";
+  }
+
   ExitCode ReportFailure() {
     if (!isInstalled) Attempt([&] { RecordUndone(Ending()); });
     WriteProblems();
@@ -325,7 +342,7 @@ class LoadRun {
     } else if (hasBegun) {
       summary += "; nothing was installed";
     }
-    const std::string next = AdviseOnPrivilege();
+    const std::string next = Advise();
     return End(kFailed, reason, next.empty() ? summary : summary + ". " + next);
   }
 
@@ -350,6 +367,7 @@ class LoadRun {
   std::optional<LinuxHost::PolicyTransaction> transaction;
   std::string failure;
   LoadEnding ending;
+  bool isUnbooted = false;
   bool stateIsNew = false;
   bool hasBegun = false;
   bool isInstalled = false;
@@ -357,6 +375,11 @@ class LoadRun {
 
 }  // namespace
 
-ExitCode RunLoad(const LoadRequest& request) { return LoadRun(request).Run(); }
+ExitCode RunLoad(const LoadRequest& request) {
+  if (!request.prepare && LinuxHost::IsStateMissing() && !HasPlaceForState()) {
+    return RefuseWithoutState(request.verb);
+  }
+  return LoadRun(request).Run();
+}
 
 }  // namespace SecPolicyCli

@@ -4,15 +4,14 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <exception>
 #include <filesystem>
 #include <optional>
-#include <stdexcept>
 #include <system_error>
 #include <tuple>
 
 #include "command_line.h"
 #include "ending.h"
+#include "host/linux/common/host_error.h"
 #include "root.h"
 
 namespace SecPolicyCli {
@@ -32,7 +31,7 @@ bool IsMissing(const std::error_code& failure) {
 }
 
 [[noreturn]] void ThrowUnreadable(const std::string& path, const std::error_code& failure) {
-  throw std::runtime_error(WithAdvice("cannot look for " + path + ": " + failure.message()));
+  throw LinuxHost::HostError(failure.value(), "cannot look for " + path + ": " + failure.message());
 }
 
 // What lies at `path`; nothing when nothing does.
@@ -108,14 +107,6 @@ std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::strin
       .Check(WhyNoSavedName)
       .Offer(OfferSavedStates());
   return name;
-}
-
-ExitCode RunOrRefuse(const std::string& verb, const Action& action) {
-  try {
-    return action();
-  } catch (const std::exception& failure) {
-    return Refuse(verb, failure.what());
-  }
 }
 
 }  // namespace SecPolicyCli

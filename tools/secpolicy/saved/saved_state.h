@@ -24,13 +24,11 @@ std::string WhyNoSavedName(const std::string& name);
 // The file of the saved state `name`, which may not be there.
 std::string SavedStatePath(const std::string& name);
 
-// The saved state `name`; nothing when there is none. Throws std::runtime_error, with what to do
-// about it, when this user may not look.
+// The saved state `name`; nothing when there is none. Throws HostError when this user may not look.
 std::optional<SavedState> FindSaved(const std::string& name);
 bool IsSaved(const std::string& name);
 
-// The saved states, the oldest first. Throws std::runtime_error, with what to do about it, when
-// they cannot be listed.
+// The saved states, the oldest first. Throws HostError when they cannot be listed.
 std::vector<SavedState> ListSavedStates();
 
 // Refuses what needs the saved state `name` where there is none.
@@ -38,8 +36,5 @@ ExitCode RefuseUnsaved(const std::string& verb, const std::string& name);
 
 // Adds the required argument NAME, the name of a saved state, to `syntax`.
 std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning);
-
-// Does what `action` does, and ends `verb` with the message of what it throws.
-ExitCode RunOrRefuse(const std::string& verb, const Action& action);
 
 }  // namespace SecPolicyCli

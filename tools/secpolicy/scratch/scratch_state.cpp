@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host/linux/common/host_error.h"
+#include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -25,7 +26,15 @@ std::string MakePrivateDirectory() {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
   }
-  LinuxHost::ThrowErrno("cannot make a directory for the scratch state; TMPDIR can name a place");
+  const int failure = errno;
+  std::vector<std::string> named;
+  named.reserve(places.size());
+  for (const std::string& place : places) named.push_back(place.empty() ? "/" : place);
+  const std::string text =
+      "there is no place for a copy of the policy to work with: " + ListOf(named, "and") +
+      " below this root cannot be written; TMPDIR can name another";
+  errno = failure;
+  LinuxHost::ThrowErrno(text);
 }
 
 constexpr char kState[] = "host.db";
