@@ -447,7 +447,7 @@ END
   secpolicy check --disable rule-type
   wrong_usage check "--disable: 'rule-type' is an error: a load does not end well with it"
   secpolicy check --disable no-such-code
-  wrong_usage check "--disable: there is no warning 'no-such-code'"
+  wrong_usage check "--disable: there is no problem 'no-such-code'; 'secpolicy explain' lists all"
 }
 
 @test "--format json" {
@@ -678,7 +678,9 @@ many_problems() {
   secpolicy check --max many
   wrong_usage check "--max: 'many' is not a number"
   secpolicy check --only nothing
-  wrong_usage check "--only: there is no problem 'nothing'"
+  wrong_usage check "--only: there is no problem 'nothing'; 'secpolicy explain' lists all"
+  secpolicy check --only unkown-word
+  wrong_usage check "--only: there is no problem 'unkown-word'; did you mean 'unknown-word'?"
   secpolicy check --stdin
   exits 1
   ends_with "secpolicy: check: name the file that standard input holds the content of."

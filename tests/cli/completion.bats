@@ -75,6 +75,13 @@ fish_offers() {
   offers capabilities calls
   complete_line secpolicy settings enforcement appDom ""
   offers enforcing permissive disabled
+  complete_line secpolicy --root "$root" label set sshD
+  [[ ${#COMPREPLY[@]} -eq 0 ]]
+  secpolicy settings enforcement appDom permissive
+  complete_line secpolicy --root "$root" settings unset enforcement ""
+  offers appDom
+  complete_line secpolicy --root "$root" settings unset option /
+  offers /UserVars/CheckAccessTemplateEnabled
   complete_line secpolicy --root "$root" boot --policy-from b
   offers base.tgz
   complete_line secpolicy help rol
@@ -95,6 +102,8 @@ fish_offers() {
 @test "before the first boot, the domains of the policy files are offered" {
   complete_line secpolicy --root "$root" settings enforcement mon
   offers monitorDom
+  complete_line secpolicy --root "$root" capability grant monitorDom cap_sys_b
+  offers cap_sys_boot
   [[ ! -e $root/var/run && ! -e $root/run/secpolicy ]]
 }
 

@@ -146,6 +146,9 @@ END
   secpolicy diff nosuch installed
   exits 2
   [[ $stderr == "secpolicy: diff: there is no saved state 'nosuch', and no such directory. 'secpolicy --root $root history' lists what is saved; 'installed' is what is installed now." ]]
+  secpolicy diff instaled /new
+  exits 2
+  [[ $stderr == "secpolicy: diff: there is no saved state 'instaled', and no such directory. Did you mean 'installed'?" ]]
   rm -r "$root/run/secpolicy/"*
   secpolicy diff installed /new
   exits 2

@@ -86,18 +86,22 @@ policies() {
   wrong_usage "file-policy add" "file-policy add: 'srv/b' is no path from the root on: it begins with a slash"
   secpolicy file-policy add job7 r /srv/a/
   wrong_usage "file-policy add" "file-policy add: '/srv/a/' ends in a slash, so it is the path of no file"
-  local long
-  long=$(printf '/%.0s' {1..1983})
-  secpolicy file-policy add job7 r "${long}ab"
+  local long path
+  for path in /srv/../a /srv/./a /srv//a /..; do
+    secpolicy file-policy add job7 r "$path"
+    wrong_usage "file-policy add" "file-policy add: '$path' is the path of no file: it holds '.', '..' or two slashes"
+  done
+  long=/$(printf 'x%.0s' {1..1981})
+  secpolicy file-policy add job7 r "${long}abc"
   wrong_usage "file-policy add" "file-policy add: the path of a file policy has at most 1983 bytes, and not 1985"
   secpolicy file-policy add job7 r --world none /srv/a
   wrong_usage "file-policy add" "file-policy add: 'none' is not the number of a process"
   secpolicy file-policy add job77 r /srv/a
   wrong_usage "file-policy add" "file-policy add: there is no domain 'job77'; did you mean 'job7'?"
   policies ""
-  secpolicy file-policy add job7 r "${long:1}a" /
+  secpolicy file-policy add job7 r "${long}a" /
   exits 0
-  policies "-r ${long:1}a r" "-r / r"
+  policies "-r ${long}a r" "-r / r"
 }
 
 @test "what is not there cannot be changed or removed" {

@@ -142,14 +142,11 @@ secpolicy: label get: failed (2 errors above)" ]]
 @test "set of a label that there is not changes nothing and says what was meant" {
   boot
   secpolicy label set sshKye /etc
-  exits 1
-  [[ $stderr == "secpolicy: label set: there is no object label 'sshKye'. Did you mean 'sshKey'?" ]]
+  wrong_usage "label set" "label set: there is no object label 'sshKye'. Did you mean 'sshKey'?"
   secpolicy label set entirelyDifferent /etc
-  exits 1
-  [[ $stderr == "secpolicy: label set: there is no object label 'entirelyDifferent'. 'secpolicy --root $root display' shows all labels" ]]
+  wrong_usage "label set" "label set: there is no object label 'entirelyDifferent'. 'secpolicy --root $root display' shows all labels"
   secpolicy label set /etc sshKey
-  exits 1
-  [[ $stderr == "secpolicy: label set: there is no object label '/etc'. The label comes first: secpolicy label set sshKey /etc" ]]
+  wrong_usage "label set" "label set: there is no object label '/etc'. The label comes first: secpolicy label set sshKey /etc"
   [[ $(the_label /etc) == hostConfig ]]
 }
 
@@ -536,6 +533,5 @@ index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
   exits 0
   [[ $(the_label /etc/services.conf) == sshKey ]]
   secpolicy label set 4000 /etc/services.conf
-  exits 1
-  ends_with "secpolicy: label set: there is no object label '4000'. 'secpolicy --root $root display' shows all labels"
+  wrong_usage "label set" "label set: there is no object label '4000'. 'secpolicy --root $root display' shows all labels"
 }

@@ -74,6 +74,8 @@ has() {
   wrong_usage "param-check set" "param-check set: there is no parameter check 'bind_prt'; did you mean 'bind_port'?"
   secpolicy param-check remove job7 bind_port 1 2 3
   wrong_usage "param-check remove" "param-check remove: write: DOMAIN CHECK FIRST [LAST]"
+  secpolicy param-check remove job7 bind_port 1 grant
+  wrong_usage "param-check remove" "param-check remove: a rule is removed by its numbers alone, without 'grant'"
   secpolicy domain show job7
   [[ $output != *$'\n-p'* ]]
 }

@@ -364,6 +364,8 @@ refuses() {
     secpolicy saved "$verb" ../config
     wrong_usage "saved $verb" "NAME: '../config' cannot be a name: it takes 1 to 64 of A-Z a-z 0-9 . _ -, and begins with neither . nor -"
   done
+  secpolicy saved show othre
+  fails_with "saved show" "there is no saved state 'othre'. Did you mean 'other'?"
   ln -s other.db "$saved/link.db"
   secpolicy saved delete link
   exits 0

@@ -32,8 +32,7 @@ nothing_is_stored() {
 
 @test "a level that the host does not know is refused" {
   secpolicy settings enforcement appDom sometimes
-  exits 1
-  [[ $stderr == "secpolicy: settings: Unknown enforcement level sometimes: use enforcing, permissive or disabled" ]]
+  wrong_usage "settings enforcement" "LEVEL: there is no level 'sometimes': enforcing, permissive or disabled"
   nothing_is_stored "enforcement appDom" LEVEL
 }
 
@@ -184,11 +183,9 @@ kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 
   exits 0
   boot
   secpolicy settings enforcement sshDmo permissive
-  exits 1
-  ends_with "secpolicy: settings: there is no domain 'sshDmo', so nothing was stored. Did you mean 'sshDom'?"
+  wrong_usage "settings enforcement" "settings enforcement: there is no domain 'sshDmo', so nothing was stored. Did you mean 'sshDom'?"
   secpolicy settings enforcement another permissive
-  exits 1
-  ends_with "secpolicy: settings: there is no domain 'another', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
+  wrong_usage "settings enforcement" "settings enforcement: there is no domain 'another', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
   secpolicy settings list
   answers 0 "enforcement notYet permissive"
 }
@@ -206,8 +203,17 @@ kept_number() { "$SECPOLICY" --root "$root" display 2>/dev/null | sed -n "s/^$1 
   secpolicy settings list
   [[ -z $output ]]
   secpolicy settings enforcement 400 permissive
-  exits 1
-  ends_with "secpolicy: settings: there is no domain '400', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
+  wrong_usage "settings enforcement" "settings enforcement: there is no domain '400', so nothing was stored. 'secpolicy --root $root status' counts those that there are"
+}
+
+@test "an option that no load reads is stored, and that is told" {
+  secpolicy settings option /UserVars/CheckAccesTemplateEnabled 1
+  exits 0
+  [[ $stderr == "secpolicy: settings: done; a load reads no option but /UserVars/CheckAccessTemplateEnabled" ]]
+  secpolicy settings option UserVars/CheckAccessTemplateEnabled 1
+  wrong_usage "settings option" "settings option: the path of an option begins with a slash, as /UserVars/CheckAccessTemplateEnabled"
+  secpolicy settings list
+  answers 0 "option /UserVars/CheckAccesTemplateEnabled 1"
 }
 
 @test "restore where nothing is installed says what to do" {

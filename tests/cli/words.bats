@@ -3,9 +3,17 @@
 load helper
 
 @test "without a kind the kinds are listed" {
-  boot
   secpolicy words
   answers 0 objects accesses capabilities transitions files checks calls sockets
+}
+
+@test "only the labels of a policy have to be installed to be listed" {
+  secpolicy words checks
+  exits 0
+  shows bind_port
+  secpolicy words objects
+  fails_with words "nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
+  [[ ! -e $root/run/secpolicy ]]
 }
 
 @test "the words of each kind" {
@@ -21,7 +29,6 @@ load helper
 }
 
 @test "a set of system calls stands with its members" {
-  boot
   secpolicy words calls
   shows "@signal: sending and handling signals"
   [[ $output == *"@start: what a dynamically linked program needs from execve to exit"$'\n  access arch_prctl brk '* ]]
@@ -34,7 +41,6 @@ load helper
 }
 
 @test "a kind that there is not" {
-  boot
   secpolicy words call
   wrong_usage words "words: there is no kind of words 'call'; did you mean 'calls'?"
 }

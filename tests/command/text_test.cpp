@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "text/format.h"
+#include "text/shell_word.h"
 #include "text/visible.h"
 #include "text/wrap.h"
 
@@ -16,6 +17,7 @@ namespace {
 using SecPolicyCli::CountCharacters;
 using SecPolicyCli::CountOf;
 using SecPolicyCli::IsoTime;
+using SecPolicyCli::ShellWord;
 using SecPolicyCli::UtcTime;
 using SecPolicyCli::Visible;
 using SecPolicyCli::VisibleLines;
@@ -106,6 +108,20 @@ TEST(WrappedText, FitsAndKeepsItsColumns) {
        "1234\n5678"},
   };
   for (const auto& [text, wrapped] : table) EXPECT_EQ(Wrap(text, 20), wrapped);
+}
+
+TEST(ShellWords, AreQuotedWhereAShellWouldTakeThemForSomethingElse) {
+  const std::pair<const char*, const char*> table[] = {
+      {"/srv/r-1", "/srv/r-1"},
+      {"job@7:a+b", "job@7:a+b"},
+      {"", R"("")"},
+      {"a b", R"("a b")"},
+      {"a'b", R"("a'b")"},
+      {"*", R"("*")"},
+      {"a;b", R"("a;b")"},
+      {R"(a"$b`\)", R"("a\"\$b\`\\")"},
+  };
+  for (const auto& [word, quoted] : table) EXPECT_EQ(ShellWord(word), quoted);
 }
 
 }  // namespace

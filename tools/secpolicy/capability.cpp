@@ -2,6 +2,7 @@
 #include <string>
 
 #include "command_line.h"
+#include "policy/limits.h"
 #include "policy_dir.h"
 #include "query/ask.h"
 #include "query/named.h"
@@ -15,11 +16,10 @@ namespace SecPolicyCli {
 namespace {
 
 // The capabilities that the runtime interface does not know came after it.
-std::string WhyNotSet(const NamedDomain& domain, const std::string& capability, unsigned int number,
+std::string WhyNotSet(const NamedDomain& domain, const NumberedWord& capability,
                       const char* decision) {
-  constexpr unsigned int kLastOfInterface = 18;
-  if (number <= kLastOfInterface) return "";
-  return "Only a policy file can name " + capability + ": write '-c " + capability + " " +
+  if (capability.number < Policy::kRuntimeCapabilities) return "";
+  return "Only a policy file can name " + capability.word + ": write '-c " + capability.word + " " +
          decision + "' into " + OutsidePath(DomainFile(domain.name, SecPolicy::kPolicyRoot)) +
          " and load it";
 }
@@ -28,14 +28,14 @@ ExitCode Set(const std::string& verb, const std::string& domainWord, const std::
              bool grant) {
   SecPolicy::TeskAccessInterfaceImpl access;
   const NamedDomain domain = FindDomain(domainWord, access);
-  const std::string capability = FindWord(Policy::WordKind::kCapability, word, access);
-  const unsigned int number = NumberOf(Policy::WordKind::kCapability, capability, access);
+  const NumberedWord capability = FindNumberedWord(Policy::WordKind::kCapability, word, access);
   return Change(
       verb,
       [&] {
-        SecPolicy::SetCapRule(domain.id, SecPolicy::TeskAccess_Capability{number}, grant ? 1 : 0);
+        SecPolicy::SetCapRule(domain.id, SecPolicy::TeskAccess_Capability{capability.number},
+                              grant ? 1 : 0);
       },
-      [&] { return WhyNotSet(domain, capability, number, grant ? "grant" : "revoke"); });
+      [&] { return WhyNotSet(domain, capability, grant ? "grant" : "revoke"); });
 }
 
 Action DefineSet(Syntax& syntax, const char* verb, bool grant) {

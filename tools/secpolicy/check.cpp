@@ -67,10 +67,6 @@ ExitCode Check(const Options& options) {
   return Report(report, options);
 }
 
-std::string CheckCodeName(const std::string& name) {
-  return FindCode(name) != nullptr ? "" : "there is no problem '" + name + "'";
-}
-
 std::string CheckNumber(const std::string& word) {
   const bool isNumber = !word.empty() && word.size() < 10 &&
                         word.find_first_not_of("0123456789") == std::string::npos;
@@ -79,7 +75,7 @@ std::string CheckNumber(const std::string& word) {
 
 std::string CheckWarningName(const std::string& name) {
   const Code* const code = FindCode(name);
-  if (code == nullptr) return "there is no warning '" + name + "'";
+  if (code == nullptr) return WhyNoCode(name);
   if (code->severity == Severity::kWarning) return "";
   return "'" + name + "' is an error: a load does not end well with it";
 }
@@ -98,7 +94,7 @@ Action Define(Syntax& syntax) {
                  "Take standard input for the content of the file");
   syntax.AddFlag("--errors-only", options->errorsOnly, "Show no warnings");
   syntax.AddList("--only", options->wanted, "Show only this problem; may be given repeatedly")
-      .Check(CheckCodeName)
+      .Check(WhyNoCode)
       .NameValue("CODE");
   syntax.AddOption("--max", options->most, "Show at most so many problems")
       .Check(CheckNumber)

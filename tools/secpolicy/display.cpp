@@ -20,14 +20,6 @@
 namespace SecPolicyCli {
 namespace {
 
-// The library knows domains by their numbers, and shows nothing for one that no domain has.
-std::string NumberOf(const std::string& word, SecPolicy::TeskAccessInterfaceImpl& access) {
-  unsigned int id = 0;
-  if (access.FindDomain(word, &id)) return std::to_string(id);
-  if (!ReadNumber(word)) RefuseDomain(word, access);
-  return word;
-}
-
 std::string Advise() {
   if (File_IsDirectory(SecPolicy::kTardiskImagesDir)) return AdviseOnPrivilege();
   return std::string("There is no directory ") + SecPolicy::kTardiskImagesDir +
@@ -72,7 +64,7 @@ ExitCode Display(const std::string& domainId, const std::string& format) {
 
 ExitCode DisplayDomain(const std::string& word, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  return Display(NumberOf(word, access), format);
+  return Display(std::to_string(FindDomain(word, access).id), format);
 }
 
 Action Define(Syntax& syntax) {

@@ -19,6 +19,7 @@
 #include "runtime/change.h"
 #include "secpolicy/observed/loading.h"
 #include "text/format.h"
+#include "text/shell_word.h"
 #include "text/visible.h"
 #include "verb.h"
 
@@ -31,14 +32,12 @@ using SecPolicy::TeskAccessInterfaceImpl;
 // ---- Creating and destroying
 
 std::string WhyNotCreated(const std::string& name) {
-  constexpr std::size_t kLongestName = 63;
   TeskAccessInterfaceImpl access;
   unsigned int id = 0;
   if (access.FindDomain(name, &id)) {
     return "There is a domain of this name, with the number " + std::to_string(id) + ": " +
-           Call("domain show " + name) + " shows it";
+           Call("domain show " + ShellWord(name)) + " shows it";
   }
-  if (name.size() > kLongestName) return "A name has 1 to 63 bytes";
   if (Policy::ListDomains(access).size() + 1 < access.GetMaxDomains()) return "";
   return "All domains are in use: " + Call("domain leaked") +
          " lists those that nothing refers to, and " + Call("domain destroy") + " destroys one";
@@ -55,7 +54,7 @@ ExitCode Create(const std::string& name, bool forAccessChecks) {
 Action DefineCreate(Syntax& syntax) {
   const auto name = std::make_shared<std::string>();
   const auto forAccessChecks = std::make_shared<bool>(false);
-  syntax.AddOption("NAME", *name, "The name of the new domain").Require();
+  syntax.AddOption("NAME", *name, "The name of the new domain").Check(WhyNoDomainName).Require();
   syntax.AddFlag("--check-access", *forAccessChecks,
                  "Begin with the default rules of access checks, instead of none");
   return [=] { return Ask("domain create", [=] { return Create(*name, *forAccessChecks); }); };

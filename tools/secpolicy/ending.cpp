@@ -4,6 +4,7 @@
 #include <iostream>
 
 #include "error_list.h"
+#include "refusal.h"
 #include "root.h"
 #include "text/format.h"
 #include "text/visible.h"
@@ -22,6 +23,8 @@ ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList
   std::string failure;
   try {
     call(errors);
+  } catch (const QuestionError&) {
+    throw;
   } catch (const std::exception& raised) {
     failure = raised.what();
     if (failure.empty()) failure = "failed";

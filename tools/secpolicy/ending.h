@@ -15,8 +15,9 @@ class ErrorList;
 
 // Makes the call `call` for the verb `verb`, which is no load, and ends it with one summary line on
 // standard error. An error that is added to `errors` counts as a failure even when the call returns
-// normally. `advice` is asked after a failure for what the user can do about it; it may return
-// nothing. `ending` is asked after a success for what the summary says; without it, that is "done".
+// normally; what cannot be understood is thrown on. `advice` is asked after a failure for what the
+// user can do about it; it may return nothing. `ending` is asked after a success for what the
+// summary says; without it, that is "done".
 ExitCode CallLibrary(const std::string& verb, const std::function<void(ErrorList& errors)>& call,
                      const std::function<std::string()>& advice,
                      const std::function<std::string()>& ending = {});

@@ -8,7 +8,6 @@
 #include "check/diagnostic_pages.h"
 #include "command_line.h"
 #include "terminal/size.h"
-#include "text/suggestion.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -20,16 +19,6 @@ std::string_view PageOf(const std::string& code) {
   const std::string heading = "### `" + code + "`\n\n";
   const std::size_t begin = pages.find(heading) + heading.size();
   return pages.substr(begin, pages.find("\n#", begin) - begin);
-}
-
-std::string CheckCode(const std::string& name) {
-  if (FindCode(name) != nullptr) return "";
-  std::vector<std::string> names;
-  for (const Code* code : AllCodes()) names.emplace_back(code->name);
-  const std::string nearest = NearestWord(name, names);
-  return "there is no problem '" + name + "'" +
-         (nearest.empty() ? "; 'secpolicy explain' lists all"
-                          : "; did you mean '" + nearest + "'?");
 }
 
 void ListCodes() {
@@ -47,7 +36,7 @@ void ListCodes() {
 Action Define(Syntax& syntax) {
   const auto code = std::make_shared<std::string>();
   syntax.AddOption("CODE", *code, "The name of a problem, as check writes it behind each")
-      .Check(CheckCode);
+      .Check(WhyNoCode);
   return [code] {
     if (code->empty()) {
       ListCodes();

@@ -1,4 +1,5 @@
 #include <cstring>
+#include <filesystem>
 #include <iostream>
 #include <memory>
 #include <optional>
@@ -8,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "json.h"
+#include "policy/limits.h"
 #include "policy/permissions.h"
 #include "policy/rule.h"
 #include "query/ask.h"
@@ -17,6 +19,7 @@
 #include "runtime/change.h"
 #include "runtime/retry.h"
 #include "text/format.h"
+#include "text/shell_word.h"
 #include "text/visible.h"
 #include "verb.h"
 #include "zorvan/kernel.h"
@@ -48,10 +51,18 @@ void RequirePolicyPath(const std::string& path) {
   if (path.size() > 1 && path.ends_with('/')) {
     throw QuestionError("'" + path + "' ends in a slash, so it is the path of no file");
   }
-  if (path.size() >= sizeof TeskAccess_FileRule::path) {
-    throw QuestionError("the path of a file policy has at most 1983 bytes, and not " +
+  if (path.size() > Policy::kLongestPolicyPath) {
+    throw QuestionError("the path of a file policy has at most " +
+                        std::to_string(Policy::kLongestPolicyPath) + " bytes, and not " +
                         std::to_string(path.size()));
   }
+}
+
+// A path with such a name in it is the path of no file, as files are known by where they lie.
+void RequireNewPolicyPath(const std::string& path) {
+  RequirePolicyPath(path);
+  if (path == std::filesystem::path(path).lexically_normal().native()) return;
+  throw QuestionError("'" + path + "' is the path of no file: it holds '.', '..' or two slashes");
 }
 
 // 0, which stands for all processes of the domain, when none is named.
@@ -77,7 +88,7 @@ std::shared_ptr<const std::string> AddPath(Syntax& syntax, const char* name, con
 }
 
 std::string ListHint(const NamedDomain& domain) {
-  return Call("file-policy list " + domain.name) + " lists those of " + domain.name;
+  return Call("file-policy list " + ShellWord(domain.name)) + " lists those of " + domain.name;
 }
 
 // ---- Adding, removing and changing
@@ -108,7 +119,7 @@ ExitCode Add(const std::string& word, const std::string& letters,
   const int world = ReadWorld(process);
   std::vector<TeskAccess_FileRule> rules;
   for (const std::string& path : paths) {
-    RequirePolicyPath(path);
+    RequireNewPolicyPath(path);
     rules.push_back(ToFileRule(path, permissions));
   }
   unsigned int added = 0;
@@ -172,7 +183,7 @@ Action DefineUpdate(Syntax& syntax) {
 
 ExitCode Replace(const std::string& oldPath, const std::string& newPath) {
   RequirePolicyPath(oldPath);
-  RequirePolicyPath(newPath);
+  RequireNewPolicyPath(newPath);
   return Change(
       "file-policy replace", [&] { SecPolicy::ReplaceFilePolicyVMs(oldPath, newPath); },
       [] {

@@ -11,6 +11,7 @@
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
+#include "text/shell_word.h"
 #include "text/visible.h"
 #include "verb.h"
 
@@ -31,7 +32,7 @@ void WritePolicy(const fs::path& dir) {
 ExitCode Init(const std::string& dir) {
   if (fs::exists(dir) && !fs::is_empty(dir)) {
     return Refuse("init", OutsidePath(dir) + " is not empty, so nothing was written. " +
-                              Call("check " + dir) + " reads what is there.");
+                              Call("check " + ShellWord(dir)) + " reads what is there.");
   }
   const bool isHostsOwn = dir == SecPolicy::kPolicyRoot;
   return CallLibrary(
@@ -44,7 +45,7 @@ ExitCode Init(const std::string& dir) {
       AdviseOnPrivilege,
       [&] {
         return "done (" + CountOf(StarterFiles().size(), "file") + "). " +
-               Call(isHostsOwn ? "boot" : "check --fresh " + dir) +
+               Call(isHostsOwn ? "boot" : "check --fresh " + ShellWord(dir)) +
                (isHostsOwn ? " installs them" : " reads them");
       });
 }

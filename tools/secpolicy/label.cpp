@@ -80,7 +80,8 @@ constexpr LabelKind kLabelKinds[] = {
      [](Syntax& syntax, Arguments& arguments) {
        AddWholeTrees(syntax, arguments);
        syntax.AddOption("LABEL", arguments.label, "The object label, by its name or its number")
-           .Require();
+           .Require()
+           .Offer(OfferObjects());
        AddPaths(syntax, arguments, "The files", true);
      },
      [](LabelRun& run, const Arguments& arguments) {

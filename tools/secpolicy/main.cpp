@@ -137,6 +137,11 @@ ExitCode Run(int argc, char** argv, Terminal& terminal) {
     std::optional<LinuxHost::ShownLog> shown;
     if (commandLine.IsVerbose()) shown.emplace();
     return FlushOutput(commandLine.Act());
+  } catch (const QuestionError& error) {
+    Summarize(commandLine.AskedCommand(), error.what());
+    std::cerr << "'secpolicy " << commandLine.AskedCommand() << " --help' explains the usage."
+              << std::endl;
+    return kUsage;
   } catch (const Refusal& refusal) {
     return Refuse(commandLine.AskedCommand(), refusal.what());
   } catch (const std::exception& failure) {

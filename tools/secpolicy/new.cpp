@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "policy_dir.h"
+#include "query/named.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/visible.h"
@@ -21,18 +22,6 @@ struct Options {
   std::string name;
   std::string policyDir = SecPolicy::kPolicyRoot;
 };
-
-// What can stand in a rule and on a command line as it is.
-std::string CheckName(const std::string& name) {
-  constexpr std::size_t kLongest = 63;
-  const bool isWord = std::ranges::all_of(name, [](unsigned char letter) {
-    return std::isalnum(letter) != 0 || letter == '_' || letter == '-' || letter == '.';
-  });
-  const bool isName = isWord && !name.empty() && std::isalnum(static_cast<unsigned char>(name[0]));
-  if (isName && name.size() <= kLongest) return "";
-  return "'" + name +
-         "' is no name: letters, digits and '_', '-', '.' behind the first, 63 at most";
-}
 
 ExitCode MakeDomain(const Options& options) {
   if (const auto refused = RefuseMissingDir("new domain", options.policyDir)) return *refused;
@@ -57,7 +46,9 @@ ExitCode MakeDomain(const Options& options) {
 
 Action DefineDomain(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
-  syntax.AddOption("NAME", options->name, "The name of the domain").Check(CheckName).Require();
+  syntax.AddOption("NAME", options->name, "The name of the domain")
+      .Check(WhyNoDomainName)
+      .Require();
   syntax.AddOption("--policy", options->policyDir, "The policy directory, as seen from the root")
       .NameValue("DIR")
       .ShowDefault();

@@ -29,8 +29,8 @@ struct CheckedNumbers {
 
 CheckedNumbers ReadNumbers(const std::string& check, const std::vector<std::string>& numbers,
                            TeskAccessInterfaceImpl& access) {
-  const auto number =
-      TeskAccess_ParamCheck{NumberOf(Policy::WordKind::kParameterCheck, check, access)};
+  const auto number = TeskAccess_ParamCheck{
+      FindNumberedWord(Policy::WordKind::kParameterCheck, check, access).number};
   if (check == Policy::kMaskCheck && numbers.size() > 1) {
     throw QuestionError(check + " takes one number, of all bits that it is about");
   }
@@ -88,6 +88,9 @@ ExitCode Remove(const std::string& word, const std::string& check,
                 const std::vector<std::string>& numbers) {
   TeskAccessInterfaceImpl access;
   const NamedDomain domain = FindDomain(word, access);
+  if (numbers.back() == "grant" || numbers.back() == "revoke") {
+    throw QuestionError("a rule is removed by its numbers alone, without '" + numbers.back() + "'");
+  }
   if (numbers.size() > 2) throw QuestionError("write: DOMAIN CHECK FIRST [LAST]");
   const CheckedNumbers rule = ReadNumbers(check, numbers, access);
   return Change(

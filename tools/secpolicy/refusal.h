@@ -11,6 +11,12 @@ class Refusal : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+// What was typed cannot be understood; the message says what would be.
+class QuestionError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
 // What the user names is not there.
 class NoSuchPolicy : public Refusal {
  public:

@@ -4,14 +4,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <cctype>
 #include <cerrno>
-#include <cstring>
 #include <fstream>
 #include <optional>
 
 #include "host/linux/common/host_error.h"
+#include "text/shell_word.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -43,13 +41,6 @@ void EnterUserNamespace() {
   WriteProcFile("/proc/self/gid_map", group + " " + group + " 1");
 }
 
-// A word of a command line that a shell takes as it is.
-bool IsPlainWord(const std::string& word) {
-  return std::ranges::all_of(word, [](unsigned char letter) {
-    return std::isalnum(letter) != 0 || std::strchr("/._-+:@%,=", letter) != nullptr;
-  });
-}
-
 bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
 
 }  // namespace
@@ -67,11 +58,7 @@ void EnterRoot(const std::string& directory) {
 }
 
 std::string Call(const std::string& words) {
-  std::string root;
-  if (enteredRoot) {
-    const char* const quote = IsPlainWord(*enteredRoot) ? "" : "\"";
-    root = "--root " + (quote + *enteredRoot) + quote + " ";
-  }
+  const std::string root = enteredRoot ? "--root " + ShellWord(*enteredRoot) + " " : "";
   return "'secpolicy " + root + words + "'";
 }
 

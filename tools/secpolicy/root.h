@@ -9,7 +9,8 @@ namespace SecPolicyCli {
 // own. Throws Braxo::Lib::BraxoException when that cannot be done.
 void EnterRoot(const std::string& directory);
 
-// How this command is called with `words` for the root that was entered, in quotes:
+// How this command is called with `words`, each as ShellWord has it, for the root that was entered,
+// in quotes:
 // "'secpolicy --root DIR boot'".
 std::string Call(const std::string& words);
 

@@ -141,7 +141,8 @@ Action Define(Syntax& syntax) {
 }  // namespace
 
 const Verb kRules = {
-    "rules", "Find the installed rules that speak of a label, a path or a system call",
+    "rules",
+    "Find the installed rules that speak of a label, a path or a system call",
     "Prints the rules of all domains that grant or revoke something of it, each with its domain,\n"
     "policy file and line. Which of them decides is what 'why' says. Exit status: 0 there are "
     "some,\n"
@@ -151,6 +152,8 @@ const Verb kRules = {
     "  secpolicy rules --label sshKey\n"
     "  secpolicy rules --path /etc/ssh/host_key\n"
     "  secpolicy rules --call mount --format json | jq -r '.rules[] | select(.grant) | .domain'",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

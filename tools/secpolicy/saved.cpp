@@ -92,13 +92,16 @@ Action Define(Syntax& syntax) { return syntax.AddKinds(std::vector<Kind>{kShow, 
 }  // namespace
 
 const Verb kSaved = {
-    "saved", "Show and delete saved states",
+    "saved",
+    "Show and delete saved states",
     "'save' makes them, 'history' lists them, and 'rollback' puts one back. They lie in\n"
     "/var/lib/secpolicy/saved, and outlive a boot.\n"
     "\n"
     "Examples:\n"
     "  secpolicy saved show before-upgrade\n"
     "  secpolicy saved delete before-upgrade",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

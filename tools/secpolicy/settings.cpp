@@ -1,8 +1,10 @@
 #include "host/linux/operation/settings.h"
 
 #include <algorithm>
+#include <cctype>
 #include <iostream>
 #include <iterator>
+#include <string_view>
 #include <variant>
 
 #include "braxo/lib/exception.h"
@@ -15,6 +17,7 @@
 #include "query/question.h"
 #include "root.h"
 #include "secpolicy/secpolicy.h"
+#include "text/shell_word.h"
 #include "text/suggestion.h"
 #include "text/visible.h"
 #include "verb.h"
@@ -33,6 +36,7 @@ struct Setting {
   std::optional<std::string> (*find)(const std::string& key);
   void (*store)(const std::string& key, const std::string& value);
   bool (*remove)(const std::string& key);
+  std::string (*whyNot)(const std::string& value);
   Offer (*offerKeys)(const std::vector<std::string>& before);
 };
 
@@ -41,13 +45,23 @@ std::string TextOf(const LinuxHost::OptionValue& value) {
   return std::get<std::string>(value);
 }
 
+constexpr char kTemplateOption[] = "/UserVars/CheckAccessTemplateEnabled";
+
+void RequireOptionPath(const std::string& path) {
+  if (path.starts_with('/')) return;
+  throw QuestionError("the path of an option begins with a slash, as " +
+                      std::string(kTemplateOption));
+}
+
 std::optional<std::string> FindOption(const std::string& path) {
+  RequireOptionPath(path);
   const auto value = LinuxHost::FindWantedOption(path);
   if (!value) return std::nullopt;
   return TextOf(*value);
 }
 
 void StoreOption(const std::string& path, const std::string& value) {
+  RequireOptionPath(path);
   LinuxHost::StoreWantedOption(path, LinuxHost::ParseOptionValue(value));
 }
 
@@ -85,17 +99,27 @@ void StoreEnforcement(const std::string& domain, const std::string& level) {
     }
     if (std::ranges::find(names, name) == names.end()) {
       const std::string nearest = NearestWord(name, names);
-      throw Braxo::Lib::BraxoException(
-          "there is no domain '" + name + "', so nothing was stored. " +
-          (nearest.empty() ? Call("status") + " counts those that there are"
-                           : "Did you mean '" + nearest + "'?"));
+      throw QuestionError("there is no domain '" + name + "', so nothing was stored. " +
+                          (nearest.empty() ? Call("status") + " counts those that there are"
+                                           : "Did you mean '" + nearest + "'?"));
     }
   }
   LinuxHost::StoreWantedEnforcement(name, level);
 }
 
+// Any text can be the value of an option.
+std::string WhyNoValue(const std::string& /*value*/) { return ""; }
+
+std::string WhyNoLevel(const std::string& value) {
+  std::string word = value;
+  std::ranges::transform(word, word.begin(),
+                         [](unsigned char letter) { return std::tolower(letter); });
+  if (Policy::FindLevel(word)) return "";
+  return "there is no level '" + value + "': enforcing, permissive or disabled";
+}
+
 Offer OfferOptions(const std::vector<std::string>& /*before*/) {
-  Offer offer{.words = {{"/UserVars/CheckAccessTemplateEnabled"}}};
+  Offer offer{.words = {{kTemplateOption}}};
   for (const auto& [path, value] : LinuxHost::ListWantedOptions()) offer.words.push_back({path});
   return offer;
 }
@@ -104,40 +128,51 @@ Offer OfferDomains(const std::vector<std::string>& before) {
   return OfferWordsOf(Policy::WordKind::kDomain)(before);
 }
 
+constexpr char kOption[] = "option";
+constexpr char kEnforcement[] = "enforcement";
+
 constexpr Setting kSettingKinds[] = {
-    {"option", "An advanced option of the host", "PATH",
+    {kOption, "An advanced option of the host", "PATH",
      "The option, such as /UserVars/CheckAccessTemplateEnabled", "VALUE",
      "What to store: a whole number, or any other text", FindOption, StoreOption,
-     LinuxHost::RemoveWantedOption, OfferOptions},
-    {"enforcement", "The level that 'restore' gives a domain", "DOMAIN",
+     LinuxHost::RemoveWantedOption, WhyNoValue, OfferOptions},
+    {kEnforcement, "The level that 'restore' gives a domain", "DOMAIN",
      "The domain, by its name or its number", "LEVEL",
      "What to store: enforcing, permissive or disabled", FindEnforcement, StoreEnforcement,
-     RemoveEnforcement, OfferDomains},
+     RemoveEnforcement, WhyNoLevel, OfferDomains},
 };
 
 ExitCode Show(const Setting& setting, const std::string& key) {
   const auto value = setting.find(key);
   if (!value) {
-    return Refuse(
-        "settings",
-        std::string("nothing is stored for ") + setting.name + " " + key +
-            ". Store something with " +
-            Call(std::string("settings ") + setting.name + " " + key + " " + setting.value) + ".");
+    return Refuse("settings", std::string("nothing is stored for ") + setting.name + " " + key +
+                                  ". Store something with " +
+                                  Call(std::string("settings ") + setting.name + " " +
+                                       ShellWord(key) + " " + setting.value) +
+                                  ".");
   }
   return CallLibrary(
       "settings", [&](ErrorList&) { std::cout << *value << std::endl; }, AdviseOnPrivilege);
 }
 
+// Whose programs read the other options, nobody knows here.
+std::string DescribeStored(const Setting& setting, const std::string& key) {
+  const bool isRead = std::string_view(setting.name) != kOption || key == kTemplateOption;
+  return isRead ? "done" : std::string("done; a load reads no option but ") + kTemplateOption;
+}
+
 ExitCode Store(const Setting& setting, const std::string& key, const std::string& value) {
   return CallLibrary(
-      "settings", [&](ErrorList&) { setting.store(key, value); }, AdviseOnPrivilege);
+      "settings", [&](ErrorList&) { setting.store(key, value); }, AdviseOnPrivilege,
+      [&] { return DescribeStored(setting, key); });
 }
 
 Action DefineSetting(const Setting& setting, Syntax& syntax) {
   const auto key = std::make_shared<std::string>();
   const auto value = std::make_shared<std::string>();
   syntax.AddOption(setting.key, *key, setting.keyMeaning).Require().Offer(setting.offerKeys);
-  const Option stored = syntax.AddOption(setting.value, *value, setting.valueMeaning);
+  const Option stored =
+      syntax.AddOption(setting.value, *value, setting.valueMeaning).Check(setting.whyNot);
   return [=, &setting] {
     return stored.IsGiven() ? Store(setting, *key, *value) : Show(setting, *key);
   };
@@ -158,7 +193,10 @@ std::string CheckSettingKind(const std::string& kind) {
 }
 
 Offer OfferKeys(const std::vector<std::string>& before) {
-  Offer offer = OfferOptions(before);
+  const std::string kind = before.empty() ? "" : before.front();
+  Offer offer;
+  if (kind != kEnforcement) offer = OfferOptions(before);
+  if (kind == kOption) return offer;
   for (const auto& [domain, level] : LinuxHost::ListWantedEnforcement()) {
     offer.words.push_back({domain});
   }
@@ -171,7 +209,7 @@ Action DefineUnset(Syntax& syntax) {
   syntax.AddOption("KIND", *kind, "option or enforcement")
       .Check(CheckSettingKind)
       .Require()
-      .Offer(OfferWords({"option", "enforcement"}));
+      .Offer(OfferWords({kOption, kEnforcement}));
   syntax.AddOption("KEY", *key, "The path of the option, or the name of the domain")
       .Require()
       .Offer(OfferKeys);

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "command_line.h"
+#include "host/linux/operation/host_words.h"
 #include "json.h"
 #include "policy/call_set.h"
 #include "policy/rule_kind.h"
@@ -50,9 +51,15 @@ const WordList& FindList(const std::string& name) {
   RefuseWord("kind of words", name, NamesOfLists());
 }
 
-std::vector<std::string> WordsOf(WordKind kind, SecPolicy::TeskAccessInterfaceImpl& access) {
+// Labels are words of the installed policy, and all others of the host.
+std::vector<std::string> WordsOf(WordKind kind) {
+  const auto table = *FormOf(kind).table;
+  const auto found = kind == WordKind::kLabel
+                         ? SecPolicy::TeskAccessInterfaceImpl().GetKeywordsMap(table)
+                         : LinuxHost::HostWords(table);
   std::vector<std::string> words;
-  for (const auto& [word, id] : access.GetKeywordsMap(*FormOf(kind).table)) words.push_back(word);
+  words.reserve(found.size());
+  for (const auto& [word, id] : found) words.push_back(word);
   return words;
 }
 
@@ -86,14 +93,8 @@ void ListKinds() {
   for (const WordList& list : kLists) std::cout << list.name << '\n';
 }
 
-ExitCode Answer(const std::string& kind, const std::string& format) {
-  if (kind.empty()) {
-    ListKinds();
-    return kWell;
-  }
-  const WordList& list = FindList(kind);
-  SecPolicy::TeskAccessInterfaceImpl access;
-  const std::vector<std::string> words = WordsOf(list.kind, access);
+ExitCode ListWords(const WordList& list, const std::string& format) {
+  const std::vector<std::string> words = WordsOf(list.kind);
   if (format == "json") {
     WriteJson(list.name, words);
   } else {
@@ -102,18 +103,29 @@ ExitCode Answer(const std::string& kind, const std::string& format) {
   return kWell;
 }
 
+ExitCode Answer(const std::string& kind, const std::string& format) {
+  if (kind.empty()) {
+    ListKinds();
+    return kWell;
+  }
+  const WordList& list = FindList(kind);
+  if (list.kind != WordKind::kLabel) return ListWords(list, format);
+  return Ask("words", [&] { return ListWords(list, format); });
+}
+
 Action Define(Syntax& syntax) {
   const auto kind = std::make_shared<std::string>();
   syntax.AddOption("KIND", *kind, "The kind of words; without it, the kinds are listed")
       .Offer(OfferWords(NamesOfLists()));
   const auto format = AddAnswerFormat(syntax);
-  return [=] { return Ask("words", [=] { return Answer(*kind, *format); }); };
+  return [=] { return Answer(*kind, *format); };
 }
 
 }  // namespace
 
 const Verb kWords = {
-    "words", "List the words that a rule may use, and what the sets among them hold",
+    "words",
+    "List the words that a rule may use, and what the sets among them hold",
     "Prints every word of one kind that this host knows. KIND is one of\n"
     "\n"
     "  objects         labels, behind -a, -d, -f, -u       as policy files declare them\n"
@@ -131,6 +143,8 @@ const Verb kWords = {
     "Examples:\n"
     "  secpolicy words calls\n"
     "  secpolicy words capabilities --format json",
-    Define};
+    Define,
+    nullptr,
+    true};
 
 }  // namespace SecPolicyCli

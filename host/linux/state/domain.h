@@ -5,6 +5,7 @@
 #include <string>
 #include <string_view>
 
+#include "policy/limits.h"
 #include "teskctl/security.h"
 
 namespace LinuxHost {
@@ -17,7 +18,7 @@ constexpr unsigned int kStartDomain = 0;
 
 // The longest name of a domain in bytes: with its NUL it fills the 64 bytes that a caller of the
 // kernel has for it.
-constexpr std::size_t kMaxDomainName = 63;
+constexpr std::size_t kMaxDomainName = Policy::kLongestDomainName;
 
 // What one domain of the host is for.
 enum class DomainRole : unsigned int { GlobalVm = 1, IoFilter = 2, DaemonFramework = 3 };

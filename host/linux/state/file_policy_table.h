@@ -5,12 +5,13 @@
 #include <vector>
 
 #include "host/linux/state/domain_table.h"
+#include "policy/limits.h"
 #include "policy/rule.h"
 
 namespace LinuxHost {
 
 // The longest path of a file policy in bytes.
-constexpr std::size_t kMaxPolicyPath = 1983;
+constexpr std::size_t kMaxPolicyPath = Policy::kLongestPolicyPath;
 
 // What a domain, or one world in it, may do with a path.
 struct FilePolicy {

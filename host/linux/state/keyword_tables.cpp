@@ -154,8 +154,12 @@ std::string WordAt(TeskAccess_KeywordType type, std::uint64_t id) {
 }  // namespace
 
 std::map<std::string, long> KeywordTables::All(TeskAccess_KeywordType type) {
-  NounOf(type);
   if (type == TeskCtl::Security::TESKACCESS_KEYWORD_LABEL) return labels.All();
+  return FixedWords(type);
+}
+
+std::map<std::string, long> FixedWords(TeskAccess_KeywordType type) {
+  NounOf(type);
   if (type == TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL) return SystemCalls();
   std::map<std::string, long> keywords;
   for (const auto& word : ShortList(type)) {

@@ -38,6 +38,9 @@ class KeywordTables {
   LabelTable& labels;
 };
 
+// The words of any table but that of labels. Throws HostError for a type that is no such table.
+std::map<std::string, long> FixedWords(TeskCtl::Security::TeskAccess_KeywordType type);
+
 // The words of the capability and the parameter check with the identifier `id`. Throw HostError
 // when there is none.
 std::string CapabilityWord(std::uint64_t id);

@@ -6,6 +6,8 @@
 #include <tuple>
 #include <utility>
 
+#include "text/suggestion.h"
+
 namespace SecPolicyCli {
 namespace Codes {
 
@@ -110,6 +112,16 @@ const Code* FindCode(const std::string& name) {
   const auto found =
       std::ranges::find_if(kAll, [&](const Code* code) { return code->name == name; });
   return found == std::end(kAll) ? nullptr : *found;
+}
+
+std::string WhyNoCode(const std::string& name) {
+  if (FindCode(name) != nullptr) return "";
+  std::vector<std::string> names;
+  for (const Code* code : AllCodes()) names.emplace_back(code->name);
+  const std::string nearest = NearestWord(name, names);
+  return "there is no problem '" + name + "'" +
+         (nearest.empty() ? "; 'secpolicy explain' lists all"
+                          : "; did you mean '" + nearest + "'?");
 }
 
 const Code& CodeOf(SecPolicy::Fault fault) {

@@ -70,6 +70,9 @@ std::span<const Code* const> AllCodes();
 // The code with this name; null when there is none.
 const Code* FindCode(const std::string& name);
 
+// Why `name` cannot be the name of a problem; empty when it can.
+std::string WhyNoCode(const std::string& name);
+
 // The code of a line that the library refuses.
 const Code& CodeOf(SecPolicy::Fault fault);
 

@@ -9,6 +9,8 @@
 #include "root.h"
 #include "saved/saved_state.h"
 #include "scratch/scratch_state.h"
+#include "text/shell_word.h"
+#include "text/suggestion.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -24,7 +26,7 @@ Side ReadDirectory(const std::string& dir, SecPolicy::PolicyObserver& observer) 
   WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir), observer);
   if (!written.isClean) {
     throw BadPolicy("the policy in " + dir + " has errors (above), so it was not compared. " +
-                    Call("check " + dir) + " shows every one with its place.");
+                    Call("check " + ShellWord(dir)) + " shows every one with its place.");
   }
   return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
 }
@@ -38,11 +40,18 @@ Side ReadInstalled() {
   return ReadStateOf(kInstalled, LinuxHost::StatePath(), LinuxHost::CopyOf::kState);
 }
 
+std::string NearestSide(const std::string& name) {
+  const std::string installed = NearestWord(name, {kInstalled});
+  return installed.empty() ? NearestSavedName(name) : installed;
+}
+
 Side ReadSaved(const std::string& name) {
   if (!IsSaved(name)) {
+    const std::string nearest = NearestSide(name);
     throw NoSuchPolicy("there is no saved state '" + name + "', and no such directory. " +
-                       Call("history") +
-                       " lists what is saved; 'installed' is what is installed now.");
+                       (nearest.empty() ? Call("history") + " lists what is saved; 'installed' is "
+                                                            "what is installed now."
+                                        : "Did you mean '" + nearest + "'?"));
   }
   return ReadStateOf(name, SavedStatePath(name), LinuxHost::CopyOf::kSavedState);
 }

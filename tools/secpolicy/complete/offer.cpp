@@ -8,6 +8,7 @@
 
 #include "braxo/lib/exception.h"
 #include "check/diagnostic.h"
+#include "host/linux/operation/host_words.h"
 #include "host/linux/operation/state_use.h"
 #include "policy/call_set.h"
 #include "policy/level.h"
@@ -48,9 +49,17 @@ Offer OfferDomainsOfFiles() {
   return offer;
 }
 
+Words WordsOfHost(WordKind kind) {
+  Words words;
+  const auto& table = FormOf(kind).table;
+  if (!table) return words;
+  for (const auto& [word, id] : LinuxHost::HostWords(*table)) words.push_back(word);
+  return words;
+}
+
 // The host would make a state of its own where there is none.
 Words InstalledWords(WordKind kind) {
-  if (LinuxHost::IsStateMissing()) return {};
+  if (LinuxHost::IsStateMissing()) return WordsOfHost(kind);
   try {
     SecPolicy::TeskAccessInterfaceImpl access;
     return KnownWords(kind, access);
@@ -88,6 +97,16 @@ Offer OfferSavedStates(const Words& /*before*/) {
   return offer;
 }
 
+Offer OfferObjects(const Words& /*before*/) {
+  if (LinuxHost::IsStateMissing()) return {};
+  SecPolicy::TeskAccessInterfaceImpl access;
+  Offer offer;
+  for (const auto& [name, id] : access.GetKeywordsMap(*FormOf(WordKind::kLabel).table)) {
+    offer.words.push_back({name});
+  }
+  return offer;
+}
+
 // What two policies are that are compared.
 Offer OfferSide(const Words& before) {
   Offer offer = OfferSavedStates(before);
@@ -121,6 +140,10 @@ Offering OfferNothing() { return OnlyFiles(OfferedFiles::kNone); }
 
 Offering OfferWordsOf(WordKind kind) {
   return [kind](const Words&) { return OfferInstalled(kind); };
+}
+
+Offering OfferObjects() {
+  return [](const Words& before) { return OfferObjects(before); };
 }
 
 Offering OfferFiles() { return OnlyFiles(OfferedFiles::kFiles); }

@@ -24,7 +24,8 @@ struct Offer {
 };
 
 // Says what can stand for a value, below the root that was entered. `before` are the words of the
-// same argument that stand before. May throw what the host throws.
+// same argument that stand before or, of one that takes a single word, of the arguments before. May
+// throw what the host throws.
 using Offering = std::function<Offer(const std::vector<std::string>& before)>;
 
 Offering OfferWords(const std::vector<std::string>& words);
@@ -32,6 +33,9 @@ Offering OfferNothing();
 
 // The words of rules that this kind can stand for: those of the host's tables, domains and paths.
 Offering OfferWordsOf(Policy::WordKind kind);
+
+// The labels that files can be given; the name of a domain is none of them.
+Offering OfferObjects();
 
 Offering OfferFiles();
 Offering OfferSavedStates();

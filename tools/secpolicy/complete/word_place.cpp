@@ -142,7 +142,7 @@ class Walk {
     std::size_t index = 0;
     while (index < arguments.size() && index < all.size() && !IsList(*all[index])) ++index;
     if (index == all.size()) return nullptr;
-    Keep(index);
+    Keep(IsList(*all[index]) ? index : 0);
     return all[index];
   }
 

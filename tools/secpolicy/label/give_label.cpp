@@ -6,8 +6,10 @@
 #include "host/linux/operation/label_index.h"
 #include "label_actions.h"
 #include "query/named.h"
+#include "refusal.h"
 #include "root.h"
 #include "secpolicy/observed/policy_lines.h"
+#include "text/shell_word.h"
 #include "text/suggestion.h"
 
 namespace SecPolicyCli {
@@ -19,8 +21,8 @@ using Braxo::Lib::BraxoException;
                               const std::vector<std::string>& paths) {
   const std::string problem = "there is no object label '" + label + "'";
   if (label.starts_with('/') && run.FindLabel(paths.back()) != kNoSuchLabel) {
-    throw BraxoException(problem + ". The label comes first: secpolicy label set " + paths.back() +
-                         " " + label);
+    throw QuestionError(problem + ". The label comes first: secpolicy label set " + paths.back() +
+                        " " + label);
   }
   std::vector<std::string> labels;
   for (const auto& [name, id] :
@@ -28,8 +30,8 @@ using Braxo::Lib::BraxoException;
     labels.push_back(name);
   }
   const std::string nearest = NearestWord(label, labels);
-  throw BraxoException(problem + (nearest.empty() ? ". " + Call("display") + " shows all labels"
-                                                  : ". Did you mean '" + nearest + "'?"));
+  throw QuestionError(problem + (nearest.empty() ? ". " + Call("display") + " shows all labels"
+                                                 : ". Did you mean '" + nearest + "'?"));
 }
 
 std::string NameOf(LabelRun& run, const std::string& label, const std::vector<std::string>& paths) {

@@ -8,6 +8,7 @@
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
+#include "text/shell_word.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -32,7 +33,7 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
   }
   // A check of the policy looks at the early policy in it too.
   const bool isEarly = policyDir == SecPolicy::kEarlyPolicyRoot;
-  return text + Visible(Call("check " + (isEarly ? SecPolicy::kPolicyRoot : policyDir))) +
+  return text + Visible(Call("check " + ShellWord(isEarly ? SecPolicy::kPolicyRoot : policyDir))) +
          " shows the lines, and what may be meant\n";
 }
 

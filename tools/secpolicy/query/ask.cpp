@@ -1,12 +1,8 @@
 #include "ask.h"
 
-#include <iostream>
-
 #include "command_line.h"
 #include "ending.h"
 #include "host/linux/operation/state_use.h"
-#include "question.h"
-#include "text/visible.h"
 
 namespace SecPolicyCli {
 
@@ -23,13 +19,7 @@ ExitCode Ask(const std::string& verb, const std::function<ExitCode()>& answer,
     RefuseWithoutState(verb);
     return withoutState;
   }
-  try {
-    return answer();
-  } catch (const QuestionError& error) {
-    std::cerr << "secpolicy: " << verb << ": " << Visible(error.what()) << "\n'secpolicy " << verb
-              << " --help' explains the usage." << std::endl;
-    return kUsage;
-  }
+  return answer();
 }
 
 }  // namespace SecPolicyCli

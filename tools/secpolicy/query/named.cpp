@@ -1,11 +1,14 @@
 #include "named.h"
 
+#include <algorithm>
+#include <cctype>
 #include <charconv>
 #include <optional>
 #include <utility>
 #include <vector>
 
 #include "installed/installed_policy.h"
+#include "policy/limits.h"
 #include "question.h"
 
 namespace SecPolicyCli {
@@ -25,6 +28,20 @@ std::string NameOfDomain(unsigned int id) {
 }
 
 }  // namespace
+
+// What can stand in a rule, be a file, and is on a command line what it is.
+std::string WhyNoDomainName(const std::string& name) {
+  const auto isLetter = [](unsigned char letter) { return std::isalnum(letter) != 0; };
+  const bool isWord = std::ranges::all_of(name, [&](unsigned char letter) {
+    return isLetter(letter) || letter == '_' || letter == '-' || letter == '.';
+  });
+  const bool isName = isWord && !name.empty() && isLetter(static_cast<unsigned char>(name[0]));
+  if (!isName || name.size() > Policy::kLongestDomainName) {
+    return "'" + name + "' is no name: letters, digits and '_', '-', '.' behind the first, " +
+           std::to_string(Policy::kLongestDomainName) + " at most";
+  }
+  return ReadNumber(name) ? "'" + name + "' is no name: it would be taken for a number" : "";
+}
 
 std::optional<unsigned int> ReadNumber(const std::string& word) {
   unsigned int number = 0;

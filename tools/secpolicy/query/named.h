@@ -11,6 +11,10 @@
 // thing.
 namespace SecPolicyCli {
 
+// Why `name` cannot name a new domain where people type it; empty when it can. Programs may give
+// domains any names.
+std::string WhyNoDomainName(const std::string& name);
+
 struct NamedDomain {
   unsigned int id = 0;
   std::string name;

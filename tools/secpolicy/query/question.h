@@ -2,21 +2,15 @@
 
 #include <optional>
 #include <span>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "host/linux/operation/rule_origins.h"
 #include "policy/decision.h"
+#include "refusal.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
-
-// The words of a question cannot be understood; the message says what would be.
-class QuestionError : public std::runtime_error {
- public:
-  using std::runtime_error::runtime_error;
-};
 
 // A kind of question. The words are those of the rule that answers it, in the same order.
 struct QuestionForm {

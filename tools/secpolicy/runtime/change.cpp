@@ -53,10 +53,11 @@ int ReadProcess(const std::string& word) {
   throw QuestionError("'" + word + "' is not the number of a process");
 }
 
-unsigned int NumberOf(Policy::WordKind kind, const std::string& word,
-                      SecPolicy::TeskAccessInterfaceImpl& access) {
-  const std::string name = FindWord(kind, word, access);
-  return static_cast<unsigned int>(access.GetKeywordsMap(*FormOf(kind).table).at(name));
+NumberedWord FindNumberedWord(Policy::WordKind kind, const std::string& word,
+                              SecPolicy::TeskAccessInterfaceImpl& access) {
+  const std::string found = FindWord(kind, word, access);
+  const auto number = access.GetKeywordsMap(*FormOf(kind).table).at(found);
+  return {found, static_cast<unsigned int>(number)};
 }
 
 }  // namespace SecPolicyCli

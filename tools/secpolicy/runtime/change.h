@@ -26,9 +26,14 @@ bool ReadGrant(const std::string& word);
 // The number of a process. Throws QuestionError for a word that is none.
 int ReadProcess(const std::string& word);
 
-// The number by which the runtime interface knows a word of the table. Throws QuestionError for a
-// word that is not in it.
-unsigned int NumberOf(Policy::WordKind kind, const std::string& word,
-                      SecPolicy::TeskAccessInterfaceImpl& access);
+// A word of a table of the host, and the number by which the runtime interface knows it.
+struct NumberedWord {
+  std::string word;
+  unsigned int number = 0;
+};
+
+// The word that `word` stands for. Throws QuestionError for one that is not in the table.
+NumberedWord FindNumberedWord(Policy::WordKind kind, const std::string& word,
+                              SecPolicy::TeskAccessInterfaceImpl& access);
 
 }  // namespace SecPolicyCli

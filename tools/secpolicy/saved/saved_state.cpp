@@ -13,6 +13,7 @@
 #include "ending.h"
 #include "host/linux/common/host_error.h"
 #include "root.h"
+#include "text/suggestion.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -95,9 +96,17 @@ std::vector<SavedState> ListSavedStates() {
   return states;
 }
 
+std::string NearestSavedName(const std::string& name) {
+  std::vector<std::string> names;
+  for (const SavedState& state : ListSavedStates()) names.push_back(state.name);
+  return NearestWord(name, names);
+}
+
 ExitCode RefuseUnsaved(const std::string& verb, const std::string& name) {
-  return Refuse(
-      verb, "there is no saved state '" + name + "'. " + Call("history") + " lists what is saved.");
+  const std::string nearest = NearestSavedName(name);
+  return Refuse(verb, "there is no saved state '" + name + "'. " +
+                          (nearest.empty() ? Call("history") + " lists what is saved."
+                                           : "Did you mean '" + nearest + "'?"));
 }
 
 std::shared_ptr<const std::string> AddSavedName(Syntax& syntax, const std::string& meaning) {

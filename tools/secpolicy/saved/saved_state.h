@@ -31,6 +31,9 @@ bool IsSaved(const std::string& name);
 // The saved states, the oldest first. Throws HostError when they cannot be listed.
 std::vector<SavedState> ListSavedStates();
 
+// The name of a saved state that `name` may be meant for; empty when none is near. Throws as that.
+std::string NearestSavedName(const std::string& name);
+
 // Refuses what needs the saved state `name` where there is none.
 ExitCode RefuseUnsaved(const std::string& verb, const std::string& name);
 
