@@ -1,6 +1,7 @@
 # What the packages of this project hold, for one prefix: each component of the installation is a
 # package, in debian/control and for `cpack`.
 include(CMakePackageConfigHelpers)
+include(Documents)
 
 set(SECPOLICY_HEADERS "${CMAKE_INSTALL_INCLUDEDIR}/libsecpolicy")
 set(SECPOLICY_CMAKE "${CMAKE_INSTALL_LIBDIR}/cmake/secpolicy")
@@ -22,13 +23,18 @@ install(TARGETS secpolicyhost secpolicyhost_headers host_contract EXPORT secpoli
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
   COMPONENT libsecpolicyhost1 NAMELINK_COMPONENT libsecpolicy-dev)
 
+foreach(component libsecpolicy1 libsecpolicyhost1 libsecpolicy-dev secpolicy)
+  install(FILES LICENSE DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${component}"
+    COMPONENT ${component})
+endforeach()
+
 set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME libsecpolicy-dev)
 install(FILES secpolicy/secpolicy.h secpolicy/export.h
   DESTINATION "${SECPOLICY_HEADERS}/secpolicy")
 install(DIRECTORY host/include/ DESTINATION "${SECPOLICY_HEADERS}")
 install(DIRECTORY host/linux/include/ DESTINATION "${SECPOLICY_HEADERS}")
-install(FILES docs/abi.md docs/embed.md examples/runtime.cpp
-  DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/libsecpolicy-dev")
+install_documents("${CMAKE_INSTALL_DATADIR}/doc/libsecpolicy-dev"
+  docs/abi.md docs/embed.md examples/runtime.cpp)
 
 # For find_package and pkg-config.
 install(EXPORT secpolicyTargets NAMESPACE secpolicy:: DESTINATION "${SECPOLICY_CMAKE}")
@@ -63,19 +69,14 @@ endforeach()
 install(FILES packaging/systemd/secpolicy-metrics.timer packaging/systemd/secpolicy-drift.timer
   DESTINATION "${SECPOLICY_UNITS}")
 install(FILES packaging/systemd/secpolicy.catalog DESTINATION "${SECPOLICY_CATALOG}")
-install(FILES README.md CHANGELOG.md SECURITY.md
-  docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
-  docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
-  docs/messages.md docs/monitoring.md docs/queries.md docs/runtime.md docs/graph.svg
-  DESTINATION "${CMAKE_INSTALL_DOCDIR}")
-install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}")
-install(DIRECTORY examples/host examples/systemd packaging/monitoring
+install(DIRECTORY examples/broken examples/host examples/systemd packaging/monitoring
   DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples" USE_SOURCE_PERMISSIONS)
 install(PROGRAMS scripts/pack-example DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
-
-foreach(component libsecpolicy1 libsecpolicyhost1 libsecpolicy-dev secpolicy)
-  install(FILES LICENSE DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${component}"
-    COMPONENT ${component})
-endforeach()
+install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}/docs")
+install_documents("${CMAKE_INSTALL_DOCDIR}" README.md CHANGELOG.md SECURITY.md
+  docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
+  docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
+  docs/messages.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/runtime.md
+  docs/graph.svg)
 
 include(Rpm)

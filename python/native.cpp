@@ -35,6 +35,7 @@ py::tuple Run(const Root& root, const std::function<void(const Send&)>& work) {
 }
 
 PYBIND11_MODULE(_native, module) {
+  module.attr("version") = SECPOLICY_VERSION;
   module.def("check", [](const Root& root, const std::string& path, bool fresh) {
     return Run(root, [&](const Send& send) { Check(path, fresh, send); });
   });

@@ -28,6 +28,8 @@ __all__ = [
     "PolicyError", "Problem", "Question", "QuestionError", "Remainder", "Report", "RootError", "Rule", "RuleChange",
     "Severity", "WhoCan", "Why", "check", "diff", "load", "plan", "who_can", "why"]
 
+__version__ = _native.version
+
 Path = str | bytes | _os.PathLike[str] | _os.PathLike[bytes]
 
 POLICY = "/etc/zorvan/secpolicy"

@@ -104,6 +104,18 @@ EOF
   [[ -f $PREFIX/lib/systemd/catalog/secpolicy.catalog && -f $PREFIX/share/doc/secpolicy/examples/monitoring/alerts.yaml ]]
 }
 
+@test "links between the installed documents lead on" {
+  local page target count=0
+  while IFS=: read -r page target; do
+    [[ -e $(dirname "$page")/$target ]] || { echo "$page: $target" && return 1; }
+    ((++count))
+  done < <(grep --recursive --only-matching --perl-regexp '\]\(\K[^):# ]+(?=[)#])' \
+    --include='*.md' "$PREFIX/share/doc")
+  ((count > 50))
+  # What is not installed is named all the same.
+  grep --quiet CONTRIBUTING "$PREFIX/share/doc/secpolicy/README.md"
+}
+
 @test "installed headers stand alone" {
   while read -r header; do
     ${CXX:-c++} -std=c++20 -fsyntax-only -I "$PREFIX/include/libsecpolicy" -x c++ "$header"

@@ -157,7 +157,7 @@ rpm_files() {
   local libraries=$DEBIAN/usr/lib/x86_64-linux-gnu
   # shellcheck disable=SC2046
   PKG_CONFIG_LIBDIR=$libraries/pkgconfig ${CXX:-c++} -std=c++20 \
-    "$DEBIAN/usr/share/doc/libsecpolicy-dev/runtime.cpp" -o "$DEBIAN/srv/runtime" \
+    "$DEBIAN/usr/share/doc/libsecpolicy-dev/examples/runtime.cpp" -o "$DEBIAN/srv/runtime" \
     $(PKG_CONFIG_LIBDIR=$libraries/pkgconfig pkg-config --cflags --libs secpolicy)
   run inside env SECPOLICY_HOST_STATE=/srv/state/host.db /srv/runtime
   [[ $status -eq 0 && $output == *"job7: /usr/bin/convert 0x11"* ]]

@@ -11,6 +11,10 @@ def values(items, *members):
     return [tuple(item.get(member) for member in members) for item in items]
 
 
+def test_version(broken):
+    assert run(broken, "--version").stdout == f"secpolicy {secpolicy.__version__}\n"
+
+
 def test_check(broken):
     report = secpolicy.check(root=broken)
     written = document(broken, "check")
