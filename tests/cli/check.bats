@@ -417,6 +417,12 @@ END
   warns "$shown/fileLabels/x:1:17: warning: this label does not stay: line 1 of $inside/fileLabels/y gives the whole tree 'hostConfig' [two-labels]"
 }
 
+@test "unknown-port" {
+  add domains/sshDom "-p bind_port 65535 grant" "-p ioctl_request 65536 grant" "-p bind_port 60000 65536 grant"
+  warns "$shown/domains/sshDom:$number:20: warning: there is no port 65536: the last is 65535 [unknown-port]"
+  [[ $(grep -c unknown-port <<<"$output") -eq 1 ]]
+}
+
 @test "unreachable-domain, also of domains that enter each other" {
   echo "-d hostProgram twoDom exec grant" >"$policy/domains/oneDom"
   echo "-d hostProgram oneDom exec grant" >"$policy/domains/twoDom"

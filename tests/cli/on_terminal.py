@@ -10,6 +10,8 @@ import struct
 import sys
 import termios
 
+from terminal_output import pieces
+
 screen, size, keys, *command = sys.argv[1:]
 columns, rows = map(int, size.split("x"))
 
@@ -19,13 +21,7 @@ if child == 0:
     os.execvp(command[0], command)
 
 shown = b""
-while True:
-    try:
-        piece = os.read(terminal, 65536)
-    except OSError:
-        break
-    if not piece:
-        break
+for piece in pieces(terminal):
     if not shown:
         os.write(terminal, keys.encode())
     shown += piece

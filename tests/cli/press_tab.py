@@ -9,6 +9,8 @@ import shutil
 import sys
 import tempfile
 
+from terminal_output import pieces
+
 shell, completions, command_dir, *lines = sys.argv[1:]
 
 # ^X t tells what stands on the line.
@@ -49,15 +51,10 @@ def start(home):
 
 def read_until(terminal, mark):
     shown = b""
-    while mark is None or mark not in shown:
-        try:
-            piece = os.read(terminal, 65536)
-        except OSError:
-            break
-        if not piece:
-            break
+    for piece in pieces(terminal):
         shown += piece
-    return shown
+        if mark is not None and mark in shown:
+            return
 
 
 home = tempfile.mkdtemp()

@@ -316,6 +316,27 @@ END
   shows "  instead: -s mmap grant"
 }
 
+@test "domains and objects are named by their numbers, too" {
+  boot
+  local ssh host key
+  ssh=$(domain_id sshDom) host=$(domain_id hostDom)
+  key=$("$SECPOLICY" --root "$root" display 2>/dev/null | sed -n 's/^sshKey (\([0-9]*\))$/\1/p')
+  secpolicy why hostDom enter sshDom
+  local answer=$output
+  secpolicy why "$host" enter "$ssh"
+  [[ $answer == *sshDom* && $output == "$answer" ]]
+  secpolicy who-can access sshKey read
+  answer=$output
+  secpolicy who-can access "$key" read
+  [[ $output == "$answer" && $stderr == *" may access sshKey read" ]]
+  secpolicy features --for sshDom
+  answer=$output
+  secpolicy features --for "$ssh"
+  [[ -n $answer && $output == "$answer" ]]
+  secpolicy run "$ssh" --explain
+  exits 0
+}
+
 @test "a domain is named by its name or its number, and what was written by its place in the root" {
   boot
   secpolicy why "$(domain_id sshDom)" use cap_net_bind_service

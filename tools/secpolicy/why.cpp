@@ -18,8 +18,7 @@ namespace {
 ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
                 const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const Policy::InstalledDomain domain =
-      RequireInstalledDomain(FindDomain(name, access).name, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
   const Question question = ReadQuestion(words, access);
   const Policy::Decision decision = Policy::Decide(question.asked, domain);
   if (format == "json") {

@@ -21,6 +21,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
+#include "host/linux/common/write_all.h"
 #include "host/linux/files/directory_entry.h"
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/state/host_state.h"
@@ -230,11 +231,7 @@ void LabelJournal::Keep(const NotedLabels& labels) {
 }
 
 void LabelJournal::Write(const std::string& text) const {
-  for (std::size_t done = 0; done < text.size();) {
-    const ssize_t written = write(file.Number(), text.data() + done, text.size() - done);
-    if (written < 0) ThrowErrno("Unable to write the journal of labels ", path);
-    done += static_cast<std::size_t>(written);
-  }
+  if (!WriteAll(file.Number(), text)) ThrowErrno("Unable to write the journal of labels ", path);
 }
 
 LabelsPutBack LabelJournal::PutBack() const {

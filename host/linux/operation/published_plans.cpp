@@ -16,6 +16,7 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/shared_directory.h"
 #include "host/linux/common/used_paths.h"
+#include "host/linux/common/write_all.h"
 #include "host/linux/operation/store_copy.h"
 #include "host/linux/operation/world_records.h"
 #include "host/linux/state/host_state.h"
@@ -85,7 +86,7 @@ class PlanDirectory {
     unlinkat(opened.Number(), kNew, 0);
     constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
     const Descriptor file(openat(opened.Number(), kNew, kFlags, S_IRUSR | S_IWUSR));
-    if (!file.IsOpen() || !WriteAll(file, content)) Fail(name);
+    if (!file.IsOpen() || !WriteAll(file.Number(), content)) Fail(name);
     TakeName(file, name);
   }
 
@@ -115,15 +116,6 @@ class PlanDirectory {
  private:
   static constexpr mode_t kMode = 0755;
   static constexpr mode_t kFileMode = 0644;
-
-  static bool WriteAll(const Descriptor& file, std::string_view content) {
-    while (!content.empty()) {
-      const ssize_t count = write(file.Number(), content.data(), content.size());
-      if (count < 0) return false;
-      content.remove_prefix(static_cast<std::size_t>(count));
-    }
-    return true;
-  }
 
   void TakeName(const Descriptor& file, const std::string& name) const {
     if (fchmod(file.Number(), kFileMode) != 0 ||

@@ -5,6 +5,7 @@
 
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 namespace SecPolicyCli {
 
@@ -12,8 +13,7 @@ void WriteNewFile(const std::filesystem::path& path, const std::string& text) {
   const LinuxHost::Descriptor file(
       open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0644));
   if (!file.IsOpen()) LinuxHost::ThrowErrno("cannot make ", path.native());
-  const auto size = static_cast<ssize_t>(text.size());
-  if (write(file.Number(), text.data(), text.size()) != size) {
+  if (!LinuxHost::WriteAll(file.Number(), text)) {
     LinuxHost::ThrowErrno("cannot write ", path.native());
   }
 }

@@ -57,6 +57,7 @@ const Code kSkippedEntry{"skipped-entry", kWarning,
 const Code kStarInPath{"star-in-path", kWarning, "A star in a path does not mean what it seems to"};
 const Code kTab{"tab", kWarning, "A tab is part of a word"};
 const Code kTwoLabels{"two-labels", kWarning, "Two lines give one file different labels"};
+const Code kUnknownPort{"unknown-port", kWarning, "A rule is about a port beyond 65535"};
 const Code kUnreachableDomain{"unreachable-domain", kWarning, "Nothing enters a domain"};
 const Code kUntypedEntries{"untyped-entries", kWarning,
                            "A file system does not tell what its entries are: a load skips them"};
@@ -66,7 +67,7 @@ const Code kUnusedObject{"unused-object", kWarning, "Nobody uses an object"};
 
 namespace {
 
-constexpr std::array<const Code*, 35> kAll = {
+constexpr std::array<const Code*, 36> kAll = {
     &Codes::kArgumentCount,
     &Codes::kBadName,
     &Codes::kBadPermissions,
@@ -99,6 +100,7 @@ constexpr std::array<const Code*, 35> kAll = {
     &Codes::kStarInPath,
     &Codes::kTab,
     &Codes::kTwoLabels,
+    &Codes::kUnknownPort,
     &Codes::kUnreachableDomain,
     &Codes::kUntypedEntries,
     &Codes::kUnusedObject,

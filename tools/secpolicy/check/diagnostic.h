@@ -58,6 +58,7 @@ extern const Code kSkippedEntry;
 extern const Code kStarInPath;
 extern const Code kTab;
 extern const Code kTwoLabels;
+extern const Code kUnknownPort;
 extern const Code kUnreachableDomain;
 extern const Code kUntypedEntries;
 extern const Code kUnusedObject;

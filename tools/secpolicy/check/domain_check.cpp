@@ -1,12 +1,14 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstddef>
+#include <cstdint>
 #include <iterator>
 #include <list>
 #include <map>
 #include <unordered_map>
 
 #include "check_run.h"
+#include "host/enforce/plan/port_check.h"
 #include "host/linux/common/host_error.h"
 #include "policy/call_set.h"
 #include "policy/parameter_range.h"
@@ -27,6 +29,8 @@ const char* const kPathRule = FormOf(Policy::RuleKind::kFilePath).keyword;
 
 constexpr char kStartCalls[] = "@start";
 
+constexpr std::uint64_t kLastPort = 65'535;
+
 bool IsNumber(const std::string& word) {
   try {
     Policy::ParseParameterRange(word, "");
@@ -36,10 +40,12 @@ bool IsNumber(const std::string& word) {
   }
 }
 
+std::uint64_t NumberOf(const std::string& word) {
+  return Policy::ParseParameterRange(word, "").first;
+}
+
 bool IsReversed(const std::string& first, const std::string& second) {
-  if (second.empty()) return false;
-  return Policy::ParseParameterRange(first, "").first >
-         Policy::ParseParameterRange(second, "").first;
+  return !second.empty() && NumberOf(first) > NumberOf(second);
 }
 
 // How a range is written of which both ends stand in one word.
@@ -65,6 +71,7 @@ class DomainCheck {
       if (!Accepts(line, words)) continue;
       CheckRepetition(line, words);
       if (words.front() == kPathRule) CheckPathRule(line, words);
+      if (words.front() == kParameterRule) CheckPorts(line, words);
       if (words.front() == kCallRule) calls[words[1]] = words.back() == "grant";
     }
     CheckParameterRules();
@@ -140,6 +147,17 @@ class DomainCheck {
     } catch (const BraxoException& failure) {
       run.diagnostics.Add(file.AtWord(Codes::kBadPermissions, line, 2, failure.what(),
                                       "letters out of r, w and x, each at most once"));
+    }
+  }
+
+  // No socket has such a port, so that the rule, or a part of its range, is about nothing.
+  void CheckPorts(unsigned int line, const Words& words) {
+    if (!Enforce::IsPortCheck(words[1])) return;
+    for (std::size_t i = 2; i + 1 < words.size(); ++i) {
+      if (!IsNumber(words[i]) || NumberOf(words[i]) <= kLastPort) continue;
+      run.diagnostics.Add(file.AtWord(
+          Codes::kUnknownPort, line, i,
+          "there is no port " + words[i] + ": the last is " + std::to_string(kLastPort)));
     }
   }
 

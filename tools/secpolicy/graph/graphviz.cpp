@@ -11,6 +11,7 @@
 
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -25,13 +26,7 @@ int systemRoot = kNoFile;
 
 // Leaves `text` to be read from the start in `file`.
 void Fill(const Descriptor& file, const std::string& text) {
-  std::size_t written = 0;
-  while (written < text.size()) {
-    const ssize_t count = write(file.Number(), text.data() + written, text.size() - written);
-    if (count < 0) ThrowErrno("cannot keep the graph in memory");
-    written += static_cast<std::size_t>(count);
-  }
-  if (lseek(file.Number(), 0, SEEK_SET) != 0) {
+  if (!LinuxHost::WriteAll(file.Number(), text) || lseek(file.Number(), 0, SEEK_SET) != 0) {
     ThrowErrno("cannot keep the graph in memory");
   }
 }

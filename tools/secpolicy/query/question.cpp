@@ -7,6 +7,7 @@
 
 #include "host/linux/operation/file_label.h"
 #include "host/linux/operation/state_use.h"
+#include "query/named.h"
 #include "text/suggestion.h"
 #include "zorvan/kernel.h"
 
@@ -85,7 +86,11 @@ void RequireNumber(const std::string& word) {
 }  // namespace
 
 std::string FindWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
+  if (kind == kDomain) return FindDomain(word, access).name;
   if (IsKnown(kind, word, access)) return word;
+  if (kind == kLabel) {
+    if (const auto name = FindObjectByNumber(word, access)) return *name;
+  }
   std::vector<std::string> known = KnownWords(kind, access);
   if (kind == kCapability && !word.starts_with(kCapabilityPrefix)) {
     std::string name = kCapabilityPrefix + word;

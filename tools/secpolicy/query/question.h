@@ -63,9 +63,9 @@ FileFacts ExamineFile(const std::string& path, SecPolicy::TeskAccessInterfaceImp
 // `path` without slashes at its end.
 std::string WithoutTrailingSlashes(std::string path);
 
-// The word of the host's table, or the domain, that `word` stands for: itself, but that
-// capabilities may lack the prefix that policy files write, as they do in other tools. Throws
-// QuestionError for a word that is not known.
+// The word of the host's table, or the domain, that `word` stands for: itself, but that domains and
+// objects may be named by their numbers, and that capabilities may lack the prefix that policy
+// files write, as they do in other tools. Throws QuestionError for a word that is not known.
 std::string FindWord(Policy::WordKind kind, const std::string& word,
                      SecPolicy::TeskAccessInterfaceImpl& access);
 

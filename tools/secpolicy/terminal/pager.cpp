@@ -15,19 +15,12 @@
 
 #include "environment.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 namespace SecPolicyCli {
 namespace {
 
-bool WriteAll(int descriptor, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t count = write(descriptor, text.data(), text.size());
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return false;
-    text.remove_prefix(static_cast<std::size_t>(count));
-  }
-  return true;
-}
+using LinuxHost::WriteAll;
 
 // In place of the pager.
 void Copy() {
