@@ -144,7 +144,7 @@ secpolicy: label get: failed (2 errors above)" ]]
   secpolicy label set sshKye /etc
   wrong_usage "label set" "label set: there is no object label 'sshKye'. Did you mean 'sshKey'?"
   secpolicy label set entirelyDifferent /etc
-  wrong_usage "label set" "label set: there is no object label 'entirelyDifferent'. 'secpolicy --root $root display' shows all labels"
+  wrong_usage "label set" "label set: there is no object label 'entirelyDifferent'. 'secpolicy --root $root words objects' lists all labels"
   secpolicy label set /etc sshKey
   wrong_usage "label set" "label set: there is no object label '/etc'. The label comes first: secpolicy label set sshKey /etc"
   [[ $(the_label /etc) == hostConfig ]]
@@ -533,5 +533,5 @@ index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
   exits 0
   [[ $(the_label /etc/services.conf) == sshKey ]]
   secpolicy label set 4000 /etc/services.conf
-  wrong_usage "label set" "label set: there is no object label '4000'. 'secpolicy --root $root display' shows all labels"
+  wrong_usage "label set" "label set: there is no object label '4000'. 'secpolicy --root $root words objects' lists all labels"
 }

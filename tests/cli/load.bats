@@ -79,7 +79,7 @@ load helper
   rm -r "$policy"
   secpolicy load
   exits 1
-  ends_with "secpolicy: load: there is no directory /etc/zorvan/secpolicy below this root, so nothing was changed. Name the directory of the policy, or the root that it is in (--root DIR)."
+  ends_with "secpolicy: load: there is no directory /etc/zorvan/secpolicy below this root, so nothing was changed. Name the directory of the policy, or the root that it is in (--root DIR). 'secpolicy --root $root init' writes a first policy."
 }
 
 @test "-v shows the progress on standard error, before and after the verb" {

@@ -181,6 +181,25 @@ State: 8 RefCount: 0 WorldRefCount: 0 defaultDom: 0
   [[ -z $(ls "$BATS_TEST_TMPDIR/empty/run") ]]
 }
 
+@test "a path that begins with the root is told from there" {
+  cd "$BATS_TEST_TMPDIR"
+  local name=etc/zorvan/secpolicy found="Did you mean /etc/zorvan/secpolicy? Paths begin at the root."
+  for root in ./root root/ "$PWD/root"; do
+    secpolicy check "$root/$name"
+    exits 1
+    ends_with "secpolicy: check: there is no policy at $root/$name below this root. Name the directory of the policy or a file in it, or the root that it is in (--root DIR). $found"
+  done
+  root=root
+  secpolicy load "root/$name"
+  exits 1
+  [[ $stderr == *"(--root DIR). $found" ]]
+  secpolicy diff "root/$name" "./$name"
+  exits 2
+  ends_with "secpolicy: diff: there is no directory root/$name below this root. Name a policy directory, a saved state, or 'installed'. $found"
+  secpolicy check root/no/such
+  ends_with "secpolicy: check: there is no policy at root/no/such below this root. Name the directory of the policy or a file in it, or the root that it is in (--root DIR)."
+}
+
 @test "a load before the first boot tells of that" {
   local unbooted="nothing is installed below this root. Name the root that was booted (--root DIR), or run 'secpolicy --root $root boot' first."
   rmdir "$root/run"

@@ -230,7 +230,7 @@ TEST_F(CommandLineTest, RefusesWhatItDoesNotUnderstand) {
   const Misuse table[] = {
       {{"pant", "north"}, "there is no verb or option 'pant'; did you mean 'paint'?", "secpolicy"},
       {{"xyzzy"}, "there is no verb or option 'xyzzy'", "secpolicy"},
-      {{"--rot", "/r"}, "there is no verb or option '--rot'", "secpolicy"},
+      {{"--rot", "/r"}, "there is no verb or option '--rot'; did you mean '--root'?", "secpolicy"},
       {{"-v"}, "a verb is required", "secpolicy"},
       {{"carve"}, "one of bowl, spoon is required", "secpolicy carve"},
       {{"carve", "bolw"}, "there is no 'carve bolw'; did you mean 'bowl'?", "secpolicy carve"},

@@ -91,7 +91,8 @@ ExitCode Boot(const Options& options) {
   if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) {
     return Refuse("boot", std::string("there is no directory ") + SecPolicy::kTardiskImagesDir +
                               " below this root, so nothing was changed. Put the tardisks there, "
-                              "or name the root that they are in (--root DIR).");
+                              "or name the root that they are in (--root DIR). " +
+                              Call("init") + " writes a first policy, for a host without any.");
   }
   return options.plan ? Plan(options) : BootNow(options);
 }

@@ -2,11 +2,13 @@
 #include <iostream>
 #include <memory>
 #include <string>
+#include <system_error>
 
 #include "begin/new_file.h"
 #include "begin/starter_policy.h"
 #include "command_line.h"
 #include "ending.h"
+#include "host/linux/common/host_error.h"
 #include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
@@ -20,10 +22,18 @@ namespace {
 
 namespace fs = std::filesystem;
 
+void MakeDirectories(const fs::path& dir) {
+  std::error_code failure;
+  fs::create_directories(dir, failure);
+  if (!failure) return;
+  throw LinuxHost::HostError(failure.value(),
+                             "cannot make " + dir.string() + ": " + failure.message());
+}
+
 void WritePolicy(const fs::path& dir) {
   for (const StarterFile& file : StarterFiles()) {
     const fs::path path = dir / file.path;
-    fs::create_directories(path.parent_path());
+    MakeDirectories(path.parent_path());
     WriteNewFile(path, file.text);
     std::cout << Visible(OutsidePath(path.string())) << '\n';
   }
@@ -40,7 +50,7 @@ ExitCode Init(const std::string& dir) {
       [&](ErrorList&) {
         WritePolicy(dir);
         // A boot looks for archives there, and is content with none.
-        if (isHostsOwn) fs::create_directories(SecPolicy::kTardiskImagesDir);
+        if (isHostsOwn) MakeDirectories(SecPolicy::kTardiskImagesDir);
       },
       AdviseOnPrivilege,
       [&] {

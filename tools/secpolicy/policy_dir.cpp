@@ -4,6 +4,7 @@
 
 #include "ending.h"
 #include "kitlibs/file.h"
+#include "root.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -24,11 +25,19 @@ Option AddTiming(Syntax& syntax, bool& timing) {
                         "Print the time that each phase took to standard output");
 }
 
+std::string AdviseOnMissing(const std::string& path) {
+  const std::string below = PathBelowRoot(path);
+  if (!below.empty()) return " Did you mean " + below + "? Paths begin at the root.";
+  if (path == SecPolicy::kPolicyRoot) return " " + Call("init") + " writes a first policy.";
+  return "";
+}
+
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir) {
   if (File_IsDirectory(dir.c_str())) return std::nullopt;
   return Refuse(verb, "there is no directory " + dir +
                           " below this root, so nothing was changed. Name the directory of the "
-                          "policy, or the root that it is in (--root DIR).");
+                          "policy, or the root that it is in (--root DIR)." +
+                          AdviseOnMissing(dir));
 }
 
 std::string DomainFile(std::string_view domain, const std::string& policyDir) {

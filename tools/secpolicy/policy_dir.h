@@ -19,6 +19,10 @@ Option AddKeep(Syntax& syntax, bool& keep);
 // Adds the flag --timing to `syntax`.
 Option AddTiming(Syntax& syntax, bool& timing);
 
+// What may be meant by the path of a policy that is not there, as a sentence with a blank before
+// it; nothing when that cannot be told.
+std::string AdviseOnMissing(const std::string& path);
+
 // Refuses a policy directory that is not there; nothing for one that is.
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);
 

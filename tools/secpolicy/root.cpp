@@ -5,8 +5,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <fstream>
 #include <optional>
+#include <system_error>
 
 #include "host/linux/common/host_error.h"
 #include "text/shell_word.h"
@@ -14,6 +16,7 @@
 namespace SecPolicyCli {
 namespace {
 
+namespace fs = std::filesystem;
 using LinuxHost::ThrowErrno;
 
 // As it was given; nothing while none was entered.
@@ -70,6 +73,16 @@ std::string OutsidePath(const std::string& path) {
 std::string AdviseOnForeignRoot() {
   if (geteuid() == 0 || !isRootOfOther) return "";
   return "This root is another user's: run it as that user, or as root.";
+}
+
+std::string PathBelowRoot(const std::string& path) {
+  if (!enteredRoot) return "";
+  const fs::path root = (fs::path(*enteredRoot) / "").lexically_normal();
+  const fs::path inside = fs::path(path).lexically_normal().lexically_relative(root);
+  if (inside.empty() || *inside.begin() == "..") return "";
+  std::error_code unknown;
+  const fs::path found = "/" / inside;
+  return fs::exists(found, unknown) && found != path ? found.string() : "";
 }
 
 std::string AdviseOnPrivilege() {

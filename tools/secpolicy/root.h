@@ -17,6 +17,10 @@ std::string Call(const std::string& words);
 // The path by which a file below the root that was entered is known to whom the command is for.
 std::string OutsidePath(const std::string& path);
 
+// What lies below the root that was entered where `path`, as it is known outside, leads there;
+// empty when nothing does.
+std::string PathBelowRoot(const std::string& path);
+
 // What to try after a failure that the rights of the user can explain; nothing for root, and for
 // who has entered a root of its own.
 std::string AdviseOnPrivilege();

@@ -41,7 +41,8 @@ std::string DidYouMean(const std::string& word, const std::vector<std::string>& 
 std::string DescribeUnknown(const std::string& word, const std::vector<const CLI::App*>& levels) {
   const std::vector<std::string> names = SubcommandNames(*levels.back());
   if (levels.size() == 1) {
-    return "there is no verb or option '" + word + "'" + DidYouMean(word, names);
+    return "there is no verb or option '" + word + "'" +
+           DidYouMean(word, word.starts_with('-') ? OptionNames(levels) : names);
   }
   if (word.starts_with('-')) {
     const std::string name = word.substr(0, word.find('='));
@@ -53,7 +54,8 @@ std::string DescribeUnknown(const std::string& word, const std::vector<const CLI
   if (names.empty()) return "'" + word + "' is one word too many";
   const std::string nearest = DidYouMean(word, names);
   return "there is no '" + levels.back()->get_name() + " " + word + "'" +
-         (nearest.empty() ? "; there are " + Join(names) : nearest);
+         (nearest.empty() ? (names.size() > 1 ? "; there are " : "; there is ") + Join(names)
+                          : nearest);
 }
 
 std::string DescribeMissingKind(const std::vector<const CLI::App*>& levels) {

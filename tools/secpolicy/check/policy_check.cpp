@@ -13,6 +13,7 @@
 #include "host/linux/operation/policy_load.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
+#include "policy_dir.h"
 #include "refusal.h"
 #include "secpolicy/policy_root.h"
 
@@ -99,7 +100,8 @@ CheckReport CheckPolicy(const CheckRequest& request) {
   if (!subject) {
     throw NoSuchPolicy("there is no policy at " + request.path +
                        " below this root. Name the directory of the policy or a file in it, or "
-                       "the root that it is in (--root DIR).");
+                       "the root that it is in (--root DIR)." +
+                       AdviseOnMissing(request.path));
   }
   if (request.content != nullptr && subject->file.empty()) {
     throw NoSuchPolicy("name the file that standard input holds the content of.");

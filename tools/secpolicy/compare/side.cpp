@@ -5,6 +5,7 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/operation/state_use.h"
 #include "kitlibs/file.h"
+#include "policy_dir.h"
 #include "refusal.h"
 #include "root.h"
 #include "saved/saved_state.h"
@@ -21,7 +22,8 @@ Side ReadDirectory(const std::string& dir, SecPolicy::PolicyObserver& observer) 
   if (!File_IsDirectory(dir.c_str())) {
     throw NoSuchPolicy("there is no directory " + dir +
                        " below this root. Name a policy directory, a saved state, or "
-                       "'installed'.");
+                       "'installed'." +
+                       AdviseOnMissing(dir));
   }
   WrittenPolicy written = ReadPolicyDirectory(dir, PartnerDirOf(dir), observer);
   if (!written.isClean) {

@@ -30,8 +30,9 @@ using Braxo::Lib::BraxoException;
     labels.push_back(name);
   }
   const std::string nearest = NearestWord(label, labels);
-  throw QuestionError(problem + (nearest.empty() ? ". " + Call("display") + " shows all labels"
-                                                 : ". Did you mean '" + nearest + "'?"));
+  throw QuestionError(problem + (nearest.empty()
+                                     ? ". " + Call("words objects") + " lists all labels"
+                                     : ". Did you mean '" + nearest + "'?"));
 }
 
 std::string NameOf(LabelRun& run, const std::string& label, const std::vector<std::string>& paths) {
