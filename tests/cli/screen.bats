@@ -72,7 +72,12 @@ setup() {
   [[ $(grep -c '^other:' "$BATS_TEST_TMPDIR/screen") -eq $all ]]
   SECPOLICY_PAGER="sed s/^/paged:/" on_terminal --help
   [[ $(grep -vc '^paged:' "$BATS_TEST_TMPDIR/screen") -eq 0 ]]
-  local plain
+  local long plain
+  "$SECPOLICY" --root "$root" save good
+  for long in "words calls" "saved show good" "rules --call read"; do
+    SECPOLICY_PAGER="sed s/^/paged:/" size=80x4 on_terminal $long
+    [[ $(grep -vc '^paged:' "$BATS_TEST_TMPDIR/screen") -eq 0 ]]
+  done
   for plain in "--no-pager display" history "explain tab" "graph"; do
     SECPOLICY_PAGER="sed s/^/paged:/" on_terminal $plain
     [[ $(grep -c '^paged:' "$BATS_TEST_TMPDIR/screen") -eq 0 && -s $BATS_TEST_TMPDIR/screen ]]
