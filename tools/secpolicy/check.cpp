@@ -8,6 +8,7 @@
 #include "check/report_format.h"
 #include "command_line.h"
 #include "ending.h"
+#include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
 #include "verb.h"
@@ -73,13 +74,6 @@ std::string CheckNumber(const std::string& word) {
   return isNumber ? "" : "'" + word + "' is not a number";
 }
 
-std::string CheckWarningName(const std::string& name) {
-  const Code* const code = FindCode(name);
-  if (code == nullptr) return WhyNoCode(name);
-  if (code->severity == Severity::kWarning) return "";
-  return "'" + name + "' is an error: a load does not end well with it";
-}
-
 Action Define(Syntax& syntax) {
   const auto options = std::make_shared<Options>();
   syntax
@@ -87,8 +81,7 @@ Action Define(Syntax& syntax) {
                  "The policy directory, or a file in it, as seen from the root")
       .Offer(OfferFiles())
       .ShowDefault();
-  syntax.AddFlag("--fresh", options->fresh,
-                 "Check as after a boot, whatever is installed on this host now");
+  AddFresh(syntax, options->fresh);
   syntax.AddFormat(options->format, "the problems", {"text", "json", "sarif"});
   syntax.AddFlag("--stdin", options->fromStandardInput,
                  "Take standard input for the content of the file");
@@ -100,10 +93,7 @@ Action Define(Syntax& syntax) {
       .Check(CheckNumber)
       .NameValue("N");
   syntax.AddFlag("--werror", options->warningsAreErrors, "End with 1 for warnings too");
-  syntax.AddList("--disable", options->unwanted, "Leave out this warning; may be given repeatedly")
-      .Check(CheckWarningName)
-      .NameValue("CODE")
-      .Offer(OfferCodes(true));
+  AddUnwantedCodes(syntax, options->unwanted);
   return [options] { return Check(*options); };
 }
 

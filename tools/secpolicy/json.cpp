@@ -82,19 +82,25 @@ void WriteText(std::string_view text, std::string& output) {
   output += '"';
 }
 
-// Writes `items` one to a line between `open` and `close`.
+// Begins a line; on one line, only sets items apart.
+void BreakLine(std::optional<std::size_t> indent, std::string& output) {
+  if (indent) output.append("\n").append(*indent, ' ');
+}
+
+// Writes `items` between `open` and `close`: with an indent, one to a line.
 template <class Items, class WriteItem>
-void WriteLines(const Items& items, char open, char close, std::size_t indent, std::string& output,
-                WriteItem writeItem) {
+void WriteItems(const Items& items, char open, char close, std::optional<std::size_t> indent,
+                std::string& output, WriteItem writeItem) {
+  const auto inner = indent ? std::optional(*indent + kIndent) : std::nullopt;
   output += open;
-  const char* separator = "\n";
+  const char* separator = "";
   for (const auto& item : items) {
     output += separator;
-    output.append(indent + kIndent, ' ');
-    writeItem(item);
-    separator = ",\n";
+    BreakLine(inner, output);
+    writeItem(item, inner);
+    separator = ",";
   }
-  if (!items.empty()) output.append("\n").append(indent, ' ');
+  if (!items.empty()) BreakLine(indent, output);
   output += close;
 }
 
@@ -122,7 +128,39 @@ std::string Json::Text() const {
   return text + "\n";
 }
 
-void Json::Write(std::string& output, std::size_t indent) const {
+std::string Json::Line() const {
+  std::string text;
+  Write(text, std::nullopt);
+  return text;
+}
+
+const Json& Json::At(std::string_view name) const {
+  static const Json missing;
+  const Members* const members = std::get_if<Members>(&value);
+  if (members == nullptr) return missing;
+  const auto found = std::ranges::find(*members, name, &Member::first);
+  return found == members->end() ? missing : found->second;
+}
+
+std::span<const Json> Json::Elements() const {
+  const Values* const values = std::get_if<Values>(&value);
+  if (values == nullptr) return {};
+  return *values;
+}
+
+std::optional<bool> Json::Truth() const {
+  const bool* const truth = std::get_if<bool>(&value);
+  return truth == nullptr ? std::nullopt : std::optional(*truth);
+}
+
+std::optional<std::int64_t> Json::Number() const {
+  const std::int64_t* const number = std::get_if<std::int64_t>(&value);
+  return number == nullptr ? std::nullopt : std::optional(*number);
+}
+
+const std::string* Json::String() const { return std::get_if<std::string>(&value); }
+
+void Json::Write(std::string& output, std::optional<std::size_t> indent) const {
   if (const bool* const truth = std::get_if<bool>(&value)) {
     output += *truth ? "true" : "false";
   } else if (const std::int64_t* const number = std::get_if<std::int64_t>(&value)) {
@@ -130,13 +168,13 @@ void Json::Write(std::string& output, std::size_t indent) const {
   } else if (const std::string* const text = std::get_if<std::string>(&value)) {
     WriteText(*text, output);
   } else if (const Values* const values = std::get_if<Values>(&value)) {
-    WriteLines(*values, '[', ']', indent, output,
-               [&](const Json& element) { element.Write(output, indent + kIndent); });
+    WriteItems(*values, '[', ']', indent, output,
+               [&](const Json& element, auto inner) { element.Write(output, inner); });
   } else if (const Members* const members = std::get_if<Members>(&value)) {
-    WriteLines(*members, '{', '}', indent, output, [&](const Member& member) {
+    WriteItems(*members, '{', '}', indent, output, [&](const Member& member, auto inner) {
       WriteText(member.first, output);
       output += ": ";
-      member.second.Write(output, indent + kIndent);
+      member.second.Write(output, inner);
     });
   } else {
     output += "null";

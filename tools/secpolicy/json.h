@@ -3,7 +3,10 @@
 #include <concepts>
 #include <cstdint>
 #include <initializer_list>
+#include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -41,6 +44,21 @@ class Json {
   // refused: a path need not be text.
   std::string Text() const;
 
+  // The same on one line, without a line end.
+  std::string Line() const;
+
+  // What is there, for who reads a document: null, nothing or an empty list stands for what is
+  // missing or of another type.
+  const Json& At(std::string_view name) const;
+  std::span<const Json> Elements() const;
+  std::optional<bool> Truth() const;
+  std::optional<std::int64_t> Number() const;
+  const std::string* String() const;
+  bool IsNull() const { return std::holds_alternative<std::monostate>(value); }
+  bool IsObject() const { return std::holds_alternative<Members>(value); }
+
+  bool operator==(const Json&) const = default;
+
  private:
   using Values = std::vector<Json>;
   using Members = std::vector<Member>;
@@ -48,7 +66,7 @@ class Json {
 
   explicit Json(Value content) : value(std::move(content)) {}
 
-  void Write(std::string& output, std::size_t indent) const;
+  void Write(std::string& output, std::optional<std::size_t> indent) const;
 
   Value value;
 };

@@ -22,6 +22,8 @@ using LinuxHost::ThrowErrno;
 // As it was given; nothing while none was entered.
 std::optional<std::string> enteredRoot;
 
+std::vector<std::string> placesOfRoot;
+
 // Whether another user has that directory; to be asked before a namespace hides who.
 bool isRootOfOther = false;
 
@@ -49,7 +51,10 @@ bool MakeRoot() { return chroot(".") == 0 && chdir("/") == 0; }
 }  // namespace
 
 void EnterRoot(const std::string& directory) {
+  std::error_code unknown;
+  const std::string given = fs::absolute(directory, unknown).lexically_normal();
   if (chdir(directory.c_str()) != 0) ThrowErrno("cannot enter the root ", directory);
+  placesOfRoot = {given, fs::current_path(unknown)};
   struct stat status {};
   isRootOfOther = stat(".", &status) == 0 && status.st_uid != geteuid();
   if (!MakeRoot()) {
@@ -84,6 +89,8 @@ std::string PathBelowRoot(const std::string& path) {
   const fs::path found = "/" / inside;
   return fs::exists(found, unknown) && found != path ? found.string() : "";
 }
+
+const std::vector<std::string>& PlacesOfRoot() { return placesOfRoot; }
 
 std::string AdviseOnPrivilege() {
   if (geteuid() == 0) return "";

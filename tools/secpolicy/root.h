@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 namespace SecPolicyCli {
 
@@ -20,6 +21,10 @@ std::string OutsidePath(const std::string& path);
 // What lies below the root that was entered where `path`, as it is known outside, leads there;
 // empty when nothing does.
 std::string PathBelowRoot(const std::string& path);
+
+// The absolute paths by which the root that was entered is known outside: as it was given, and
+// without links. None while none was entered.
+const std::vector<std::string>& PlacesOfRoot();
 
 // What to try after a failure that the rights of the user can explain; nothing for root, and for
 // who has entered a root of its own.

@@ -4,9 +4,11 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <fstream>
 #include <iterator>
 #include <string_view>
 
+#include "host/linux/common/host_error.h"
 #include "secpolicy/parse/directory.h"
 
 namespace SecPolicyCli {
@@ -75,8 +77,19 @@ void CheckEntries(CheckRun& run, const std::string& dir, const std::string& expe
   }
 }
 
-std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
-                                       const std::string& expected, const Code& skipped) {
+void TakeContent(CheckRun& run, const std::string& file, std::istream& input) {
+  const auto [place, isNew] = run.contents.try_emplace(file);
+  std::string& content = place->second;
+  if (isNew) {
+    content = run.scratch.DirectoryPath() + "/content-" + std::to_string(run.contentsTaken++);
+  }
+  std::ofstream output(content, std::ios::binary);
+  std::copy(std::istreambuf_iterator<char>(input), {}, std::ostreambuf_iterator<char>(output));
+  output.flush();
+  if (!output) LinuxHost::ThrowErrno("cannot write ", content);
+}
+
+std::map<std::string, std::string> ListPolicyFiles(CheckRun& run, const std::string& dir) {
   std::map<std::string, std::string> names;
   try {
     SecPolicy::GetFileList(dir, names);
@@ -84,18 +97,34 @@ std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
     AddFileProblem(run, Codes::kUnreadable, dir, failure.what());
     return {};
   }
+  for (const auto& [path, content] : run.contents) {
+    const std::size_t slash = path.rfind('/');
+    if (path.substr(0, slash) == dir) names.emplace(path, path.substr(slash + 1));
+  }
+  return names;
+}
+
+const SourceFile* OpenPolicyFile(CheckRun& run, const std::string& path, const std::string& name) {
+  run.diagnostics.BeginFile(path);
+  try {
+    const auto content = run.contents.find(path);
+    const SourceFile& file =
+        run.files.emplace_back(path, content == run.contents.end() ? path : content->second);
+    CheckName(run, file, name);
+    file.CheckBytes(run.diagnostics);
+    return &file;
+  } catch (const BraxoException& failure) {
+    AddFileProblem(run, Codes::kUnreadable, path, failure.what());
+    return nullptr;
+  }
+}
+
+std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
+                                       const std::string& expected, const Code& skipped) {
   std::vector<NamedFile> opened;
-  for (const auto& [path, name] : names) {
-    run.diagnostics.BeginFile(path);
-    try {
-      const auto content = run.contents.find(path);
-      const SourceFile& file =
-          run.files.emplace_back(path, content == run.contents.end() ? path : content->second);
-      CheckName(run, file, name);
-      file.CheckBytes(run.diagnostics);
-      opened.push_back({&file, name});
-    } catch (const BraxoException& failure) {
-      AddFileProblem(run, Codes::kUnreadable, path, failure.what());
+  for (const auto& [path, name] : ListPolicyFiles(run, dir)) {
+    if (const SourceFile* const file = OpenPolicyFile(run, path, name)) {
+      opened.push_back({file, name});
     }
   }
   CheckEntries(run, dir, expected, skipped);
@@ -117,7 +146,7 @@ void CheckIsAbsolute(CheckRun& run, const SourceFile& file, unsigned int line, s
 }
 
 void AddRefusal(CheckRun& run, const SourceFile& file, const SecPolicy::Problem& problem,
-                const std::string& hint) {
+                const Hint& hint) {
   const std::size_t size = file.Lines().at(problem.line).size();
   const bool isWhole = problem.word >= size;
   run.diagnostics.Add(file.AtWords(CodeOf(*problem.fault), problem.line, isWhole ? 0 : problem.word,

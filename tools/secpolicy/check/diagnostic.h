@@ -80,6 +80,19 @@ const Code& CodeOf(SecPolicy::Fault fault);
 // "error" or "warning".
 const char* SeverityName(Severity severity);
 
+// What to do about a problem.
+struct Hint {
+  Hint() = default;  // nothing is known
+  Hint(const char* advice) : text(advice) {}
+  Hint(std::string advice, std::string better = {})
+      : text(std::move(advice)), replacement(std::move(better)) {}
+
+  std::string text;
+  std::string replacement;  // for the words that the problem is about; empty when not just that
+
+  bool operator==(const Hint&) const = default;
+};
+
 // One problem. Lines and columns count from 1; line 0 is the file as a whole. Columns and lengths
 // count characters, a byte that belongs to none as one.
 struct Diagnostic {
@@ -89,8 +102,10 @@ struct Diagnostic {
   std::size_t column = 0;
   std::size_t length = 0;
   std::string message;
-  std::string hint;    // empty: none
+  Hint hint;
   std::string source;  // the bytes of the line
+
+  bool operator==(const Diagnostic&) const = default;
 };
 
 // Which of the problems are shown.
@@ -125,6 +140,8 @@ class DiagnosticList {
 
   // What the latest selection chose; nothing before the first.
   const std::vector<Diagnostic>& Shown() const { return shown; }
+
+  const std::vector<Diagnostic>& All() const { return diagnostics; }
 
   std::size_t Count(Severity severity) const;
   std::size_t Count() const { return diagnostics.size(); }

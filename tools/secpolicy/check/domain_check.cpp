@@ -49,14 +49,15 @@ bool IsReversed(const std::string& first, const std::string& second) {
 }
 
 // How a range is written of which both ends stand in one word.
-std::string HintForRange(const std::string& word) {
+Hint HintForRange(const std::string& word) {
   const std::size_t end = word.find_first_of("-:.");
   const std::size_t begin = word.find_last_of("-:.");
-  if (end == std::string::npos) return "";
+  if (end == std::string::npos) return {};
   const std::string first = word.substr(0, end);
   const std::string last = word.substr(begin + 1);
-  if (!IsNumber(first) || !IsNumber(last)) return "";
-  return "a range is two words: " + first + " " + last;
+  if (!IsNumber(first) || !IsNumber(last)) return {};
+  const std::string words = first + " " + last;
+  return {"a range is two words: " + words, words};
 }
 
 // The check of one domain's file.
@@ -182,7 +183,7 @@ class DomainCheck {
         Codes::kCannotStart,
         "no dynamically linked program can start in the domain '" + name + "': it may not make " +
             CountOf(static_cast<std::size_t>(lacking), "system call") + " of " + kStartCalls);
-    diagnostic.hint = std::string("write: -s ") + kStartCalls + " grant";
+    diagnostic.hint = "write: -s @start grant";
     run.diagnostics.Add(std::move(diagnostic));
   }
 
@@ -223,9 +224,10 @@ class DomainCheck {
     } else if (!second.empty() && !IsNumber(second)) {
       run.diagnostics.Add(file.AtWord(Codes::kParameterConflict, line, kFirstNumber + 1, refusal));
     } else if (IsReversed(first, second)) {
-      run.diagnostics.Add(file.AtWords(Codes::kParameterConflict, line, kFirstNumber,
-                                       kFirstNumber + 1, refusal,
-                                       "the smaller number comes first: " + second + " " + first));
+      const std::string inOrder = second + " " + first;
+      run.diagnostics.Add(
+          file.AtWords(Codes::kParameterConflict, line, kFirstNumber, kFirstNumber + 1, refusal,
+                       Hint("the smaller number comes first: " + inOrder, inOrder)));
     } else {
       Add(Codes::kParameterConflict, line, file.Lines().at(line), refusal);
     }
@@ -253,21 +255,17 @@ class DomainCheck {
   std::map<std::string, bool> calls;                // the latest word on each name or set
 };
 
-struct NamedDomain {
-  const SourceFile* file;
-  std::string name;
-  unsigned int id;
-};
-
 // Of a host that has no room for one more domain.
 std::string DescribeRest(std::size_t files) {
   return files == 0 ? ""
                     : "neither is there room for " + CountOf(files, "file") + " after this one";
 }
 
-// Creates the domain in the scratch state, as a load does before it reads any file.
-std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>& files,
-                                     const std::string& prefix) {
+}  // namespace
+
+// Creates the domains in the scratch state, as a load does before it reads any file.
+std::vector<NamedDomain> DefineDomains(CheckRun& run, const std::vector<NamedFile>& files,
+                                       const std::string& prefix) {
   std::vector<NamedDomain> domains;
   for (std::size_t index = 0; index < files.size(); ++index) {
     const NamedFile& named = files[index];
@@ -291,15 +289,16 @@ std::vector<NamedDomain> NameDomains(CheckRun& run, const std::vector<NamedFile>
   return domains;
 }
 
-}  // namespace
+void CheckDomain(CheckRun& run, const NamedDomain& domain, const std::string& prefix) {
+  // Partner domains are entered by the service that belongs to them.
+  if (!prefix.empty()) run.enteredDomains.insert(domain.name);
+  DomainCheck(run, *domain.file, domain.name, domain.id).CheckLines();
+}
 
-void CheckDomains(CheckRun& run, const std::string& dir, const std::string& prefix,
-                  const std::string& expected) {
-  const std::vector<NamedFile> files = OpenPolicyFiles(run, dir, expected);
-  for (const NamedDomain& domain : NameDomains(run, files, prefix)) {
-    // Partner domains are entered by the service that belongs to them.
-    if (!prefix.empty()) run.enteredDomains.insert(domain.name);
-    DomainCheck(run, *domain.file, domain.name, domain.id).CheckLines();
+void CheckDomains(CheckRun& run, const DomainsDir& dir) {
+  const std::vector<NamedFile> files = OpenPolicyFiles(run, dir.path, dir.expected);
+  for (const NamedDomain& domain : DefineDomains(run, files, dir.prefix)) {
+    CheckDomain(run, domain, dir.prefix);
   }
 }
 

@@ -16,7 +16,7 @@ Json ToJson(const Diagnostic& diagnostic) {
   json["severity"] = SeverityName(diagnostic.code->severity);
   json["code"] = diagnostic.code->name;
   json["message"] = diagnostic.message;
-  if (!diagnostic.hint.empty()) json["hint"] = diagnostic.hint;
+  if (!diagnostic.hint.text.empty()) json["hint"] = diagnostic.hint.text;
   return json;
 }
 

@@ -30,8 +30,7 @@ std::string Describe(const LabelLine& line) {
   return "line " + std::to_string(line.line) + " of " + line.file->Path();
 }
 
-std::string HintFor(CheckRun& run, const SecPolicy::Problem& problem,
-                    const SourceFile::Words& words) {
+Hint HintFor(CheckRun& run, const SecPolicy::Problem& problem, const SourceFile::Words& words) {
   if (problem.fault == SecPolicy::Fault::kTreeMarker) {
     return "there are no patterns but /* at the end";
   }

@@ -14,6 +14,39 @@ constexpr char kExceptionKeyword[] = "-E";
 constexpr std::array kExceptionWords = {kLabel, kDomain};
 constexpr LineForm kException = {.usage = "-E LABEL DOMAIN", .words = kExceptionWords};
 
+Vocabulary& VocabularyOf(CheckRun& run, WordKind kind) {
+  const auto known = run.vocabularies.find(kind);
+  if (known != run.vocabularies.end()) return known->second;
+  return run.vocabularies.emplace(kind, WordsOf(run, kind)).first->second;
+}
+
+Hint AskFor(const std::string& nearest) {
+  if (nearest.empty()) return {};
+  return {"did you mean '" + nearest + "'?", nearest};
+}
+
+Hint Suggest(CheckRun& run, WordKind kind, const std::string& word) {
+  constexpr char kCapabilityPrefix[] = "cap_";
+  Vocabulary& table = VocabularyOf(run, kind);
+  const std::string nearest = table.Nearest(word);
+  if (!nearest.empty() || kind != kCapability) return AskFor(nearest);
+  return AskFor(table.Nearest(kCapabilityPrefix + word));
+}
+
+// A short table is told as a whole when no word of it is near.
+Hint SuggestOrList(CheckRun& run, WordKind kind, const std::string& word) {
+  constexpr std::size_t kShortTable = 10;
+  Hint suggestion = Suggest(run, kind, word);
+  const Vocabulary& table = VocabularyOf(run, kind);
+  if (!suggestion.text.empty() || table.Size() == 0 || table.Size() > kShortTable)
+    return suggestion;
+  std::string list = "one of";
+  for (const std::string& candidate : WordsOf(run, kind)) list += " " + candidate;
+  return list;
+}
+
+}  // namespace
+
 std::vector<std::string> WordsOf(CheckRun& run, WordKind kind) {
   std::vector<std::string> words;
   if (kind == kDomain) {
@@ -25,37 +58,6 @@ std::vector<std::string> WordsOf(CheckRun& run, WordKind kind) {
   return words;
 }
 
-Vocabulary& VocabularyOf(CheckRun& run, WordKind kind) {
-  const auto known = run.vocabularies.find(kind);
-  if (known != run.vocabularies.end()) return known->second;
-  return run.vocabularies.emplace(kind, WordsOf(run, kind)).first->second;
-}
-
-std::string AskFor(const std::string& nearest) {
-  return nearest.empty() ? "" : "did you mean '" + nearest + "'?";
-}
-
-std::string Suggest(CheckRun& run, WordKind kind, const std::string& word) {
-  constexpr char kCapabilityPrefix[] = "cap_";
-  Vocabulary& table = VocabularyOf(run, kind);
-  const std::string nearest = table.Nearest(word);
-  if (!nearest.empty() || kind != kCapability) return AskFor(nearest);
-  return AskFor(table.Nearest(kCapabilityPrefix + word));
-}
-
-// A short table is told as a whole when no word of it is near.
-std::string SuggestOrList(CheckRun& run, WordKind kind, const std::string& word) {
-  constexpr std::size_t kShortTable = 10;
-  std::string suggestion = Suggest(run, kind, word);
-  const Vocabulary& table = VocabularyOf(run, kind);
-  if (!suggestion.empty() || table.Size() == 0 || table.Size() > kShortTable) return suggestion;
-  std::string list = "one of";
-  for (const std::string& candidate : WordsOf(run, kind)) list += " " + candidate;
-  return list;
-}
-
-}  // namespace
-
 std::optional<LineForm> FindLineForm(const std::string& keyword) {
   if (keyword == kExceptionKeyword) return kException;
   const Policy::RuleForm* const form = Policy::FindRuleForm(keyword);
@@ -63,16 +65,16 @@ std::optional<LineForm> FindLineForm(const std::string& keyword) {
   return LineForm{.usage = form->usage, .words = form->Words()};
 }
 
-std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
-                        std::size_t index) {
+Hint HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
+                 std::size_t index) {
   if (&code == &Codes::kRuleType) return "a line begins with one of -a -c -d -f -p -r -s -u";
   const auto form = FindLineForm(words.front());
   if (!form) return "";
   if (&code == &Codes::kArgumentCount) return std::string("write: ") + form->usage;
   if (index == 0 || index >= words.size()) return "";
   if (&code == &Codes::kGrantWord) {
-    const std::string suggestion = AskFor(NearestWord(words[index], {"grant", "revoke"}));
-    return suggestion.empty() ? "the last word is 'grant' or 'revoke'" : suggestion;
+    const Hint suggestion = AskFor(NearestWord(words[index], {"grant", "revoke"}));
+    return suggestion.text.empty() ? "the last word is 'grant' or 'revoke'" : suggestion;
   }
   if (index > form->words.size()) return "";
   const WordKind kind = form->words[index - 1];
@@ -80,9 +82,9 @@ std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words
   return SuggestOrList(run, kind, words[index]);
 }
 
-std::string HintForLabel(CheckRun& run, const std::string& word) {
-  const std::string suggestion = Suggest(run, kLabel, word);
-  return suggestion.empty() ? "labels are declared in objects/" : suggestion;
+Hint HintForLabel(CheckRun& run, const std::string& word) {
+  const Hint suggestion = Suggest(run, kLabel, word);
+  return suggestion.text.empty() ? "labels are declared in objects/" : suggestion;
 }
 
 }  // namespace SecPolicyCli

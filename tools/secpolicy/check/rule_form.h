@@ -3,6 +3,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <vector>
 
 #include "check_run.h"
 
@@ -18,11 +19,14 @@ struct LineForm {
 // The form of the lines with this first word; nothing when there is none.
 std::optional<LineForm> FindLineForm(const std::string& keyword);
 
+// All words of the kind that a rule may have; none of paths and numbers.
+std::vector<std::string> WordsOf(CheckRun& run, Policy::WordKind kind);
+
 // A hint for the word `index` of a line that the library refused with `code`; may be empty.
-std::string HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
-                        std::size_t index);
+Hint HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words,
+                 std::size_t index);
 
 // "did you mean 'WORD'?" for the label that is nearest to `word`, or nothing.
-std::string HintForLabel(CheckRun& run, const std::string& word);
+Hint HintForLabel(CheckRun& run, const std::string& word);
 
 }  // namespace SecPolicyCli

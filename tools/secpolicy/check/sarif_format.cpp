@@ -1,9 +1,9 @@
 #include <algorithm>
-#include <string_view>
 
 #include "json.h"
 #include "report_format.h"
 #include "root.h"
+#include "text/uri.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -12,28 +12,6 @@ namespace {
 constexpr char kSchema[] =
     "https://docs.oasis-open.org/sarif/sarif/v2.1.0/errata01/os/schemas/sarif-schema-2.1.0.json";
 constexpr char kSarifVersion[] = "2.1.0";
-
-bool IsPlain(char byte) {
-  const bool isLetter = (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z');
-  return isLetter || (byte >= '0' && byte <= '9') ||
-         std::string_view("-._~/").find(byte) != std::string_view::npos;
-}
-
-std::string ToUri(const std::string& path) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
-  std::string uri = path.starts_with('/') ? "file://" : "";
-  for (const char letter : path) {
-    if (IsPlain(letter)) {
-      uri += letter;
-      continue;
-    }
-    const auto byte = static_cast<unsigned char>(letter);
-    uri += '%';
-    uri += kDigits[byte >> 4];
-    uri += kDigits[byte & 0xf];
-  }
-  return uri;
-}
 
 Json OneOf(Json element) {
   Json list = Json::Array();
@@ -64,9 +42,9 @@ Json Location(const Diagnostic& diagnostic) {
 
 Json Result(const Diagnostic& diagnostic) {
   const auto codes = AllCodes();
-  const std::string text = diagnostic.hint.empty()
+  const std::string text = diagnostic.hint.text.empty()
                                ? diagnostic.message
-                               : diagnostic.message + " (" + diagnostic.hint + ")";
+                               : diagnostic.message + " (" + diagnostic.hint.text + ")";
   return {{"ruleId", diagnostic.code->name},
           {"ruleIndex", std::find(codes.begin(), codes.end(), diagnostic.code) - codes.begin()},
           {"level", SeverityName(diagnostic.code->severity)},

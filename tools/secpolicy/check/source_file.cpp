@@ -46,7 +46,7 @@ SourceFile::SourceFile(const std::string& filePath, const std::string& contentPa
   texts = ReadLines(contentPath);
 }
 
-Diagnostic SourceFile::About(const Code& code, std::string message, std::string hint) const {
+Diagnostic SourceFile::About(const Code& code, std::string message, Hint hint) const {
   Diagnostic diagnostic;
   diagnostic.code = &code;
   diagnostic.file = path;
@@ -56,7 +56,7 @@ Diagnostic SourceFile::About(const Code& code, std::string message, std::string 
 }
 
 Diagnostic SourceFile::AtBytes(const Code& code, unsigned int number, std::size_t offset,
-                               std::size_t size, std::string message, std::string hint) const {
+                               std::size_t size, std::string message, Hint hint) const {
   const std::string_view text = Text(number);
   Diagnostic diagnostic = About(code, std::move(message), std::move(hint));
   diagnostic.line = number;
@@ -67,7 +67,7 @@ Diagnostic SourceFile::AtBytes(const Code& code, unsigned int number, std::size_
 }
 
 Diagnostic SourceFile::AtWords(const Code& code, unsigned int number, std::size_t first,
-                               std::size_t last, std::string message, std::string hint) const {
+                               std::size_t last, std::string message, Hint hint) const {
   const std::string_view text = Text(number);
   const Words& words = lines.at(number);
   std::size_t begin = 0;

@@ -36,19 +36,19 @@ class SourceFile {
   }
 
   // A problem of the whole file.
-  Diagnostic About(const Code& code, std::string message, std::string hint = {}) const;
+  Diagnostic About(const Code& code, std::string message, Hint hint = {}) const;
 
   // A problem of the words `first` to `last` of the line `number`, counted from 0.
   Diagnostic AtWords(const Code& code, unsigned int number, std::size_t first, std::size_t last,
-                     std::string message, std::string hint = {}) const;
+                     std::string message, Hint hint = {}) const;
   Diagnostic AtWord(const Code& code, unsigned int number, std::size_t word, std::string message,
-                    std::string hint = {}) const {
+                    Hint hint = {}) const {
     return AtWords(code, number, word, word, std::move(message), std::move(hint));
   }
 
   // A problem of `size` bytes of the line `number` from the byte `offset` on.
   Diagnostic AtBytes(const Code& code, unsigned int number, std::size_t offset, std::size_t size,
-                     std::string message, std::string hint = {}) const;
+                     std::string message, Hint hint = {}) const;
 
   // Adds what the library reads otherwise than it looks.
   void CheckBytes(DiagnosticList& diagnostics) const;

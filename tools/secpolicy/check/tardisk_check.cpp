@@ -29,7 +29,7 @@ void CheckLines(CheckRun& run, const SourceFile& file, const std::string& tardis
       const SecPolicy::Problem& problem = failure.problem;
       const bool isNoRule = problem.fault == SecPolicy::Fault::kRuleType;
       AddRefusal(run, file, problem,
-                 isNoRule ? "write: -E LABEL DOMAIN"
+                 isNoRule ? Hint("write: -E LABEL DOMAIN")
                           : HintForRule(run, CodeOf(*problem.fault), words, problem.word));
       continue;
     }

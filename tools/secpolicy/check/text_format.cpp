@@ -59,7 +59,8 @@ void WriteText(const DiagnosticList& diagnostics, std::ostream& output) {
     output << ' ' << Paint(diagnostic.code->severity) << ": " << Visible(diagnostic.message) << " ["
            << diagnostic.code->name << "]\n";
     if (diagnostic.line > 0) WriteExcerpt(diagnostic, output);
-    if (!diagnostic.hint.empty()) output << "    hint: " << Visible(diagnostic.hint) << '\n';
+    const std::string& hint = diagnostic.hint.text;
+    if (!hint.empty()) output << "    hint: " << Visible(hint) << '\n';
   }
   WriteTally(diagnostics, output);
 }

@@ -1,0 +1,59 @@
+#include "uri.h"
+
+#include <charconv>
+
+namespace SecPolicyCli {
+namespace {
+
+constexpr std::string_view kFileScheme = "file://";
+
+bool IsPlain(char byte) {
+  const bool isLetter = (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z');
+  return isLetter || (byte >= '0' && byte <= '9') ||
+         std::string_view("-._~/").find(byte) != std::string_view::npos;
+}
+
+// The byte that "%xx" at the beginning of the text stands for; nothing when there is none.
+std::optional<char> DecodeByte(std::string_view text) {
+  constexpr std::size_t kSize = 3;
+  if (text.size() < kSize || text.front() != '%') return std::nullopt;
+  unsigned int byte = 0;
+  const auto read = std::from_chars(text.data() + 1, text.data() + kSize, byte, 16);
+  if (read.ec != std::errc() || read.ptr != text.data() + kSize) return std::nullopt;
+  return static_cast<char>(byte);
+}
+
+}  // namespace
+
+std::string ToUri(std::string_view path) {
+  constexpr char kDigits[] = "0123456789ABCDEF";
+  std::string uri(path.starts_with('/') ? kFileScheme : "");
+  for (const char letter : path) {
+    if (IsPlain(letter)) {
+      uri += letter;
+      continue;
+    }
+    const auto byte = static_cast<unsigned char>(letter);
+    uri += '%';
+    uri += kDigits[byte >> 4];
+    uri += kDigits[byte & 0xf];
+  }
+  return uri;
+}
+
+std::optional<std::string> PathOfUri(std::string_view uri) {
+  if (!uri.starts_with(kFileScheme)) return std::nullopt;
+  uri.remove_prefix(kFileScheme.size());
+  constexpr std::string_view kThisHost = "localhost";
+  if (uri.starts_with(kThisHost)) uri.remove_prefix(kThisHost.size());
+  if (!uri.starts_with('/')) return std::nullopt;
+  std::string path;
+  while (!uri.empty()) {
+    const auto byte = DecodeByte(uri);
+    path += byte.value_or(uri.front());
+    uri.remove_prefix(byte ? 3 : 1);
+  }
+  return path;
+}
+
+}  // namespace SecPolicyCli
