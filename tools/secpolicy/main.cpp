@@ -26,7 +26,7 @@ namespace SecPolicyCli {
 namespace {
 
 const VerbGroup kVerbs[] = {
-    {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords}},
+    {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords, &kLsp}},
     {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
     {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff, &kDrift}},
     {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
@@ -76,6 +76,7 @@ constexpr char kFooter[] =
     "  secpolicy run appDom -- /bin/sh              # in this domain\n"
     "  secpolicy exec -- /usr/sbin/sshd             # in that of its label\n"
     "  secpolicy observe -- /usr/bin/webd           # which rules would it need?\n"
+    "  secpolicy lsp                                # for an editor, as one types\n"
     "\n"
     "'secpolicy help VERB' explains one verb. The files are described in secpolicy(5).\n"
     "\n"

@@ -1,5 +1,7 @@
 #include "policy_dir.h"
 
+#include <filesystem>
+
 #include "check/diagnostic.h"
 #include "ending.h"
 #include "kitlibs/file.h"

@@ -39,6 +39,7 @@ extern const Verb kNew;
 extern const Verb kExplain;
 extern const Verb kBoot;
 extern const Verb kCheck;
+extern const Verb kLsp;
 extern const Verb kLoad;
 extern const Verb kLoadEarly;
 extern const Verb kRestore;
