@@ -26,9 +26,8 @@ class RequestFailed(Exception):
 class Client:
     """Speaks with a server that it starts; what the server tells by itself is kept until asked for."""
 
-    def __init__(self, root, *options):
-        command = [os.environ["SECPOLICY"], "--root", str(root), "lsp", *options]
-        self.root = root
+    def __init__(self, root, *options, command=None):
+        command = [str(command or os.environ["SECPOLICY"]), "--root", str(root), "lsp", *options]
         self.process = subprocess.Popen(command, stdin=subprocess.PIPE, stdout=subprocess.PIPE)
         self.number = 0
         self.version = 0

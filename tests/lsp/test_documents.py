@@ -75,6 +75,20 @@ def test_looks_again_when_a_file_is_saved(client, web, root):
     assert client.problems_of(web) == []
 
 
+def test_asks_to_be_told_of_files_that_others_change(root, web, policy):
+    with Client(root, "--fresh") as client:
+        client.start(workspace={"didChangeWatchedFiles": {"dynamicRegistration": True}})
+        request = client.receive()
+        assert request["method"] == "client/registerCapability"
+        assert request["params"]["registrations"][0]["method"] == "workspace/didChangeWatchedFiles"
+        client.send(id=request["id"], result=None)
+        client.open(web)
+        assert [each["code"] for each in client.problems_of(web)] == ["unknown-word"]
+        (policy / "objects/more").write_text("webContnet\n")
+        client.notify("workspace/didChangeWatchedFiles", changes=[])
+        assert client.problems_of(web) == []
+
+
 def test_knows_the_root_by_a_link(tmp_path, root, web):
     (tmp_path / "link").symlink_to(root)
     with Client(tmp_path / "link", "--fresh") as client:

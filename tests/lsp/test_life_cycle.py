@@ -1,12 +1,14 @@
 """Hunts a server that ends badly, never, or for a message that is none."""
 
+import copy
 import os
+import random
 import signal
 import subprocess
 import time
 
 import pytest
-from client import Client, RequestFailed
+from client import Client, RequestFailed, span
 
 
 @pytest.fixture
@@ -124,3 +126,49 @@ def test_tells_of_many_edits_only_the_last(client, web):
     started = time.monotonic()
     assert [each["message"].split("\n")[0] for each in client.problems_of(web)][-1] == "unknown system call 'rea49'"
     assert time.monotonic() - started < 20
+
+
+def places(value, path=()):
+    """Every place in a document, as the names and numbers that lead to it."""
+    if path:
+        yield path
+    items = value.items() if isinstance(value, dict) else enumerate(value) if isinstance(value, list) else []
+    for key, inner in items:
+        yield from places(inner, (*path, key))
+
+
+def test_survives_messages_by_chance(client, web):
+    """Messages that are good but for one place, where something else stands or nothing."""
+    chance = random.Random(5)
+    document = {"textDocument": {"uri": web.as_uri(), "version": 3}}
+    here = {**document, "position": {"line": 2, "character": 5}}
+    change = {"range": span(1, 2, 3), "text": "-a \r\n\U0001f600"}
+    messages = [
+        ("textDocument/didOpen", {"textDocument": {"uri": web.as_uri(), "version": 1, "text": web.read_text()}}),
+        ("textDocument/didChange", {**document, "contentChanges": [change, {"text": web.read_text()}, change]}),
+        ("textDocument/didSave", document), ("textDocument/didClose", document), ("initialize", {"capabilities": {}}),
+        ("textDocument/completion", here), ("textDocument/hover", here), ("textDocument/definition", here),
+        ("textDocument/references", {**here, "context": {"includeDeclaration": True}}),
+        ("textDocument/rename", {**here, "newName": "new"}), ("textDocument/prepareRename", here),
+        ("textDocument/codeAction", {**document, "range": span(0, 0, 9, 9), "context": {}}),
+        ("textDocument/formatting", {**document, "options": {}}), ("textDocument/documentSymbol", document),
+        ("textDocument/rangeFormatting", {**document, "range": span(0, 0, 9, 9), "options": {}})]
+    odd = [None, True, -1, 2**40, 2**70, 1.5, "", "file:///", "file:///%00/%ff", "\0", [], {}, [[]], "a" * 3000]
+    for number in range(400):
+        method, params = chance.choice(messages)
+        message = {"jsonrpc": "2.0", "id": number, "method": method, "params": copy.deepcopy(params)}
+        if method.startswith("textDocument/did"):
+            del message["id"]
+        *path, last = chance.choice(list(places(message)))
+        holder = message
+        for key in path:
+            holder = holder[key]
+        if chance.random() < 0.2:
+            del holder[last]
+        else:
+            holder[last] = chance.choice(odd)
+        client.send(**message)
+    client.sync()
+    client.close(web)
+    client.open(web)
+    assert [each["code"] for each in client.problems_of(web)] == ["unknown-word"]

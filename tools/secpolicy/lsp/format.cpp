@@ -1,12 +1,10 @@
 #include "format.h"
 
 #include <algorithm>
+#include <span>
 #include <string_view>
 #include <utility>
 
-#include "cursor.h"
-#include "features.h"
-#include "protocol.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
@@ -70,39 +68,46 @@ class Columns {
     return end;
   }
 
-  void Align(std::size_t begin, std::size_t end) {
-    std::vector<std::size_t> widths;
-    for (std::size_t index = begin; index < end; ++index) {
-      const auto& words = rows[index].words;
-      widths.resize(std::max(widths.size(), words.size()));
-      for (std::size_t i = 0; i < words.size(); ++i) {
-        widths[i] = std::max(widths[i], CountCharacters(words[i]));
-      }
-    }
+  // Where the words of a group stand.
+  struct Layout {
+    std::vector<std::size_t> widths;  // of the columns
     std::size_t verdictColumn = 0;
-    for (std::size_t index = begin; index < end; ++index) {
-      if (rows[index].verdict.empty()) continue;
-      const std::size_t width = CountCharacters(Join(rows[index].words, widths));
-      verdictColumn = std::max(verdictColumn, width + 1);
-    }
     std::size_t commentColumn = 0;
-    for (std::size_t index = begin; index < end; ++index) {
-      const std::string rule = JoinRule(rows[index], widths, verdictColumn);
-      commentColumn = std::max(commentColumn, CountCharacters(rule) + kCommentGap);
-    }
-    for (std::size_t index = begin; index < end; ++index) {
-      const Row& row = rows[index];
-      if (row.words.empty()) continue;
-      const std::string line =
-          Append(JoinRule(row, widths, verdictColumn), commentColumn, row.comment);
-      const std::string narrow = Append(JoinRule(row, {}, 0), 0, row.comment);
-      // What would be too long to be read is set apart by single spaces, as far as that helps.
-      if (line.size() <= kLongestLine) {
-        lines[index] = line;
-      } else if (narrow.size() <= kLongestLine) {
-        lines[index] = narrow;
+  };
+
+  static Layout LayOut(std::span<const Row> group) {
+    Layout layout;
+    for (const Row& row : group) {
+      layout.widths.resize(std::max(layout.widths.size(), row.words.size()));
+      for (std::size_t i = 0; i < row.words.size(); ++i) {
+        layout.widths[i] = std::max(layout.widths[i], CountCharacters(row.words[i]));
       }
     }
+    for (const Row& row : group) {
+      if (row.verdict.empty()) continue;
+      const std::size_t width = CountCharacters(Join(row.words, layout.widths));
+      layout.verdictColumn = std::max(layout.verdictColumn, width + 1);
+    }
+    for (const Row& row : group) {
+      const std::size_t width = CountCharacters(JoinRule(row, layout));
+      layout.commentColumn = std::max(layout.commentColumn, width + kCommentGap);
+    }
+    return layout;
+  }
+
+  void Align(std::size_t begin, std::size_t end) {
+    const Layout layout = LayOut(std::span(rows).subspan(begin, end - begin));
+    for (std::size_t index = begin; index < end; ++index) {
+      if (rows[index].words.empty()) continue;
+      std::string line = Write(rows[index], layout);
+      // What would be too long to be read is set apart by single spaces, as far as that helps.
+      if (line.size() > kLongestLine) line = Write(rows[index], {});
+      if (line.size() <= kLongestLine) lines[index] = std::move(line);
+    }
+  }
+
+  static std::string Write(const Row& row, const Layout& layout) {
+    return Append(JoinRule(row, layout), layout.commentColumn, row.comment);
   }
 
   static std::string Join(const std::vector<std::string>& words,
@@ -117,9 +122,8 @@ class Columns {
     return line;
   }
 
-  static std::string JoinRule(const Row& row, const std::vector<std::size_t>& widths,
-                              std::size_t verdictColumn) {
-    return Append(Join(row.words, widths), verdictColumn, row.verdict);
+  static std::string JoinRule(const Row& row, const Layout& layout) {
+    return Append(Join(row.words, layout.widths), layout.verdictColumn, row.verdict);
   }
 
   // With `addition`, if any, at the column or, behind a longer line, one space away.
@@ -136,44 +140,10 @@ class Columns {
   std::vector<Row> rows;
 };
 
-bool Touches(Range wanted, Range line) {
-  return wanted.start.line <= line.end.line && line.start.line <= wanted.end.line;
-}
-
 }  // namespace
 
 std::vector<std::string> FormatLines(FileRole role, const TextDocument& text) {
   return Columns(role, text).Format();
-}
-
-Json FormatDocument(Workspace& workspace, const Json& params) {
-  const std::string path = PathOfDocument(params);
-  const auto role = workspace.RoleOf(path);
-  if (!role) return {};
-  const Json& wanted = params.At("range");
-  const TextDocument text = workspace.TextOf(path);
-  const std::vector<std::string> lines = FormatLines(*role, text);
-  Json edits = Json::Array();
-  for (std::size_t number = 1; number <= lines.size(); ++number) {
-    Span span = text.LineSpan(number);
-    std::string_view line = lines[number - 1];
-    std::string_view before = text.Line(number);
-    // To an editor, a carriage return there is no part of the line.
-    if (line.ends_with('\r') && before.ends_with('\r')) {
-      line.remove_suffix(1);
-      before.remove_suffix(1);
-      --span.end;
-    }
-    const Range range = text.RangeOf(span);
-    const bool isWanted = wanted.IsNull() || Touches(ReadRange(wanted), range);
-    if (isWanted && line != before) edits.Append(TextEdit(range, std::string(line)));
-  }
-  const bool lacksEnd = !text.Text().empty() && !text.Text().ends_with('\n');
-  if (wanted.IsNull() && lacksEnd) {
-    const std::size_t end = text.Text().size();
-    edits.Append(TextEdit(text.RangeOf({end, end}), "\n"));
-  }
-  return edits;
 }
 
 }  // namespace SecPolicyCli

@@ -92,29 +92,30 @@ void LivePolicy::Check() {
 
 std::set<std::string> LivePolicy::TakeChanged() { return std::exchange(changed, {}); }
 
-void LivePolicy::CheckAll() {
-  // What there was may be gone.
-  const auto noteAll = [this](const DiagnosticList& list) {
+// What there was may be gone.
+void LivePolicy::Clear() {
+  const auto clear = [this](DiagnosticList& list) {
     NoteChanges(list, DiagnosticList(unwanted));
+    list = DiagnosticList(unwanted);
   };
-  for (const Findings* findings : {&objects, &names, &tardisks, &fileLabels}) {
-    noteAll(findings->diagnostics);
-  }
-  for (const DomainFile& file : domainFiles) {
-    noteAll(file.bytes.diagnostics);
-    noteAll(file.lines.diagnostics);
-  }
-  noteAll(uses);
   for (Findings* findings : {&objects, &names, &tardisks, &fileLabels}) {
+    clear(findings->diagnostics);
     *findings = Findings(unwanted);
   }
+  for (DomainFile& file : domainFiles) {
+    clear(file.bytes.diagnostics);
+    clear(file.lines.diagnostics);
+  }
+  clear(uses);
   domainFiles.clear();
   labelUses.clear();
-  uses = DiagnosticList(unwanted);
-  changed.insert(edited.begin(), edited.end());
-
   load.reset();
   run.reset();
+}
+
+void LivePolicy::CheckAll() {
+  Clear();
+  changed.insert(edited.begin(), edited.end());
   run = std::make_unique<CheckRun>(fresh, unwanted);
   load = std::make_unique<LinuxHost::PolicyTransaction>(LinuxHost::CurrentState());
   BeginLoadOf(*load, dir);
@@ -168,33 +169,35 @@ void LivePolicy::NoteChanges(const DiagnosticList& before, const DiagnosticList&
   }
 }
 
-// As CheckDomains, but each file for itself.
 void LivePolicy::CheckDomainsDirs() {
   domainsDirs = DomainsDirsOf(dir);
-  for (std::size_t number = 0; number < domainsDirs.size(); ++number) {
-    const DomainsDir& domains = domainsDirs[number];
-    std::map<std::string, std::string> listed;
-    Collect(names, [&] {
-      listed = ListPolicyFiles(*run, domains.path);
-      CheckEntries(*run, domains.path, domains.expected, Codes::kSkippedEntry);
-    });
-    const std::size_t first = domainFiles.size();
-    std::vector<NamedFile> opened;
-    for (const auto& [path, name] : listed) {
-      DomainFile& file = domainFiles.emplace_back(path, name, number, unwanted);
-      if (Open(file)) opened.push_back({file.domain.file, name});
-    }
-    std::vector<NamedDomain> defined;
-    Collect(names, [&] { defined = DefineDomains(*run, opened, domains.prefix); });
-    auto next = defined.begin();
-    for (std::size_t index = first; index < domainFiles.size(); ++index) {
-      DomainFile& file = domainFiles[index];
-      if (next == defined.end() || next->file != file.domain.file) continue;
-      file.domain = *next++;
-      CheckLines(file);
-    }
-  }
+  for (std::size_t number = 0; number < domainsDirs.size(); ++number) CheckDomainsDir(number);
   NoteChanges(DiagnosticList(unwanted), names.diagnostics);
+}
+
+// As CheckDomains, but each file for itself.
+void LivePolicy::CheckDomainsDir(std::size_t number) {
+  const DomainsDir& domains = domainsDirs[number];
+  std::map<std::string, std::string> listed;
+  Collect(names, [&] {
+    listed = ListPolicyFiles(*run, domains.path);
+    CheckEntries(*run, domains.path, domains.expected, Codes::kSkippedEntry);
+  });
+  const std::size_t first = domainFiles.size();
+  std::vector<NamedFile> opened;
+  for (const auto& [path, name] : listed) {
+    DomainFile& file = domainFiles.emplace_back(path, name, number, unwanted);
+    if (Open(file)) opened.push_back({file.domain.file, name});
+  }
+  std::vector<NamedDomain> defined;
+  Collect(names, [&] { defined = DefineDomains(*run, opened, domains.prefix); });
+  auto next = defined.begin();
+  for (std::size_t index = first; index < domainFiles.size(); ++index) {
+    DomainFile& file = domainFiles[index];
+    if (next == defined.end() || next->file != file.domain.file) continue;
+    file.domain = *next++;
+    CheckLines(file);
+  }
 }
 
 void LivePolicy::CheckTardiskFiles() {
@@ -227,14 +230,10 @@ bool LivePolicy::IsIn(const std::string& path, const char* name) const {
   return std::filesystem::path(path).parent_path() == std::filesystem::path(dir) / name;
 }
 
-// Leaves the tables incomplete where more than the files themselves has to be read again.
-void LivePolicy::CheckEdited() {
-  isComplete = false;
-  run->vocabularies.clear();
-  bool isLabelFile = false;
-  bool isTardiskFile = false;
-  bool isObjectFile = false;
-  std::set<DomainFile*> stale;
+// Makes the texts of edited files known, and finds what is to be checked of them. Nothing when that
+// is more than the files that are known.
+std::optional<LivePolicy::Stale> LivePolicy::TakeEdited() {
+  Stale stale;
   for (const std::string& path : edited) {
     changed.insert(path);
     const auto content = contents.find(path);
@@ -244,33 +243,43 @@ void LivePolicy::CheckEdited() {
       std::istringstream input(content->second);
       TakeContent(*run, path, input);
     }
-    const auto file = std::ranges::find(domainFiles, path, &DomainFile::path);
     const auto parent = std::filesystem::path(path).parent_path().string();
-    if (file != domainFiles.end()) {
-      stale.insert(&*file);
+    const auto file = std::ranges::find(domainFiles, path, &DomainFile::path);
+    if (file != domainFiles.end() && file->domain.file != nullptr) {
+      stale.domains.insert(&*file);
     } else if (std::ranges::find(domainsDirs, parent, &DomainsDir::path) != domainsDirs.end()) {
-      return;
+      return std::nullopt;
     }
-    isObjectFile = isObjectFile || IsIn(path, SecPolicy::kObjectsDir);
-    isTardiskFile = isTardiskFile || IsIn(path, SecPolicy::kTardisksDir);
-    isLabelFile = isLabelFile || IsIn(path, SecPolicy::kFileLabelsDir);
+    stale.objects = stale.objects || IsIn(path, SecPolicy::kObjectsDir);
+    stale.tardisks = stale.tardisks || IsIn(path, SecPolicy::kTardisksDir);
+    stale.fileLabels = stale.fileLabels || IsIn(path, SecPolicy::kFileLabelsDir);
   }
-  if (isObjectFile) {
-    const std::set<std::string> otherNames = CheckEditedObjects();
-    for (DomainFile& file : domainFiles) {
-      if (DependsOn(file.lines, otherNames)) stale.insert(&file);
-    }
-    isLabelFile = isLabelFile || DependsOn(fileLabels, otherNames);
-    isTardiskFile = isTardiskFile || DependsOn(tardisks, otherNames);
+  return stale;
+}
+
+// What was not edited itself, but names what now is declared or no longer is.
+void LivePolicy::AddDependent(const std::set<std::string>& labels, Stale& stale) {
+  for (DomainFile& file : domainFiles) {
+    if (DependsOn(file.lines, labels)) stale.domains.insert(&file);
   }
-  for (DomainFile* const file : stale) {
-    if (file->domain.file == nullptr) return;
+  stale.fileLabels = stale.fileLabels || DependsOn(fileLabels, labels);
+  stale.tardisks = stale.tardisks || DependsOn(tardisks, labels);
+}
+
+// Leaves the tables incomplete where all files have to be read again.
+void LivePolicy::CheckEdited() {
+  isComplete = false;
+  run->vocabularies.clear();
+  auto stale = TakeEdited();
+  if (!stale) return;
+  if (stale->objects) AddDependent(CheckEditedObjects(), *stale);
+  for (DomainFile* const file : stale->domains) {
     if (edited.contains(file->path) && !Open(*file)) return;
     CheckLines(*file);
     if (DependsOnLaterDomains(*file)) return;
   }
-  if (isTardiskFile) CheckTardiskFiles();
-  if (isLabelFile) CheckLabelFiles();
+  if (stale->tardisks) CheckTardiskFiles();
+  if (stale->fileLabels) CheckLabelFiles();
   CheckUses();
   isComplete = true;
 }

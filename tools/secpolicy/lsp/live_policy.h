@@ -4,18 +4,17 @@
 #include <deque>
 #include <map>
 #include <memory>
+#include <optional>
 #include <set>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "check/check_run.h"
+#include "file_role.h"
 #include "host/linux/operation/policy_load.h"
 
 namespace SecPolicyCli {
-
-// What the lines of a policy file are.
-enum class FileRole { kObjectFile, kDomainFile, kTardiskFile, kLabelFile };
 
 // A file of a policy as it was read.
 struct PolicyFile {
@@ -80,8 +79,20 @@ class LivePolicy {
     Findings lines;
   };
 
+  // What of the policy is to be checked again.
+  struct Stale {
+    bool objects = false;
+    bool tardisks = false;
+    bool fileLabels = false;
+    std::set<DomainFile*> domains = {};
+  };
+
+  void Clear();
   void CheckAll();
   void CheckDomainsDirs();
+  void CheckDomainsDir(std::size_t number);
+  std::optional<Stale> TakeEdited();
+  void AddDependent(const std::set<std::string>& labels, Stale& stale);
   void CheckEdited();
   std::set<std::string> CheckEditedObjects();
   bool Open(DomainFile& file);

@@ -90,7 +90,7 @@ std::string RenamedFile(const std::string& path, const std::string& name) {
   if (isPartner && (!name.starts_with(kPrefix) || name == kPrefix)) {
     RefuseRename("the name of a partner domain begins with '" + std::string(kPrefix) + "'");
   }
-  const std::string renamed = dir / (isPartner ? name.substr(kPrefix.size()) : name);
+  std::string renamed = dir / (isPartner ? name.substr(kPrefix.size()) : name);
   std::error_code ignored;
   if (std::filesystem::exists(std::filesystem::symlink_status(renamed, ignored))) {
     RefuseRename("there is a file " + renamed + " already");

@@ -41,12 +41,31 @@ Json Capabilities() {
       {"renameProvider", {{"prepareProvider", true}}}};
 }
 
-EditorAbilities AbilitiesOf(const Json& workspaceEdit) {
+// Asks the editor to tell what others do to the files.
+Json WatchFiles() {
+  Json watchers = Json::Array();
+  watchers.Append({{"globPattern", "**/{objects,domains,fileLabels,tardisks}/**"}});
+  Json registrations = Json::Array();
+  registrations.Append({{"id", "files"},
+                        {"method", "workspace/didChangeWatchedFiles"},
+                        {"registerOptions", {{"watchers", watchers}}}});
+  return {{"jsonrpc", "2.0"},
+          {"id", "watch"},
+          {"method", "client/registerCapability"},
+          {"params", {{"registrations", registrations}}}};
+}
+
+EditorAbilities AbilitiesOf(const Json& capabilities) {
   EditorAbilities abilities;
-  abilities.takesVersions = workspaceEdit.At("documentChanges").Truth().value_or(false);
+  const Json& watches = capabilities.At("didChangeWatchedFiles");
+  abilities.watchesFiles = watches.At("dynamicRegistration").Truth().value_or(false);
+  const Json& workspaceEdit = capabilities.At("workspaceEdit");
   const auto operations = workspaceEdit.At("resourceOperations").Elements();
-  abilities.renamesFiles =
-      abilities.takesVersions && std::ranges::find(operations, Json("rename")) != operations.end();
+  abilities.renamesFiles = std::ranges::find(operations, Json("rename")) != operations.end();
+  // What renames files takes them in the form of edits that has versions, also where it tells of
+  // no other use of it.
+  abilities.takesVersions =
+      abilities.renamesFiles || workspaceEdit.At("documentChanges").Truth().value_or(false);
   return abilities;
 }
 
@@ -65,7 +84,7 @@ void Server::Handle(const Json& message) {
   const Json& id = message.At("id");
   const std::string* const method = message.At("method").String();
   if (method == nullptr) {
-    // Answers have none, and this server asks nothing.
+    // Answers have none, and nothing is made of them.
     const bool isAnswer = message.At("method").IsNull() && !id.IsNull();
     if (!isAnswer) SendError(id, ErrorCode::kInvalidRequest, "the message has no method");
     return;
@@ -108,7 +127,7 @@ Json Server::Initialize(const Json& params) {
     throw RequestError(ErrorCode::kInvalidRequest, "the server is initialized already");
   }
   phase = Phase::kReady;
-  workspace.editor = AbilitiesOf(params.At("capabilities").At("workspace").At("workspaceEdit"));
+  workspace.editor = AbilitiesOf(params.At("capabilities").At("workspace"));
   return {{"capabilities", Capabilities()},
           {"serverInfo", {{"name", "secpolicy"}, {"version", SECPOLICY_VERSION}}}};
 }
@@ -119,6 +138,8 @@ void Server::Note(const std::string& method, const Json& params) {
     ending = phase == Phase::kShutDown ? kWell : kFailed;
   } else if (phase != Phase::kReady) {
     return;
+  } else if (method == "initialized") {
+    if (workspace.editor.watchesFiles) send(WatchFiles());
   } else if (method == "textDocument/didOpen") {
     OpenDocument(params);
   } else if (method == "textDocument/didChange") {

@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "live_policy.h"
+#include "file_role.h"
 #include "policy/rule_kind.h"
 #include "text_document.h"
 

@@ -20,10 +20,11 @@ struct OpenDocument {
   TextDocument text;
 };
 
-// What the editor can do with edits.
+// What the editor can do.
 struct EditorAbilities {
   bool takesVersions = false;
   bool renamesFiles = false;
+  bool watchesFiles = false;
 };
 
 // The files that are open, and the policy that they belong to. Paths are below the root that was
