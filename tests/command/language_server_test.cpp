@@ -149,6 +149,8 @@ class Formatting : public testing::Test {
     ASSERT_EQ(Read(formatted + "\n"), Read(text)) << text;
   }
 
+  std::mt19937 chance;
+
  private:
   SecPolicyTest::TemporaryDirectory directory;
   const std::string file = directory / "file";
@@ -199,7 +201,6 @@ TEST_F(Formatting, ChangesNothingThatIsRead) {
                                            std::string(1, '\0'),
                                            std::string(340, 'x'),
                                            std::string(340, ' ')};
-  std::mt19937 chance;
   for (int round = 0; round < 1500; ++round) {
     std::string text;
     for (auto count = chance() % 40; count > 0; --count) text += pieces[chance() % pieces.size()];

@@ -107,6 +107,10 @@ def test_explains_words_and_who_else_has_them(client, web, policy):
     assert "`openat`" in client.at("hover", web, 7, 5)["contents"]["value"]
     assert "`accept4`: a system call of `@network`" in client.at("hover", web, 8, 5)["contents"]["value"]
     assert client.at("hover", web, 0, 5) is None
+    client.change(web, "-a unlabeled read grant\n-a nothing read grant\n-d webProgram noDom exec grant\n")
+    assert "`unlabeled`: a label that is built in\n" in client.at("hover", web, 0, 5)["contents"]["value"]
+    assert "`nothing`: a label that no file declares\n" in client.at("hover", web, 1, 5)["contents"]["value"]
+    assert "`noDom`: a domain that no file defines\n" in client.at("hover", web, 2, 16)["contents"]["value"]
     labels_file = policy / "fileLabels/base"
     client.open(labels_file)
     assert client.at("hover", labels_file, 0, 1)["contents"]["value"].startswith(

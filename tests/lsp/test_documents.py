@@ -3,7 +3,8 @@
 import os
 import subprocess
 
-from client import Client, span
+import pytest
+from client import Client, RequestFailed, span
 
 
 def messages(problems):
@@ -106,6 +107,25 @@ def test_tells_of_a_file_outside_the_root(client, tmp_path):
     client.open(tmp_path / "file", "-x")
     client.sync()
     assert client.shown == [f"secpolicy: {(tmp_path / 'file').as_uri()} is not below the root that this server is for"]
+
+
+def test_tells_once_why_nothing_can_be_checked(root, web):
+    state = root / "run/secpolicy/host.db"
+    state.parent.mkdir(parents=True)
+    state.write_text("no database")
+    with Client(root) as client:
+        client.start()
+        client.open(web)
+        client.sync()
+        client.change(web, "-x")
+        assert client.problems_of(web) == []
+        assert len(client.shown) == 1, client.shown
+        with pytest.raises(RequestFailed) as failure:
+            client.at("hover", web, 0, 0)
+        assert failure.value.code == -32603
+        state.unlink()
+        assert [each["code"] for each in client.problems_of(web)] == ["cannot-start", "rule-type"]
+        assert client.stop() == 0
 
 
 def test_leaves_files_of_no_policy_alone(client, root, policy):

@@ -35,25 +35,27 @@ std::string CommentOf(const Mention& mention) {
   return begin == std::string_view::npos ? "" : Visible(line.substr(begin));
 }
 
-std::string DescribeLabel(LivePolicy& policy, const std::vector<Mention>& mentions) {
+std::string DescribeLabel(LivePolicy& policy, const std::string& name,
+                          const std::vector<Mention>& mentions) {
   const auto declaration = std::ranges::find_if(mentions, &Mention::Declares);
-  if (declaration == mentions.end()) return "a label that no file declares";
-  const std::string comment = CommentOf(*declaration);
-  return "an object of `" + PlaceOf(policy, *declaration) + "`" +
-         (comment.empty() ? "" : ": " + comment);
+  if (declaration != mentions.end()) {
+    const std::string comment = CommentOf(*declaration);
+    return "an object of `" + PlaceOf(policy, *declaration) + "`" +
+           (comment.empty() ? "" : ": " + comment);
+  }
+  const bool isBuiltIn =
+      policy.Tables().access.IsPredefinedLabel(name, TeskCtl::Security::TESKACCESS_LABEL_OBJECT);
+  return isBuiltIn ? "a label that is built in" : "a label that no file declares";
 }
 
 std::string DescribeDomain(const LivePolicy& policy, const std::string& name) {
-  std::string text = "a domain that no file defines";
-  const char* separator = "a domain, defined by ";
+  std::string files;
   for (const PolicyFile& file : policy.Files()) {
     if (file.role != FileRole::kDomainFile || file.domain != name) continue;
-    if (separator[0] == 'a') text.clear();
-    text += separator + ("`" + ShortPath(policy, file.source->Path()) + "` (" +
-                         CountOf(file.source->Lines().size(), "rule") + ")");
-    separator = ", ";
+    files += (files.empty() ? "`" : ", `") + ShortPath(policy, file.source->Path()) + "` (" +
+             CountOf(file.source->Lines().size(), "rule") + ")";
   }
-  return text;
+  return files.empty() ? "a domain that no file defines" : "a domain, defined by " + files;
 }
 
 std::string ListOf(std::span<const std::string_view> words) {
@@ -76,13 +78,13 @@ std::string DescribeCall(const std::string& name) {
 
 std::string Describe(LivePolicy& policy, const Symbol& symbol,
                      const std::vector<Mention>& mentions) {
-  if (symbol.kind == WordKind::kLabel) return DescribeLabel(policy, mentions);
+  if (symbol.kind == WordKind::kLabel) return DescribeLabel(policy, symbol.name, mentions);
   if (symbol.kind == WordKind::kDomain) return DescribeDomain(policy, symbol.name);
   if (symbol.kind == WordKind::kSyscall) return DescribeCall(symbol.name);
   return std::string("a ") + Policy::FormOf(symbol.kind).plainNoun;
 }
 
-// Other lines that speak of it, but not line `own` of the file at the cursor.
+// Other lines that speak of it than the one of the cursor.
 std::string ListOthers(const LivePolicy& policy, const std::vector<Mention>& mentions,
                        const Cursor& cursor) {
   std::string list;

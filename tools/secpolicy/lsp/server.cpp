@@ -188,8 +188,12 @@ void Server::Update() {
     publisher.Update(workspace, [this](const Json& params) {
       send({{"jsonrpc", "2.0"}, {"method", "textDocument/publishDiagnostics"}, {"params", params}});
     });
+    shownFailure.clear();
   } catch (const std::exception& failure) {
-    Show(failure.what());
+    // It fails again at each edit until somebody does something about it.
+    if (shownFailure == failure.what()) return;
+    shownFailure = failure.what();
+    Show(shownFailure);
   }
 }
 

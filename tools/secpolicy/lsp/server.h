@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <optional>
+#include <string>
 #include <string_view>
 
 #include "diagnostics.h"
@@ -46,6 +47,7 @@ class Server {
   Send send;
   DiagnosticPublisher publisher;
   Phase phase = Phase::kFresh;
+  std::string shownFailure;  // of the latest check
   std::optional<ExitCode> ending;
 };
 
