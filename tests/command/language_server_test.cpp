@@ -149,8 +149,6 @@ class Formatting : public testing::Test {
     ASSERT_EQ(Read(formatted + "\n"), Read(text)) << text;
   }
 
-  std::mt19937 chance;
-
  private:
   SecPolicyTest::TemporaryDirectory directory;
   const std::string file = directory / "file";
@@ -201,7 +199,8 @@ TEST_F(Formatting, ChangesNothingThatIsRead) {
                                            std::string(1, '\0'),
                                            std::string(340, 'x'),
                                            std::string(340, ' ')};
-  for (int round = 0; round < 1500; ++round) {
+  for (unsigned int seed = 0; seed < 1500; ++seed) {
+    std::mt19937 chance(seed);
     std::string text;
     for (auto count = chance() % 40; count > 0; --count) text += pieces[chance() % pieces.size()];
     ExpectSameMeaning(kRoles[chance() % 4], text);
