@@ -22,7 +22,8 @@ std::vector<std::string> UsualPlaces() {
 }
 
 std::string MakePrivateDirectory() {
-  for (const std::string& place : UsualPlaces()) {
+  const std::vector<std::string> places = UsualPlaces();
+  for (const std::string& place : places) {
     std::string directory = place + "/secpolicy.XXXXXX";
     if (mkdtemp(directory.data()) != nullptr) return directory;
   }
