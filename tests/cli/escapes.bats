@@ -242,10 +242,15 @@ makes_only() {
   domain wideDom "${calls[@]}" '-r /t r'
   boot_root
   echo content >"$root/t/data"
-  ln -s /t/secret/file "$root/t/link"
   cp "$root/t/data" "$root/t/public/data"
-  # shellcheck disable=SC2016
-  in_background sh -c 'cd "$0/t" && while :; do cp -P link public/new; mv public/new public/data; ln -f data public/data; done' "$root"
+  in_background python3 -c '
+import os, sys
+os.chdir(sys.argv[1])
+while True:
+    os.symlink("/t/secret/file", "public/new")
+    os.rename("public/new", "public/data")
+    os.link("data", "public/new")
+    os.rename("public/new", "public/data")' "$root/t"
   local _
   for _ in {1..20}; do
     tries narrowDom read=/t/secret/file read=/t/public/data

@@ -142,11 +142,11 @@ digest() {
   boot
   secpolicy status --format prometheus --output /nowhere/host.prom
   exits 1
-  ends_with "secpolicy: cannot write /nowhere/host.prom: No such file or directory"
+  ends_with "secpolicy: status: cannot write /nowhere/host.prom: No such file or directory"
   mkdir -p "$root/metrics/host.prom"
   secpolicy status --format prometheus --output /metrics/host.prom
   exits 1
-  ends_with "secpolicy: cannot write /metrics/host.prom: Is a directory"
+  ends_with "secpolicy: status: cannot write /metrics/host.prom: Is a directory"
   [[ $(ls -A "$root/metrics") == host.prom ]]
   secpolicy status --format json --output /host.prom
   exits 2
