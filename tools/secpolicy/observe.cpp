@@ -14,6 +14,7 @@
 #include "host/enforce/supervise/asked.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 #include "installed/installed_policy.h"
 #include "observe/asked_rules.h"
 #include "observe/proposal.h"
@@ -62,12 +63,7 @@ class NewFile {
   const std::string& Name() const { return name; }
 
   void Write(const std::string& text) {
-    std::size_t written = 0;
-    while (written < text.size()) {
-      const ssize_t count = write(created.Number(), text.data() + written, text.size() - written);
-      if (count < 0) ThrowErrno("cannot write ", name);
-      written += static_cast<std::size_t>(count);
-    }
+    if (!LinuxHost::WriteAll(created.Number(), text)) ThrowErrno("cannot write ", name);
     isWritten = true;
   }
 

@@ -17,6 +17,7 @@
 #include "host/enforce/plan_file.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -41,12 +42,7 @@ std::vector<std::filesystem::path> Places() {
 Descriptor SealedFile(const std::string& bytes) {
   Descriptor file(memfd_create("secpolicy plan", MFD_ALLOW_SEALING));
   if (file.Number() < 0) ThrowErrno("cannot make a plan");
-  std::size_t written = 0;
-  while (written < bytes.size()) {
-    const ssize_t count = write(file.Number(), bytes.data() + written, bytes.size() - written);
-    if (count < 0) ThrowErrno("cannot write a plan");
-    written += static_cast<std::size_t>(count);
-  }
+  if (!LinuxHost::WriteAll(file.Number(), bytes)) ThrowErrno("cannot write a plan");
   constexpr int kSeals = F_SEAL_SEAL | F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_WRITE;
   const bool isSealed = fchmod(file.Number(), 0400) == 0 &&
                         fcntl(file.Number(), F_ADD_SEALS, kSeals) == 0 &&

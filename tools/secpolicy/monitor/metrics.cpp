@@ -13,6 +13,7 @@
 
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -44,16 +45,6 @@ std::string TextOf(const Sample& sample) {
   return text + ' ' + TextOf(sample.value) + '\n';
 }
 
-bool WriteAll(int file, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t written = write(file, text.data(), text.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return false;
-    text.remove_prefix(static_cast<std::size_t>(written));
-  }
-  return true;
-}
-
 }  // namespace
 
 std::string TextOf(std::span<const Gauge> gauges) {
@@ -74,7 +65,7 @@ void ReplaceFile(const std::string& path, const std::string& text) {
   std::string name = wanted.parent_path() / ("." + wanted.filename().string() + ".XXXXXX");
   const LinuxHost::Descriptor file(mkostemp(name.data(), O_CLOEXEC));
   if (!file.IsOpen()) LinuxHost::ThrowErrno(kCannotWrite, path);
-  if (WriteAll(file.Number(), text) && fchmod(file.Number(), kForAll) == 0 &&
+  if (LinuxHost::WriteAll(file.Number(), text) && fchmod(file.Number(), kForAll) == 0 &&
       rename(name.c_str(), path.c_str()) == 0) {
     return;
   }
