@@ -39,7 +39,7 @@ int OpenAtOnce(const std::string& path, int flags) {
 int OpenNameByName(std::string_view path, int flags) {
   FileDescriptor directory(open("/", O_PATH | O_CLOEXEC));
   path.remove_prefix(1);
-  for (auto slash = path.find('/'); slash != path.npos; slash = path.find('/')) {
+  for (auto slash = path.find('/'); slash != std::string_view::npos; slash = path.find('/')) {
     const std::string name(path.substr(0, slash));
     directory =
         FileDescriptor(openat(directory.Number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
