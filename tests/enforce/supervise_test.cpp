@@ -5,15 +5,24 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <linux/capability.h>
+#include <linux/netlink.h>
+#include <netinet/in.h>
+#include <sched.h>
 #include <signal.h>
 #include <sys/prctl.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
+#include <cstdint>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <set>
 #include <string>
 #include <vector>
@@ -76,6 +85,7 @@ class SuperviseTest : public testing::Test {
   }
 
   std::string Within(const std::string& name) const { return directory + "/" + name; }
+  int Proc() const { return proc; }
 
   std::string directory;
   std::vector<std::string> calls;
@@ -129,6 +139,202 @@ TEST_F(SuperviseTest, TellsProgramsWithTheirInterpreters) {
   EXPECT_THAT(asked, Contains("read " + Within("script")));
   EXPECT_THAT(asked, Contains("execute " + shell));
   EXPECT_THAT(calls, Contains("execve"));
+}
+
+// Calls of this process, that it need not make.
+class AskedTest : public SuperviseTest {
+ protected:
+  using Arguments = std::array<std::uint64_t, 6>;
+
+  static std::vector<std::string> AskedIn(int directoryOfProcesses, int number,
+                                          const Arguments& arguments) {
+    seccomp_data call = {};
+    call.nr = number;
+    std::ranges::copy(arguments, call.args);
+    std::vector<std::string> texts;
+    for (const auto& each :
+         Enforce::AskedBy(call, Enforce::Caller(directoryOfProcesses, getpid()))) {
+      texts.push_back(TextOf(each));
+    }
+    return texts;
+  }
+
+  // But for capabilities.
+  std::vector<std::string> AskedOf(int number, const Arguments& arguments) const {
+    std::vector<std::string> texts = AskedIn(Proc(), number, arguments);
+    std::erase_if(texts, [](const std::string& text) { return text.starts_with("cap_"); });
+    return texts;
+  }
+
+  // Only these, of a superuser who has all of them, wherever this runs.
+  std::string CapabilitiesOf(int number, const Arguments& arguments) const {
+    const std::string own = Within("proc/" + std::to_string(getpid()));
+    std::filesystem::create_directories(own);
+    std::ofstream(own + "/status") << "Uid:\t0\t1\t2\t3\nGid:\t0\t1\t2\t3\n"
+                                   << "CapEff:\tffffffffffffffff\n";
+    const Enforce::FileDescriptor made(open(Within("proc").c_str(), O_PATH | O_CLOEXEC));
+    std::string found;
+    for (const std::string& text : AskedIn(made.Number(), number, arguments)) {
+      if (text.starts_with("cap_")) found += (found.empty() ? "" : " ") + text;
+    }
+    return found;
+  }
+
+  static std::vector<std::string> Only(const std::string& question) { return {question}; }
+
+  static std::uint64_t AddressOf(const std::string& text) {
+    return reinterpret_cast<std::uintptr_t>(text.c_str());
+  }
+};
+
+TEST_F(AskedTest, TakesWhatIsCheckedFromItsArgument) {
+  const std::map<int, std::vector<std::string>> expected = {
+      {SYS_clone, {"clone_flags 11"}},
+      {SYS_unshare, {"clone_flags 11"}},
+      {SYS_ioctl, {"ioctl_request 12"}},
+      {SYS_prctl, {"prctl_option 11"}},
+      {SYS_kill, {"kill_signal 12"}},
+      {SYS_tkill, {"kill_signal 12"}},
+      {SYS_tgkill, {"kill_signal 13"}},
+      {SYS_rt_sigqueueinfo, {"kill_signal 12"}},
+      {SYS_rt_tgsigqueueinfo, {"kill_signal 13"}},
+      {SYS_pidfd_send_signal, {"kill_signal 12"}},
+      {SYS_socket, {"socket_family 11", "socket_type 12"}},
+      {SYS_socketpair, {"socket_family 11", "socket_type 12"}},
+      {SYS_setuid, {"set_uid 11"}},
+      {SYS_setfsuid, {"set_uid 11"}},
+      {SYS_setreuid, {"set_uid 11", "set_uid 12"}},
+      {SYS_setresuid, {"set_uid 11", "set_uid 12", "set_uid 13"}},
+      {SYS_setgid, {"set_gid 11"}},
+      {SYS_setfsgid, {"set_gid 11"}},
+      {SYS_setregid, {"set_gid 11", "set_gid 12"}},
+      {SYS_setresgid, {"set_gid 11", "set_gid 12", "set_gid 13"}},
+  };
+  for (const auto& [number, questions] : expected) {
+    EXPECT_EQ(AskedOf(number, {11, 12, 13, 14, 15, 16}), questions) << number;
+  }
+}
+
+TEST_F(AskedTest, TellsFilesByTheArgumentsThatNameThem) {
+  const std::string oldName = Within("old");
+  const std::string newName = Within("new");
+  const std::string sub = Within("sub");
+  std::ofstream(oldName).put('x');
+  std::filesystem::create_directory(sub);
+  constexpr auto kHere = static_cast<std::uint64_t>(AT_FDCWD);
+  const std::uint64_t there = AddressOf(oldName);
+  const std::uint64_t missing = AddressOf(newName);
+  const std::vector<std::string> made = {"make regular " + newName};
+  const std::vector<std::string> moved = {"remove " + oldName, "make regular " + newName};
+  const std::vector<std::string> removed = {"remove " + oldName};
+  const std::vector<std::string> written = {"make regular " + newName, "write " + newName};
+  EXPECT_EQ(AskedOf(SYS_linkat, {kHere, there, kHere, missing}), made);
+  EXPECT_EQ(AskedOf(SYS_symlinkat, {there, kHere, missing}), Only("make symlink " + newName));
+  EXPECT_EQ(AskedOf(SYS_mkdirat, {kHere, missing}), Only("make directory " + newName));
+  EXPECT_EQ(AskedOf(SYS_mknodat, {kHere, missing, S_IFIFO}), Only("make fifo " + newName));
+  EXPECT_EQ(AskedOf(SYS_openat, {kHere, there, O_RDONLY}), Only("read " + oldName));
+  EXPECT_EQ(AskedOf(SYS_openat, {kHere, missing, O_CREAT | O_WRONLY}), written);
+  EXPECT_EQ(AskedOf(SYS_renameat2, {kHere, there, kHere, missing, 0}), moved);
+  EXPECT_EQ(AskedOf(SYS_truncate, {there}), Only("truncate " + oldName));
+  EXPECT_EQ(AskedOf(SYS_unlinkat, {kHere, there}), removed);
+// Newer architectures are without them.
+#ifdef SYS_open
+  EXPECT_EQ(AskedOf(SYS_creat, {missing}), written);
+  EXPECT_EQ(AskedOf(SYS_link, {there, missing}), made);
+  EXPECT_EQ(AskedOf(SYS_mkdir, {missing}), Only("make directory " + newName));
+  EXPECT_EQ(AskedOf(SYS_mknod, {missing, S_IFIFO}), Only("make fifo " + newName));
+  EXPECT_EQ(AskedOf(SYS_open, {there, O_WRONLY}), Only("write " + oldName));
+  EXPECT_EQ(AskedOf(SYS_rename, {there, missing}), moved);
+  EXPECT_EQ(AskedOf(SYS_renameat, {kHere, there, kHere, missing}), moved);
+  EXPECT_EQ(AskedOf(SYS_rmdir, {AddressOf(sub)}), Only("remove " + sub));
+  EXPECT_EQ(AskedOf(SYS_symlink, {there, missing}), Only("make symlink " + newName));
+  EXPECT_EQ(AskedOf(SYS_unlink, {there}), removed);
+#endif
+}
+
+TEST_F(AskedTest, TellsCapabilitiesByTheCall) {
+  const std::map<std::string, std::vector<int>> expected = {
+      {"cap_ipc_lock", {SYS_mlockall}},
+      {"cap_dac_read_search", {SYS_open_by_handle_at}},
+      {"cap_setgid", {SYS_setgroups}},
+      {"cap_sys_admin",
+       {SYS_mount, SYS_move_mount, SYS_pivot_root, SYS_setdomainname, SYS_sethostname, SYS_setns,
+        SYS_swapoff, SYS_swapon, SYS_umount2}},
+      {"cap_sys_boot", {SYS_kexec_load, SYS_reboot}},
+      {"cap_sys_chroot", {SYS_chroot}},
+      {"cap_sys_module", {SYS_delete_module, SYS_finit_module, SYS_init_module}},
+      {"cap_sys_pacct", {SYS_acct}},
+      {"cap_sys_time", {SYS_clock_settime, SYS_settimeofday}},
+      {"cap_sys_tty_config", {SYS_vhangup}},
+      {"", {SYS_read, SYS_getpid}},
+  };
+  for (const auto& [capability, numbers] : expected) {
+    for (const int number : numbers) EXPECT_EQ(CapabilitiesOf(number, {}), capability) << number;
+  }
+}
+
+TEST_F(AskedTest, TellsCapabilitiesByTheArguments) {
+  const struct {
+    std::string capability;
+    int number;
+    std::vector<Arguments> taking;
+    std::vector<Arguments> free;
+  } expected[] = {
+      {"cap_sys_resource", SYS_prctl, {{PR_SET_MM}}, {{PR_SET_NO_NEW_PRIVS}, {PR_GET_DUMPABLE}}},
+      {"cap_setpcap", SYS_prctl, {{PR_CAPBSET_DROP}, {PR_SET_SECUREBITS}}, {{PR_CAPBSET_READ}}},
+      {"cap_net_admin",
+       SYS_setsockopt,
+       {{0, SOL_SOCKET, SO_MARK},
+        {0, SOL_SOCKET, SO_SNDBUFFORCE},
+        {0, SOL_SOCKET, SO_RCVBUFFORCE},
+        {0, IPPROTO_IP, IP_TRANSPARENT}},
+       {{0, SOL_SOCKET, SO_REUSEADDR}, {0, IPPROTO_IP, SO_MARK}, {0, SOL_SOCKET, IP_TRANSPARENT}}},
+      {"cap_net_raw",
+       SYS_socket,
+       {{AF_INET, SOCK_RAW}, {AF_INET6, SOCK_RAW | SOCK_CLOEXEC}, {AF_PACKET, SOCK_DGRAM}},
+       {{AF_INET, SOCK_DGRAM}, {AF_NETLINK, SOCK_RAW}}},
+      {"cap_audit_write",
+       SYS_socket,
+       {{AF_NETLINK, SOCK_RAW, NETLINK_AUDIT}},
+       {{AF_INET, SOCK_DGRAM, NETLINK_AUDIT}}},
+      {"cap_sys_nice",
+       SYS_sched_setscheduler,
+       {{0, SCHED_FIFO}, {0, SCHED_RR | SCHED_RESET_ON_FORK}},
+       {{0, SCHED_OTHER}, {0, SCHED_RESET_ON_FORK}}},
+      {"cap_sys_nice", SYS_setpriority, {{0, 0, static_cast<std::uint64_t>(-1)}}, {{}, {0, 0, 1}}},
+      {"cap_mknod", SYS_mknodat, {{0, 0, S_IFCHR}, {0, 0, S_IFBLK}}, {{0, 0, S_IFIFO}}},
+      {"cap_sys_admin",
+       SYS_unshare,
+       {{CLONE_NEWNS},
+        {CLONE_NEWCGROUP},
+        {CLONE_NEWUTS},
+        {CLONE_NEWIPC},
+        {CLONE_NEWPID},
+        {CLONE_NEWNET}},
+       {{CLONE_FILES}, {CLONE_NEWUSER | CLONE_NEWNS}}},
+      {"cap_sys_admin", SYS_clone, {{CLONE_NEWNS}}, {{SIGCHLD}}},
+      {"cap_setuid", SYS_setuid, {{4}}, {{0}, {1}, {2}}},
+      {"cap_setuid", SYS_setresuid, {{0, 1, 4}}, {{0, 1, 2}, {UINT32_MAX, 1, UINT32_MAX}}},
+      {"cap_setgid", SYS_setregid, {{0, 4}}, {{0, 1, 4}}},
+  };
+  for (const auto& [capability, number, taking, free] : expected) {
+    for (const auto& each : taking) EXPECT_EQ(CapabilitiesOf(number, each), capability) << number;
+    for (const auto& each : free) EXPECT_EQ(CapabilitiesOf(number, each), "") << number;
+  }
+}
+
+TEST_F(AskedTest, TakesALoaderFromAProgramOnly) {
+  std::ifstream program("/proc/self/exe", std::ios::binary);
+  std::string content(4096, '\0');
+  program.read(content.data(), static_cast<std::streamsize>(content.size()));
+  const std::string file = Within("program");
+  const auto askedOf = [&] {
+    std::ofstream(file) << content;
+    return AskedOf(SYS_execve, {AddressOf(file)});
+  };
+  EXPECT_THAT(askedOf(), testing::SizeIs(4));
+  content.front() = 'x';
+  EXPECT_THAT(askedOf(), ElementsAre("execute " + file, "read " + file));
 }
 
 // What only root can lay out.
@@ -258,6 +464,22 @@ TEST_F(SuperviseTest, HandsSignalsOn) {
   waitpid(supervisor, &status, 0);
   EXPECT_TRUE(WIFEXITED(status));
   EXPECT_EQ(WEXITSTATUS(status), 9);
+}
+
+// The one that is left behind knows that its parent was seen to end when it is no process any more.
+TEST_F(SuperviseTest, HandsSignalsOnToWhatIsLeftBehind) {
+  const pid_t supervisor = fork();
+  if (supervisor == 0) {
+    _exit(
+        Shell("(trap 'echo >ended; exit' TERM; while kill -0 $$; do sleep 0.05; done; echo >ready; "
+              "n=0; while [ $n -lt 100 ]; do n=$((n+1)); sleep 0.05; done) 2>&- & exit 4"));
+  }
+  while (!std::filesystem::exists(Within("ready"))) usleep(10'000);
+  kill(supervisor, SIGTERM);
+  int status = 0;
+  waitpid(supervisor, &status, 0);
+  EXPECT_EQ(WEXITSTATUS(status), 4);
+  EXPECT_TRUE(std::filesystem::exists(Within("ended")));
 }
 
 }  // namespace
