@@ -76,6 +76,14 @@ TEST(Compile, TakesWhatEachPartHas) {
   EXPECT_TRUE(compiled.plan.secret.has_value());
 }
 
+TEST(Compile, TakesThePortsOfBothEnds) {
+  const CompiledPlan compiled =
+      CompileOn(NewKernel(), {"-p bind_port 80 grant", "-p connect_port 443 grant"});
+  EXPECT_TRUE(compiled.plan.connectsChecked);
+  EXPECT_THAT(compiled.plan.bindPorts, ElementsAre(80));
+  EXPECT_THAT(compiled.plan.connectPorts, ElementsAre(443));
+}
+
 // What says that nothing can start there.
 TEST(Compile, KnowsWhetherProgramsMayEndAndMapFiles) {
   const auto of = [](const std::vector<std::string>& lines) {

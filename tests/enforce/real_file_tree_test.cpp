@@ -1,14 +1,17 @@
 #include "host/enforce/real_file_tree.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <seccomp.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <fstream>
 #include <initializer_list>
 #include <iostream>
 
 #include "braxo/lib/exception.h"
+#include "support/temporary_directory.h"
 
 namespace EnforceTest {
 namespace {
@@ -54,6 +57,17 @@ TEST(RealFileTree, TellsWhatIsThere) { ExpectKnownPlaces(); }
 
 TEST(RealFileTree, LooksNameByNameWhereAFilterIsOlderThanTheCall) {
   EXPECT_EXIT(LookNameByName(), testing::ExitedWithCode(0), "");
+}
+
+TEST(RealFileTree, ListsWhatADirectoryHoldsAndNotItself) {
+  const SecPolicyTest::TemporaryDirectory directory;
+  Enforce::RealFileTree tree;
+  EXPECT_THAT(tree.List(directory.Path(), 2), testing::Optional(testing::IsEmpty()));
+  for (const char* const name : {"one", ".two"}) std::ofstream(directory / name).put('x');
+  EXPECT_THAT(tree.List(directory.Path(), 2),
+              testing::Optional(testing::UnorderedElementsAre("one", ".two")));
+  EXPECT_EQ(tree.List(directory.Path(), 1), std::nullopt);
+  EXPECT_EQ(tree.List(directory / "one", 2), std::nullopt);
 }
 
 // As if nothing were there, plans would name no path at all.

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -54,6 +55,31 @@ TEST_P(Masks, HideDirectories) {
   EXPECT_THAT(AnswerUnder(masks, "create=@/kept/new"),
               StrEq(user == User::kRoot ? "EROFS" : "EACCES"));
   EXPECT_THAT(AnswerUnder(masks, "read=@/open/file"), StrEq("ok"));
+}
+
+// Sets the limit of open descriptors while it lives, also for what is started.
+class DescriptorLimit {
+ public:
+  explicit DescriptorLimit(rlim_t limit) {
+    getrlimit(RLIMIT_NOFILE, &before);
+    const rlimit wanted = {limit, before.rlim_max};
+    setrlimit(RLIMIT_NOFILE, &wanted);
+  }
+  DescriptorLimit(const DescriptorLimit&) = delete;
+  DescriptorLimit& operator=(const DescriptorLimit&) = delete;
+  ~DescriptorLimit() { setrlimit(RLIMIT_NOFILE, &before); }
+
+ private:
+  rlimit before{};
+};
+
+TEST_P(Masks, MayBeMoreThanFilesMayBeOpen) {
+  constexpr rlim_t kOpen = 40;
+  for (const char* const path : {"kept", "kept/file"}) {
+    const std::vector<Mask> masks(kOpen, {tree / path, MaskKind::kHidden});
+    const DescriptorLimit limit(kOpen);
+    EXPECT_THAT(AnswerUnder(masks, "read=@/open/file"), StrEq("ok")) << path;
+  }
 }
 
 TEST_P(Masks, HideFiles) {
