@@ -19,6 +19,8 @@
 #include <fstream>
 #include <functional>
 #include <random>
+#include <string_view>
+#include <utility>
 
 #include "child_process.h"
 #include "host/linux/common/host_error.h"
@@ -43,6 +45,9 @@ using LinuxHost::RefreshLabelIndex;
 
 constexpr std::uint32_t kMine = 7;
 constexpr std::uint32_t kOther = 8;
+
+// Is done when the label of a file with the name "file" is about to be read, once.
+std::function<void()> atFile;
 
 std::string TextOf(const std::vector<Enforce::LabelledPlace>& places) {
   std::string text;
@@ -428,5 +433,24 @@ TEST_F(IndexOfARoot, NeverHasOldLabelsWhoeverLabelsMeanwhile) {
             "");
 }
 
+// A walk that was in a directory which is somewhere else by then begins again.
+TEST_F(IndexOfARoot, IsMadeAlsoWhereADirectoryIsMoved) {
+  scratch.Write("b/moved/file", "x");
+  EXPECT_EQ(InBooted([] {
+              Give("/b/moved/file", kMine);
+              atFile = [] { std::filesystem::rename("/b/moved", "/a/moved"); };
+              return RefreshAnd(Index);
+            }),
+            "made //=2 /a/moved/file=7 ");
+}
+
 }  // namespace
+
+// An extern "C" function is the same one in any namespace.
+extern "C" ssize_t lgetxattr(const char* path, const char* name, void* value,
+                             std::size_t size) noexcept {
+  if (atFile && std::string_view(path) == "file") std::exchange(atFile, nullptr)();
+  return syscall(SYS_lgetxattr, path, name, value, size);
+}
+
 }  // namespace LinuxHostTest

@@ -4,15 +4,22 @@
 #include "host/linux/operation/label_journal.h"
 
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sched.h>
+#include <sys/file.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <csignal>
 #include <cstring>
+#include <functional>
 #include <initializer_list>
+#include <utility>
 
 #include "host/linux/common/host_error.h"
 #include "host/linux/files/security_attribute.h"
@@ -27,6 +34,9 @@ using LinuxHost::LabelJournal;
 using LinuxHost::LabelNotes;
 using LinuxHost::LabelsPutBack;
 using LinuxHost::NotedLabels;
+
+// Is done when a file is about to be locked, once.
+std::function<void()> beforeLock;
 
 std::string AllCarried(std::initializer_list<const char*> paths) {
   std::string text;
@@ -204,6 +214,35 @@ TEST_F(Journal, FollowsNothingThatWasReplaced) {
       "2 2 6 ENODATA 3 8");
 }
 
+TEST_F(Journal, OfAnotherProcessThatTookItsPlaceIsLeftAlone) {
+  EXPECT_EQ(Run([] {
+              GiveAndDie();
+              beforeLock = [] {
+                rename(JournalPath().c_str(), "aside");
+                close(open(JournalPath().c_str(), O_CREAT | O_WRONLY, 0600));
+              };
+              return Words({LeftOver(), Journals(), Carried("tree/one")});
+            }),
+            "none there 9");
+}
+
+TEST_F(Journal, ThatCannotBeOpenedIsTold) {
+  const std::string told = Run([]() -> std::string {
+    GiveAndDie();
+    const std::string path = JournalPath();
+    const char* const journal = path.c_str();
+    if (unshare(CLONE_NEWNS) != 0 || mount("", "/", "", MS_REC | MS_PRIVATE, "") != 0 ||
+        mount(journal, journal, "", MS_BIND, "") != 0 ||
+        mount("", journal, "", MS_REMOUNT | MS_BIND | MS_RDONLY, "") != 0) {
+      return "(no mounts)";
+    }
+    return LeftOver();
+  });
+  if (told == "(no mounts)") GTEST_SKIP() << "nothing can be mounted here";
+  EXPECT_THAT(told, testing::MatchesRegex("Unable to open the journal of labels /.*/labels.undo: "
+                                          "Read-only file system"));
+}
+
 TEST_F(Journal, IsRefusedWhereOthersMayHaveWrittenIt) {
   EXPECT_NE(Run([]() -> std::string {
               StatePath();
@@ -221,4 +260,11 @@ TEST_F(Journal, IsRefusedWhereOthersMayHaveWrittenIt) {
 }
 
 }  // namespace
+
+// An extern "C" function is the same one in any namespace.
+extern "C" int flock(int file, int operation) noexcept {
+  if (beforeLock) std::exchange(beforeLock, nullptr)();
+  return static_cast<int>(syscall(SYS_flock, file, operation));
+}
+
 }  // namespace LinuxHostTest
