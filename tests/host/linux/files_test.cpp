@@ -4,6 +4,7 @@
 
 #include <climits>
 
+#include "host/linux/files/directory_entry.h"
 #include "host/linux/files/real_path.h"
 #include "kitlibs/file.h"
 #include "scratch_root.h"
@@ -35,6 +36,14 @@ class Files : public ::testing::Test {
 
   ScratchRoot scratch;
 };
+
+TEST(JoinPath, PutsOneSlashBetweenADirectoryAndAName) {
+  EXPECT_EQ(LinuxHost::JoinPath("/", "name"), "/name");
+  EXPECT_EQ(LinuxHost::JoinPath("/some", "name"), "/some/name");
+  EXPECT_EQ(LinuxHost::JoinPath("/some/", "name"), "/some/name");
+  EXPECT_EQ(LinuxHost::JoinPath(".", "name"), "name");
+  EXPECT_EQ(LinuxHost::JoinPath("/some", "."), "/some");
+}
 
 TEST_F(Files, RealPathFollowsLinksAndDots) {
   scratch.Write("usr/bin/program", "code");

@@ -8,6 +8,7 @@
 #include <sched.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -174,6 +175,24 @@ TEST_F(InheritedLabel, IsReadAsAnAttributeIs) {
                    Told(Zorvan::Kernel::GetXattr("tree/file", kLabelName, buffer, sizeof buffer))});
             }),
             "4 ERANGE");
+}
+
+TEST_F(InheritedLabel, ThatCannotBeReadIsAFailureAsOfAnAttribute) {
+  EXPECT_EQ(Run([]() -> std::string {
+              const auto read = [](const char* path) {
+                const ssize_t result = Zorvan::Kernel::GetXattr(path, kLabelName, nullptr, 0);
+                return std::to_string(result) + " " + strerrorname_np(errno);
+              };
+              const std::string none = read("bare");
+              // Room for the directory of the file, and for none above it.
+              const int next = open("/", O_PATH | O_CLOEXEC);
+              close(next);
+              const rlim_t most = static_cast<rlim_t>(next) + 1;
+              const rlimit limit = {most, most};
+              if (setrlimit(RLIMIT_NOFILE, &limit) != 0) return "no limit";
+              return none + ", " + read("tree/file");
+            }),
+            "-1 ENODATA, -1 EMFILE");
 }
 
 TEST_F(InheritedLabel, IsCreatedAndSetAsWithoutIt) {

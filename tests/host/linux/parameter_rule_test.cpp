@@ -48,6 +48,13 @@ TEST(ParameterRuleConflict, IsAnOverlapOfGrantAndRevoke) {
       "99 in line 2");
 }
 
+// Services install rules that are in no line.
+TEST(ParameterRuleConflict, IsToldInTheOrderOfTheValuesWhereLinesAreTheSame) {
+  EXPECT_EQ(Conflict({ParameterRuleOf(0, "7", "", false), ParameterRuleOf(0, "1", "9", true)}),
+            "parameter check 'bind_port': grant of 1 to 9 in line 0 conflicts with revoke of 7 in "
+            "line 0");
+}
+
 // Two values would be a range, and a mask has none.
 TEST(ParameterRuleConflict, IsASecondValueOfAMask) {
   EXPECT_EQ(Conflict({ParameterRuleOf(1, "0x100", "0x200", true, "clone_flags")}),

@@ -293,6 +293,16 @@ TEST_F(PolicyLoad, ADestroyedDomainTakesWhatWasCoveredAlong) {
   EXPECT_EQ(Covered(), "0 0 0");
 }
 
+// A later version of this program finds them in the state.
+TEST_F(PolicyLoad, HasTheNumberOfItsKindInTheState) {
+  Load({{"d", {}}}, LoadKind::kEarly);
+  Load({{"d", {}}});
+  auto rows = HostState::Current().Database().Select(
+      "SELECT group_concat(kind, ' ') FROM (SELECT kind FROM policy_load ORDER BY number)");
+  ASSERT_TRUE(rows.Next());
+  EXPECT_EQ(rows.Text(0), "1 2");
+}
+
 TEST_F(PolicyLoad, LeavesTheEarlyPolicyAlone) {
   Load({{"boot", {"reboot", "read"}}}, LoadKind::kEarly);
   Load({{"boot", {"!reboot", "write"}}, {"d", {}}});

@@ -116,6 +116,23 @@ TEST_F(PublishedPlans, AreThoseOfWhoHasBegunLast) {
   EXPECT_TRUE(ArePlansPublished());
 }
 
+// Its end takes the mark away of plans that were in the making before.
+TEST_F(PublishedPlans, AreMadeBehindACommitThatIsUnderWay) {
+  const std::string begun = directory.Path() + "/begun";
+  ChildProcess commits([&] {
+    HostState& own = HostState::Current();
+    LinuxHost::Transaction transaction(own.Database());
+    own.Domains().SetLevel("a", "permissive");
+    std::ofstream(begun).put('x');
+    usleep(50'000);
+    transaction.Commit();
+  });
+  while (!fs::exists(begun)) usleep(1000);
+  PlansInTheMaking making;
+  EXPECT_EQ(commits.Wait(), "");
+  EXPECT_TRUE(making.Publish({{"a", "bytes"}}));
+}
+
 TEST_F(PublishedPlans, AreNotOfAStateThatAnotherFileHasReplacedMeanwhile) {
   PlansInTheMaking making;
   const std::string& file = LinuxHost::StatePath();

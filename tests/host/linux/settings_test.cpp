@@ -3,6 +3,7 @@
 
 #include "host/linux/operation/settings.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
@@ -76,6 +77,27 @@ TEST_F(Settings, OptionKeepsItsKindAndValue) {
   EXPECT_EQ(Run([] { return Seen("/UserVars/Number"); }), "-7");
   EXPECT_EQ(Run([] { return Seen("/UserVars/Text"); }), "no integer");
   EXPECT_EQ(Run([] { return Seen("/UserVars/number"); }), "none");
+}
+
+TEST_F(Settings, OptionsAreListedWithTheirKinds) {
+  EXPECT_EQ(Run([] {
+              LinuxHost::StoreWantedOption("/UserVars/Number", 0L);
+              LinuxHost::StoreWantedOption("/UserVars/Text", std::string("7"));
+              const std::map<std::string, OptionValue> expected = {
+                  {"/UserVars/Number", 0L}, {"/UserVars/Text", std::string("7")}};
+              return LinuxHost::ListWantedOptions() == expected ? "as stored" : "otherwise";
+            }),
+            "as stored");
+}
+
+// A later version of this program has to know the file again, and others what it is.
+TEST_F(Settings, AreInAFileOfTheirKind) {
+  Run([] {
+    LinuxHost::StoreWantedOption("/UserVars/Any", 1L);
+    return "";
+  });
+  EXPECT_THAT(Content(Database()) + Content(Database().string() + "-wal"),
+              testing::HasSubstr("ZOCF"));
 }
 
 TEST_F(Settings, LaterValueReplacesEarlier) {

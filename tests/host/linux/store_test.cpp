@@ -4,6 +4,7 @@
 #include "host/linux/state/store.h"
 
 #include <gtest/gtest.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -278,6 +279,19 @@ TEST_F(StoreFile, TakesTextsAsTheyAre) {
   EXPECT_EQ(rows.Text(0), text);
   EXPECT_FALSE(rows.Next());
   EXPECT_EQ(CountOf(store, ""), 5);
+}
+
+// Longer than the engine takes, and nowhere in memory.
+TEST_F(StoreFile, RefusesATextThatIsTooLong) {
+  constexpr std::size_t kLength = 2'000'000'000;
+  void* const pages =
+      mmap(nullptr, kLength, PROT_READ, MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0);
+  ASSERT_NE(pages, MAP_FAILED);
+  const std::string_view text(static_cast<const char*>(pages), kLength);
+  Store store(path, kLayout);
+  EXPECT_EQ(MessageOf([&] { store.Run("INSERT INTO item VALUES (?1, 1)", text); }),
+            "Unable to use the shopping list " + path + ": string or blob too big");
+  munmap(pages, kLength);
 }
 
 TEST_F(StoreFile, CountsTheRowsThatChanged) {

@@ -79,6 +79,20 @@ TEST_F(WorldRecords, AreReadAsTheyWereMade) {
   EXPECT_EQ(Files().size(), 1U);
 }
 
+TEST_F(WorldRecords, AreInADirectoryWithTheNumberOfTheirUser) {
+  LinuxHost::RecordWorld("a", "enforcing");
+  EXPECT_TRUE(Files().front().starts_with(worlds + "/" + std::to_string(geteuid()) + "."));
+}
+
+TEST_F(WorldRecords, MayBeBelowADirectoryOfAnyName) {
+  const std::string other = directory.Path() + "/of_mine";
+  const LinuxHost::UsedState used(other + "/host.db");
+  fs::create_directory(other);
+  LinuxHost::MakeWorldRecords();
+  LinuxHost::RecordWorld("a", "enforcing");
+  EXPECT_EQ(Texts(), std::vector<std::string>{std::to_string(getpid()) + " a enforcing"});
+}
+
 TEST_F(WorldRecords, GoWithTheirProcess) {
   EXPECT_EQ(RunInChild([] { LinuxHost::RecordWorld("a", "enforcing"); }), "");
   EXPECT_EQ(Texts(), std::vector<std::string>{});
