@@ -188,6 +188,18 @@ END
   everything | diff <(grep -vE '/(labels.index|plans/.current) ' "$BATS_TEST_TMPDIR/before") -
 }
 
+@test "a load that cannot be written takes its labels back" {
+  # More than the state may grow by.
+  local number
+  for number in {1..2000}; do echo "-p bind_port $number grant"; done >>"$policy/domains/newDom"
+  everything >"$BATS_TEST_TMPDIR/before"
+  run --separate-stderr bash -c "trap '' XFSZ; ulimit -f 64; exec \"\$@\"" limited \
+    "$SECPOLICY" --root "$root" load --all-or-nothing /new
+  exits 1
+  ends_with "secpolicy: load: Unable to use the host state /run/secpolicy/host.db: disk I/O error (1 error above); nothing was installed"
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+}
+
 @test "a load that is asked to end while it gives labels ends whole" {
   local signal
   for signal in HUP INT QUIT TERM; do

@@ -74,6 +74,8 @@ setup() {
     exits 2
     [[ $stderr == *"'$name' is no name: letters, digits and '_', '-', '.' behind the first, 63 at most"* ]]
   done
+  secpolicy new domain A-dom_1.x
+  exits 0
   secpolicy new domain --policy /no/such x
   exits 1
   [[ $stderr == "secpolicy: new domain: there is no directory /no/such below this root"* ]]

@@ -366,6 +366,13 @@ END
   shows "$root/copy/tardisks/inner: warning: this is a directory: a load skips it [skipped-entry]"
 }
 
+@test "a policy of its own may be in a directory of any name" {
+  cp -r "$policy" "$root/early"
+  secpolicy check --werror /early/domains/appDom
+  exits 0
+  [[ -z $output && $stderr == "secpolicy: check: no problems" ]]
+}
+
 @test "nul-byte" {
   printf -- '-s bind grant \0 x\n' >>"$policy/domains/appDom"
   number=$(wc -l <"$policy/domains/appDom")

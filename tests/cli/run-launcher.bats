@@ -36,6 +36,11 @@ refuses() {
   [[ $output != *NEEDED* ]]
 }
 
+@test "what is no broker is not asked" {
+  SECPOLICY_BROKER=0 launch --ask -- true </dev/null
+  refuses "cannot ask the broker of this domain: Socket operation on non-socket"
+}
+
 @test "--help and --version print and start nothing" {
   launch --version
   answers 0 "secpolicy-run $(sed -n 's/^project(secpolicy VERSION \([^ ]*\).*/\1/p' "$SOURCE/CMakeLists.txt")"

@@ -90,6 +90,14 @@ TEST(Propose, TakesASetForManyOfItsCallsAndNotForFew) {
       ElementsAre(kStart, "-s @network grant   # 5 calls: bind listen accept socket connect"));
 }
 
+TEST(Propose, TakesTheSetOfMostCallsFirst) {
+  EXPECT_THAT(ProposedFor({Call("bind"), Call("listen"), Call("accept"), Call("socket"),
+                           Call("connect"), Call("mkdir"), Call("rmdir"), Call("rename"),
+                           Call("link"), Call("symlink"), Call("unlink")}),
+              ElementsAre(kStart, HasSubstr("-s @file grant   # 6 calls: mkdir "),
+                          HasSubstr("-s @network grant   # 5 calls: bind ")));
+}
+
 TEST(Propose, NeverTakesTheSetOfAnAdministrator) {
   const auto lines = ProposedFor(
       {Call("reboot"), Call("swapon"), Call("swapoff"), Call("acct"), Call("sethostname")});
@@ -186,6 +194,7 @@ TEST(Propose, LeavesOutWhatTheDomainIsGranted) {
                            File(FileAccess::kWrite, "/etc/a")},
                           domain),
               ElementsAre(HasSubstr("-s bind grant "), HasSubstr("-r /etc/a rw ")));
+  EXPECT_THAT(ProposedFor({File(FileAccess::kRead, "/etc/a")}, domain), ElementsAre());
 }
 
 TEST(Propose, HasPortsFamiliesAndIdentitiesOfANewDomainOnly) {
