@@ -189,6 +189,17 @@ TEST_P(NotedLabelsTest, TellsALabelThatIsNoIdentifier) {
             "0 labelled:0>8 ");
 }
 
+TEST_P(NotedLabelsTest, LeaveALabelOfNoBytesToItsFile) {
+  EXPECT_EQ(RunNoting([](const NotedLabels&) -> std::string {
+              if (lsetxattr("tree/one", LinuxHost::LabelAttribute().c_str(), "", 0, 0) != 0) {
+                return "(no empty attributes here)";
+              }
+              errno = ENODATA;
+              return Told(Zorvan::Kernel::GetXattr("tree/one", kLabelName, nullptr, 0));
+            }),
+            "0");
+}
+
 TEST_P(NotedLabelsTest, PassesOverADirectory) {
   scratch.Write("own/file", "text");
   std::filesystem::create_symlink("own", scratch.Root() / "link");
@@ -228,7 +239,7 @@ TEST_P(NotedLabelsTest, FailsOnAReadOnlyFileSystem) {
 }
 
 // There, a try to write copies the file.
-TEST_P(NotedLabelsTest, DryRunsWithoutTraceOnAnOverlay) {
+TEST_P(NotedLabelsTest, AreAsElsewhereOnAnOverlayAndDryRunsWithoutTrace) {
   if (geteuid() != 0) GTEST_SKIP() << "only the superuser mounts";
   for (const char* directory : {"/upper", "/work", "/merged"}) {
     std::filesystem::create_directory(scratch.Directory().string() + directory);
@@ -251,10 +262,12 @@ TEST_P(NotedLabelsTest, DryRunsWithoutTraceOnAnOverlay) {
         !std::filesystem::is_empty(scratch.Directory() / "upper")) {
       return given + " copied";
     }
-    return given;
+    constexpr unsigned long kAsItIs = MS_REMOUNT | MS_BIND | MS_RDONLY;
+    if (mount("none", merged.c_str(), nullptr, kAsItIs, nullptr) != 0) return "(no overlay here)";
+    return given + ", " + Give("labelled", 9);
   });
   if (noted == "(no overlay here)") GTEST_SKIP() << noted;
-  EXPECT_EQ(noted, "0 ENODATA ENOENT 0 8 7");
+  EXPECT_EQ(noted, "0 ENODATA ENOENT 0 8 7, EROFS");
 }
 
 TEST_P(NotedLabelsTest, AppliesInTheOrderOfGiving) {
