@@ -50,6 +50,9 @@ TEST_F(Files, RealPathFollowsLinksAndDots) {
   std::filesystem::create_symlink("usr/bin", scratch.Root() / "bin");
   const std::string real = Directory() + "/root/usr/bin/program";
   EXPECT_EQ(RealPath(Directory() + "/root/bin//./program"), real);
+  for (const std::string dots : {"/root/./usr/bin/program", "/root/../root/usr/bin/program"}) {
+    EXPECT_EQ(RealPath(Directory() + dots), real);
+  }
   EXPECT_EQ(RealPath(real), real);
 }
 
