@@ -48,10 +48,10 @@ file(RELATIVE_PATH SECPOLICY_PC_TO_PREFIX
 configure_file(packaging/secpolicy.pc.in secpolicy.pc @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 
-# The command, with the library that is never linked to, only loaded by a boot.
+# The command, with the libraries that are never linked to, only loaded by the verbs that need them.
 set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME secpolicy)
 install(TARGETS secpolicy_cli)
-install(TARGETS secpolicyhost_archive
+install(TARGETS secpolicyhost_archive secpolicy_signature
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/secpolicy" NAMELINK_SKIP)
 install(TARGETS secpolicy_run DESTINATION "${CMAKE_INSTALL_LIBEXECDIR}/secpolicy")
 install(FILES docs/man/secpolicy.5 DESTINATION "${CMAKE_INSTALL_MANDIR}/man5")
@@ -75,7 +75,7 @@ install(PROGRAMS scripts/pack-example DESTINATION "${CMAKE_INSTALL_DOCDIR}/examp
 install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}/docs")
 install_documents("${CMAKE_INSTALL_DOCDIR}" README.md CHANGELOG.md SECURITY.md
   docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
-  docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
+  docs/bundles.md docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
   docs/messages.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/runtime.md
   docs/graph.svg)
 

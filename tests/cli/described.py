@@ -11,7 +11,7 @@ command, manual, root = sys.argv[1:]
 problems = []
 
 # Values whose words are nobody's to know: numbers, letters, any text; and new names.
-FREE = {"N", "NUMBER", "PERMISSIONS", "PID", "SERVICE", "VALUE"}
+FREE = {"N", "NUMBER", "PERMISSIONS", "PID", "SERVICE", "TEXT", "TIME", "VALUE"}
 NAMES = {"new domain", "domain create"}
 GLOBAL = {"help", "version", "root", "verbose", "color", "no-pager"}
 

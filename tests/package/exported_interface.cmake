@@ -19,7 +19,8 @@ endif()
 add_test(NAME package.needed_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-needed-libraries" "$<TARGET_FILE:secpolicy>")
 
-# What a boot alone needs is loaded by a boot alone.
+# What a boot alone needs is loaded by a boot alone, and what signs by the verb that does.
 add_test(NAME package.late_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-late-libraries"
-    "$<TARGET_FILE:secpolicy_cli>" "$<TARGET_FILE:secpolicyhost_archive>")
+    "$<TARGET_FILE:secpolicy_cli>" "$<TARGET_FILE:secpolicyhost_archive>"
+    "$<TARGET_FILE:secpolicy_signature>")

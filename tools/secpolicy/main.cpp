@@ -27,7 +27,7 @@ namespace {
 
 const VerbGroup kVerbs[] = {
     {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords, &kLsp}},
-    {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kRestore, &kSettings, &kLabel}},
+    {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kBundle, &kRestore, &kSettings, &kLabel}},
     {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff, &kDrift}},
     {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
     {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
@@ -77,6 +77,7 @@ constexpr char kFooter[] =
     "  secpolicy exec -- /usr/sbin/sshd             # in that of its label\n"
     "  secpolicy observe -- /usr/bin/webd           # which rules would it need?\n"
     "  secpolicy lsp                                # for an editor, as one types\n"
+    "  secpolicy bundle show web.bundle             # what was signed for many hosts?\n"
     "\n"
     "'secpolicy help VERB' explains one verb. The files are described in secpolicy(5).\n"
     "\n"

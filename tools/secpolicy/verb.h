@@ -42,6 +42,7 @@ extern const Verb kCheck;
 extern const Verb kLsp;
 extern const Verb kLoad;
 extern const Verb kLoadEarly;
+extern const Verb kBundle;
 extern const Verb kRestore;
 extern const Verb kDisplay;
 extern const Verb kDiff;
