@@ -188,6 +188,9 @@ refused() {
   bundle create web -o new.bundle --key key.pem --expires 2020-01-01
   exits 2
   [[ $stderr == *"cannot expire at 2020-01-01 00:00:00 UTC"* ]]
+  SOURCE_DATE_EPOCH=253402300799 bundle create web -o new.bundle --key key.pem --expires 1
+  exits 2
+  [[ $stderr == *"a bundle of 9999-12-31 23:59:59 UTC cannot expire at "* ]]
   SOURCE_DATE_EPOCH=today bundle create web -o new.bundle --key key.pem
   exits 2
   [[ $stderr == *"SOURCE_DATE_EPOCH is 'today', which is no number of seconds"* && ! -e new.bundle ]]

@@ -27,6 +27,9 @@ namespace {
 
 constexpr std::int64_t kDay = 86400;
 
+// Of the year 9999, the last that a manifest can name.
+constexpr std::int64_t kLastSecond = 253402300799;
+
 // A whole number that is not negative; nothing for anything else.
 std::optional<std::int64_t> NumberIn(const std::string& text) {
   std::int64_t number = 0;
@@ -40,7 +43,8 @@ std::optional<std::int64_t> NumberIn(const std::string& text) {
 std::int64_t TimeOfBuild() {
   const char* const wanted = std::getenv("SOURCE_DATE_EPOCH");
   if (wanted == nullptr) return std::time(nullptr);
-  if (const auto time = NumberIn(wanted)) return *time;
+  const auto time = NumberIn(wanted);
+  if (time && *time <= kLastSecond) return *time;
   throw QuestionError("SOURCE_DATE_EPOCH is '" + std::string(wanted) +
                       "', which is no number of seconds");
 }
@@ -68,9 +72,9 @@ std::string CheckExpiry(const std::string& word) {
 
 std::optional<std::int64_t> ExpiryOf(const std::string& word, std::int64_t created) {
   if (word.empty()) return std::nullopt;
-  if (const auto days = NumberIn(word)) return created + *days * kDay;
-  const std::optional<std::int64_t> time = ReadUtcTime(word);
-  if (time && *time > created) return time;
+  const auto days = NumberIn(word);
+  const auto time = days ? created + *days * kDay : ReadUtcTime(word);
+  if (time && *time > created && *time <= kLastSecond) return time;
   throw QuestionError("a bundle of " + UtcTime(created) + " cannot expire at " +
                       (time ? UtcTime(*time) : word));
 }
@@ -95,7 +99,8 @@ void RequireSoundPolicy(const std::string& dir) {
 
 std::string NameOf(const std::string& dir) {
   const std::filesystem::path path = std::filesystem::absolute(dir) / ".";
-  return path.lexically_normal().parent_path().filename();
+  const std::string name = path.lexically_normal().parent_path().filename();
+  return name.empty() ? "policy" : name;
 }
 
 ExitCode Create(const CreateOptions& options) {
