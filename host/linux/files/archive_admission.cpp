@@ -107,9 +107,6 @@ bool ArchiveAdmission::Admits(archive_entry* entry) {
   const Kind kind = KindAt(path);
   CheckProtectedPlaces(name, path, kind, entry);
   if (kind == Kind::kDirectory && !IsDirectory(entry)) Refuse(name, "There is a directory");
-  if (kind == Kind::kLink && IsDirectory(entry) && IsNeeded(path)) {
-    Refuse(name, "There is a link, and a directory in its place would hide what it leads to");
-  }
   const char* const target = archive_entry_hardlink(entry);
   if (target != nullptr && PlainPath(target) == path) return false;
   Record(path, entry);
@@ -199,13 +196,6 @@ ArchiveAdmission::Kind ArchiveAdmission::KindAt(const std::string& path) {
   NoticeAnotherName(path, status);
   directories.insert(path);
   return Kind::kDirectory;
-}
-
-// Where all programs of a host are found through /bin, nothing would start without that link. One
-// that a tardisk brings the next boot would bring again, and find the directory in its place.
-bool ArchiveAdmission::IsNeeded(const std::string& link) const {
-  struct stat status;
-  return brought.contains(link) || (stat(link.c_str(), &status) == 0 && S_ISDIR(status.st_mode));
 }
 
 // A mount or a link can show a protected directory at another path.

@@ -55,7 +55,6 @@ class ArchiveAdmission {
                             archive_entry* entry) const;
   bool IsFree(const Place& place, const std::string& path) const;
   Kind KindAt(const std::string& path);
-  bool IsNeeded(const std::string& link) const;
   void NoticeAnotherName(const std::string& path, const struct stat& status);
   const Brought* FindBrought(std::string_view target) const;
   void Record(const std::string& path, archive_entry* entry);

@@ -196,29 +196,8 @@ TEST_F(UnpackTardisks, ReplacesLinkInLastPlace) {
   EXPECT_TRUE(std::filesystem::is_regular_file(std::filesystem::symlink_status(In("own"))));
 }
 
-constexpr char kHidesDirectory[] =
-    ": There is a link, and a directory in its place would hide what it leads to";
-
-// As /bin of a host whose programs all lie in /usr.
-TEST_F(UnpackTardisks, RefusesDirectoryInPlaceOfLinkToDirectory) {
-  std::filesystem::create_directories(In("usr/bin"));
-  std::filesystem::create_symlink("usr/bin", In("bin"));
-  TarImage image;
-  image.Directory("bin/", 0700).File("bin/victim", "inside");
-  EXPECT_EQ(Unpack(image),
-            std::string("Unable to unpack tardisk disk.tgz: bin/") + kHidesDirectory);
-  EXPECT_EQ(std::filesystem::read_symlink(In("bin")), "usr/bin");
-}
-
-// The next boot would find the directory in the way of the link.
-TEST_F(UnpackTardisks, RefusesDirectoryInPlaceOfItsOwnLink) {
-  TarImage image;
-  image.SymbolicLink("own", "missing").Directory("own", 0700);
-  EXPECT_EQ(Unpack(image), std::string("Unable to unpack tardisk disk.tgz: own") + kHidesDirectory);
-}
-
-TEST_F(UnpackTardisks, ReplacesLinkToNothingByDirectory) {
-  std::filesystem::create_symlink("missing", In("out"));
+TEST_F(UnpackTardisks, ReplacesLinkToDirectoryByDirectory) {
+  std::filesystem::create_symlink(scratch.Directory(), In("out"));
   TarImage image;
   image.Directory("out/", 0700).File("out/victim", "inside");
   ASSERT_EQ(Unpack(image), "unpacked");
