@@ -1,5 +1,6 @@
 #pragma once
 
+#include <deque>
 #include <map>
 #include <queue>
 #include <string>
@@ -32,7 +33,7 @@ class SourceFile {
   // The words of the line `number`, for the library.
   std::queue<std::string> TokensOf(unsigned int number) const {
     const Words& words = lines.at(number);
-    return std::queue<std::string>({words.begin(), words.end()});
+    return std::queue<std::string>(std::deque<std::string>(words.begin(), words.end()));
   }
 
   // A problem of the whole file.
