@@ -4,11 +4,11 @@
 #include <string>
 #include <vector>
 
+#include "check/check_options.h"
 #include "check/policy_check.h"
 #include "check/report_format.h"
 #include "command_line.h"
 #include "ending.h"
-#include "policy_dir.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
 #include "verb.h"

@@ -18,6 +18,7 @@
 #include "root.h"
 #include "secpolicy/policy_root.h"
 #include "text/format.h"
+#include "text/replace_file.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -9,11 +9,11 @@
 #include <string>
 #include <vector>
 
+#include "check/check_options.h"
 #include "command_line.h"
 #include "ending.h"
 #include "lsp/framing.h"
 #include "lsp/server.h"
-#include "policy_dir.h"
 #include "verb.h"
 
 namespace SecPolicyCli {

@@ -2,24 +2,12 @@
 
 #include <filesystem>
 
-#include "check/diagnostic.h"
 #include "ending.h"
 #include "kitlibs/file.h"
 #include "root.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
-namespace {
-
-std::string CheckWarningName(const std::string& name) {
-  const Code* const code = FindCode(name);
-  if (code == nullptr) return WhyNoCode(name);
-  if (code->severity == Severity::kWarning) return "";
-  return "'" + name + "' is an error: a load does not end well with it";
-}
-
-}  // namespace
-
 std::shared_ptr<const std::string> AddPolicyDir(Syntax& syntax, const std::string& preset) {
   const auto dir = std::make_shared<std::string>(preset);
   syntax.AddOption("DIR", *dir, "The policy directory, as seen from the root").ShowDefault();
@@ -41,17 +29,6 @@ std::string AdviseOnMissing(const std::string& path) {
   if (!below.empty()) return " Did you mean " + below + "? Paths begin at the root.";
   if (path == SecPolicy::kPolicyRoot) return " " + Call("init") + " writes a first policy.";
   return "";
-}
-
-void AddFresh(Syntax& syntax, bool& fresh) {
-  syntax.AddFlag("--fresh", fresh, "Check as after a boot, whatever is installed on this host now");
-}
-
-void AddUnwantedCodes(Syntax& syntax, std::vector<std::string>& codes) {
-  syntax.AddList("--disable", codes, "Leave out this warning; may be given repeatedly")
-      .Check(CheckWarningName)
-      .NameValue("CODE")
-      .Offer(OfferCodes(true));
 }
 
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir) {

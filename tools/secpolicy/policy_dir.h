@@ -4,7 +4,6 @@
 #include <optional>
 #include <string>
 #include <string_view>
-#include <vector>
 
 #include "command_line.h"
 
@@ -23,10 +22,6 @@ Option AddTiming(Syntax& syntax, bool& timing);
 // What may be meant by the path of a policy that is not there, as a sentence with a blank before
 // it; nothing when that cannot be told.
 std::string AdviseOnMissing(const std::string& path);
-
-// Adds the options of a check to `syntax`: --fresh, and --disable for warnings that are not wanted.
-void AddFresh(Syntax& syntax, bool& fresh);
-void AddUnwantedCodes(Syntax& syntax, std::vector<std::string>& codes);
 
 // Refuses a policy directory that is not there; nothing for one that is.
 std::optional<ExitCode> RefuseMissingDir(const std::string& verb, const std::string& dir);

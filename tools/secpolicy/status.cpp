@@ -8,7 +8,6 @@
 #include "ending.h"
 #include "host/linux/operation/state_use.h"
 #include "installed/installed_json.h"
-#include "monitor/metrics.h"
 #include "root.h"
 #include "scratch/scratch_state.h"
 #include "status/host_status.h"
@@ -16,6 +15,7 @@
 #include "terminal/color.h"
 #include "terminal/size.h"
 #include "text/format.h"
+#include "text/replace_file.h"
 #include "text/visible.h"
 #include "verb.h"
 

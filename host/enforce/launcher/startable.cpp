@@ -13,9 +13,6 @@
 namespace Enforce {
 namespace {
 
-// Scripts may be interpreted by scripts, as often as the kernel goes along with.
-constexpr int kMostInterpreters = 5;
-
 int OpenForReading(const Program& program) {
   if (program.descriptor >= 0) return dup(program.descriptor);
   return open(program.path.c_str(), Kernel::kForReading | O_CLOEXEC);

@@ -14,6 +14,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/percent_encoding.h"
 #include "host/linux/common/shared_directory.h"
 #include "host/linux/common/used_paths.h"
 #include "host/linux/common/write_all.h"
@@ -30,29 +31,8 @@ using Braxo::Misc::StrCat;
 constexpr char kNew[] = ".new";
 constexpr char kStateCopy[] = ".state";
 
-// A letter that stands for itself in the name of a plan's file. A dot does not: files whose names
-// begin with one are no plans.
-bool IsPlain(char letter) {
-  constexpr std::string_view kMarks = "-_+,=@";
-  return (letter >= 'a' && letter <= 'z') || (letter >= 'A' && letter <= 'Z') ||
-         (letter >= '0' && letter <= '9') || kMarks.find(letter) != std::string_view::npos;
-}
-
-std::string FileNameOf(const std::string& domain) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
-  std::string name;
-  for (const char letter : domain) {
-    if (IsPlain(letter)) {
-      name += letter;
-      continue;
-    }
-    const auto byte = static_cast<unsigned char>(letter);
-    name += '%';
-    name += kDigits[byte >> 4];
-    name += kDigits[byte & 0xf];
-  }
-  return name;
-}
+// A dot begins names of files that are no plans.
+std::string FileNameOf(const std::string& domain) { return PercentEncoded(domain, "-_+,=@"); }
 
 // Tells the file of the state from another that was put in its place. Empty where there is none.
 std::string IdentityOfState() {

@@ -15,9 +15,6 @@ using Braxo::Lib::BraxoException;
 using Policy::Rule;
 using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
-// Scripts may be interpreted by scripts, as often as the kernel goes along with.
-constexpr int kMostInterpreters = 5;
-
 // The kernel reads what it executes.
 Rule ThatReads(Rule rule) {
   if (rule.kind == Policy::RuleKind::kFilePath) {
@@ -99,7 +96,7 @@ void RequireExecutable(const std::string& path, const Policy::InstalledDomain& d
                        SecPolicy::TeskAccessInterfaceImpl& access) {
   std::optional<ProgramFile> program = TryToOpen(path);
   std::string role;
-  for (int count = 0; count < kMostInterpreters && program; ++count) {
+  for (int count = 0; count < Enforce::kMostInterpreters && program; ++count) {
     const Policy::FileQuestion asked = AskToExecute(*program, access);
     RequireAllowed(asked, domain, access, role);
     RequireToStay(asked, domain);

@@ -23,8 +23,4 @@ struct Gauge {
 // The metrics in the text format that Prometheus and its collectors read, version 0.0.4.
 std::string TextOf(std::span<const Gauge> gauges);
 
-// Puts a file with this text in place of `path`, which everybody may read and others see whole: the
-// old or the new. Throws BraxoException.
-void ReplaceFile(const std::string& path, const std::string& text);
-
 }  // namespace SecPolicyCli

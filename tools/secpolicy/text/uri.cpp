@@ -2,16 +2,12 @@
 
 #include <charconv>
 
+#include "host/linux/common/percent_encoding.h"
+
 namespace SecPolicyCli {
 namespace {
 
 constexpr std::string_view kFileScheme = "file://";
-
-bool IsPlain(char byte) {
-  const bool isLetter = (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z');
-  return isLetter || (byte >= '0' && byte <= '9') ||
-         std::string_view("-._~/").find(byte) != std::string_view::npos;
-}
 
 // The byte that "%xx" at the beginning of the text stands for; nothing when there is none.
 std::optional<char> DecodeByte(std::string_view text) {
@@ -26,19 +22,8 @@ std::optional<char> DecodeByte(std::string_view text) {
 }  // namespace
 
 std::string ToUri(std::string_view path) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
-  std::string uri(path.starts_with('/') ? kFileScheme : "");
-  for (const char letter : path) {
-    if (IsPlain(letter)) {
-      uri += letter;
-      continue;
-    }
-    const auto byte = static_cast<unsigned char>(letter);
-    uri += '%';
-    uri += kDigits[byte >> 4];
-    uri += kDigits[byte & 0xf];
-  }
-  return uri;
+  const std::string scheme(path.starts_with('/') ? kFileScheme : "");
+  return scheme + LinuxHost::PercentEncoded(path, "-._~/");
 }
 
 std::optional<std::string> PathOfUri(std::string_view uri) {
