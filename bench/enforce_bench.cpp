@@ -1,15 +1,18 @@
 // What a domain costs: makes plans for the launcher, and is itself the program that runs in one.
 //
-//   enforce_bench plan FILE DIRECTORY RULES reads|writes|masks
+//   enforce_bench plan FILE DIRECTORY RULES writes|masks|reads|named
 //                                                           a plan with so many rules about paths
-//                                                           that may be written, or all be read as
-//                                                           one; of those it may hide eight
+//                                                           that may be written, also one that
+//                                                           hides eight of them; or be read, as
+//                                                           all may, or only what a program needs
+//                                                           and what is beside DIRECTORY
 //   enforce_bench compile COUNT DIRECTORY RULES             makes such a plan so often, and prints
 //   the
 //                                                           processor time of one in microseconds
 //   enforce_bench open COUNT FILE                           opens and closes the file so often
-//   enforce_bench landlock COUNT FILE                       the same where Landlock lets everything
-//                                                           be read, and nothing else is set up
+//   enforce_bench landlock COUNT FILE DIRECTORY             the same where Landlock lets all in the
+//                                                           directory be read, is not asked about
+//                                                           truncation, and nothing else is set up
 //   enforce_bench call COUNT                                makes the cheapest system call so often
 
 #include <fcntl.h>
@@ -53,8 +56,16 @@ Rule Path(const std::string& path, const char* letters) {
       .kind = RuleKind::kFilePath, .words = {path}, .verdict = Policy::Permissions::Parse(letters)};
 }
 
+void GrantReading(const fs::path& directory, std::string_view kind, std::vector<Rule>* rules) {
+  if (kind != "named") return rules->push_back(Path("/", "rx"));
+  for (const char* const place : {"/usr", "/etc"}) rules->push_back(Path(place, "rx"));
+  rules->push_back(Path(fs::read_symlink("/proc/self/exe").parent_path(), "rx"));
+  rules->push_back(Path(directory.parent_path(), "rx"));
+}
+
 // The directories that rules are about are made where they are missing.
-Policy::InstalledDomain DomainWith(const fs::path& directory, int rules, bool writes) {
+Policy::InstalledDomain DomainWith(const fs::path& directory, int rules, std::string_view kind) {
+  const bool writes = kind == "writes" || kind == "masks";
   Policy::InstalledDomain domain;
   domain.name = "benchDom";
   for (const char* set : {"@start", "@file", "@io", "@network", "@process", "@signal"}) {
@@ -66,7 +77,7 @@ Policy::InstalledDomain DomainWith(const fs::path& directory, int rules, bool wr
     rule.words[1] = std::to_string(8000 + port);
     domain.rules.push_back(std::move(rule));
   }
-  domain.rules.push_back(Path("/", "rx"));
+  GrantReading(directory, kind, &domain.rules);
   for (int number = 0; number < rules; ++number) {
     const fs::path path = directory / std::to_string(number);
     fs::create_directories(path);
@@ -84,7 +95,7 @@ Enforce::CompiledPlan Compile(const Policy::InstalledDomain& domain,
 
 void WritePlan(const char* file, const fs::path& directory, int rules, std::string_view kind) {
   constexpr std::size_t kMasks = 8;
-  Enforce::Plan plan = Compile(DomainWith(directory, rules, kind != "reads"), {}).plan;
+  Enforce::Plan plan = Compile(DomainWith(directory, rules, kind), {}).plan;
   for (const Enforce::PathRight& right : plan.paths) {
     const bool isMasked = kind == "masks" && plan.masks.size() < kMasks;
     if (isMasked && right.path.starts_with(directory.native())) {
@@ -102,7 +113,7 @@ double ProcessorMicroseconds() {
 }
 
 void TimeCompile(int count, const fs::path& directory, int rules) {
-  const Policy::InstalledDomain domain = DomainWith(directory, rules, false);
+  const Policy::InstalledDomain domain = DomainWith(directory, rules, "reads");
   const std::vector<LabelledPath> places = {{"/", "label"}};
   Compile(domain, places);
   const double begin = ProcessorMicroseconds();
@@ -118,18 +129,18 @@ void OpenOften(int count, const char* path) {
   }
 }
 
-// What a domain that reads cannot do without: all rights are handled, and one rule is all that
-// there is.
-void RestrictToReading() {
-  const int ruleset =
-      Kernel::CreateRuleset({.handledFiles = Landlock::AllRights(Kernel::LandlockVersion())});
-  const int root = Kernel::OpenPlace("/");
-  if (ruleset < 0 || root < 0 || prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
-      Kernel::AddPath(ruleset, root, Landlock::kReadFile | Landlock::kReadDir) != 0 ||
+// What a domain that reads cannot do without: one rule, at which the kernel ends its way up.
+void RestrictToReading(const char* directory) {
+  const std::uint64_t handled =
+      Landlock::AllRights(Kernel::LandlockVersion()) & ~Landlock::kTruncate;
+  const int ruleset = Kernel::CreateRuleset({.handledFiles = handled});
+  const int place = Kernel::OpenPlace(directory);
+  if (ruleset < 0 || place < 0 || prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
+      Kernel::AddPath(ruleset, place, Landlock::kReadFile | Landlock::kReadDir) != 0 ||
       Kernel::RestrictSelf(ruleset) != 0) {
     Fail("landlock");
   }
-  close(root);
+  close(place);
   close(ruleset);
 }
 
@@ -147,8 +158,8 @@ int main(int count, char** words) {
     TimeCompile(std::atoi(words[2]), words[3], std::atoi(words[4]));
   } else if (verb == "open" && count == 4) {
     OpenOften(std::atoi(words[2]), words[3]);
-  } else if (verb == "landlock" && count == 4) {
-    RestrictToReading();
+  } else if (verb == "landlock" && count == 5) {
+    RestrictToReading(words[4]);
     OpenOften(std::atoi(words[2]), words[3]);
   } else if (verb == "call" && count == 3) {
     CallOften(std::atoi(words[2]));

@@ -22,8 +22,10 @@ using Policy::Rule;
 using Policy::RuleKind;
 
 // The first that can refuse to truncate files, without which what may not be written can be
-// emptied.
-constexpr int kNeededLandlock = 3;
+// emptied, unless a filter refuses it.
+constexpr int kTruncationVersion = 3;
+
+constexpr Rights kReading = Landlock::kReadFile | Landlock::kReadDir;
 
 constexpr char kWithoutLandlock[] =
     "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)";
@@ -97,8 +99,21 @@ void TellOfBroker(const std::string& domain, std::vector<RuleFate>* fates) {
   }
 }
 
+// Landlock asks about truncation at every open, and does not stop on its way to the root before it
+// is granted. So where nothing may be written that is left to the filter, but for the call that it
+// does not see through: who grants just that gets it.
+Truncation TruncationOf(const PathPlan& paths, const InstalledDomain& domain,
+                        const Features& features) {
+  constexpr Rights kWithoutWriting = kReading | Landlock::kExecute;
+  const bool writes = std::ranges::any_of(
+      paths.rights, [](const PathRight& right) { return (right.rights & ~kWithoutWriting) != 0; });
+  if (writes || !features.seccomp || IsCallNamed(domain, "openat2")) return Truncation::kByLandlock;
+  return Truncation::kByFilter;
+}
+
 struct Parts {
   PathPlan paths;
+  Truncation truncation;
   CallPlan calls;
   CapabilityPlan capabilities;
   NetPlan net;
@@ -109,19 +124,24 @@ Parts PlanParts(const InstalledDomain& domain, const Surroundings& surroundings)
   CapabilityPlan capabilities = PlanCapabilities(
       domain, features.capabilities, static_cast<unsigned int>(features.lastCapability));
   const bool mayMask = (capabilities.kept & kPastMasks) == 0;
-  return {.paths = PlanPaths(domain, surroundings.places, surroundings.files, mayMask),
-          .calls = PlanCalls(domain),
+  PathPlan paths = PlanPaths(domain, surroundings.places, surroundings.files, mayMask);
+  const Truncation truncation = TruncationOf(paths, domain, features);
+  return {.paths = std::move(paths),
+          .truncation = truncation,
+          .calls = PlanCalls(domain, truncation),
           .capabilities = std::move(capabilities),
           .net = PlanNet(domain, features.landlock)};
 }
 
-bool HasLandlock(const Features& features) { return features.landlock >= kNeededLandlock; }
+bool HasLandlock(const Features& features, Truncation truncation) {
+  return features.landlock >= (truncation == Truncation::kByFilter ? 1 : kTruncationVersion);
+}
 
 bool IsScoped(const Features& features) { return features.landlock >= Kernel::kScopesVersion; }
 
-std::vector<std::string> GapsOf(const Features& features) {
+std::vector<std::string> GapsOf(const Features& features, Truncation truncation) {
   std::vector<std::string> gaps;
-  if (!HasLandlock(features)) gaps.emplace_back(kWithoutLandlock);
+  if (!HasLandlock(features, truncation)) gaps.emplace_back(kWithoutLandlock);
   if (!features.seccomp) gaps.emplace_back(kWithoutSeccomp);
   return gaps;
 }
@@ -135,18 +155,36 @@ std::vector<RuleFate> TakeFates(Parts& parts, const Features& features) {
   std::ranges::sort(fates, {}, &RuleFate::place);
   for (RuleFate& fate : fates) {
     const RuleKind kind = fate.rule.kind;
-    if (IsAboutFiles(kind) && !HasLandlock(features)) GiveUp(fate, kWithoutLandlock);
+    if (IsAboutFiles(kind) && !HasLandlock(features, parts.truncation))
+      GiveUp(fate, kWithoutLandlock);
     if (IsAboutCalls(kind) && !features.seccomp) GiveUp(fate, kWithoutSeccomp);
     if (IsScoped(features)) NarrowToScope(fate);
   }
   return fates;
 }
 
-// What of a plan about files this version of Landlock has.
-void TakeFiles(PathPlan& paths, int landlock, Plan* plan) {
-  plan->handledFiles = Landlock::AllRights(landlock);
+// What the root gives, all files give.
+Rights RightsToAll(const PathPlan& paths) {
+  Rights rights = 0;
+  for (const PathRight& right : paths.rights) {
+    if (right.path == "/") rights |= right.rights;
+  }
+  return rights;
+}
+
+// What Landlock is asked about. What all files may be read for it is not asked about at every open,
+// unless some are within reach that have another root.
+Rights HandledRights(const Parts& parts, const Surroundings& surroundings) {
+  const Rights known = Landlock::AllRights(surroundings.features.landlock);
+  if (parts.truncation == Truncation::kByLandlock) return known;
+  const Rights unasked = surroundings.isBelowRoot ? 0 : RightsToAll(parts.paths) & kReading;
+  return known & ~Landlock::kTruncate & ~unasked;
+}
+
+void TakeFiles(PathPlan& paths, Rights handled, Plan* plan) {
+  plan->handledFiles = handled;
   for (PathRight& right : paths.rights) {
-    right.rights &= plan->handledFiles;
+    right.rights &= handled;
     if (right.rights != 0) plan->paths.push_back(std::move(right));
   }
   plan->masks = std::move(paths.masks);
@@ -159,17 +197,20 @@ void TakePorts(NetPlan& net, Plan* plan) {
   plan->connectPorts = std::move(net.connect.ports);
 }
 
-CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts parts) {
+CompiledPlan Join(const InstalledDomain& domain, const Surroundings& surroundings, Parts parts) {
+  const Features& features = surroundings.features;
   CompiledPlan compiled;
   compiled.fates = TakeFates(parts, features);
   TellOfBroker(domain.name, &compiled.fates);
-  compiled.gaps = GapsOf(features);
+  compiled.gaps = GapsOf(features, parts.truncation);
   Plan& plan = compiled.plan;
   plan.domain = domain.name;
   plan.domainId = domain.id;
   plan.level = domain.level;
   plan.keepsBroker = KeepsBroker(domain, compiled.fates);
-  if (HasLandlock(features)) TakeFiles(parts.paths, features.landlock, &plan);
+  if (HasLandlock(features, parts.truncation)) {
+    TakeFiles(parts.paths, HandledRights(parts, surroundings), &plan);
+  }
   TakePorts(parts.net, &plan);
   plan.isScoped = IsScoped(features);
   plan.capabilities = parts.capabilities.kept;
@@ -183,7 +224,7 @@ CompiledPlan Join(const InstalledDomain& domain, const Features& features, Parts
 }  // namespace
 
 CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surroundings) {
-  return Join(domain, surroundings.features, PlanParts(domain, surroundings));
+  return Join(domain, surroundings, PlanParts(domain, surroundings));
 }
 
 std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
@@ -208,7 +249,7 @@ std::string Explain(const InstalledDomain& domain, const Surroundings& surroundi
   Parts parts = PlanParts(domain, surroundings);
   std::string text =
       Dump(parts.paths) + Dump(parts.net) + Dump(parts.capabilities) + Dump(parts.calls);
-  const CompiledPlan compiled = Join(domain, surroundings.features, std::move(parts));
+  const CompiledPlan compiled = Join(domain, surroundings, std::move(parts));
   for (const std::string& line : CoverageOf(compiled)) text += line + "\n";
   return text;
 }

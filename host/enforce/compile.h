@@ -16,6 +16,8 @@ struct Surroundings {
   const Features& features;
   const std::vector<LabelledPath>& places;
   FileTree& files;
+  // The domain is entered in a part of the machine's tree, out of which descriptors may lead.
+  bool isBelowRoot = false;
 };
 
 struct CompiledPlan {

@@ -124,18 +124,41 @@ a_victim() {
   gets narrowDom ok read=/t/secret/file
 }
 
-@test "3 emptying what may only be read" {
+emptying=({open,read,ioctl}-truncate=/t/secret/file {,f}truncate=/t/secret/file)
+
+@test "3 emptying what may only be read, in a domain that writes nothing" {
   domain narrowDom "${calls[@]}" '-r /t r'
   domain wideDom "${calls[@]}" '-r /t rw'
+  domain namingDom "${calls[@]}" '-r /t r' '-s openat2 grant'
   boot_root
-  refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
+  refuses EACCES "${emptying[@]}"
+  refuses ENOSYS openat2-truncate=/t/secret/file
+  gets namingDom EACCES "${emptying[@]}" openat2-truncate=/t/secret/file
+  gets narrowDom ok read=/t/secret/file pipe-truncate
+}
+
+@test "3 emptying what may only be read, where that is all there is" {
+  domain narrowDom "${calls[@]}" '-r / rx'
+  domain wideDom "${calls[@]}" '-r / rwx'
+  boot_root
+  as_machine
+  refuses EACCES "${emptying[@]}" write=/t/secret/file create=/t/secret/new unlink=/t/secret/file
+  gets narrowDom ok read=/t/public/file list=/t/secret pipe-truncate
+}
+
+@test "3 emptying what may only be read, beside what may be written" {
+  domain narrowDom "${calls[@]}" '-r /t r' '-r /t/public rw'
+  domain wideDom "${calls[@]}" '-r /t rw'
+  boot_root
+  refuses EACCES "${emptying[@]}" openat2-truncate=/t/secret/file
+  gets narrowDom ok "${emptying[@]//secret/public}" openat2-truncate=/t/public/file
 }
 
 @test "3 emptying what may be written but not truncated" {
   domain narrowDom "${calls[@]}" '-a secret read grant' '-a secret write grant'
   domain wideDom "${calls[@]}" '-a secret read grant' '-a secret write grant' '-a secret truncate grant'
   boot_root
-  refuses EACCES open-truncate=/t/secret/file read-truncate=/t/secret/file truncate=/t/secret/file ftruncate=/t/secret/file
+  refuses EACCES "${emptying[@]}" openat2-truncate=/t/secret/file
   gets narrowDom ok write=/t/secret/file
 }
 
@@ -455,8 +478,8 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   domain wideDom "${calls[@]}" "${can[@]}" '-s open_by_handle_at grant'
   boots
   refuses EPERM open-by-handle=/t/public/file,/t/public
-  gets wideDom EACCES open-by-handle=/t/secret/file,/t/public
-  gets openDom ok open-by-handle=/t/secret/file,/t/public
+  gets wideDom EACCES open-by-handle=/t/secret/file,/t/public handle-truncate=/t/public/file,/t/public
+  gets openDom ok open-by-handle=/t/secret/file,/t/public handle-truncate=/t/public/file,/t/public
 }
 
 @test "18 inherited descriptors" {
@@ -479,6 +502,18 @@ mounting=('-s mount grant' '-s umount2 grant' '-s open_tree grant' '-s move_moun
   exec <"$root"
   refuses EACCES read=/proc/self/fd/0/t/secret/file
   exec <&7 7<&-
+}
+
+@test "18 reading outside of a root, all of which may be read" {
+  domain narrowDom "${calls[@]}" '-r / r'
+  boots
+  mkdir "$BATS_TEST_TMPDIR/outside"
+  echo content >"$BATS_TEST_TMPDIR/outside/file"
+  exec 7<&0 <"$BATS_TEST_TMPDIR/outside"
+  gets narrowDom EACCES read=/proc/self/fd/0/file
+  gets openDom ok read=/proc/self/fd/0/file
+  exec <&7 7<&-
+  gets narrowDom ok read=/t/secret/file
 }
 
 @test "20 attributes by ioctl" {

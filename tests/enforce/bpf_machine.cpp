@@ -96,6 +96,8 @@ std::string AnswerOf(const std::vector<sock_filter>& program, const seccomp_data
   switch (Run(program, call)) {
     case SECCOMP_RET_ALLOW:
       return "allowed";
+    case SECCOMP_RET_ERRNO | EACCES:
+      return "EACCES";
     case SECCOMP_RET_ERRNO | EPERM:
       return "EPERM";
     case SECCOMP_RET_ERRNO | ENOSYS:

@@ -22,7 +22,7 @@ std::string RefusalOf(const std::vector<sock_filter>& program);
 // What the program returns for a call. Throws std::logic_error where it does what a filter may not.
 std::uint32_t Run(const std::vector<sock_filter>& program, const seccomp_data& call);
 
-// "allowed", "EPERM", "ENOSYS", "killed".
+// "allowed", "EACCES", "EPERM", "ENOSYS", "killed".
 std::string AnswerOf(const std::vector<sock_filter>& program, const seccomp_data& call);
 
 }  // namespace EnforceTest

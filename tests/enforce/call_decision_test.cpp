@@ -2,6 +2,7 @@
 // refuse, and for one that it refuses, the rules grant, and no rule's fate tells of. By domains of
 // chance, each call and many arguments.
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <linux/fs.h>
@@ -23,6 +24,7 @@ namespace {
 
 using Enforce::CallPlan;
 using Enforce::PlanCalls;
+using Enforce::Truncation;
 using Policy::InstalledDomain;
 using Policy::Rule;
 
@@ -94,6 +96,27 @@ bool ArgumentsPass(const InstalledDomain& domain, const std::string& call,
   });
 }
 
+struct Opening {
+  const char* call;
+  std::size_t flags;
+};
+constexpr Opening kOpenings[] = {{"open", 1}, {"open_by_handle_at", 2}, {"openat", 2}};
+
+bool CanTruncate(const std::string& call) {
+  return call == "truncate" ||
+         std::ranges::find(kOpenings, call, &Opening::call) != std::end(kOpenings);
+}
+
+// Whether the call truncates a file that it does not open for writing.
+bool Truncates(const std::string& call, const Arguments& arguments) {
+  if (call == "truncate") return true;
+  const auto* const opening = std::ranges::find(kOpenings, call, &Opening::call);
+  if (opening == std::end(kOpenings)) return false;
+  const std::uint64_t flags = arguments.at(opening->flags);
+  const std::uint64_t mode = flags & O_ACCMODE;
+  return (flags & O_TRUNC) != 0 && mode != O_WRONLY && mode != O_RDWR;
+}
+
 // Whether a rule that grants the call, or one of its checks, is told to be less than it says.
 bool IsTold(const CallPlan& plan, const std::string& call) {
   return std::ranges::any_of(plan.fates, [&](const Enforce::RuleFate& fate) {
@@ -136,6 +159,9 @@ constexpr std::uint64_t kValues[] = {0,
                                      TIOCLINUX,
                                      FS_IOC_SETFLAGS,
                                      FS_IOC_FSSETXATTR,
+                                     O_TRUNC,
+                                     O_TRUNC | O_CREAT | O_RDWR,
+                                     O_CREAT | O_CLOEXEC,
                                      0x8901,
                                      0xffff,
                                      0x7fff'ffff,
@@ -198,29 +224,48 @@ std::string Show(const InstalledDomain& domain, const Arguments& arguments) {
 struct Tally {
   std::size_t asked = 0;
   std::size_t allowed = 0;
+  std::size_t keptWhole = 0;
+};
+
+// What a call is refused with that no rule grants, or that goes past the rules.
+std::string ExpectedRefusal(const std::string& call, Truncation truncation) {
+  const bool isUnknown =
+      call == "clone3" || (call == "openat2" && truncation == Truncation::kByFilter);
+  return isUnknown ? "ENOSYS" : "EPERM";
+}
+
+struct Case {
+  const InstalledDomain& domain;
+  const CallPlan& plan;
+  const Enforce::SystemCall& call;
+  Truncation truncation;
+  bool mayCall;
 };
 
 // Why an answer is not what the rules mean; empty when it is.
-std::string ErrorOf(const std::string& call, const std::string& answer, bool isGranted,
-                    bool isTold) {
+std::string ErrorOf(const Case& tried, const Arguments& arguments, const std::string& answer) {
+  const std::string& call = tried.call.name;
+  if (tried.mayCall && tried.truncation == Truncation::kByFilter && Truncates(call, arguments)) {
+    return answer == "EACCES" ? "" : "truncated with " + answer;
+  }
+  const bool isGranted = tried.mayCall && ArgumentsPass(tried.domain, call, arguments);
   if (answer == "allowed") return isGranted ? "" : "allowed without a grant";
-  if (isGranted) return isTold ? "" : "refused without a word";
-  return answer == (call == "clone3" ? "ENOSYS" : "EPERM") ? "" : answer;
+  if (isGranted) return IsTold(tried.plan, call) ? "" : "refused without a word";
+  return answer == ExpectedRefusal(call, tried.truncation) ? "" : answer;
 }
 
-void ExpectMeaning(const InstalledDomain& domain, const CallPlan& plan,
-                   const Enforce::SystemCall& call, Chance& chance, Tally& tally) {
-  const bool mayCall = MayCall(domain, call.name);
-  const bool isTold = IsTold(plan, call.name);
-  const bool isChecked = std::ranges::find(kUses, call.name, &Use::call) != std::end(kUses);
+void ExpectMeaning(const Case& tried, Chance& chance, Tally& tally) {
+  const std::string& call = tried.call.name;
+  const bool isChecked = std::ranges::find(kUses, call, &Use::call) != std::end(kUses) ||
+                         (tried.truncation == Truncation::kByFilter && CanTruncate(call));
   for (int round = isChecked ? 40 : 1; round > 0; --round) {
     const Arguments arguments = chance.Any();
-    const std::string answer = AnswerOf(plan.program, CallOf(call.number, arguments));
-    const bool isGranted = mayCall && ArgumentsPass(domain, call.name, arguments);
-    ASSERT_EQ(ErrorOf(call.name, answer, isGranted, isTold), "") << call.name << "\n"
-                                                                 << Show(domain, arguments);
+    const std::string answer = AnswerOf(tried.plan.program, CallOf(tried.call.number, arguments));
+    ASSERT_EQ(ErrorOf(tried, arguments, answer), "") << call << "\n"
+                                                     << Show(tried.domain, arguments);
     ++tally.asked;
     if (answer == "allowed") ++tally.allowed;
+    if (answer == "EACCES") ++tally.keptWhole;
   }
 }
 
@@ -230,20 +275,28 @@ constexpr unsigned int kDomains = 100;
 constexpr unsigned int kDomains = 500;
 #endif
 
+void ExpectMeaningOfDomain(unsigned int seed, Truncation truncation, Tally& tally) {
+  Chance chance(seed);
+  const InstalledDomain domain = chance.Domain();
+  const CallPlan plan = PlanCalls(domain, truncation);
+  ASSERT_EQ(RefusalOf(plan.program), "") << seed;
+  for (const Enforce::SystemCall& call : Enforce::SystemCalls()) {
+    const bool mayCall = MayCall(domain, call.name);
+    ExpectMeaning({domain, plan, call, truncation, mayCall}, chance, tally);
+    ASSERT_FALSE(testing::Test::HasFatalFailure()) << "seed " << seed;
+  }
+}
+
 TEST(PlanCalls, DoesAsTheRulesMean) {
   Tally tally;
   for (unsigned int seed = 0; seed < kDomains; ++seed) {
-    Chance chance(seed);
-    const InstalledDomain domain = chance.Domain();
-    const CallPlan plan = PlanCalls(domain);
-    ASSERT_EQ(RefusalOf(plan.program), "") << seed;
-    for (const Enforce::SystemCall& call : Enforce::SystemCalls()) {
-      ExpectMeaning(domain, plan, call, chance, tally);
-      ASSERT_FALSE(testing::Test::HasFatalFailure()) << "seed " << seed;
-    }
+    ExpectMeaningOfDomain(seed, seed % 2 == 0 ? Truncation::kByLandlock : Truncation::kByFilter,
+                          tally);
+    ASSERT_FALSE(testing::Test::HasFatalFailure());
   }
   EXPECT_GT(tally.asked, kDomains * 1000);
   EXPECT_GT(tally.allowed, tally.asked / 20);
+  EXPECT_GT(tally.keptWhole, kDomains);
 }
 
 TEST(PlanCalls, AnswersNumbersOfNoCallAsUnknown) {

@@ -150,6 +150,30 @@ TEST(Filter, LeavesOnlyTcpWhereThereIsMultipath) {
   EXPECT_EQ(Confined({"-s socket grant"}, multipath), "works");
 }
 
+// Opens a file in memory once more; an error, too, where it has not become what the flags say.
+int OpenAgain(int flags) {
+  const auto file = static_cast<int>(syscall(SYS_memfd_create, "file", 0));
+  if (syscall(SYS_write, file, "text", 4) != 4) return EIO;
+  const std::string path = "/proc/self/fd/" + std::to_string(file);
+  if (syscall(SYS_openat, AT_FDCWD, path.c_str(), flags, 0) < 0) return errno;
+  const bool isEmpty = syscall(SYS_lseek, file, 0, SEEK_END) == 0;
+  return isEmpty == ((flags & O_TRUNC) != 0) ? 0 : EIO;
+}
+
+TEST(Filter, TruncatesNothingThatIsNotOpenedForWriting) {
+  const auto confined = [](Deed deed) {
+    EXPECT_EQ(Try({}, deed), "works") << "without a filter";
+    const std::vector<std::string> lines = {"-s memfd_create grant", "-s write grant",
+                                            "-s openat grant", "-s lseek grant",
+                                            "-s exit_group grant"};
+    return Try(PlanCalls(DomainOf(lines), Enforce::Truncation::kByFilter).program, deed);
+  };
+  EXPECT_EQ(confined([] { return OpenAgain(O_RDONLY); }), "works");
+  EXPECT_EQ(confined([] { return OpenAgain(O_RDONLY | O_TRUNC); }), "EACCES");
+  EXPECT_EQ(confined([] { return OpenAgain(O_ACCMODE | O_TRUNC); }), "EACCES");
+  EXPECT_EQ(confined([] { return OpenAgain(O_WRONLY | O_TRUNC); }), "works");
+}
+
 // /dev/null is no terminal, and says so where it is asked.
 TEST(Filter, RefusesTypingIntoTheTerminal) {
   const Deed type = [] {

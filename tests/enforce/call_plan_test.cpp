@@ -514,6 +514,59 @@ TEST(PlanCalls, LeavesRingsToNobody) {
                           "filter sees what a ring does)"));
 }
 
+// ---- Truncation
+
+CallPlan PlanThatTruncatesNothing(const std::vector<std::string>& lines) {
+  return PlanCalls(DomainOf(lines), Enforce::Truncation::kByFilter);
+}
+
+TEST(PlanCalls, TruncatesNoFileThatIsNotOpenedForWriting) {
+  const CallPlan plan = PlanThatTruncatesNothing({"-s @file grant", "-s open_by_handle_at grant"});
+  constexpr std::uint64_t kNeither = O_ACCMODE;  // for ioctl alone
+  for (const std::uint64_t flags : Numbers{O_TRUNC, O_TRUNC | O_CREAT, O_TRUNC | O_CLOEXEC,
+                                           O_TRUNC | kNeither, kHighBits | O_TRUNC}) {
+    EXPECT_EQ(Ask(plan, "open", {0, flags}), "EACCES") << flags;
+    EXPECT_EQ(Ask(plan, "openat", {0, 0, flags}), "EACCES") << flags;
+    EXPECT_EQ(Ask(plan, "open_by_handle_at", {0, 0, flags}), "EACCES") << flags;
+  }
+  for (const std::uint64_t flags :
+       Numbers{O_RDONLY, O_RDONLY | O_CLOEXEC, kNeither, O_WRONLY | O_CREAT | O_TRUNC,
+               O_RDWR | O_TRUNC, kHighBits | O_RDONLY}) {
+    EXPECT_EQ(Ask(plan, "open", {O_TRUNC, flags}), "allowed") << flags;
+    EXPECT_EQ(Ask(plan, "openat", {0, O_TRUNC, flags}), "allowed") << flags;
+    EXPECT_EQ(Ask(plan, "open_by_handle_at", {0, O_TRUNC, flags}), "allowed") << flags;
+  }
+  EXPECT_EQ(Ask(plan, "truncate"), "EACCES");
+  EXPECT_EQ(Ask(plan, "ftruncate"), "allowed");
+  EXPECT_EQ(Ask(plan, "creat"), "allowed");
+}
+
+TEST(PlanCalls, TellsOfTheCallWhoseFlagsNoFilterSees) {
+  const CallPlan plan = PlanThatTruncatesNothing({"-s @file grant", "-s openat grant"});
+  EXPECT_EQ(Ask(plan, "openat2"), "ENOSYS");
+  EXPECT_THAT(Told(plan.fates),
+              ElementsAre("narrowed: -s @file grant (openat2: answered as unknown unless granted "
+                          "by itself, so that programs use openat)"));
+  EXPECT_EQ(Ask({"-s @file grant"}, "openat2"), "allowed");
+}
+
+TEST(PlanCalls, RefusesTruncationAsACallWhereNoRuleGrantsIt) {
+  const CallPlan plan = PlanThatTruncatesNothing({"-s @file grant", "-s truncate revoke"});
+  EXPECT_EQ(Ask(plan, "truncate"), "EPERM");
+  EXPECT_EQ(Ask(PlanThatTruncatesNothing({"-s open revoke"}), "open", {0, O_TRUNC}), "EPERM");
+}
+
+TEST(IsCallNamed, IsAboutRulesThatGrantTheCallByItself) {
+  const auto isNamed = [](const char* line) {
+    return Enforce::IsCallNamed(DomainOf({line}), "openat2");
+  };
+  EXPECT_TRUE(isNamed("-s openat2 grant"));
+  EXPECT_FALSE(isNamed("-s openat2 revoke"));
+  EXPECT_FALSE(isNamed("-s @file grant"));
+  EXPECT_FALSE(isNamed("-s openat grant"));
+  EXPECT_FALSE(isNamed("-a openat2 read grant"));
+}
+
 // ---- Size
 
 // Two hundred domains of one call more each: the largest filter there can be without checks.

@@ -50,6 +50,8 @@ const std::vector<std::string> kOneOfEachKind = {"-a label read grant",
                                                  "-s read grant",
                                                  "-u label stream revoke"};
 
+constexpr std::uint64_t kAllRights = Enforce::Landlock::AllRights(7);
+
 CompiledPlan CompileOn(const Features& features, const std::vector<std::string>& lines) {
   EmptyDirectories files;
   const std::vector<Enforce::LabelledPath> places = {{"/", "label"}};
@@ -66,7 +68,7 @@ TEST(Compile, GivesEveryRuleItsFateInOrder) {
 
 TEST(Compile, TakesWhatEachPartHas) {
   const CompiledPlan compiled = CompileOn(NewKernel(), kOneOfEachKind);
-  EXPECT_EQ(compiled.plan.handledFiles, Enforce::Landlock::AllRights(7));
+  EXPECT_EQ(compiled.plan.handledFiles, kAllRights);
   EXPECT_THAT(compiled.plan.paths, ElementsAre(Field(&Enforce::PathRight::path, "/")));
   EXPECT_TRUE(compiled.plan.bindsChecked);
   EXPECT_THAT(compiled.plan.bindPorts, ElementsAre(80));
@@ -104,7 +106,7 @@ TEST(Compile, TellsWhatAKernelWithoutLandlockCannotRefuse) {
     Features features = NewKernel();
     features.landlock = version;
     const CompiledPlan compiled =
-        CompileOn(features, {"-r /srv r", "-a label read grant", "-c cap_kill grant"});
+        CompileOn(features, {"-r /srv rw", "-a label read grant", "-c cap_kill grant"});
     EXPECT_EQ(compiled.plan.handledFiles, 0U);
     EXPECT_THAT(compiled.plan.paths, IsEmpty());
     EXPECT_EQ(NotExpressible(compiled.fates).size(), 2U) << version;
@@ -112,6 +114,76 @@ TEST(Compile, TellsWhatAKernelWithoutLandlockCannotRefuse) {
               "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)");
   }
 }
+
+// ---- Domains that write nothing
+
+std::uint64_t HandledFor(const std::vector<std::string>& lines) {
+  return CompileOn(NewKernel(), lines).plan.handledFiles;
+}
+
+TEST(Compile, LeavesTruncationToTheFilterWhereNothingIsWritten) {
+  constexpr std::uint64_t kWithoutTruncation = kAllRights & ~Enforce::Landlock::kTruncate;
+  EXPECT_EQ(HandledFor({}), kWithoutTruncation);
+  EXPECT_EQ(HandledFor({"-r /srv rx", "-s @file grant"}), kWithoutTruncation);
+  for (const char* const line : {"-r /srv rw", "-a label write grant", "-a label truncate grant",
+                                 "-a label remove grant", "-f label label regular grant"}) {
+    EXPECT_EQ(HandledFor({"-a label read grant", line}), kAllRights) << line;
+  }
+}
+
+TEST(Compile, LeavesTruncationToLandlockBesideACallWhoseFlagsNoFilterSees) {
+  EXPECT_EQ(HandledFor({"-r /srv r", "-s openat2 grant"}), kAllRights);
+  EXPECT_THAT(CompileOn(NewKernel(), {"-s openat2 grant"}).fates,
+              ElementsAre(Field(&Enforce::RuleFate::fate, Fate::kEnforced)));
+  EXPECT_THAT(CompileOn(NewKernel(), {"-s @file grant"}).fates,
+              ElementsAre(Field(&Enforce::RuleFate::fate, Fate::kNarrowed)));
+  EXPECT_THAT(CompileOn(NewKernel(), {"-s @file grant", "-r /srv rw"}).fates,
+              Each(Field(&Enforce::RuleFate::fate, Fate::kEnforced)));
+}
+
+TEST(Compile, LeavesTruncationToLandlockWhereThereAreNoFilters) {
+  Features features = NewKernel();
+  features.seccomp = false;
+  EXPECT_EQ(CompileOn(features, {"-r /srv r"}).plan.handledFiles, kAllRights);
+}
+
+TEST(Compile, KeepsFilesWholeOnKernelsWhoseLandlockCannot) {
+  for (const int version : {1, 2}) {
+    Features features = NewKernel();
+    features.landlock = version;
+    const CompiledPlan compiled = CompileOn(features, {"-r /srv rx", "-s openat grant"});
+    EXPECT_TRUE(KeepsAllRules(compiled));
+    EXPECT_EQ(compiled.plan.handledFiles, Enforce::Landlock::AllRights(version));
+    EXPECT_THAT(compiled.plan.paths, SizeIs(1));
+    EXPECT_FALSE(KeepsAllRules(CompileOn(features, {"-r /srv rx", "-s openat2 grant"})));
+    features.seccomp = false;
+    EXPECT_THAT(CompileOn(features, {"-r /srv rx"}).gaps, SizeIs(2)) << version;
+  }
+}
+
+TEST(Compile, AsksLandlockNothingOfWhatAllFilesMayBeReadFor) {
+  constexpr std::uint64_t kReading = Enforce::Landlock::kReadFile | Enforce::Landlock::kReadDir;
+  const CompiledPlan compiled = CompileOn(NewKernel(), {"-r / rx", "-r /srv r"});
+  EXPECT_EQ(compiled.plan.handledFiles & kReading, 0U);
+  EXPECT_NE(compiled.plan.handledFiles & Enforce::Landlock::kExecute, 0U);
+  EXPECT_EQ(HandledFor({"-a label read grant"}) & kReading, Enforce::Landlock::kReadDir);
+  EXPECT_EQ(HandledFor({"-r / r", "-r /srv"}) & kReading, kReading);
+  EXPECT_EQ(HandledFor({"-r / r", "-r /srv rw"}), kAllRights);
+}
+
+// Or who comes by a descriptor of what is outside could read that, too.
+TEST(Compile, AsksLandlockOfAllFilesBelowARoot) {
+  EmptyDirectories files;
+  const Features features = NewKernel();
+  const auto plan =
+      Compile(DomainOf({"-r / r"}),
+              {.features = features, .places = {}, .files = files, .isBelowRoot = true})
+          .plan;
+  EXPECT_EQ(plan.handledFiles, kAllRights & ~Enforce::Landlock::kTruncate);
+  EXPECT_THAT(plan.paths, SizeIs(1));
+}
+
+// ---- Other kernels
 
 TEST(Compile, TellsWhatCannotBeRefusedAlsoWhereNoRuleIsAboutIt) {
   EXPECT_THAT(CompileOn(NewKernel(), {"-s read grant"}).gaps, IsEmpty());

@@ -51,6 +51,18 @@ TEST(Dump, ShowsWhatIsClosedBesides) {
       "refused: all others\n");
 }
 
+TEST(Dump, ShowsWhatIsRefusedAsByLandlock) {
+  EXPECT_EQ(Dump(PlanCalls(DomainOf({"-s openat grant", "-s truncate grant", "-s execve grant"}),
+                           Enforce::Truncation::kByFilter)),
+            "answered as unknown: clone3 openat2\n"
+            "refused with EACCES: truncate\n"
+            "allowed: execve\n"
+            "allowed where argument 3 & 512 in 0 or argument 3 & 3 in 1-2, else refused with "
+            "EACCES: openat\n"
+            "refused but to enter: execveat exit_group write\n"
+            "refused: all others\n");
+}
+
 TEST(Dump, ShowsCapabilities) {
   EXPECT_EQ(Dump(PlanCapabilities(
                 DomainOf({"-c cap_kill grant", "-c cap_chown grant", "-c cap_syslog grant"}),

@@ -16,8 +16,9 @@ constexpr std::size_t kFarthestBranch = std::numeric_limits<std::uint8_t>::max()
 // The numbers of the second table of x86_64, the one of 32-bit pointers.
 constexpr ValueRange kX32Numbers = {0x4000'0000, 0x7fff'ffff};
 
-constexpr std::uint32_t kRefuse = SECCOMP_RET_ERRNO | EPERM;
-constexpr std::uint32_t kUnknown = SECCOMP_RET_ERRNO | ENOSYS;
+constexpr std::uint32_t Failure(int error) {
+  return SECCOMP_RET_ERRNO | static_cast<std::uint32_t>(error);
+}
 
 // A place in the program that is jumped to before it is known where it lies.
 using Label = std::size_t;
@@ -136,14 +137,14 @@ void WriteCheck(ProgramWriter& writer, const ArgumentCheck& check, const Exit& p
   writer.Search(SegmentsOf(check.values, passed, failed));
 }
 
-// Goes on behind itself where the condition holds.
-void WriteCondition(ProgramWriter& writer, const Condition& condition) {
-  if (condition.empty()) return writer.Return(kRefuse);
+// Goes on behind itself where the condition holds, and answers `refusal` where it does not.
+void WriteCondition(ProgramWriter& writer, const Condition& condition, std::uint32_t refusal) {
+  if (condition.empty()) return writer.Return(refusal);
   const Label behind = writer.NewLabel();
   for (std::size_t index = 0; index < condition.size(); ++index) {
     const bool isLast = index + 1 == condition.size();
     const Label next = writer.NewLabel();
-    const Exit failed = isLast ? Exit{std::nullopt, kRefuse} : Exit{next};
+    const Exit failed = isLast ? Exit{std::nullopt, refusal} : Exit{next};
     WriteCheck(writer, condition[index], Exit{behind}, failed);
     writer.PlaceHere(next);
   }
@@ -155,7 +156,7 @@ std::size_t WriteSecretWord(ProgramWriter& writer, Half half) {
   writer.Load(OffsetOf(kSecretArgument, half));
   const std::size_t place = writer.Place();
   writer.SkipWhere(BPF_JGT, std::numeric_limits<std::uint32_t>::max(), 1, 0);
-  writer.Return(kRefuse);
+  writer.Return(Failure(EPERM));
   return place;
 }
 
@@ -170,8 +171,8 @@ class Leaves {
   explicit Leaves(ProgramWriter& programWriter) : writer(programWriter) {}
 
   Exit ExitOf(const CallVerdict& verdict) {
-    if (verdict.answer == Answer::kUnknown) return {std::nullopt, kUnknown};
-    if (verdict.answer == Answer::kRefused) return {std::nullopt, kRefuse};
+    if (verdict.answer == Answer::kUnknown) return {std::nullopt, Failure(ENOSYS)};
+    if (verdict.answer == Answer::kRefused) return {std::nullopt, Failure(verdict.refusal)};
     if (verdict.answer == Answer::kNoticed) return {std::nullopt, SECCOMP_RET_USER_NOTIF};
     if (verdict.answer == Answer::kAllowed && verdict.conditions.empty()) {
       return {std::nullopt, SECCOMP_RET_ALLOW};
@@ -187,7 +188,9 @@ class Leaves {
     for (const auto& [verdict, label] : labels) {
       writer.PlaceHere(label);
       if (verdict.answer == Answer::kAllowedWithSecret) secret = WriteSecret(writer);
-      for (const Condition& condition : verdict.conditions) WriteCondition(writer, condition);
+      for (const Condition& condition : verdict.conditions) {
+        WriteCondition(writer, condition, Failure(verdict.refusal));
+      }
       writer.Return(SECCOMP_RET_ALLOW);
     }
     return secret;
@@ -206,7 +209,7 @@ void Append(std::vector<Segment>& segments, std::uint32_t first, const Exit& exi
 
 std::vector<Segment> NumbersOf(const std::map<int, CallVerdict>& calls, std::uint32_t architecture,
                                Leaves& leaves) {
-  const Exit unknown = {std::nullopt, kUnknown};
+  const Exit unknown = {std::nullopt, Failure(ENOSYS)};
   std::vector<Segment> segments = {{0, unknown}};
   for (const auto& [number, verdict] : calls) {
     const auto first = static_cast<std::uint32_t>(number);

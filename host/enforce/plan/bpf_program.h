@@ -2,6 +2,7 @@
 
 #include <linux/filter.h>
 
+#include <cerrno>
 #include <compare>
 #include <cstddef>
 #include <cstdint>
@@ -31,9 +32,9 @@ struct ArgumentCheck {
 using Condition = std::vector<ArgumentCheck>;
 
 enum class Answer {
-  kUnknown,            // ENOSYS, as from a kernel that does not have the call
-  kRefused,            // EPERM
-  kAllowed,            // where all conditions hold, else EPERM
+  kUnknown,  // ENOSYS, as from a kernel that does not have the call
+  kRefused,
+  kAllowed,            // where all conditions hold, else refused
   kAllowedWithSecret,  // where the last argument is the secret, else EPERM; without conditions
   kNoticed,            // as its supervisor says, whom the filter's listener tells of it
 };
@@ -41,6 +42,7 @@ enum class Answer {
 struct CallVerdict {
   Answer answer = Answer::kRefused;
   std::vector<Condition> conditions = {};
+  int refusal = EPERM;  // the error that it refuses with
 
   auto operator<=>(const CallVerdict&) const = default;
 };

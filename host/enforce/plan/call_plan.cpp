@@ -12,6 +12,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <csignal>
 #include <initializer_list>
 #include <set>
@@ -124,6 +125,14 @@ ValueSet FamiliesPastPorts() {
                    {kFirstNewer, kWholeWord}});
 }
 
+// ---- Truncation
+
+struct OpeningCall {
+  const char* name;
+  unsigned int flags;
+};
+constexpr OpeningCall kOpeningCalls[] = {{"open", 1}, {"open_by_handle_at", 2}, {"openat", 2}};
+
 // ---- io_uring
 
 constexpr const char* kRingCalls[] = {"io_uring_enter", "io_uring_register", "io_uring_setup"};
@@ -157,8 +166,9 @@ struct Check {
 class CallPlanner {
  public:
   // Refuses all values of the checks `tooLong`.
-  CallPlanner(const Policy::InstalledDomain& installed, const std::set<std::string>& tooLong)
-      : domain(installed) {
+  CallPlanner(const Policy::InstalledDomain& installed, Truncation truncated,
+              const std::set<std::string>& tooLong)
+      : domain(installed), truncation(truncated) {
     for (const Rule& rule : domain.rules) {
       if (rule.kind == RuleKind::kSyscall) callRules.push_back(&rule);
     }
@@ -176,6 +186,7 @@ class CallPlanner {
     CloseGroups();
     ClosePorts();
     CloseRings();
+    if (truncation == Truncation::kByFilter) CloseTruncation();
     for (const auto& checked : kCheckedArguments) DemandValues(checked);
     LeaveTheEntry();
     return Finish();
@@ -447,6 +458,22 @@ class CallPlanner {
     }
   }
 
+  // Who opens a file for reading can empty it as well. Opening for writing remains for Landlock to
+  // refuse, as it tells files from pipes, which shells would truncate, too.
+  void CloseTruncation() {
+    for (const auto& [call, flags] : kOpeningCalls) {
+      CallVerdict* const verdict = FindGranted(call);
+      if (verdict == nullptr) continue;
+      verdict->conditions = {
+          {NoneOf(flags, O_TRUNC), Among(flags, SetOf({O_WRONLY, O_RDWR}), O_ACCMODE)}};
+      verdict->refusal = EACCES;
+    }
+    CallVerdict* const verdict = FindGranted("truncate");
+    if (verdict != nullptr) *verdict = {.answer = Answer::kRefused, .refusal = EACCES};
+    Withdraw("openat2", Answer::kUnknown,
+             "answered as unknown unless granted by itself, so that programs use openat");
+  }
+
   // ---- The end
 
   // By a path or by a descriptor, whichever the launcher is given; it tells of what fails, and
@@ -479,6 +506,7 @@ class CallPlanner {
   }
 
   const Policy::InstalledDomain& domain;
+  const Truncation truncation;
   std::vector<const Rule*> callRules;
   std::map<int, CallVerdict> verdicts;
   std::map<std::string, Check> checks;
@@ -487,14 +515,21 @@ class CallPlanner {
 
 }  // namespace
 
-CallPlan PlanCalls(const Policy::InstalledDomain& domain) {
+CallPlan PlanCalls(const Policy::InstalledDomain& domain, Truncation truncation) {
   std::set<std::string> tooLong;
   for (;;) {
-    CallPlanner planner(domain, tooLong);
+    CallPlanner planner(domain, truncation, tooLong);
     CallPlan plan = planner.Plan();
     if (plan.program.size() <= kMostInstructions) return plan;
     tooLong.insert(planner.LongestCheck());
   }
+}
+
+bool IsCallNamed(const Policy::InstalledDomain& domain, std::string_view call) {
+  const auto names = [call](const Rule& rule) {
+    return rule.kind == RuleKind::kSyscall && rule.words[0] == call && rule.Grants();
+  };
+  return std::ranges::any_of(domain.rules, names);
 }
 
 bool SpeaksOfSignals(const Rule& rule) {

@@ -4,6 +4,7 @@
 
 #include <map>
 #include <optional>
+#include <string_view>
 #include <vector>
 
 #include "host/enforce/coverage.h"
@@ -22,9 +23,18 @@ struct CallPlan {
   std::vector<RuleFate> fates;          // of the rules about calls and their arguments, in order
 };
 
+// What refuses to truncate the files of a domain.
+enum class Truncation {
+  kByLandlock,
+  kByFilter,  // of all files, so only where nothing may be written
+};
+
 // The plan for a domain's rules about system calls (-s) and about their arguments (-p), except
 // bind_port and connect_port: of these only what goes past a check of ports is closed. The level of
 // the domain has no say.
+//
+// By the filter no file is truncated, with the error that Landlock has, but those that are opened
+// for writing, which Landlock refuses. openat2, whose flags no filter sees, is answered as unknown.
 //
 // Where they are not granted, the program lets execve, execveat, write and exit_group pass with the
 // secret that SetSecret puts in: so the domain is entered, or its launcher tells why it could not
@@ -33,7 +43,11 @@ struct CallPlan {
 // The program is for the architecture that this is compiled for, and never longer than
 // kMostInstructions: of checks with more values than there is room for, all values are refused.
 // Throws BraxoException for a rule whose words are no range.
-CallPlan PlanCalls(const Policy::InstalledDomain& domain);
+CallPlan PlanCalls(const Policy::InstalledDomain& domain,
+                   Truncation truncation = Truncation::kByLandlock);
+
+// True where a rule grants the call by its name, and not only as one of a set.
+bool IsCallNamed(const Policy::InstalledDomain& domain, std::string_view call);
 
 // True for a rule about system calls that speaks of one whose signal a check is about.
 bool SpeaksOfSignals(const Policy::Rule& rule);

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <map>
 #include <sstream>
 #include <string_view>
@@ -56,13 +57,19 @@ std::string TextOf(const Condition& condition) {
   return Join(condition, " or ", [](const ArgumentCheck& check) { return TextOf(check); });
 }
 
+std::string TextOfRefusal(const CallVerdict& verdict) {
+  return verdict.refusal == EACCES ? "refused with EACCES" : "refused";
+}
+
 std::string TextOf(const CallVerdict& verdict) {
   if (verdict.answer == Answer::kUnknown) return "answered as unknown";
-  if (verdict.answer == Answer::kRefused) return "refused";
+  if (verdict.answer == Answer::kRefused) return TextOfRefusal(verdict);
   if (verdict.answer == Answer::kAllowedWithSecret) return "refused but to enter";
   if (verdict.conditions.empty()) return "allowed";
-  return StrCat("allowed where ", Join(verdict.conditions, ", and ",
-                                       [](const Condition& each) { return TextOf(each); }));
+  return StrCat(
+      "allowed where ",
+      Join(verdict.conditions, ", and ", [](const Condition& each) { return TextOf(each); }),
+      verdict.refusal == EPERM ? "" : ", else " + TextOfRefusal(verdict));
 }
 
 std::string TextOf(const char* name, const PortPlan& plan) {

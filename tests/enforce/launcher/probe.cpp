@@ -6,6 +6,7 @@
 #include <linux/capability.h>
 #include <linux/fs.h>
 #include <linux/io_uring.h>
+#include <linux/openat2.h>
 #include <linux/sched.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
@@ -206,13 +207,31 @@ long RunFromMemory(const Words& words) {
   });
 }
 
-long OpenByHandle(const Words& words) {
+long OpenByHandleFor(const Words& words, int flags) {
   alignas(file_handle) std::array<unsigned char, sizeof(file_handle) + 128> room{};
   auto* const handle = reinterpret_cast<file_handle*>(room.data());
   handle->handle_bytes = 128;
   int mount = 0;
   if (name_to_handle_at(AT_FDCWD, words.First(), handle, &mount, 0) != 0) return -1;
-  return open_by_handle_at(open(words.Second(), O_RDONLY | O_DIRECTORY), handle, O_RDONLY);
+  return open_by_handle_at(open(words.Second(), O_RDONLY | O_DIRECTORY), handle, flags);
+}
+
+long OpenByHandle(const Words& words) { return OpenByHandleFor(words, O_RDONLY); }
+
+// ---- Truncation
+
+long TruncateByOpenat2(const Words& words) {
+  open_how how = {};
+  how.flags = O_RDONLY | O_TRUNC;
+  return Close(static_cast<int>(syscall(SYS_openat2, AT_FDCWD, words.First(), &how, sizeof(how))));
+}
+
+// As a shell does for "> /dev/stdout".
+long TruncatePipe(const Words& /*words*/) {
+  std::array<int, 2> ends{};
+  if (pipe(ends.data()) != 0) return -1;
+  const std::string path = "/proc/self/fd/" + std::to_string(ends[1]);
+  return Close(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600));
 }
 
 // ---- Mounts
@@ -410,6 +429,10 @@ const NamedOperation kOperations[] = {
     {"write", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY)); }},
     {"open-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_WRONLY | O_TRUNC)); }},
     {"read-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_RDONLY | O_TRUNC)); }},
+    {"ioctl-truncate", [](const Words& w) -> long { return Close(open(w.First(), O_ACCMODE | O_TRUNC)); }},
+    {"openat2-truncate", TruncateByOpenat2},
+    {"handle-truncate", [](const Words& w) -> long { return OpenByHandleFor(w, O_RDONLY | O_TRUNC); }},
+    {"pipe-truncate", TruncatePipe},
     {"truncate", [](const Words& w) -> long { return truncate(w.First(), 0); }},
     {"ftruncate", Truncate},
     {"create", [](const Words& w) -> long { return Close(open(w.First(), O_CREAT | O_EXCL | O_WRONLY, 0600)); }},

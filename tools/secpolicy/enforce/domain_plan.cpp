@@ -49,6 +49,13 @@ PlanSources::PlanSources(SecPolicy::TeskAccessInterfaceImpl& access,
   }
 }
 
+Enforce::Surroundings PlanSources::All() {
+  return {.features = features,
+          .places = places,
+          .files = files,
+          .isBelowRoot = !PlacesOfRoot().empty()};
+}
+
 Enforce::CompiledPlan PlanSources::Compile(const Policy::InstalledDomain& domain) {
   return Enforce::Compile(domain, All());
 }

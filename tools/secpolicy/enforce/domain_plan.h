@@ -28,7 +28,7 @@ class PlanSources {
   std::string Explain(const Policy::InstalledDomain& domain);
 
  private:
-  Enforce::Surroundings All() { return {.features = features, .places = places, .files = files}; }
+  Enforce::Surroundings All();
 
   const Enforce::Features features;
   const Enforce::LabelIndex index;
