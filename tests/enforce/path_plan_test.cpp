@@ -244,6 +244,16 @@ TEST(PlanPaths, HidesFilesByTheirLabelWhereThereIsADeviceForIt) {
   EXPECT_THAT(plan.masks, IsEmpty());
 }
 
+TEST(PlanPaths, TellsThatNobodyRemovesWhatIsMasked) {
+  MemoryTree files = Crowd({"/dev"}, {"/opt/secret", "/dev/null"});
+  const PathPlan plan = PlanPaths(Domain({Path("/opt", "w"), Object("secret", "write", false),
+                                          Object("secret", "truncate", false)}),
+                                  {{"/opt", "config"}, {"/opt/secret", "secret"}}, files);
+  EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/secret", MaskKind::kHidden}));
+  EXPECT_EQ(HowOf(plan, 0),
+            "narrowed: /opt/secret has a mount over it, so it is neither moved nor removed");
+}
+
 // Where nothing is executed it may be read, as its rules say.
 TEST(PlanPaths, MountsWhatEntersAnotherDomain) {
   MemoryTree files = Crowd({}, {"/opt/other"});

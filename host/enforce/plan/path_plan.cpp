@@ -302,10 +302,14 @@ class Planner {
   bool HasNullDevice() { return files.KindOf("/dev/null") == FileKind::kFile; }
 
   void TellOfMask(const LaidMask& laid) {
-    if (laid.mask.kind != MaskKind::kNoExec) return;
-    losses.Lose(
-        laid.over->region, laid.over->own & Landlock::kReadFile,
-        laid.mask.path + " is mounted so that nothing there is executed, libraries neither");
+    const Region& region = laid.over->region;
+    if (laid.mask.kind == MaskKind::kNoExec) {
+      losses.Lose(
+          region, laid.over->own & Landlock::kReadFile,
+          laid.mask.path + " is mounted so that nothing there is executed, libraries neither");
+    }
+    losses.Lose(region, laid.over->own & kEntryRights,
+                laid.mask.path + " has a mount over it, so it is neither moved nor removed");
   }
 
   // ---- What becomes of the rules
