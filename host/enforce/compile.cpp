@@ -26,6 +26,7 @@ using Policy::RuleKind;
 constexpr int kTruncationVersion = 3;
 
 constexpr Rights kReading = Landlock::kReadFile | Landlock::kReadDir;
+constexpr Rights kWithoutWriting = kReading | Landlock::kExecute;
 
 constexpr char kWithoutLandlock[] =
     "this kernel's Landlock cannot refuse what no rule grants (version 3 or newer can)";
@@ -99,15 +100,24 @@ void TellOfBroker(const std::string& domain, std::vector<RuleFate>* fates) {
   }
 }
 
+// True where the right is to write to what can be emptied. Who may open for writing whatever has
+// taken the place of a device since is to be one who may empty it, too.
+bool WritesFile(const PathRight& right, FileTree& files) {
+  constexpr Rights kEmptying = Landlock::kWriteFile | Landlock::kTruncate;
+  if ((right.rights & ~kWithoutWriting) == 0) return false;
+  return (right.rights & kEmptying) != kEmptying || files.KindOf(right.path) != FileKind::kSpecial;
+}
+
 // Landlock asks about truncation at every open, and does not stop on its way to the root before it
-// is granted. So where nothing may be written that is left to the filter, but for the call that it
+// is granted. So where no file may be written that is left to the filter, but for the call that it
 // does not see through: who grants just that gets it.
 Truncation TruncationOf(const PathPlan& paths, const InstalledDomain& domain,
-                        const Features& features) {
-  constexpr Rights kWithoutWriting = kReading | Landlock::kExecute;
+                        const Surroundings& surroundings) {
   const bool writes = std::ranges::any_of(
-      paths.rights, [](const PathRight& right) { return (right.rights & ~kWithoutWriting) != 0; });
-  if (writes || !features.seccomp || IsCallNamed(domain, "openat2")) return Truncation::kByLandlock;
+      paths.rights, [&](const PathRight& right) { return WritesFile(right, surroundings.files); });
+  if (writes || !surroundings.features.seccomp || IsCallNamed(domain, "openat2")) {
+    return Truncation::kByLandlock;
+  }
   return Truncation::kByFilter;
 }
 
@@ -125,7 +135,7 @@ Parts PlanParts(const InstalledDomain& domain, const Surroundings& surroundings)
       domain, features.capabilities, static_cast<unsigned int>(features.lastCapability));
   const bool mayMask = (capabilities.kept & kPastMasks) == 0;
   PathPlan paths = PlanPaths(domain, surroundings.places, surroundings.files, mayMask);
-  const Truncation truncation = TruncationOf(paths, domain, features);
+  const Truncation truncation = TruncationOf(paths, domain, surroundings);
   return {.paths = std::move(paths),
           .truncation = truncation,
           .calls = PlanCalls(domain, truncation),

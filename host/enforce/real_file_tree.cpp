@@ -65,7 +65,8 @@ int OpenPlainly(const std::string& path, int flags) {
 
 FileKind KindOfMode(mode_t mode) {
   if (S_ISDIR(mode)) return FileKind::kDirectory;
-  return S_ISLNK(mode) ? FileKind::kLink : FileKind::kFile;
+  if (S_ISLNK(mode)) return FileKind::kLink;
+  return S_ISREG(mode) ? FileKind::kFile : FileKind::kSpecial;
 }
 
 struct CloseDirectory {

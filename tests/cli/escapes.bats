@@ -127,14 +127,17 @@ a_victim() {
 emptying=({open,read,ioctl}-truncate=/t/secret/file {,f}truncate=/t/secret/file)
 
 @test "3 emptying what may only be read, in a domain that writes nothing" {
-  domain narrowDom "${calls[@]}" '-r /t r'
+  domain narrowDom "${calls[@]}" '-r /t r' '-r /dev/null rw'
   domain wideDom "${calls[@]}" '-r /t rw'
   domain namingDom "${calls[@]}" '-r /t r' '-s openat2 grant'
+  mkdir "$root/dev"
+  : >"$root/dev/null"
+  has_places proc dev/null
   boot_root
   refuses EACCES "${emptying[@]}"
   refuses ENOSYS openat2-truncate=/t/secret/file
   gets namingDom EACCES "${emptying[@]}" openat2-truncate=/t/secret/file
-  gets narrowDom ok read=/t/secret/file pipe-truncate
+  gets narrowDom ok read=/t/secret/file open-truncate=/dev/null pipe-truncate
 }
 
 @test "3 emptying what may only be read, where that is all there is" {

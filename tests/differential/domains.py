@@ -134,8 +134,11 @@ class Root(SmallRoot):
 
 
 def some_try(chance, taken, is_root):
-    action = chance.choice(["read", "write", "list", "truncate", "exec", "make", "make", "make-socket", "call", "call",
+    action = chance.choice(["read", "write", "list", "truncate", "empty", "exec", "make", "make", "make-socket", "call", "call",
                             "use", "pass", "pass"])
+    if action == "empty":
+        path = "/" + chance.choice(FILES)
+        return [action, path], [["read", path], ["truncate", path], ["call", "openat"]]
     if action in ("read", "write", "truncate", "exec"):
         path = "/" + chance.choice(FILES)
         call = {"read": "openat", "write": "openat", "truncate": "truncate", "exec": "execve"}[action]

@@ -56,6 +56,8 @@ int Write(const char* path) { return ErrorOfOpen(path, O_WRONLY); }
 
 int List(const char* path) { return ErrorOfOpen(path, O_RDONLY | O_DIRECTORY); }
 
+int Empty(const char* path) { return ErrorOfOpen(path, O_RDONLY | O_TRUNC); }
+
 int Truncate(const char* path) { return ErrorOf(truncate(path, 0)); }
 
 int Execute(const char* path) {
@@ -202,6 +204,7 @@ int Try(char** words) {
   if (action == "read") return Read(words[1]);
   if (action == "write") return Write(words[1]);
   if (action == "list") return List(words[1]);
+  if (action == "empty") return Empty(words[1]);
   if (action == "truncate") return Truncate(words[1]);
   if (action == "exec") return Execute(words[1]);
   if (action == "remove") return Remove(words[1]);

@@ -22,10 +22,13 @@ using ::testing::Field;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// Every path is a directory without entries.
+// Every path is a directory without entries, but for one device and one file.
 class EmptyDirectories : public Enforce::FileTree {
  public:
-  FileKind KindOf(const std::string& /*path*/) override { return FileKind::kDirectory; }
+  FileKind KindOf(const std::string& path) override {
+    if (path == "/dev/null") return FileKind::kSpecial;
+    return path == "/dev/file" ? FileKind::kFile : FileKind::kDirectory;
+  }
   std::optional<std::vector<std::string>> List(const std::string& /*directory*/,
                                                std::size_t /*most*/) override {
     return std::vector<std::string>();
@@ -129,6 +132,28 @@ TEST(Compile, LeavesTruncationToTheFilterWhereNothingIsWritten) {
                                  "-a label remove grant", "-f label label regular grant"}) {
     EXPECT_EQ(HandledFor({"-a label read grant", line}), kAllRights) << line;
   }
+}
+
+// Nearly every program writes to one, and none can be emptied.
+TEST(Compile, LeavesTruncationToTheFilterWhereOnlyDevicesAreWritten) {
+  EXPECT_EQ(HandledFor({"-r /srv rx", "-r /dev/null rw"}),
+            kAllRights & ~Enforce::Landlock::kTruncate);
+  EXPECT_EQ(HandledFor({"-r /srv rx", "-r /dev/file rw"}), kAllRights);
+  EXPECT_EQ(HandledFor({"-r /dev/null rw", "-r /srv rw"}), kAllRights);
+}
+
+// Whatever is in place of the device when the domain is entered could be emptied.
+TEST(Compile, LeavesTruncationToLandlockWhereADeviceMayBeWrittenAndNotTruncated) {
+  EmptyDirectories files;
+  const Features features = NewKernel();
+  const std::vector<Enforce::LabelledPath> places = {{"/dev/null", "device"}};
+  const auto handledFor = [&](const std::vector<std::string>& lines) {
+    return Compile(DomainOf(lines), {.features = features, .places = places, .files = files})
+        .plan.handledFiles;
+  };
+  EXPECT_EQ(handledFor({"-a device write grant", "-a device truncate grant"}),
+            kAllRights & ~Enforce::Landlock::kTruncate);
+  EXPECT_EQ(handledFor({"-a device write grant"}), kAllRights);
 }
 
 TEST(Compile, LeavesTruncationToLandlockBesideACallWhoseFlagsNoFilterSees) {

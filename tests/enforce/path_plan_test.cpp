@@ -67,7 +67,10 @@ MemoryTree Files(std::initializer_list<const char*> directories,
                  std::initializer_list<const char*> files) {
   MemoryTree tree;
   for (const char* path : directories) tree.kinds[path] = FileKind::kDirectory;
-  for (const char* path : files) tree.kinds[path] = FileKind::kFile;
+  for (const char* path : files) {
+    const bool isDevice = std::string_view(path).starts_with("/dev/");
+    tree.kinds[path] = isDevice ? FileKind::kSpecial : FileKind::kFile;
+  }
   return tree;
 }
 
@@ -238,10 +241,12 @@ TEST(PlanPaths, HidesFilesByTheirLabelWhereThereIsADeviceForIt) {
   PathPlan plan = PlanPaths(domain, places, files);
   EXPECT_THAT(plan.rights, ElementsAre(PathRight{"/opt", Landlock::kReadFile}));
   EXPECT_THAT(plan.masks, ElementsAre(Mask{"/opt/secret", MaskKind::kHidden}));
-  files.kinds.erase("/dev/null");
-  plan = PlanPaths(domain, places, files);
-  EXPECT_THAT(plan.rights, IsEmpty());
-  EXPECT_THAT(plan.masks, IsEmpty());
+  for (const FileKind other : {FileKind::kNothing, FileKind::kFile}) {
+    files.kinds["/dev/null"] = other;
+    plan = PlanPaths(domain, places, files);
+    EXPECT_THAT(plan.rights, IsEmpty());
+    EXPECT_THAT(plan.masks, IsEmpty());
+  }
 }
 
 TEST(PlanPaths, TellsThatNobodyRemovesWhatIsMasked) {
@@ -449,7 +454,9 @@ void AddEntries(World& world, const std::string& directory, int depth, Chance& c
   for (std::size_t index = 0; index < count; ++index) {
     const std::string path = (directory == "/" ? "" : directory) + "/" + "abcd"[index];
     const bool isDirectory = depth < 4 && chance.Below(2) == 0;
-    world.files.kinds[path] = isDirectory ? FileKind::kDirectory : FileKind::kFile;
+    world.files.kinds[path] = isDirectory            ? FileKind::kDirectory
+                              : chance.Below(4) == 0 ? FileKind::kSpecial
+                                                     : FileKind::kFile;
     world.labels[path] =
         chance.Below(4) == 0 ? chance.Of(kLabels) : world.labels[MemoryTree::ParentOf(path)];
     if (isDirectory && chance.Below(3) == 0) world.files.crowded.insert(path);
@@ -485,7 +492,7 @@ World RandomWorld(unsigned int seed) {
   World world;
   world.labels["/"] = chance.Of(kLabels);
   if (chance.Below(3) == 0) world.files.crowded.insert("/");
-  if (chance.Below(2) == 0) world.files.kinds["/dev/null"] = FileKind::kFile;
+  if (chance.Below(2) == 0) world.files.kinds["/dev/null"] = FileKind::kSpecial;
   AddEntries(world, "/", 0, chance);
   for (const auto& [path, label] : world.labels) {
     const bool isPlace = path == "/" || world.labels[MemoryTree::ParentOf(path)] != label;

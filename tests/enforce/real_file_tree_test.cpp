@@ -40,7 +40,8 @@ void Refuse(std::initializer_list<int> calls) {
 void ExpectKnownPlaces() {
   Enforce::RealFileTree tree;
   EXPECT_EQ(tree.KindOf("/"), Enforce::FileKind::kDirectory);
-  EXPECT_EQ(tree.KindOf("/dev/null"), Enforce::FileKind::kFile);
+  EXPECT_EQ(tree.KindOf("/dev/null"), Enforce::FileKind::kSpecial);
+  EXPECT_EQ(tree.KindOf("/etc/passwd"), Enforce::FileKind::kFile);
   EXPECT_EQ(tree.KindOf("/proc/self"), Enforce::FileKind::kLink);
   EXPECT_EQ(tree.KindOf("/proc/self/status"), Enforce::FileKind::kNothing);
   EXPECT_EQ(tree.KindOf("/no/such/place"), Enforce::FileKind::kNothing);

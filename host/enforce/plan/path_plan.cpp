@@ -15,6 +15,8 @@ using Policy::InstalledDomain;
 using Policy::Rule;
 using Policy::RuleKind;
 
+bool IsFile(FileKind kind) { return kind == FileKind::kFile || kind == FileKind::kSpecial; }
+
 // ---- The tree of places where rights may change
 
 // What is known of a place before rights are given.
@@ -122,7 +124,7 @@ class Planner {
   }
 
   static Rights AnyOf(const Finding& finding) {
-    const bool isThere = finding.kind == FileKind::kDirectory || finding.kind == FileKind::kFile;
+    const bool isThere = finding.kind == FileKind::kDirectory || IsFile(finding.kind);
     return isThere ? finding.own & Fitting(finding.kind) : 0;
   }
 
@@ -136,7 +138,7 @@ class Planner {
     for (const auto& [name, child] : node.children) {
       const Step step(path, name);
       const Rights beneath = Examine(*child, path, finding.region);
-      if (finding.kind == FileKind::kFile) continue;
+      if (IsFile(finding.kind)) continue;
       const Finding& found = child->finding;
       finding.any |= found.any;
       // An entry is removed by its own rights, whatever lies beneath it.
@@ -210,7 +212,7 @@ class Planner {
       const FileKind kind = files.KindOf(entry);
       // No rule names it, so it may come and go.
       if (kind == FileKind::kDirectory) Give(entry, region, apart, true);
-      if (kind == FileKind::kFile) Give(entry, region, apart & Landlock::kOfFiles, true);
+      if (IsFile(kind)) Give(entry, region, apart & Landlock::kOfFiles, true);
     }
   }
 
@@ -272,14 +274,14 @@ class Planner {
   }
 
   static Rights LackingOf(const Finding& finding, Rights wanted) {
-    if (finding.kind == FileKind::kFile) wanted &= Landlock::kOfFiles | kEntryRights;
+    if (IsFile(finding.kind)) wanted &= Landlock::kOfFiles | kEntryRights;
     if (finding.kind == FileKind::kLink) wanted &= kEntryRights;
     return wanted & ~finding.own;
   }
 
   std::optional<Cover> CoverFor(const Node& node, Rights lacking) {
     const Finding& finding = node.finding;
-    const bool isFile = finding.kind == FileKind::kFile;
+    const bool isFile = IsFile(finding.kind);
     if (lacking == 0 || (!isFile && finding.kind != FileKind::kDirectory)) return std::nullopt;
     // Whoever changes a file replaces it, as a rule, and the new one would have no mask. By its
     // label it has the directory's then, but its path is still the one that a rule is about.
@@ -299,7 +301,7 @@ class Planner {
   }
 
   // It is what lies over files that are hidden.
-  bool HasNullDevice() { return files.KindOf("/dev/null") == FileKind::kFile; }
+  bool HasNullDevice() { return files.KindOf("/dev/null") == FileKind::kSpecial; }
 
   void TellOfMask(const LaidMask& laid) {
     const Region& region = laid.over->region;

@@ -28,7 +28,8 @@ enum class FileKind {
   kNothing,  // or nothing that this path leads to without a link
   kDirectory,
   kLink,
-  kFile,  // and all others
+  kFile,
+  kSpecial,  // a device, fifo or socket, in which nothing is kept
 };
 
 // What a plan has to know of files. Throws what its owner throws.
