@@ -106,6 +106,25 @@ void WriteItems(const Items& items, char open, char close, std::optional<std::si
 
 }  // namespace
 
+// All of them are compiled here, once: units that use documents are many.
+Json::Json() = default;
+Json::Json(Value content) : value(std::move(content)) {}
+Json::Json(const char* text) : value(std::string(text)) {}
+Json::Json(std::string text) : value(std::move(text)) {}
+Json::Json(const std::vector<std::string>& texts) : value(Values(texts.begin(), texts.end())) {}
+Json::Json(std::initializer_list<Member> members) : value(Members(members)) {}
+
+Json::Json(const Json& other) = default;
+Json::Json(Json&& other) noexcept = default;
+Json& Json::operator=(const Json& other) = default;
+Json& Json::operator=(Json&& other) noexcept = default;
+Json::~Json() = default;
+
+Json Json::OfTruth(bool truth) { return Json(Value(truth)); }
+Json Json::OfNumber(std::int64_t number) { return Json(Value(number)); }
+Json Json::Array() { return Json(Value(Values())); }
+Json Json::Object() { return Json(Value(Members())); }
+
 void Json::Append(Json element) { std::get<Values>(value).push_back(std::move(element)); }
 
 Json& Json::operator[](const std::string& name) {
@@ -159,6 +178,12 @@ std::optional<std::int64_t> Json::Number() const {
 }
 
 const std::string* Json::String() const { return std::get_if<std::string>(&value); }
+
+bool Json::IsNull() const { return std::holds_alternative<std::monostate>(value); }
+
+bool Json::IsObject() const { return std::holds_alternative<Members>(value); }
+
+bool Json::operator==(const Json& other) const { return value == other.value; }
 
 void Json::Write(std::string& output, std::optional<std::size_t> indent) const {
   if (const bool* const truth = std::get_if<bool>(&value)) {

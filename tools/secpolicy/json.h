@@ -18,18 +18,24 @@ class Json {
  public:
   using Member = std::pair<std::string, Json>;
 
-  Json() = default;  // null
-  Json(std::same_as<bool> auto truth) : value(truth) {}
+  Json();  // null
+  Json(std::same_as<bool> auto truth) : Json(OfTruth(truth)) {}
   template <std::integral Number>
   requires(!std::same_as<Number, bool>) Json(Number number)
-      : value(static_cast<std::int64_t>(number)) {}
-  Json(const char* text) : value(std::string(text)) {}
-  Json(std::string text) : value(std::move(text)) {}
-  Json(const std::vector<std::string>& texts) : value(Values(texts.begin(), texts.end())) {}
-  Json(std::initializer_list<Member> members) : value(Members(members)) {}
+      : Json(OfNumber(static_cast<std::int64_t>(number))) {}
+  Json(const char* text);
+  Json(std::string text);
+  Json(const std::vector<std::string>& texts);
+  Json(std::initializer_list<Member> members);
 
-  static Json Array() { return Json(Value(Values())); }
-  static Json Object() { return Json(Value(Members())); }
+  Json(const Json& other);
+  Json(Json&& other) noexcept;
+  Json& operator=(const Json& other);
+  Json& operator=(Json&& other) noexcept;
+  ~Json();
+
+  static Json Array();
+  static Json Object();
 
   // Adds an element to an array.
   void Append(Json element);
@@ -54,17 +60,19 @@ class Json {
   std::optional<bool> Truth() const;
   std::optional<std::int64_t> Number() const;
   const std::string* String() const;
-  bool IsNull() const { return std::holds_alternative<std::monostate>(value); }
-  bool IsObject() const { return std::holds_alternative<Members>(value); }
+  bool IsNull() const;
+  bool IsObject() const;
 
-  bool operator==(const Json&) const = default;
+  bool operator==(const Json& other) const;
 
  private:
   using Values = std::vector<Json>;
   using Members = std::vector<Member>;
   using Value = std::variant<std::monostate, bool, std::int64_t, std::string, Values, Members>;
 
-  explicit Json(Value content) : value(std::move(content)) {}
+  explicit Json(Value content);
+  static Json OfTruth(bool truth);
+  static Json OfNumber(std::int64_t number);
 
   void Write(std::string& output, std::optional<std::size_t> indent) const;
 
