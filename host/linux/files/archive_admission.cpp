@@ -22,6 +22,7 @@ namespace {
 using Braxo::Misc::StrCat;
 
 constexpr char kStatePlace[] = "var/lib/secpolicy";
+constexpr char kKeyPlace[] = "etc/secpolicy/bundle-keys";
 constexpr char kTardiskPolicy[] = "/tardisks";
 
 [[noreturn]] void Refuse(std::string_view name, std::string_view reason) {
@@ -82,6 +83,7 @@ ArchiveAdmission::ArchiveAdmission(const TardiskRules& given) : rules(given) {
   places.push_back({policy, policy + kTardiskPolicy,
                     "It belongs to the policy, which a tardisk brings only when it is named by "
                     "--policy-from"});
+  places.push_back({kKeyPlace, kKeyPlace, "It says whose policies this host takes"});
   for (const Place& place : places) {
     struct stat status;
     const bool isThere = stat(place.path.c_str(), &status) == 0;

@@ -628,6 +628,14 @@ TEST_F(UnpackTardisks, RefusesSavedStatesAndSettingsOfAnyTardisk) {
             kUnable + "var/lib/secpolicy: It belongs to the saved states and settings");
 }
 
+TEST_F(UnpackTardisks, RefusesKeysOfBundles) {
+  rules.policyTardisks = {"disk.tgz"};
+  const std::string path = "etc/secpolicy/bundle-keys/own.pem";
+  EXPECT_EQ(Unpack(TarImage().File(path, "text")),
+            kUnable + path + ": It says whose policies this host takes");
+  EXPECT_EQ(Unpack(TarImage().File("etc/secpolicy/other", "text")), "unpacked");
+}
+
 TEST_F(UnpackTardisks, RefusesWhatWouldTurnTheWayToThePolicy) {
   const auto message = [](const std::string& path, const std::string& place) {
     return kUnable + path + ": It leads to " + place +
