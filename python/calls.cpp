@@ -105,7 +105,7 @@ void Plan(const std::string& dir, bool keep, const Send& send) {
   const SecPolicyCli::LoadDryRun dryRun(load);
   const LinuxHost::DroppedLog dropped;
   std::ostringstream document;
-  WritePlanJson(MakeLoadPlan(dryRun), dir, dryRun, document);
+  WritePlanJson(MakeLoadPlan(dryRun), dir, SecPolicyCli::Json(), dryRun, document);
   send({"answer", document.str()});
 }
 

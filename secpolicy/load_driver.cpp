@@ -52,11 +52,8 @@ void ResolveWellKnownDomains(TeskAccessInterfaceImpl& access, PolicyObserver& ob
   }
 }
 
-}  // namespace
-
-void LoadPolicy(const std::string& policyDir) { LoadPolicy(policyDir, Nobody()); }
-
-void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
+void LoadPolicy(const std::string& policyDir, const std::string& partnersDir,
+                PolicyObserver& observer) {
   TeskAccessInterfaceImpl access;
   bool failed = false;
   const auto load = [&](auto step) {
@@ -67,7 +64,7 @@ void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
   load([&] { LoadPolicyObjects(Join(policyDir, kObjectsDir), access, observer); });
   load([&] { CreateCheckAccessPolicyDomain(access); });
   load([&] { LoadPolicyDomains(Join(policyDir, kDomainsDir), access, observer); });
-  load([&] { LoadPartnerPolicyDomains(access, observer); });
+  load([&] { LoadPartnerPolicyDomains(partnersDir, access, observer); });
   ResolveWellKnownDomains(access, observer);
   // Tardisks are the host's own, whatever policy is loaded: always under the fixed root.
   load([&] { LoadPolicyTardisks(Join(kPolicyRoot, kTardisksDir), access, observer); });
@@ -75,6 +72,18 @@ void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
 
   if (failed) RaiseError("There were some problems encountered in setting the policy");
   SecpolicyInfo("System security policy has been set successfully");
+}
+
+}  // namespace
+
+void LoadPolicy(const std::string& policyDir) { LoadPolicy(policyDir, Nobody()); }
+
+void LoadPolicy(const std::string& policyDir, PolicyObserver& observer) {
+  LoadPolicy(policyDir, kPartnerDomainsDir, observer);
+}
+
+void LoadPolicyWithPartners(const std::string& policyDir, PolicyObserver& observer) {
+  LoadPolicy(policyDir, Join(Join(policyDir, kDomainsDir), kPartnersDir), observer);
 }
 
 void LoadPolicyEarly(const std::string& earlyPolicyDir) {

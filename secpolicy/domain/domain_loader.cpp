@@ -18,12 +18,11 @@ unsigned int FindOrCreateDomain(const std::string& name, TeskAccessInterfaceImpl
 }
 
 // All names exist before the first policy is parsed, so that domains can refer to each other.
-std::list<DomainPolicy> NameDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
-                                    PolicyObserver& observer) {
+std::list<DomainPolicy> NameDomains(const std::string& dir, const std::string& prefix,
+                                    TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
   std::map<std::string, std::string> files;
   TellFailure(dir, observer, [&] { GetFileList(dir, files); });
 
-  const std::string prefix = dir == kPartnerDomainsDir ? kPartnerPrefix : "";
   std::list<DomainPolicy> domains;
   for (const auto& [path, file] : files) {
     const std::string name = prefix + file;
@@ -77,6 +76,18 @@ bool SetPolicies(std::list<DomainPolicy>& domains, TeskAccessInterfaceImpl& acce
   return set;
 }
 
+void LoadDomains(const std::string& dir, LoadPhase which, TeskAccessInterfaceImpl& access,
+                 PolicyObserver& observer) {
+  const PhaseOfLoad phase(which, observer);
+  const std::string prefix = which == LoadPhase::kPartnerDomains ? kPartnerPrefix : "";
+  std::list<DomainPolicy> domains = NameDomains(dir, prefix, access, observer);
+  const bool parsed = ParsePolicies(domains, access, observer);
+  CheckConstraints(domains, access, observer);
+  // What was read before a bad line is installed too.
+  const bool set = SetPolicies(domains, access, observer);
+  if (!parsed || !set) RaiseError("Failure in domain policy");
+}
+
 }  // namespace
 
 void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access) {
@@ -85,23 +96,19 @@ void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access) 
 
 void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
                        PolicyObserver& observer) {
-  const PhaseOfLoad phase(
-      dir == kPartnerDomainsDir ? LoadPhase::kPartnerDomains : LoadPhase::kDomains, observer);
-  std::list<DomainPolicy> domains = NameDomains(dir, access, observer);
-  const bool parsed = ParsePolicies(domains, access, observer);
-  CheckConstraints(domains, access, observer);
-  // What was read before a bad line is installed too.
-  const bool set = SetPolicies(domains, access, observer);
-  if (!parsed || !set) RaiseError("Failure in domain policy");
+  const bool isOfPartners = dir == kPartnerDomainsDir;
+  LoadDomains(dir, isOfPartners ? LoadPhase::kPartnerDomains : LoadPhase::kDomains, access,
+              observer);
 }
 
 void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access) {
-  LoadPartnerPolicyDomains(access, Nobody());
+  LoadPartnerPolicyDomains(kPartnerDomainsDir, access, Nobody());
 }
 
-void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer) {
-  if (File_Exists(kPartnerDomainsDir) && File_IsDirectory(kPartnerDomainsDir)) {
-    LoadPolicyDomains(kPartnerDomainsDir, access, observer);
+void LoadPartnerPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                              PolicyObserver& observer) {
+  if (File_Exists(dir.c_str()) && File_IsDirectory(dir.c_str())) {
+    LoadDomains(dir, LoadPhase::kPartnerDomains, access, observer);
   }
 }
 

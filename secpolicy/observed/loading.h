@@ -7,6 +7,8 @@
 namespace SecPolicy {
 
 void LoadPolicy(const std::string& policyDir, PolicyObserver& observer);
+// The load of a policy that is to be the host's own: with the partner domains in it.
+void LoadPolicyWithPartners(const std::string& policyDir, PolicyObserver& observer);
 void LoadPolicyEarly(const std::string& earlyPolicyDir, PolicyObserver& observer);
 void RestoreDomainEnforcement(PolicyObserver& observer);
 void DisplayPolicy(const std::string& domainName, PolicyObserver& observer);
@@ -16,7 +18,8 @@ void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access,
                        PolicyObserver& observer);
 void LoadPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
                        PolicyObserver& observer);
-void LoadPartnerPolicyDomains(TeskAccessInterfaceImpl& access, PolicyObserver& observer);
+void LoadPartnerPolicyDomains(const std::string& dir, TeskAccessInterfaceImpl& access,
+                              PolicyObserver& observer);
 void LoadPolicyTardisks(const std::string& dir, TeskAccessInterfaceImpl& access,
                         PolicyObserver& observer);
 void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& access,

@@ -1,7 +1,10 @@
 #!/usr/bin/env python3
 """forge_bundle.py BUNDLE KEY OTHER: writes beside BUNDLE what differs from it by one change each, CHANGE.bundle.
-A changed manifest is signed with KEY again in signed-CHANGE.bundle; other.bundle is signed with OTHER."""
+A changed manifest is signed with KEY again in signed-CHANGE.bundle, as are a policy with a fault and one that
+lacks a needed domain; other.bundle is signed with OTHER."""
 
+import hashlib
+import json
 import pathlib
 import subprocess
 import sys
@@ -27,6 +30,15 @@ class Bundle:
         member, content = self.entries[index]
         assert old in content
         self.entries[index] = member, content.replace(old, new, 1)
+
+    def describe(self):
+        """Makes the manifest that of the files."""
+        member, text = self.entries[0]
+        manifest = json.loads(text)
+        manifest["files"] = [
+            {"path": file.name.removeprefix("policy/"), "size": len(content), "sha256": hashlib.sha256(content).hexdigest()}
+            for file, content in self.entries[2:]]
+        self.entries[0] = member, json.dumps(manifest).encode()
 
     def sign(self, private_key):
         with tempfile.NamedTemporaryFile() as text:
@@ -58,6 +70,14 @@ CHANGES = {
     "mode": lambda bundle: setattr(bundle.entries[-1][0], "mode", 0o755),
     "no-manifest": lambda bundle: bundle.entries.pop(0),
 }
+FAULTS = {
+    "policy/domains/appDom": b"-s no_such_call grant\n",
+    "policy/fileLabels/base": b"/no/such hostConfig\n",
+}
+POLICIES = {
+    "fault": lambda entries: [(file, text + FAULTS.get(file.name, b"")) for file, text in entries],
+    "stop": lambda entries: [(file, text) for file, text in entries if file.name != "policy/domains/ioFilterDom"],
+}
 MANIFESTS = {
     "name": (b'"name": "', b'"name": "not-'),
     "version": (b"secpolicy.bundle/1", b"secpolicy.bundle/2"),
@@ -74,6 +94,11 @@ for name, (old, new) in MANIFESTS.items():
     bundle = Bundle()
     bundle.replace(0, old, new)
     bundle.write(name)
+    bundle.sign(key).write("signed-" + name)
+for name, change in POLICIES.items():
+    bundle = Bundle()
+    bundle.entries = change(bundle.entries)
+    bundle.describe()
     bundle.sign(key).write("signed-" + name)
 Bundle().sign(key).write("same")
 Bundle().sign(other).write("other")

@@ -114,11 +114,15 @@ Action Syntax::AddKinds(std::span<const Kind> kinds) {
   for (const Kind& kind : kinds) {
     CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
     if (kind.help != nullptr) subcommand->footer(kind.help);
-    Syntax syntax(*subcommand, offerings, behindDashes);
+    Syntax syntax(*subcommand, offerings, preparations, behindDashes);
     subcommand->parse_complete_callback(
         [chosen, action = kind.define(syntax)] { *chosen = action; });
   }
   return [chosen] { return (*chosen)(); };
+}
+
+void Syntax::BeforeRoot(const Option& option, void (*step)()) {
+  preparations.emplace_back(option.option, step);
 }
 
 Option Syntax::Verbose() const { return {*app.get_parent()->get_option("--verbose"), offerings}; }
@@ -158,7 +162,7 @@ void CommandLine::AddVerb(const Verb& added, const char* group) {
 }
 
 Action CommandLine::Define(const Verb& defined, CLI::App& subcommand) {
-  Syntax syntax(subcommand, offerings, wordsBehindDashes);
+  Syntax syntax(subcommand, offerings, preparations, wordsBehindDashes);
   return defined.define(syntax);
 }
 
@@ -195,6 +199,13 @@ std::optional<ExitCode> CommandLine::Read(
 std::optional<std::string> CommandLine::Root() const {
   if (rootOption->count() == 0) return std::nullopt;
   return root;
+}
+
+void CommandLine::Prepare() const {
+  if (verb->prepare != nullptr) verb->prepare();
+  for (const auto& [option, step] : preparations) {
+    if (option->count() > 0) step();
+  }
 }
 
 std::string CommandLine::AskedCommand() const {

@@ -6,6 +6,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "complete/word_place.h"
@@ -57,12 +58,15 @@ struct Kind {
   std::function<Action(Syntax& syntax)> define;
 };
 
+// Steps that are due before the root is entered, for the options that they are for.
+using Preparations = std::vector<std::pair<const CLI::Option*, void (*)()>>;
+
 // What may stand behind a verb. The values that are handed in have to last until the action is
 // done: they become what is given, and stay as they are when nothing is.
 class Syntax {
  public:
-  Syntax(CLI::App& verb, Offerings& all, std::size_t wordsBehindDashes)
-      : app(verb), offerings(all), behindDashes(wordsBehindDashes) {}
+  Syntax(CLI::App& verb, Offerings& all, Preparations& steps, std::size_t wordsBehindDashes)
+      : app(verb), offerings(all), preparations(steps), behindDashes(wordsBehindDashes) {}
 
   Option AddFlag(const char* name, bool& value, const char* meaning);
 
@@ -79,6 +83,9 @@ class Syntax {
   // Returns an action that does what the kind does that is given.
   Action AddKinds(std::span<const Kind> kinds);
 
+  // Where `option` is given, `step` is done before the root is entered; it may throw as an action.
+  void BeforeRoot(const Option& option, void (*step)());
+
   // The option -v, which may stand anywhere.
   Option Verbose() const;
 
@@ -89,6 +96,7 @@ class Syntax {
  private:
   CLI::App& app;
   Offerings& offerings;
+  Preparations& preparations;
   const std::size_t behindDashes;
 };
 
@@ -130,6 +138,9 @@ class CommandLine {
   const Verb& AskedVerb() const { return *verb; }
   // The verb and its kind, if it has any: "label get".
   std::string AskedCommand() const;
+
+  // What has to be done before the root is entered.
+  void Prepare() const;
   ExitCode Act() const { return action(); }
 
  private:
@@ -139,6 +150,7 @@ class CommandLine {
   std::unique_ptr<CLI::App> app;
   std::span<const VerbGroup> groups;
   Offerings offerings;
+  Preparations preparations;
   CLI::Option* rootOption = nullptr;
   std::string root;
   bool verbose = false;

@@ -135,7 +135,7 @@ ExitCode Run(int argc, char** argv, Terminal& terminal) {
   bool isInRoot = false;
   try {
     terminal.Prepare(commandLine, commandLine.AskedVerb().isLong);
-    if (const auto prepare = commandLine.AskedVerb().prepare) prepare();
+    commandLine.Prepare();
     if (const auto root = commandLine.Root()) EnterRoot(*root);
     isInRoot = true;
     std::optional<LinuxHost::ShownLog> shown;

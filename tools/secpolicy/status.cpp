@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "bundle/bundle_decision.h"
 #include "command_line.h"
 #include "ending.h"
 #include "host/linux/operation/state_use.h"
@@ -66,6 +67,14 @@ std::string DescribeLoad(const LinuxHost::LoadRecord& load) {
          (load.errorCount > 0 ? ", " + CountOf(load.errorCount, "error") : "");
 }
 
+std::string DescribeBundle(const BundleStatus& status) {
+  if (!status.bundle) return status.problem;
+  const Manifest& manifest = status.bundle->manifest;
+  std::string text = NameBundle(manifest) + ", signed by " + manifest.key;
+  if (!status.edits.empty()) text += ", edited since: " + FirstOf(status.edits);
+  return text + (status.isLoaded ? "" : "; not what is installed");
+}
+
 // The domains that are not enforcing are named: nothing is refused to them.
 std::string DescribeDomains(const HostStatus& status) {
   std::string text = std::to_string(status.policy.domains.size());
@@ -116,6 +125,7 @@ void WriteText(const HostStatus& status) {
   WriteLine("policy", status.IsLoaded() ? "loaded" : "not loaded");
   WriteLine("latest load", status.load ? DescribeLoad(*status.load) : "none by this command");
   if (status.load) WriteErrors(*status.load);
+  if (status.bundle) WriteLine("bundle", DescribeBundle(*status.bundle));
   WriteLine("domains", DescribeDomains(status));
   WriteLine("objects", std::to_string(status.policy.objects.size()));
   WriteLine("rules", std::to_string(status.ruleCount));
@@ -151,6 +161,15 @@ Json ToJson(const LinuxHost::LoadRecord& load) {
           {"removed", {{"domains", load.removedDomains}, {"rules", load.removedRules}}}};
 }
 
+Json ToJson(const BundleStatus& status) {
+  if (!status.bundle) return {{"problem", status.problem}};
+  const auto& [manifest, digest, time] = *status.bundle;
+  return {{"name", manifest.name},       {"serial", manifest.serial},
+          {"key", manifest.key},         {"digest", digest},
+          {"time", IsoTime(time)},       {"edited", status.edits},
+          {"installed", status.isLoaded}};
+}
+
 Json WorldsToJson(const HostStatus& status) {
   Json worlds = Json::Array();
   for (const LinuxHost::PlacedWorld& world : status.worlds) {
@@ -171,10 +190,13 @@ void WriteJson(const HostStatus& status) {
   for (const auto& [kind, count] : status.rulesByKind) rules[FormOf(kind).keyword] = count;
   Json load;
   if (status.load) load = ToJson(*status.load);
+  Json bundle;
+  if (status.bundle) bundle = ToJson(*status.bundle);
   const Json screen = {
       {"schema", "secpolicy.status/1"},
       {"loaded", status.IsLoaded()},
       {"latestLoad", load},
+      {"bundle", bundle},
       {"domains", status.policy.domains.size()},
       {"domainsByLevel", levels},
       {"objects", status.policy.objects.size()},
@@ -265,8 +287,11 @@ Action Define(Syntax& syntax) {
 
 const Verb kStatus = {
     "status", "Show on one screen whether the policy is loaded, and how that went",
-    "Prints the latest load with its errors, the domains by enforcement level, and how many\n"
-    "objects, rules of each kind and tardisks there are. Exit status: 0 the policy is loaded,\n"
+    "Prints the latest load with its errors, the bundle that the policy came from and what was "
+    "edited\n"
+    "since, the domains by enforcement level, and how many objects, rules of each kind and "
+    "tardisks\n"
+    "there are. Exit status: 0 the policy is loaded,\n"
     "1 it is not, or the latest load did not end well.\n"
     "With --format prometheus it writes metrics in the text format of that monitoring system; "
     "they\n"

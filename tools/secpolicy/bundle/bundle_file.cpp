@@ -6,22 +6,13 @@
 #include "bundle/bundle_limits.h"
 #include "bundle/policy_tree.h"
 #include "bundle/read_file.h"
-#include "host/linux/operation/text_digest.h"
 #include "text/format.h"
 
 namespace SecPolicyCli {
 namespace {
 
-constexpr char kManifest[] = "manifest.json";
-constexpr char kSignature[] = "manifest.sig";
-
 // Clocks of two machines differ a little.
 constexpr std::int64_t kClockTolerance = 300;
-
-// In the order of their places in a bundle.
-BundledFile Described(const ArchiveEntry& file) {
-  return {.path = file.name, .size = file.bytes.size(), .digest = LinuxHost::DigestOf(file.bytes)};
-}
 
 }  // namespace
 
@@ -32,9 +23,9 @@ std::string MakeBundle(const BundleRequest& request, const SigningKey& key) {
                     .expires = request.expires,
                     .key = key.Id(),
                     .files = {}};
-  std::ranges::transform(request.files, std::back_inserter(manifest.files), Described);
+  std::ranges::transform(request.files, std::back_inserter(manifest.files), DescribeFile);
   const std::string text = ToJson(manifest).Text();
-  std::vector<ArchiveEntry> entries = {{kManifest, text}, {kSignature, key.Sign(text)}};
+  std::vector<ArchiveEntry> entries = {{kManifestName, text}, {kSignatureName, key.Sign(text)}};
   for (const ArchiveEntry& file : request.files) {
     entries.push_back({std::string(kPolicyPrefix) + file.name, file.bytes});
   }
@@ -51,7 +42,7 @@ BundleFile::BundleFile(const std::string& file) : path(file) {
   } catch (const BadArchive& bad) {
     Refuse(bad.what());
   }
-  if (entries.size() < 2 || entries[0].name != kManifest || entries[1].name != kSignature) {
+  if (entries.size() < 2 || entries[0].name != kManifestName || entries[1].name != kSignatureName) {
     Refuse("it does not begin with a manifest and its signature");
   }
   manifestText = std::move(entries[0].bytes);
@@ -109,7 +100,7 @@ void BundleFile::RequireFiles(const Manifest& manifest) const {
     if (found == files.end() || found->name != file.path) {
       Refuse("it lacks " + file.path + ", which its manifest names");
     }
-    if (Described(*found) != file) Refuse(file.path + " was changed after it was signed");
+    if (DescribeFile(*found) != file) Refuse(file.path + " was changed after it was signed");
   }
   for (const ArchiveEntry& file : files) {
     if (!named.contains(file.name)) {

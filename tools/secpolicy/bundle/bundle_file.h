@@ -42,6 +42,10 @@ class BundleFile {
   // `now`, in seconds since 1970. Throws BadBundle.
   Manifest Verify(const std::vector<VerifyingKey>& keys, std::int64_t now) const;
 
+  // The manifest and its signature as they are in the bundle.
+  const std::string& ManifestText() const { return manifestText; }
+  const std::string& Signature() const { return signature; }
+
   // The policy's files. Who has not verified them has no use for them.
   const std::vector<ArchiveEntry>& Files() const { return files; }
 

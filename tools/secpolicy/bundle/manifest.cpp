@@ -3,6 +3,7 @@
 #include <ctime>
 #include <variant>
 
+#include "host/linux/operation/text_digest.h"
 #include "lsp/json_reader.h"
 #include "text/format.h"
 
@@ -50,6 +51,10 @@ std::vector<BundledFile> FilesIn(const Json& json) {
 }
 
 }  // namespace
+
+BundledFile DescribeFile(const ArchiveEntry& file) {
+  return {.path = file.name, .size = file.bytes.size(), .digest = LinuxHost::DigestOf(file.bytes)};
+}
 
 Json ToJson(const Manifest& manifest) {
   Json files = Json::Array();

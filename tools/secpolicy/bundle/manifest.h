@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "bundle/archive.h"
 #include "json.h"
 #include "refusal.h"
 
@@ -32,6 +33,8 @@ struct Manifest {
 
   bool operator==(const Manifest&) const = default;
 };
+
+BundledFile DescribeFile(const ArchiveEntry& file);
 
 class BadManifest : public Refusal {
  public:

@@ -1,7 +1,6 @@
 #include "bundle/policy_tree.h"
 
 #include <algorithm>
-#include <map>
 
 #include "bundle/bundle_limits.h"
 #include "bundle/read_file.h"
@@ -24,25 +23,30 @@ bool IsPlain(char byte) { return byte > ' ' && byte <= '~' && byte != '/' && byt
 
 }  // namespace
 
-std::vector<ArchiveEntry> ReadPolicyTree(const std::string& dir) {
-  std::vector<ArchiveEntry> entries;
+std::map<std::string, std::string> ListPolicyTree(const std::string& dir) {
+  std::map<std::string, std::string> paths;
   for (const std::string& directory : Directories()) {
     const std::string place = dir + "/" + directory;
     if (!File_IsDirectory(place.c_str())) continue;
     std::map<std::string, std::string> files;
     SecPolicy::GetFileList(place, files);
-    for (const auto& [path, name] : files) {
-      if (!IsPolicyFile(directory + "/" + name)) {
-        throw Refusal("a bundle cannot hold " + path +
-                      ": the name of a file takes visible ASCII but no backslash, begins with no "
-                      "dot, and has at most " +
-                      std::to_string(kLongestPolicyFile) +
-                      " characters with its directory. Rename it or move it away.");
-      }
-      entries.push_back({directory + "/" + name, ReadFile(path, kLargestBundle).bytes});
-    }
+    for (const auto& [path, name] : files) paths.emplace(directory + "/" + name, path);
   }
-  std::ranges::sort(entries, {}, &ArchiveEntry::name);
+  return paths;
+}
+
+std::vector<ArchiveEntry> ReadPolicyTree(const std::string& dir) {
+  std::vector<ArchiveEntry> entries;
+  for (const auto& [name, path] : ListPolicyTree(dir)) {
+    if (!IsPolicyFile(name)) {
+      throw Refusal("a bundle cannot hold " + path +
+                    ": the name of a file takes visible ASCII but no backslash, begins with no "
+                    "dot, and has at most " +
+                    std::to_string(kLongestPolicyFile) +
+                    " characters with its directory. Rename it or move it away.");
+    }
+    entries.push_back({name, ReadFile(path, kLargestBundle).bytes});
+  }
   return entries;
 }
 

@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <sstream>
 #include <stdexcept>
 
 #include "forked.h"
@@ -14,6 +15,7 @@
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/store_copy.h"
+#include "load/full_load.h"
 #include "policy_dir.h"
 #include "root.h"
 #include "secpolicy/secpolicy.h"
@@ -44,9 +46,12 @@ class ErrorFile : public LoadWatcher {
   std::ofstream file;
 };
 
-void WriteLabels(const LinuxHost::NotedLabels& labels, const std::string& path) {
+// But for files that are only there for the dry run, below `own`.
+void WriteLabels(const LinuxHost::NotedLabels& labels, const std::string& own,
+                 const std::string& path) {
   std::ofstream file(path, std::ios::binary);
   for (const auto& change : labels.Changes()) {
+    if (change.path.starts_with(own)) continue;
     file << change.before << ' ' << change.after << ' ' << change.path << '\0';
   }
   file.flush();
@@ -65,16 +70,27 @@ std::vector<LinuxHost::LabelChange> ReadLabels(const std::string& path) {
   return changes;
 }
 
-std::vector<std::string> ReadErrors(const std::string& path) {
-  std::vector<std::string> errors;
-  std::ifstream file(path, std::ios::binary);
-  for (std::string error; std::getline(file, error, '\0');) errors.push_back(error);
-  return errors;
-}
-
 std::string ReadAll(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
   return {std::istreambuf_iterator<char>(file), {}};
+}
+
+// What was told in a dry run, with its files in `directory` where the load would have them.
+std::string ReadTold(const std::string& path, const std::string& directory,
+                     const std::string& place) {
+  std::string text = ReadAll(path);
+  for (std::size_t at = text.find(directory); at != std::string::npos;
+       at = text.find(directory, at + place.size())) {
+    text.replace(at, directory.size(), place);
+  }
+  return text;
+}
+
+std::vector<std::string> SplitErrors(const std::string& text) {
+  std::vector<std::string> errors;
+  std::istringstream stream(text);
+  for (std::string error; std::getline(stream, error, '\0');) errors.push_back(error);
+  return errors;
 }
 
 }  // namespace
@@ -87,6 +103,7 @@ LoadDryRun::LoadDryRun(const LoadRequest& load) {
   }
   const std::string messageFile = scratch.File("messages");
   const std::string labelFile = scratch.File("labels");
+  const std::string unpacked = scratch.File("policy");
   const ForkedEnd end = RunForked([&] {
     Redirect(STDOUT_FILENO, scratch.File("output"));
     Redirect(STDERR_FILENO, messageFile);
@@ -96,18 +113,22 @@ LoadDryRun::LoadDryRun(const LoadRequest& load) {
     const LinuxHost::UsedState state(StateAfter(), LinuxHost::ShownStatePath());
     LoadRequest dryRun = load;
     dryRun.dryRun = true;
+    if (load.unpack) {
+      load.unpack(unpacked);
+      dryRun.steps = OwnLoad(unpacked);
+    }
     ErrorFile errorFile(scratch.File("errors"));
     dryRun.watcher = &errorFile;
     const ExitCode code = RunLoad(dryRun);
-    WriteLabels(notes, labelFile);
+    if (code == kWell || !load.allOrNothing) WriteLabels(notes, scratch.File(""), labelFile);
     return code;
   });
-  messages = ReadAll(messageFile);
+  messages = ReadTold(messageFile, unpacked, load.policyDir);
   if (!end.death.empty()) {
     throw std::runtime_error("the dry run of the load died: " + end.death + "\n" + messages);
   }
   ending = end.code;
-  errors = ReadErrors(scratch.File("errors"));
+  errors = SplitErrors(ReadTold(scratch.File("errors"), unpacked, load.policyDir));
   labels = ReadLabels(labelFile);
 }
 

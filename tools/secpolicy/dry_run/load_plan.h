@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "json.h"
 #include "load_dry_run.h"
 #include "policy/difference.h"
 
@@ -41,8 +42,9 @@ LoadPlan MakeLoadPlan(const LoadDryRun& dryRun);
 // `maxLabels` files are shown.
 void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& output);
 
-// Writes the plan for programs, with how the load of `policyDir` would end.
-void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const LoadDryRun& dryRun,
-                   std::ostream& output);
+// Writes the plan for programs, with how the load of `policyDir` would end, and what is to be said
+// of the bundle that it is of; null where it is of none.
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const Json& bundle,
+                   const LoadDryRun& dryRun, std::ostream& output);
 
 }  // namespace SecPolicyCli

@@ -1,4 +1,3 @@
-#include "json.h"
 #include "load_plan.h"
 
 namespace SecPolicyCli {
@@ -66,10 +65,10 @@ const char* WordFor(ExitCode ending) {
 
 }  // namespace
 
-void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const LoadDryRun& dryRun,
-                   std::ostream& output) {
+void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const Json& bundle,
+                   const LoadDryRun& dryRun, std::ostream& output) {
   const Difference& difference = plan.difference;
-  const Json document = {
+  Json document = {
       {"schema", "secpolicy.plan/1"},
       {"directory", policyDir},
       {"ending", WordFor(dryRun.Ending())},
@@ -87,6 +86,7 @@ void WritePlanJson(const LoadPlan& plan, const std::string& policyDir, const Loa
         {"stay", StayingRules(plan)}}},
       {"labels", Labels(plan)},
   };
+  if (!bundle.IsNull()) document["bundle"] = bundle;
   output << document.Text();
 }
 

@@ -22,7 +22,7 @@ ExitCode PlanLoad(const LoadRequest& load, const PlanOptions& options) {
   const LinuxHost::DroppedLog dropped;
   const LoadPlan plan = MakeLoadPlan(dryRun);
   if (options.format == "json") {
-    WritePlanJson(plan, load.policyDir, dryRun, std::cout);
+    WritePlanJson(plan, load.policyDir, options.bundle, dryRun, std::cout);
   } else {
     const auto all = std::numeric_limits<std::size_t>::max();
     WritePlanText(plan, options.showAll ? all : kShownLabels, std::cout);

@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "json.h"
 #include "load/load_run.h"
 #include "verb.h"
 
@@ -10,6 +11,7 @@ namespace SecPolicyCli {
 struct PlanOptions {
   std::string format;    // "text" or "json"
   bool showAll = false;  // every file whose label would change, however many
+  Json bundle;           // what programs are told of the bundle that would be loaded, if it is one
 };
 
 // Prints to standard output what the load would change, and changes nothing. The

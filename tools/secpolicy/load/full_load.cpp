@@ -13,4 +13,12 @@ LoadRequest FullLoad(const std::string& dir) {
           .begin = {}};
 }
 
+std::vector<LoadStep> OwnLoad(const std::string& dir) {
+  return {
+      {.kind = LinuxHost::LoadKind::kFull,
+       .directory = dir,
+       .load = SecPolicy::LoadPolicyWithPartners,
+       .partnersDirectory = dir + "/" + SecPolicy::kDomainsDir + "/" + SecPolicy::kPartnersDir}};
+}
+
 }  // namespace SecPolicyCli

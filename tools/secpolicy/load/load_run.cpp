@@ -1,6 +1,5 @@
 #include "load/load_run.h"
 
-#include <signal.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -19,6 +18,7 @@
 #include "host/linux/operation/label_numbers.h"
 #include "host/linux/operation/noted_labels.h"
 #include "host/linux/operation/state_use.h"
+#include "load/blocked_signals.h"
 #include "load/load_listener.h"
 #include "load/load_record.h"
 #include "load/load_summary.h"
@@ -57,7 +57,7 @@ std::vector<std::string> DefinedDomains(const LoadStep& step) {
   std::vector<std::string> names;
   AddNames(step.directory + "/" + SecPolicy::kDomainsDir, "", names);
   if (step.kind == LoadKind::kFull) {
-    AddNames(SecPolicy::kPartnerDomainsDir, SecPolicy::kPartnerPrefix, names);
+    AddNames(step.partnersDirectory, SecPolicy::kPartnerPrefix, names);
   }
   return names;
 }
@@ -72,25 +72,6 @@ std::vector<std::string> NeededDomainsWithout(const std::string& policyDir,
   }
   return names;
 }
-
-// What asks the process to end waits until the labels are given and the load is committed, or both
-// are undone; so does that nobody reads the messages.
-class BlockedSignals {
- public:
-  BlockedSignals() {
-    sigset_t signals;
-    sigemptyset(&signals);
-    for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE})
-      sigaddset(&signals, signal);
-    sigprocmask(SIG_BLOCK, &signals, &before);
-  }
-  BlockedSignals(const BlockedSignals&) = delete;
-  BlockedSignals& operator=(const BlockedSignals&) = delete;
-  ~BlockedSignals() { sigprocmask(SIG_SETMASK, &before, nullptr); }
-
- private:
-  sigset_t before;
-};
 
 // Without /run there was no boot. The host makes but the directory of the state there.
 bool HasPlaceForState() {
@@ -165,7 +146,9 @@ class LoadRun {
     std::optional<NotedLabels> labels;
     if (!request.dryRun) labels.emplace(LinuxHost::LabelNotes::kForLater);
     for (const LoadStep& step : request.steps) Take(step);
-    if (request.allOrNothing && labels) {
+    if (request.allOrNothing && !WentWell()) {
+      transaction.reset();
+    } else if (request.allOrNothing && labels) {
       InstallAllOrNothing(*labels);
     } else {
       Commit();
@@ -217,7 +200,6 @@ class LoadRun {
 
   // The labels come before the commit: they can be taken back, and the commit cannot.
   void InstallAllOrNothing(const NotedLabels& labels) {
-    if (!WentWell()) return transaction.reset();
     const BlockedSignals blocked;
     LinuxHost::LabelJournal journal(LinuxHost::StatePath());
     try {
@@ -234,11 +216,22 @@ class LoadRun {
 
   // All or nothing leaves no trace of itself. Where there was no state, there is to be none; its
   // journal goes with it.
-  void RecordUndone(const RecordedLoad& record) const {
+  void RecordUndone(const RecordedLoad& record) {
+    UndoBegin();
     if (!request.allOrNothing) return RecordEnding(record);
     if (!stateIsNew) return;
     for (const char* part : {"", "-wal", "-shm"}) {
       std::filesystem::remove(LinuxHost::StatePath() + part);
+    }
+  }
+
+  void UndoBegin() {
+    if (!request.undo) return;
+    try {
+      request.undo();
+    } catch (const std::exception& problem) {
+      listener.OnError(problem.what());
+      SecPolicy::SecpolicyError(problem.what());
     }
   }
 
@@ -305,10 +298,14 @@ class LoadRun {
     }
   }
 
+  std::string DescribeProblemFiles() const {
+    if (request.bundle.empty()) return DescribeProblems(listener.Problems(), request.policyDir);
+    return DescribeBundleProblems(listener.Problems(), request.bundle,
+                                  request.steps.front().directory);
+  }
+
   void WriteProblems() const {
-    Attempt([&] {
-      std::cerr << DescribeProblems(listener.Problems(), request.policyDir) << std::flush;
-    });
+    Attempt([&] { std::cerr << DescribeProblemFiles() << std::flush; });
   }
 
   ExitCode End(ExitCode code, const std::string& reason, const std::string& summary) const {

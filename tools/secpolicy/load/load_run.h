@@ -8,6 +8,7 @@
 #include "load/load_timing.h"
 #include "load/load_watcher.h"
 #include "secpolicy/observed/policy_observer.h"
+#include "secpolicy/policy_root.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -17,6 +18,7 @@ struct LoadStep {
   LinuxHost::LoadKind kind;
   std::string directory;
   void (*load)(const std::string& directory, SecPolicy::PolicyObserver& observer);
+  std::string partnersDirectory = SecPolicy::kPartnerDomainsDir;
 };
 
 struct LoadRequest {
@@ -36,6 +38,14 @@ struct LoadRequest {
   // What acts on files before anything is installed, and what is the first to be installed, if any.
   std::function<void(LoadTiming& timing)> prepare;
   std::function<void()> begin;
+
+  // Takes back what `begin` did, when nothing was installed, if anything is to be taken back.
+  std::function<void()> undo = nullptr;
+
+  // The bundle whose files are in the directory for this load, if that is how it comes there, and
+  // what puts them into another directory for a dry run.
+  std::string bundle = {};
+  std::function<void(const std::string& directory)> unpack = nullptr;
 };
 
 // Takes the steps as one load: others see what was installed before, or all of it. Ends with one

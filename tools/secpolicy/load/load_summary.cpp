@@ -37,6 +37,17 @@ std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
          " shows the lines, and what may be meant\n";
 }
 
+std::string DescribeBundleProblems(const std::map<std::string, std::size_t>& problems,
+                                   const std::string& bundle, const std::string& dir) {
+  std::string text;
+  for (const auto& [file, count] : problems) {
+    const bool isInside = file.starts_with(dir + "/");
+    text += Visible(bundle + ": " + (isInside ? file.substr(dir.size() + 1) : file)) + ": " +
+            CountOf(count, "error") + "\n";
+  }
+  return text;
+}
+
 std::string DescribeStop(const std::vector<std::string>& missing, const std::string& policyDir) {
   const std::string names = ListOf(missing, "and");
   const bool isOne = missing.size() == 1;

@@ -14,6 +14,11 @@ namespace SecPolicyCli {
 std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
                              const std::string& policyDir);
 
+// The same of a load of the bundle `bundle`, whose files are in the directory `dir` for a moment:
+// by their names in the bundle.
+std::string DescribeBundleProblems(const std::map<std::string, std::size_t>& problems,
+                                   const std::string& bundle, const std::string& dir);
+
 // What the summary of a load says that stopped since there are no domains `missing`, which are one
 // at least.
 std::string DescribeStop(const std::vector<std::string>& missing, const std::string& policyDir);

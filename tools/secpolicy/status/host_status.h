@@ -6,17 +6,29 @@
 #include <string>
 #include <vector>
 
+#include "bundle/installed_bundle.h"
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/world_entry.h"
 #include "installed/installed_policy.h"
 
 namespace SecPolicyCli {
 
+// The bundle that the files of the host's policy came from.
+struct BundleStatus {
+  std::optional<InstalledBundle> bundle;  // nothing when it cannot be told
+  std::string problem;                    // why
+  std::vector<std::string> edits;         // files that differ from the bundle's
+  bool isLoaded = false;                  // the latest load was one of these files, and ended well
+};
+
 // What `status` tells of a host.
+
 struct HostStatus {
   Policy::InstalledPolicy policy;
   std::vector<InstalledTardisk> tardisks;
   std::optional<LinuxHost::LoadRecord> load;
+  std::optional<BundleStatus> bundle;
+
   std::map<Policy::Level, std::vector<std::string>> domainsByLevel;
   std::map<Policy::RuleKind, std::size_t> rulesByKind;
   std::size_t ruleCount = 0;

@@ -97,6 +97,24 @@ std::vector<Gauge> LoadGauges(const LinuxHost::LoadRecord& load) {
           {"secpolicy_last_load_info", "What it was.", {{{{"verb", load.verb}}, 1}}}};
 }
 
+// Nothing where the policy comes from no bundle, or that cannot be told.
+std::vector<Gauge> BundleGauges(const HostStatus& status) {
+  if (!status.bundle || !status.bundle->bundle) return {};
+  const auto& [manifest, digest, time] = *status.bundle->bundle;
+  return {{"secpolicy_bundle_info",
+           "The bundle that the policy files came from, with the SHA-256 of its manifest.",
+           {{{{"name", manifest.name}, {"key", manifest.key}, {"digest", digest}}, 1}}},
+          {"secpolicy_bundle_serial",
+           "Its serial, which is greater in each bundle of a policy.",
+           {{{}, static_cast<double>(manifest.serial)}}},
+          {"secpolicy_bundle_installed",
+           "1 when the latest load was one of these files, and ended well.",
+           {{{}, status.bundle->isLoaded ? 1.0 : 0.0}}},
+          {"secpolicy_bundle_edited_files",
+           "Policy files that differ from those of the bundle.",
+           {{{}, static_cast<double>(status.bundle->edits.size())}}}};
+}
+
 Gauge Count(const char* name, const char* help, std::size_t count) {
   return {name, help, {{{}, static_cast<double>(count)}}};
 }
@@ -112,6 +130,7 @@ std::string MetricsOf(const HostStatus& status) {
        "same policy.",
        {{{{"digest", LinuxHost::DigestOf(DescribePolicy(status.policy))}}, 1}}});
   if (status.load) std::ranges::move(LoadGauges(*status.load), std::back_inserter(gauges));
+  std::ranges::move(BundleGauges(status), std::back_inserter(gauges));
   gauges.push_back(RuleGauge(status));
   gauges.push_back(DomainGauge(status));
   gauges.push_back(
