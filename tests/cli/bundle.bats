@@ -208,5 +208,5 @@ refused() {
   cp "$SECPOLICY" alone/bin
   run --separate-stderr alone/bin/secpolicy bundle show good.bundle
   exits 1
-  [[ $stderr == "secpolicy: Unable to load what signs bundles: "*". It is installed with this command: install secpolicy again" ]]
+  [[ $stderr == "secpolicy: bundle show: Unable to load what signs bundles: "*". It is installed with this command: install secpolicy again" ]]
 }

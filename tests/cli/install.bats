@@ -85,7 +85,7 @@ EOF
   export SECPOLICY=$BATS_TEST_TMPDIR/prefix/bin/secpolicy
   secpolicy boot
   exits 1
-  [[ $stderr == "secpolicy: Unable to load what unpacks tardisks: libsecpolicyhost-archive.so.1: "*". It is installed with this command: install secpolicy again" ]]
+  [[ $stderr == "secpolicy: boot: Unable to load what unpacks tardisks: libsecpolicyhost-archive.so.1: "*". It is installed with this command: install secpolicy again" ]]
   secpolicy load
   exits 0
 }

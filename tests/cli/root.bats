@@ -18,7 +18,7 @@ as_nobody() {
   root=$BATS_TEST_TMPDIR/missing
   secpolicy display
   exits 1
-  [[ $stderr == "secpolicy: cannot enter the root $root: No such file or directory" ]]
+  [[ $stderr == "secpolicy: display: cannot enter the root $root: No such file or directory" ]]
 }
 
 @test "an empty root is not the machine's own" {
@@ -26,7 +26,7 @@ as_nobody() {
   secpolicy display
   exits 1
   [[ -z $output ]]
-  [[ $stderr == "secpolicy: cannot enter the root : No such file or directory" ]]
+  [[ $stderr == "secpolicy: display: cannot enter the root : No such file or directory" ]]
 }
 
 @test "everything stays below the root" {

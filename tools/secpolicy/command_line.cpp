@@ -85,7 +85,7 @@ Option& Option::Offer(const Offering& offering) {
 bool Option::IsGiven() const { return option->count() > 0; }
 
 Option Syntax::AddFlag(const char* name, bool& value, const char* meaning) {
-  return {*app.add_flag(name, value, meaning), offerings};
+  return {*app.add_flag(name, value, meaning)->disable_flag_override(), offerings};
 }
 
 Option Syntax::AddOption(const char* name, std::string& value, const std::string& meaning) {
@@ -136,13 +136,15 @@ CommandLine::CommandLine(const Description& description, std::span<const VerbGro
   app->set_version_flag("--version", description.version);
   rootOption = app->add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
                    ->type_name("DIR");
-  app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too");
+  app->add_flag("-v,--verbose", verbose, "Show the progress on standard error too")
+      ->disable_flag_override();
   const std::vector<std::string> choices = {"auto", "always", "never"};
   offerings.emplace(app->add_option("--color", color, "Show colors: " + ListOf(choices, "or"))
                         ->check(OneOf(choices))
                         ->type_name("WHEN"),
                     OfferWords(choices));
-  app->add_flag("--no-pager", withoutPager, "Show long output without a pager");
+  app->add_flag("--no-pager", withoutPager, "Show long output without a pager")
+      ->disable_flag_override();
   for (const VerbGroup& group : groups) {
     for (const Verb* each : group.verbs) AddVerb(*each, group.name);
   }

@@ -149,9 +149,9 @@ ExitCode Run(int argc, char** argv, Terminal& terminal) {
   } catch (const Refusal& refusal) {
     return Refuse(commandLine.AskedCommand(), refusal.what());
   } catch (const std::exception& failure) {
-    const std::string verb = isInRoot ? commandLine.AskedCommand() + ": " : "";
     const std::string message = isInRoot ? WithAdvice(failure.what()) : failure.what();
-    std::cerr << "secpolicy: " << verb << VisibleLines(message) << std::endl;
+    std::cerr << "secpolicy: " << commandLine.AskedCommand() << ": " << VisibleLines(message)
+              << std::endl;
     return kFailed;
   }
 }

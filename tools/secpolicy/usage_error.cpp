@@ -38,6 +38,13 @@ std::string DidYouMean(const std::string& word, const std::vector<std::string>& 
   return nearest.empty() ? "" : "; did you mean '" + nearest + "'?";
 }
 
+// What other commands call the option.
+bool IsMeantAsFormat(const std::string& name, const CLI::App& verb) {
+  const CLI::Option* const format = verb.get_option_no_throw("--format");
+  return name == "--json" && format != nullptr &&
+         format->get_description().find("json") != std::string::npos;
+}
+
 std::string DescribeUnknown(const std::string& word, const std::vector<const CLI::App*>& levels) {
   const std::vector<std::string> names = SubcommandNames(*levels.back());
   if (levels.size() == 1) {
@@ -49,7 +56,9 @@ std::string DescribeUnknown(const std::string& word, const std::vector<const CLI
     if (levels.back()->get_option_no_throw(name) != nullptr) {
       return "the option '" + name + "' stands behind '" + levels.back()->get_name() + "'";
     }
-    return "there is no option '" + name + "'" + DidYouMean(name, OptionNames(levels));
+    const std::string unknown = "there is no option '" + name + "'";
+    if (IsMeantAsFormat(name, *levels.back())) return unknown + "; did you mean '--format json'?";
+    return unknown + DidYouMean(name, OptionNames(levels));
   }
   if (names.empty()) return "'" + word + "' is one word too many";
   const std::string nearest = DidYouMean(word, names);
@@ -63,11 +72,12 @@ std::string DescribeMissingKind(const std::vector<const CLI::App*>& levels) {
   return "one of " + Join(SubcommandNames(*levels.back())) + " is required";
 }
 
-// The parser's own words begin with the name of the option.
+// The parser's own words begin with the name of the option, of a flag without its dashes.
 std::string DescribeValues(const std::string& message) {
-  const bool isMissing = message.find("missing") != std::string::npos;
+  const auto says = [&](const char* word) { return message.find(word) != std::string::npos; };
+  if (says("override")) return "--" + message.substr(0, message.find(' ')) + " takes no value";
   return message.substr(0, message.find(':')) +
-         (isMissing ? " needs a value" : " is given more than once");
+         (says("missing") ? " needs a value" : " is given more than once");
 }
 
 template <class Kind>
