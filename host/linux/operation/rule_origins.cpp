@@ -122,4 +122,18 @@ std::optional<LabelOrigin> FindLabelOrigin(HostState& state, const std::string& 
   return latest.origin;
 }
 
+std::vector<LabelOrigin> ListLabelOrigins(HostState& state) {
+  std::vector<LabelOrigin> origins;
+  Rows rows = state.Database().Select(
+      "SELECT path, is_tree, label, file, line FROM label_origin ORDER BY id");
+  while (rows.Next()) {
+    origins.push_back({.path = rows.Text(0),
+                       .isTree = rows.Integer(1) != 0,
+                       .label = rows.Text(2),
+                       .file = rows.Text(3),
+                       .line = static_cast<unsigned int>(rows.Integer(4))});
+  }
+  return origins;
+}
+
 }  // namespace LinuxHost

@@ -55,4 +55,7 @@ std::vector<std::string> FindDomainsWithoutFile(HostState& state);
 // trees around it, the one that was recorded last.
 std::optional<LabelOrigin> FindLabelOrigin(HostState& state, const std::string& path);
 
+// The lines that label files, in the order in which they were recorded.
+std::vector<LabelOrigin> ListLabelOrigins(HostState& state);
+
 }  // namespace LinuxHost

@@ -1,4 +1,3 @@
-#include "json.h"
 #include "policy_diff.h"
 
 namespace SecPolicyCli {
@@ -40,11 +39,11 @@ Json ToJson(const std::vector<LabelDifference>& labels) {
 
 }  // namespace
 
-void WriteDiffJson(const Comparison& diff, std::ostream& output) {
+Json DiffToJson(const Comparison& diff) {
   Json domains = Json::Array();
   for (const Policy::DomainDifference& domain : diff.difference.domains)
     domains.Append(ToJson(domain));
-  const Json document = {
+  return {
       {"schema", "secpolicy.diff/1"},
       {"before", diff.before},
       {"after", diff.after},
@@ -54,7 +53,10 @@ void WriteDiffJson(const Comparison& diff, std::ostream& output) {
        {{"removed", diff.difference.objectsRemoved}, {"added", diff.difference.objectsAdded}}},
       {"labels", diff.labels ? ToJson(*diff.labels) : Json()},
   };
-  output << document.Text();
+}
+
+void WriteDiffJson(const Comparison& diff, std::ostream& output) {
+  output << DiffToJson(diff).Text();
 }
 
 }  // namespace SecPolicyCli

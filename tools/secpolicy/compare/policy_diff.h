@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "json.h"
 #include "policy/difference.h"
 #include "side.h"
 
@@ -40,7 +41,8 @@ void WriteDiffStat(const Comparison& diff, std::ostream& output);
 // "domain sshDom", and which side alone has it.
 std::string TitleOf(const Policy::DomainDifference& domain, const Comparison& diff);
 
-// For programs.
+// For programs; see docs/json.md.
+Json DiffToJson(const Comparison& diff);
 void WriteDiffJson(const Comparison& diff, std::ostream& output);
 
 }  // namespace SecPolicyCli

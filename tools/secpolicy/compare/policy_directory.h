@@ -2,7 +2,9 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
+#include "host/linux/operation/rule_origins.h"
 #include "installed/installed_policy.h"
 #include "secpolicy/observed/policy_observer.h"
 
@@ -10,9 +12,10 @@ namespace SecPolicyCli {
 
 // What the files of a policy directory say.
 struct WrittenPolicy {
-  Policy::InstalledPolicy policy;             // as they would install it on an empty host
-  std::map<std::string, std::string> labels;  // by what is labelled: "/etc/fstab", "/srv/*"
-  bool isClean = true;                        // false: a line was refused, and left out
+  Policy::InstalledPolicy policy;                  // as they would install it on an empty host
+  std::map<std::string, std::string> labels;       // by what is labelled: "/etc/fstab", "/srv/*"
+  std::vector<LinuxHost::LabelOrigin> labelLines;  // the same as they are written, in their order
+  bool isClean = true;                             // false: a line was refused, and left out
 };
 
 // Where the partner domains of the policy directory `dir` lie.

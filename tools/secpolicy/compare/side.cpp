@@ -30,7 +30,10 @@ Side ReadDirectory(const std::string& dir, SecPolicy::PolicyObserver& observer) 
     throw BadPolicy("the policy in " + dir + " has errors (above), so it was not compared. " +
                     Call("check " + ShellWord(dir)) + " shows every one with its place.");
   }
-  return {.name = dir, .policy = std::move(written.policy), .labels = std::move(written.labels)};
+  return {.name = dir,
+          .policy = std::move(written.policy),
+          .labels = std::move(written.labels),
+          .labelLines = std::move(written.labelLines)};
 }
 
 Side ReadStateOf(const std::string& name, const std::string& path, LinuxHost::CopyOf what) {

@@ -3,7 +3,9 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <vector>
 
+#include "host/linux/operation/rule_origins.h"
 #include "installed/installed_policy.h"
 #include "secpolicy/observed/policy_observer.h"
 
@@ -16,6 +18,7 @@ struct Side {
 
   // Of a policy directory, what its lines label; nothing for a state, which keeps no such lines.
   std::optional<std::map<std::string, std::string>> labels;
+  std::vector<LinuxHost::LabelOrigin> labelLines = {};  // the same, as they are written
 };
 
 // Reads what `name` means: a policy directory, when it has a slash; "installed"; or a saved state
