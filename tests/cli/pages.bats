@@ -37,6 +37,11 @@ boot_example() {
   runs_as_written "$SOURCE/docs/queries.md"
 }
 
+@test "a policy in the browser" {
+  boot_example
+  runs_as_written "$SOURCE/docs/report.md"
+}
+
 @test "changing a running system" {
   boot_example
   runs_as_written "$SOURCE/docs/runtime.md"

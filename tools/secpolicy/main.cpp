@@ -28,7 +28,7 @@ namespace {
 const VerbGroup kVerbs[] = {
     {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords, &kLsp}},
     {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kBundle, &kRestore, &kSettings, &kLabel}},
-    {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kDiff, &kDrift}},
+    {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kReport, &kDiff, &kDrift}},
     {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
     {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
     {"Run programs in it", {&kRun, &kExec, &kObserve}},
@@ -53,6 +53,7 @@ constexpr char kFooter[] =
     "  secpolicy --root r path hostDom appDom       # how is it reached?\n"
     "  secpolicy --root r words calls               # what can stand behind -s?\n"
     "  secpolicy --root r graph >domains.dot        # draw the domains\n"
+    "  secpolicy --root r report -o /policy.html    # all of it, to look at in a browser\n"
     "  secpolicy --root r features --for webDom     # what can this kernel enforce?\n"
     "  secpolicy --root r run webDom --explain      # and what is the kernel told?\n"
     "  secpolicy --root r load --plan               # what would an edit change?\n"

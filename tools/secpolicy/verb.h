@@ -52,6 +52,7 @@ extern const Verb kSaved;
 extern const Verb kRollback;
 extern const Verb kSettings;
 extern const Verb kGraph;
+extern const Verb kReport;
 extern const Verb kLabel;
 extern const Verb kStatus;
 extern const Verb kDrift;

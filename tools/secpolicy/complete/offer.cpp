@@ -183,6 +183,7 @@ Offering OfferingFor(std::string_view valueName) {
       {"LEVEL", OfferLevels},
       {"OBJECT", OfferWordsOf(WordKind::kLabel)},
       {"PATH", OfferFiles()},
+      {"POLICY", OfferSide},
       {"PROGRAM", OfferCommand},
       {"WHAT", OfferQuestion},
   };

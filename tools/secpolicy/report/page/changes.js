@@ -1,0 +1,47 @@
+// The page of how the policy differs from another one.
+
+const DIFFERENCE = { "-": ["removed", "Removed: "], "+": ["added", "Added: "] };
+
+function differenceList(lines) {
+  const list = h("ul", { class: "difference" });
+  const more = grow(list, lines, ([sign, text]) => {
+    const [look, name] = DIFFERENCE[sign];
+    return h("li", { class: look }, h("span", { "aria-hidden": "true" }, `${sign} `),
+      h("span", { class: "hidden" }, name), h("code", {}, text));
+  });
+  return [list, more];
+}
+
+/** The lines of what was and what is, where there is anything on that side. */
+const linesOf = (before, after) => [...(before ? [["-", before]] : []), ...(after ? [["+", after]] : [])];
+
+const levelText = (level) => level && `level ${level}`;
+
+const domainDifference = ({ level, rules }) => [
+  ...(level.before === level.after ? [] : linesOf(levelText(level.before), levelText(level.after))),
+  ...rules.removed.map((rule) => ["-", rule]),
+  ...rules.changed.flatMap(({ before, after }) => linesOf(before, after)),
+  ...rules.added.map((rule) => ["+", rule]),
+];
+
+function whichSide({ level }) {
+  if (level.before && level.after) return "";
+  return ` (only in ${level.before ? data.against.before : data.against.after})`;
+}
+
+const domainTitle = (domain) =>
+  [domainByName.has(domain.name) ? domainLink(domain.name) : domain.name, whichSide(domain)];
+
+function changesPage() {
+  const { before, after, same, domains: changed, objects: { removed, added }, labels: files } = data.against;
+  const objectLines = [...removed.map((name) => ["-", name]), ...added.map((name) => ["+", name])];
+  const fileLines = (files ?? []).flatMap((line) =>
+    linesOf(line.before && `${line.path} ${line.before}`, line.after && `${line.path} ${line.after}`));
+  return page("Changes",
+    h("p", { class: "lede" }, "How ", h("code", {}, after), " differs from ", h("code", {}, before),
+      same ? ": not at all." : "."),
+    !files && note("File labels are left out: two policy directories have them, and a state does not."),
+    changed.map((domain) => section(domainTitle(domain), differenceList(domainDifference(domain)))),
+    objectLines.length > 0 && section("Objects", differenceList(objectLines)),
+    fileLines.length > 0 && section("File labels", differenceList(fileLines)));
+}
