@@ -1,0 +1,139 @@
+# The collection for Ansible on twenty hosts: changes that are told and not made, or made and not told,
+# and hosts that are left with half a policy, or reached after one that failed.
+
+bats_require_minimum_version 1.5.0
+load ../cli/helper
+load fleet
+
+fleet=${BATS_FILE_TMPDIR-}
+
+hosts=(h{01..20})
+
+setup_file() {
+  command -v ansible-playbook >/dev/null || return 0
+  lay_out_fleet 20
+}
+
+setup() {
+  needs_ansible
+  rollout=$BATS_TEST_DIRNAME/rollout.yml
+  each=$BATS_TEST_DIRNAME/each.yml
+}
+
+# bring LINE...: a new policy lies on each host, with a domain webDom of these lines.
+bring() {
+  local host
+  for host in "${hosts[@]}"; do
+    rm -rf "$fleet/$host/new"
+    cp -r "$fleet/h01/etc/zorvan/secpolicy" "$fleet/$host/new"
+    printf '%s\n' "$@" >"$fleet/$host/new/domains/webDom"
+  done
+}
+
+# has_rule HOST RULE: it is installed in webDom.
+has_rule() {
+  "$SECPOLICY" --root "$fleet/$1" display --format json webDom 2>/dev/null |
+    jq -e --arg rule "$2" '.domains[0].rules | any(.text == $rule)' >/dev/null
+}
+
+@test "check mode tells files and rules, and touches nothing" {
+  bring '-r /srv r'
+  everything h01 >"$BATS_TEST_TMPDIR/before"
+  play "$each" --check --diff --limit h01,h02
+  exits 0
+  recap changed=1 h01 h02
+  shows '+domain webDom'
+  shows '+webDom: -r /srv r'
+  [[ $output == *$'\n+'????????????????' domains/webDom'$'\n'* ]]
+  [[ $(result h01 .changes.rules_added) == 1 && $(result h01 .changes.policy_files) == 1 ]]
+  everything h01 | diff "$BATS_TEST_TMPDIR/before" -
+}
+
+@test "twenty hosts get a policy, and then nothing is left to do" {
+  local host
+  bring '-r /srv r'
+  play "$rollout"
+  exits 0
+  recap changed=1 "${hosts[@]}"
+  [[ $(result h20 .changes.domains_created) == '["webDom"]' ]]
+  for host in h01 h20; do
+    has_rule "$host" '-r /srv r'
+    diff -r "$fleet/$host/new" "$fleet/$host/etc/zorvan/secpolicy"
+    "$SECPOLICY" --root "$fleet/$host" status --format json 2>/dev/null | jq -e '.latestLoad.verb == "load"'
+  done
+  play "$rollout"
+  exits 0
+  recap changed=0 "${hosts[@]}"
+}
+
+@test "a host that fails on the way keeps its policy, and those after it are not touched" {
+  bring '-r /srv r' '-r /var r'
+  # The load of this host cannot write what it installs: its disk is full.
+  mkdir -p "$fleet/full"
+  cat >"$fleet/full/secpolicy" <<END
+#!/bin/bash
+[[ " \$* " != *" --all-or-nothing "* ]] || { trap '' XFSZ; ulimit -f 40; }
+exec "$SECPOLICY" "\$@"
+END
+  chmod +x "$fleet/full/secpolicy"
+  printf 'environment_of_host: {PATH: "%s:%s"}\n' "$fleet/full" "$PATH" >"$fleet/host_vars/h04"
+  everything h04 >"$BATS_TEST_TMPDIR/h04"
+  everything h07 >"$BATS_TEST_TMPDIR/h07"
+  play "$rollout"
+  rm "$fleet/host_vars/h04"
+  [[ $status -eq 2 ]]
+  recap changed=1 h01 h02 h03 h05 h06
+  recap failed=1 h04
+  result h04 .problems
+  [[ $(result h04 '.problems[-1]') == *"disk I/O error"*"nothing was installed"* ]]
+  [[ ! -e $fleet/results/h07 ]]
+  has_rule h03 '-r /var r'
+  everything h04 | diff "$BATS_TEST_TMPDIR/h04" -
+  everything h07 | diff "$BATS_TEST_TMPDIR/h07" -
+}
+
+@test "errors, runs that were killed, tardisks, and the usual place" {
+  local killed=$fleet/h18/etc/zorvan/secpolicy tardisk=$fleet/h19 policy=etc/zorvan/secpolicy/tardisks/clock
+  bring '-r /srv r'
+  # One was killed when it had replaced a policy, by one that cannot be loaded.
+  cp -r "$fleet/h18/new/." "$killed"
+  mv "$killed" "$killed.replaced"
+  cp -r "$fleet/h18/new" "$killed.next"
+  cp -r "$fleet/h18/new" "$killed"
+  echo '-s opne grant' >"$killed/domains/webDom"
+  # One has a tardisk that brings a policy.
+  mkdir -p "$fleet/clock/${policy%/*}"
+  echo '-E policyFile appDom' >"$fleet/clock/$policy"
+  tar -C "$fleet/clock" --owner=0 --group=0 --mode=go-w -czf "$tardisk/tardisks/clock.tgz" etc
+  "$SECPOLICY" --root "$tardisk" boot
+  bring '-r /srv rw'
+  echo '-s opne grant' >"$fleet/h17/new/domains/webDom"
+  echo '-r /opt r' >"$fleet/h20/etc/zorvan/secpolicy/domains/webDom"
+  echo 'src: /etc/zorvan/secpolicy' >"$fleet/host_vars/h20"
+  everything h17 >"$BATS_TEST_TMPDIR/h17"
+
+  play "$each" --limit h17,h18,h19,h20
+  [[ $status -eq 2 ]]
+  recap failed=1 h17
+  recap changed=1 h18 h19 h20
+  [[ $(result h17 '.problems[0]') == *"webDom"*"unknown system call 'opne'"* ]]
+  [[ $(result h17 .msg) == '"the policy in /new has errors, and nothing was changed"' ]]
+  everything h17 | diff "$BATS_TEST_TMPDIR/h17" -
+  diff -r "$fleet/h18/new" "$killed"
+  grep -qx -e '-r /srv r' "$killed.previous/domains/webDom"
+  [[ $(cd "$killed/.." && echo *) == 'secpolicy secpolicy.previous' ]]
+  has_rule h19 '-r /srv rw'
+  diff "$fleet/clock/$policy" "$tardisk/$policy"
+  has_rule h20 '-r /opt r'
+
+  play "$each" --limit h18,h19,h20
+  exits 0
+  recap changed=0 h18 h19 h20
+}
+
+@test "labels and levels are set once, and facts tell them" {
+  touch "$fleet/h16/etc/zorvan/file"
+  play "$BATS_TEST_DIRNAME/modules.yml" --limit h16
+  exits 0
+  [[ $("$SECPOLICY" --root "$fleet/h16" label get /etc/zorvan/file 2>/dev/null) == *": policyFile" ]]
+}
