@@ -137,3 +137,72 @@ END
   exits 0
   [[ $("$SECPOLICY" --root "$fleet/h16" label get /etc/zorvan/file 2>/dev/null) == *": policyFile" ]]
 }
+
+# level HOST DOMAIN: its installed level.
+level() { "$SECPOLICY" --root "$fleet/$1" display --format json "$2" 2>/dev/null | jq -r '.domains[0].level'; }
+
+# sign SERIAL LINE...: three hosts have the bundle /SERIAL.bundle, with a domain newDom of these lines and a
+# domain lateDom, and its key.
+sign() {
+  local signed=$BATS_TEST_TMPDIR/signed key=$fleet/key.pem host
+  [[ -f $key ]] || (umask 077 && openssl genpkey -algorithm ed25519 -out "$key")
+  rm -rf "$signed"
+  cp -r "$fleet/h11/new" "$signed"
+  printf '%s\n' "${@:2}" >"$signed/domains/newDom"
+  : >"$signed/domains/lateDom"
+  "$SECPOLICY" bundle create "$signed" -o "$fleet/$1.bundle" --key "$key" --name web --serial "$1"
+  for host in h{11..13}; do
+    cp "$fleet/$1.bundle" "$fleet/$host"
+    openssl pkey -in "$key" -pubout -out "$fleet/$host/public.pem"
+  done
+}
+
+@test "signed policies are taken once, and older ones never" {
+  local domains=etc/zorvan/secpolicy/domains
+  bring '-r /srv r'
+  sign 1 '-r /srv r'
+  sign 2 '-r /srv rw'
+  play "$each" --limit h11,h12 -e '{"bundle": "/1.bundle", "key": ["/public.pem"]}' --diff
+  exits 0
+  recap changed=1 h11 h12
+  [[ $output == *$'\n-none\n+web, serial 1, signed by '* ]]
+  [[ $(level h11 newDom) == enforcing ]]
+
+  play secpolicy.secpolicy.rollout --limit h13 -e "secpolicy_rollout_bundle=$fleet/2.bundle" \
+    -e '{"secpolicy_rollout_key": ["/public.pem"], "secpolicy_rollout_enforcing": ["newDom"]}'
+  exits 0
+  [[ $(level h13 newDom) == enforcing && $(level h13 lateDom) == permissive ]]
+
+  # One has it, one has it edited, and one has a newer one.
+  echo '-r /opt r' >>"$fleet/h12/$domains/newDom"
+  everything h13 >"$BATS_TEST_TMPDIR/h13"
+  play "$each" --limit h11,h12,h13 -e '{"bundle": "/1.bundle", "key": ["/public.pem"]}'
+  [[ $status -eq 2 ]]
+  recap changed=0 h11 h13
+  recap changed=1 h12
+  recap failed=1 h13
+  [[ $(result h12 .changes.policy_files) == 1 ]]
+  diff "$fleet/h11/$domains/newDom" "$fleet/h12/$domains/newDom"
+  [[ $(result h13 .msg) == *"'secpolicy load --bundle /1.bundle "*"older"* ]]
+  everything h13 | diff "$BATS_TEST_TMPDIR/h13" -
+}
+
+@test "a role begins at the canary, and puts back what is not well" {
+  local policy=$fleet/h12/etc/zorvan/secpolicy
+  sign 3 '-r /usr r'
+  printf '[canary]\nh12\n' >"$fleet/canary"
+  everything h11 >"$BATS_TEST_TMPDIR/h11"
+  cp -r "$policy" "$BATS_TEST_TMPDIR/before"
+  play secpolicy.secpolicy.rollout -i "$fleet/hosts" -i "$fleet/canary" --limit h11,h12 \
+    -e "secpolicy_rollout_bundle=$fleet/3.bundle" -e '{"secpolicy_rollout_key": ["/public.pem"]}' \
+    -e "secpolicy_rollout_check=$BATS_TEST_DIRNAME/unwell.yml"
+  [[ $status -eq 2 ]]
+  recap failed=1 h12
+  recap rescued=1 h12
+  [[ $(result h12 .msg) == *"The host has the policy that it had, since this failed: Ask the service: The service does not answer"* ]]
+  grep -qx -e '-r /usr r' "$policy.previous/domains/newDom"
+  diff -r "$BATS_TEST_TMPDIR/before" "$policy"
+  "$SECPOLICY" --root "$fleet/h12" load --plan --format json 2>/dev/null | jq -e .changesNothing
+  "$SECPOLICY" --root "$fleet/h12" status --format json 2>/dev/null | jq -e '.bundle.serial == 1 and .bundle.installed'
+  everything h11 | diff "$BATS_TEST_TMPDIR/h11" -
+}

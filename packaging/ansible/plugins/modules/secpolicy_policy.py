@@ -17,9 +17,25 @@ options:
       - Directory on the host that holds the whole policy.
       - The files of one that lies elsewhere than by default take the place of those in C(/etc/zorvan/secpolicy), which are kept
         as C(/etc/zorvan/secpolicy.previous). Of tardisks, which bring their own policy, what is not in I(src) stays.
-      - Of the default directory, which something else has written, the policy is installed.
+      - Of the default directory, C(/etc/zorvan/secpolicy), which something else has written, the policy is installed.
     type: path
-    default: /etc/zorvan/secpolicy
+  bundle:
+    description:
+      - File on the host that holds a signed policy, to be verified, to take the place of the files in C(/etc/zorvan/secpolicy), and
+        to be installed.
+      - One that is older than what the host has is refused.
+    type: path
+  key:
+    description:
+      - Files on the host with the public keys that may have signed the I(bundle).
+      - Without any, those in C(/etc/secpolicy/bundle-keys).
+    type: list
+    elements: path
+    default: []
+  allow_older:
+    description: Whether the I(bundle) may be older than what the host has, or be of another policy.
+    type: bool
+    default: false
 extends_documentation_fragment:
   - secpolicy.secpolicy.root
 attributes:
@@ -40,6 +56,11 @@ author:
 '''
 
 EXAMPLES = r'''
+- name: Install a signed policy
+  secpolicy.secpolicy.secpolicy_policy:
+    bundle: /var/cache/web.bundle
+    key: /etc/ssl/policy.pem
+
 - name: Install the policy that was brought to /var/cache/policy
   secpolicy.secpolicy.secpolicy_policy:
     src: /var/cache/policy
@@ -92,7 +113,7 @@ changes:
       description: How many files have another label.
       type: int
     policy_files:
-      description: How many files of the policy are new, changed or gone.
+      description: How many files of the policy are new, changed or gone; of a I(bundle), how many edited ones are replaced.
       type: int
   sample:
     domains_created: [webDom]
@@ -114,53 +135,48 @@ problems:
 '''
 
 from ansible.module_utils.basic import AnsibleModule
+from ansible_collections.secpolicy.secpolicy.plugins.module_utils.bundle import Bundle
 from ansible_collections.secpolicy.secpolicy.plugins.module_utils.command import ROOT_ARGUMENT, run_module
-from ansible_collections.secpolicy.secpolicy.plugins.module_utils.plan import counts_of, diff_of, sides
-from ansible_collections.secpolicy.secpolicy.plugins.module_utils.policy_tree import HOST_POLICY, PolicyTree
+from ansible_collections.secpolicy.secpolicy.plugins.module_utils.directory import HOST_POLICY, Directory
+from ansible_collections.secpolicy.secpolicy.plugins.module_utils.plan import counts_of, diff_of
 
 SHOWN_PROBLEMS = 100
 
 
 def install(module, command):
-    tree = PolicyTree(command.root, module.params['src'])
-    before, after = tree.changes()
-    replaces = bool(before or after) or tree.is_torn()
-    # Of files that are the host's already the plan knows all parts of the policy.
-    plan = plan_of(module, command, module.params['src'] if replaces else HOST_POLICY)
-    result = dict(changed=replaces or not plan['changesNothing'] or not loaded_well(command),
-                  changes=dict(counts_of(plan), policy_files=len(set(before) | set(after))))
+    status = command.ask('secpolicy.status/1', 'status')
+    policy = policy_of(module, command, status)
+    plan = policy.plan()
+    if plan['ending'] != 'done':
+        module.fail_json(msg='the policy in {0} has errors, and nothing was changed'.format(policy.name),
+                         problems=plan['errors'][:SHOWN_PROBLEMS])
+    result = dict(changed=policy.replaces() or not plan['changesNothing'] or not loaded_well(status),
+                  changes=dict(counts_of(plan), policy_files=policy.changed_files()))
     if module._diff:
-        result['diff'] = [file_diff(before, after), diff_of(plan)]
+        result['diff'] = [policy.diff(), diff_of(plan)]
     if result['changed'] and not module.check_mode:
-        with tree.taking_over():
-            command.run('load', '--all-or-nothing')
+        policy.install()
     return result
 
 
-def plan_of(module, command, directory):
-    """The plan of the load, which a policy with errors does not come to."""
-    plan = command.ask('secpolicy.plan/1', 'load', '--plan', directory)
-    if plan['ending'] != 'done':
-        module.fail_json(msg='the policy in {0} has errors, and nothing was changed'.format(module.params['src']),
-                         problems=plan['errors'][:SHOWN_PROBLEMS])
-    return plan
+def policy_of(module, command, status):
+    if module.params['bundle']:
+        return Bundle(module, command, status)
+    return Directory(module, command)
 
 
-def loaded_well(command):
+def loaded_well(status):
     """Whether the latest load did what it was to do; if not, monitoring tells of it until there is another."""
-    latest = command.ask('secpolicy.status/1', 'status')['latestLoad']
-    return latest is not None and latest['ending'] == 'done'
-
-
-def file_diff(before, after):
-    def lines(files):
-        return ['{0} {1}'.format(digest[:16], path) for path, digest in sorted(files.items())]
-    return sides('files of the policy', lines(before), 'files of the new policy', lines(after))
+    return status['latestLoad'] is not None and status['latestLoad']['ending'] == 'done'
 
 
 def main():
-    module = AnsibleModule(argument_spec=dict(src=dict(type='path', default=HOST_POLICY), **ROOT_ARGUMENT),
-                           supports_check_mode=True)
+    module = AnsibleModule(
+        argument_spec=dict(src=dict(type='path'), bundle=dict(type='path'),
+                           key=dict(type='list', elements='path', default=[], no_log=False),
+                           allow_older=dict(type='bool', default=False), **ROOT_ARGUMENT),
+        mutually_exclusive=[('src', 'bundle')],
+        supports_check_mode=True)
     run_module(module, install)
 
 

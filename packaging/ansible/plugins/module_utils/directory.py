@@ -9,18 +9,43 @@ import hashlib
 import os
 import shutil
 
+from ansible_collections.secpolicy.secpolicy.plugins.module_utils.plan import sides
+
 HOST_POLICY = '/etc/zorvan/secpolicy'
 
 
-class PolicyTree:
-    """The files of one policy, to become those of the host, whose own are kept beside them then."""
+class Directory:
+    """The files of one directory, to become the host's policy, which is kept beside it then."""
 
-    def __init__(self, root, source):
-        self.source = below(root, source)
-        self.home = below(root, HOST_POLICY)
+    def __init__(self, module, command):
+        self.command = command
+        self.name = module.params['src'] or HOST_POLICY
+        self.source = below(command.root, self.name)
+        self.home = below(command.root, HOST_POLICY)
         self.next = self.home + '.next'
         self.replaced = self.home + '.replaced'
         self.previous = self.home + '.previous'
+        self.before, self.after = self.changes()
+
+    def replaces(self):
+        """Whether the host gets other files."""
+        return self.changed_files() > 0 or self.is_torn()
+
+    def changed_files(self):
+        return len(set(self.before) | set(self.after))
+
+    def plan(self):
+        # Of files that are the host's already the plan knows all parts of the policy.
+        return self.command.ask('secpolicy.plan/1', 'load', '--plan', self.name if self.replaces() else HOST_POLICY)
+
+    def diff(self):
+        def lines(files):
+            return ['{0} {1}'.format(digest[:16], path) for path, digest in sorted(files.items())]
+        return sides('files of the policy', lines(self.before), 'files of the new policy', lines(self.after))
+
+    def install(self):
+        with self.taking_over():
+            self.command.run('load', '--all-or-nothing')
 
     def is_home(self):
         return os.path.realpath(self.source) == os.path.realpath(self.home)
@@ -47,13 +72,14 @@ class PolicyTree:
         with locked(os.path.dirname(self.home)):
             self.give_back()
             self.prepare()
-            if os.path.isdir(self.home):
-                os.rename(self.home, self.replaced)
-            os.rename(self.next, self.home)
             try:
+                if os.path.isdir(self.home):
+                    os.rename(self.home, self.replaced)
+                os.rename(self.next, self.home)
                 yield
             except BaseException:
-                shutil.rmtree(self.home)
+                if not os.path.isdir(self.next):
+                    shutil.rmtree(self.home)
                 self.give_back()
                 raise
             self.keep_previous()
