@@ -69,13 +69,13 @@ endforeach()
 install(FILES packaging/systemd/secpolicy-metrics.timer packaging/systemd/secpolicy-drift.timer
   DESTINATION "${SECPOLICY_UNITS}")
 install(FILES packaging/systemd/secpolicy.catalog DESTINATION "${SECPOLICY_CATALOG}")
-install(DIRECTORY examples/broken examples/host examples/systemd packaging/monitoring
+install(DIRECTORY examples/broken examples/host examples/systemd packaging/monitoring packaging/ansible
   DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples" USE_SOURCE_PERMISSIONS)
 install(PROGRAMS scripts/pack-example DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples")
 install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}/docs")
 install_documents("${CMAKE_INSTALL_DOCDIR}" README.md CHANGELOG.md SECURITY.md
   docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
-  docs/bundles.md docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
+  docs/bundles.md docs/fleet.md docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
   docs/messages.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/report.md docs/runtime.md
   docs/graph.svg docs/images/report.png)
 

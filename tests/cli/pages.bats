@@ -26,6 +26,8 @@ setup() {
 
 @test "what check finds" { runs_as_written "$SOURCE/docs/diagnostics.md"; }
 
+@test "a fleet of hosts" { runs_as_written "$SOURCE/docs/fleet.md"; }
+
 # The pages about what is installed begin on the example host.
 boot_example() {
   scripts/pack-example r
