@@ -24,6 +24,62 @@ std::vector<std::string>::iterator FirstWord(std::vector<std::string>& words) {
   return word;
 }
 
+std::vector<const CLI::App*> SubcommandsOf(const CLI::App& app) {
+  return app.get_subcommands([](const CLI::App*) { return true; });
+}
+
+OptionForm FormOf(const CLI::Option& option, const Offerings& offerings) {
+  OptionForm form;
+  const std::string type = option.get_type_name();
+  // It says what a value may be, too: "FORMAT:{text,json}".
+  form.valueName = option.get_positional() ? option.get_name(true) : type.substr(0, type.find(':'));
+  for (const std::string& name : option.get_lnames()) form.names.push_back("--" + name);
+  for (const std::string& name : option.get_snames()) form.names.push_back("-" + name);
+  form.description = option.get_description();
+  form.takesValue = option.get_items_expected_max() > 0;
+  form.isList = option.get_expected_max() > 1;
+  const auto offering = offerings.find(&option);
+  if (offering != offerings.end()) form.offering = offering->second;
+  return form;
+}
+
+CommandForm FormOf(const CLI::App& app, const Offerings& offerings) {
+  CommandForm form{.name = app.get_name(), .options = {}, .kinds = {}};
+  for (const CLI::Option* option : app.get_options()) {
+    form.options.push_back(FormOf(*option, offerings));
+  }
+  for (const CLI::App* kind : SubcommandsOf(app)) {
+    form.kinds.push_back({kind->get_name(), kind->get_description()});
+  }
+  return form;
+}
+
+// The command, the verb that was asked for, and its kind, as far as they were given.
+std::vector<const CLI::App*> GivenLevels(const CLI::App& app) {
+  std::vector<const CLI::App*> levels = {&app};
+  while (!levels.back()->get_subcommands().empty()) {
+    levels.push_back(levels.back()->get_subcommands().front());
+  }
+  return levels;
+}
+
+template <class Kind>
+bool Is(const CLI::Error& error) {
+  return dynamic_cast<const Kind*>(&error) != nullptr;
+}
+
+UsageFault FaultOf(const CLI::Error& error) {
+  if (Is<CLI::RequiredError>(error)) return UsageFault::kMissing;
+  if (Is<CLI::ExtrasError>(error)) return UsageFault::kUnknown;
+  return Is<CLI::ArgumentMismatch>(error) ? UsageFault::kValues : UsageFault::kOther;
+}
+
+std::string ExplainFailure(const CLI::App* app, const CLI::Error& error) {
+  UsageError usage{FaultOf(error), {}, app->remaining(true), error.what()};
+  for (const CLI::App* level : GivenLevels(*app)) usage.levels.push_back(FormOf(*level, {}));
+  return ExplainUsage(usage);
+}
+
 // "help" and nothing at all ask for the list of verbs, "help VERB" for what "VERB --help" tells.
 std::vector<std::string> Unabbreviated(std::span<char*> words, const CLI::App& app) {
   std::vector<std::string> plain(words.begin() + 1, words.end());
@@ -32,8 +88,9 @@ std::vector<std::string> Unabbreviated(std::span<char*> words, const CLI::App& a
   if (help == plain.end() || *help != "help") return plain;
   const auto verb = plain.erase(help);
   if (verb == plain.end()) return {"--help"};
-  const std::vector<std::string> verbs = SubcommandNames(app);
-  if (std::ranges::find(verbs, *verb) != verbs.end()) plain.emplace_back("--help");
+  const std::vector<const CLI::App*> verbs = SubcommandsOf(app);
+  const bool isVerb = std::ranges::find(verbs, *verb, &CLI::App::get_name) != verbs.end();
+  if (isVerb) plain.emplace_back("--help");
   return plain;
 }
 
@@ -132,7 +189,7 @@ CommandLine::CommandLine(const Description& description, std::span<const VerbGro
   app->require_subcommand(1);
   app->fallthrough();
   app->footer(description.footer);
-  app->failure_message(ExplainUsage);
+  app->failure_message(ExplainFailure);
   app->set_version_flag("--version", description.version);
   rootOption = app->add_option("--root", root, "Work below DIR as if it were /; needs no privilege")
                    ->type_name("DIR");
@@ -168,15 +225,22 @@ Action CommandLine::Define(const Verb& defined, CLI::App& subcommand) {
   return defined.define(syntax);
 }
 
-WordPlace CommandLine::FindPlace(const std::vector<std::string>& words) {
-  const auto define = [this](CLI::App& subcommand) {
+CommandForm CommandLine::FormOfKind(const std::vector<std::string>& names) {
+  CLI::App* level = app.get();
+  for (const std::string& name : names) level = level->get_subcommand(name);
+  if (names.size() == 1) {
     for (const VerbGroup& group : groups) {
-      const auto found = std::ranges::find(group.verbs, subcommand.get_name(), &Verb::name);
+      const auto found = std::ranges::find(group.verbs, names.front(), &Verb::name);
       // The values of options belong to the action.
-      if (found != group.verbs.end()) action = Define(**found, subcommand);
+      if (found != group.verbs.end()) action = Define(**found, *level);
     }
-  };
-  return SecPolicyCli::FindPlace(*app, define, offerings, words);
+  }
+  return FormOf(*level, offerings);
+}
+
+WordPlace CommandLine::FindPlace(const std::vector<std::string>& words) {
+  const auto enter = [this](const std::vector<std::string>& names) { return FormOfKind(names); };
+  return SecPolicyCli::FindPlace(FormOf(*app, offerings), enter, words);
 }
 
 std::optional<ExitCode> CommandLine::Read(
@@ -211,8 +275,10 @@ void CommandLine::Prepare() const {
 }
 
 std::string CommandLine::AskedCommand() const {
-  const std::string command = CommandOf(*app);
-  return command.substr(command.find(' ') + 1);
+  std::vector<std::string> names;
+  for (const CLI::App* level : GivenLevels(*app)) names.push_back(level->get_name());
+  names.erase(names.begin());
+  return CommandOf(names);
 }
 
 }  // namespace SecPolicyCli

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <span>
@@ -12,13 +13,15 @@
 #include "complete/word_place.h"
 #include "verb.h"
 
-// Few files know the library for command lines: its headers cost seconds to compile.
+// One file knows the library for command lines: its headers cost seconds to compile.
 namespace CLI {
 class App;
 class Option;
 }  // namespace CLI
 
 namespace SecPolicyCli {
+
+using Offerings = std::map<const CLI::Option*, Offering>;
 
 // An option or argument that was added to a verb, for what is to be said about it beside its name
 // and meaning. It lasts as long as the command line.
@@ -146,6 +149,7 @@ class CommandLine {
  private:
   void AddVerb(const Verb& added, const char* group);
   Action Define(const Verb& defined, CLI::App& subcommand);
+  CommandForm FormOfKind(const std::vector<std::string>& names);
 
   std::unique_ptr<CLI::App> app;
   std::span<const VerbGroup> groups;

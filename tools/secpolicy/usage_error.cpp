@@ -1,6 +1,7 @@
 #include "usage_error.h"
 
-#include <CLI/App.hpp>
+#include <algorithm>
+#include <iterator>
 
 #include "text/suggestion.h"
 #include "text/visible.h"
@@ -8,20 +9,14 @@
 namespace SecPolicyCli {
 namespace {
 
-// The command, the verb that was asked for, and its kind, as far as they were given.
-std::vector<const CLI::App*> LevelsOf(const CLI::App& app) {
-  std::vector<const CLI::App*> levels = {&app};
-  while (!levels.back()->get_subcommands().empty()) {
-    levels.push_back(levels.back()->get_subcommands().front());
-  }
-  return levels;
-}
+using Levels = std::vector<CommandForm>;
 
-std::vector<std::string> OptionNames(const std::vector<const CLI::App*>& levels) {
+std::vector<std::string> OptionNames(const Levels& levels) {
   std::vector<std::string> names;
-  for (const CLI::App* level : levels) {
-    for (const CLI::Option* option : level->get_options()) {
-      for (const std::string& name : option->get_lnames()) names.push_back("--" + name);
+  for (const CommandForm& level : levels) {
+    for (const OptionForm& option : level.options) {
+      std::ranges::copy_if(option.names, std::back_inserter(names),
+                           [](const std::string& name) { return name.starts_with("--"); });
     }
   }
   return names;
@@ -39,37 +34,37 @@ std::string DidYouMean(const std::string& word, const std::vector<std::string>& 
 }
 
 // What other commands call the option.
-bool IsMeantAsFormat(const std::string& name, const CLI::App& verb) {
-  const CLI::Option* const format = verb.get_option_no_throw("--format");
+bool IsMeantAsFormat(const std::string& name, const CommandForm& verb) {
+  const OptionForm* const format = verb.FindOption("--format");
   return name == "--json" && format != nullptr &&
-         format->get_description().find("json") != std::string::npos;
+         format->description.find("json") != std::string::npos;
 }
 
-std::string DescribeUnknown(const std::string& word, const std::vector<const CLI::App*>& levels) {
-  const std::vector<std::string> names = SubcommandNames(*levels.back());
+std::string DescribeUnknown(const std::string& word, const Levels& levels) {
+  const std::vector<std::string> names = levels.back().KindNames();
   if (levels.size() == 1) {
     return "there is no verb or option '" + word + "'" +
            DidYouMean(word, word.starts_with('-') ? OptionNames(levels) : names);
   }
   if (word.starts_with('-')) {
     const std::string name = word.substr(0, word.find('='));
-    if (levels.back()->get_option_no_throw(name) != nullptr) {
-      return "the option '" + name + "' stands behind '" + levels.back()->get_name() + "'";
+    if (levels.back().FindOption(name) != nullptr) {
+      return "the option '" + name + "' stands behind '" + levels.back().name + "'";
     }
     const std::string unknown = "there is no option '" + name + "'";
-    if (IsMeantAsFormat(name, *levels.back())) return unknown + "; did you mean '--format json'?";
+    if (IsMeantAsFormat(name, levels.back())) return unknown + "; did you mean '--format json'?";
     return unknown + DidYouMean(name, OptionNames(levels));
   }
   if (names.empty()) return "'" + word + "' is one word too many";
   const std::string nearest = DidYouMean(word, names);
-  return "there is no '" + levels.back()->get_name() + " " + word + "'" +
+  return "there is no '" + levels.back().name + " " + word + "'" +
          (nearest.empty() ? (names.size() > 1 ? "; there are " : "; there is ") + Join(names)
                           : nearest);
 }
 
-std::string DescribeMissingKind(const std::vector<const CLI::App*>& levels) {
+std::string DescribeMissingKind(const Levels& levels) {
   if (levels.size() == 1) return "a verb is required";
-  return "one of " + Join(SubcommandNames(*levels.back())) + " is required";
+  return "one of " + Join(levels.back().KindNames()) + " is required";
 }
 
 // The parser's own words begin with the name of the option, of a flag without its dashes.
@@ -80,44 +75,33 @@ std::string DescribeValues(const std::string& message) {
          (says("missing") ? " needs a value" : " is given more than once");
 }
 
-template <class Kind>
-bool Is(const CLI::Error& error) {
-  return dynamic_cast<const Kind*>(&error) != nullptr;
+std::string DescribeProblem(const UsageError& error) {
+  const bool isMissing = error.fault == UsageFault::kMissing;
+  if ((isMissing || error.fault == UsageFault::kUnknown) && !error.unknown.empty()) {
+    return DescribeUnknown(error.unknown.front(), error.levels);
+  }
+  if (isMissing && !error.levels.back().kinds.empty()) return DescribeMissingKind(error.levels);
+  if (error.fault == UsageFault::kValues) return DescribeValues(error.message);
+  return error.message;
 }
 
-std::string DescribeProblem(const CLI::App& app, const CLI::Error& error) {
-  const std::vector<const CLI::App*> levels = LevelsOf(app);
-  const std::vector<std::string> unknown = app.remaining(true);
-  const bool isRequired = Is<CLI::RequiredError>(error);
-  if ((isRequired || Is<CLI::ExtrasError>(error)) && !unknown.empty()) {
-    return DescribeUnknown(unknown.front(), levels);
-  }
-  if (isRequired && !SubcommandNames(*levels.back()).empty()) return DescribeMissingKind(levels);
-  if (Is<CLI::ArgumentMismatch>(error)) return DescribeValues(error.what());
-  return error.what();
+std::vector<std::string> NamesOf(const Levels& levels) {
+  std::vector<std::string> names;
+  for (const CommandForm& level : levels) names.push_back(level.name);
+  return names;
 }
 
 }  // namespace
 
-std::vector<std::string> SubcommandNames(const CLI::App& app) {
-  std::vector<std::string> names;
-  for (const CLI::App* each : app.get_subcommands([](const CLI::App*) { return true; })) {
-    names.push_back(each->get_name());
-  }
-  return names;
-}
-
-std::string CommandOf(const CLI::App& app) {
+std::string CommandOf(const std::vector<std::string>& names) {
   std::string command;
-  for (const CLI::App* level : LevelsOf(app)) {
-    command += (command.empty() ? "" : " ") + level->get_name();
-  }
+  for (const std::string& name : names) command += (command.empty() ? "" : " ") + name;
   return command;
 }
 
-std::string ExplainUsage(const CLI::App* app, const CLI::Error& error) {
-  return "secpolicy: " + VisibleLines(DescribeProblem(*app, error)) + "\n'" + CommandOf(*app) +
-         " --help' explains the usage.\n";
+std::string ExplainUsage(const UsageError& error) {
+  return "secpolicy: " + VisibleLines(DescribeProblem(error)) + "\n'" +
+         CommandOf(NamesOf(error.levels)) + " --help' explains the usage.\n";
 }
 
 }  // namespace SecPolicyCli

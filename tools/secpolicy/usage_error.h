@@ -3,20 +3,24 @@
 #include <string>
 #include <vector>
 
-namespace CLI {
-class App;
-class Error;
-}  // namespace CLI
+#include "command_form.h"
 
 namespace SecPolicyCli {
 
-// The names of the verbs, or of the kinds of a verb.
-std::vector<std::string> SubcommandNames(const CLI::App& app);
+enum class UsageFault { kMissing, kUnknown, kValues, kOther };
 
-// What was asked for, with the kind of a verb: "secpolicy label get".
-std::string CommandOf(const CLI::App& app);
+// Why a command line cannot be understood.
+struct UsageError {
+  UsageFault fault;
+  std::vector<CommandForm> levels;   // the command, its verb and the kind of that, as far as given
+  std::vector<std::string> unknown;  // words
+  std::string message;               // the parser's
+};
 
-// The message for a command line that cannot be understood, and where to read on.
-std::string ExplainUsage(const CLI::App* app, const CLI::Error& error);
+// The names of the levels: "secpolicy label get".
+std::string CommandOf(const std::vector<std::string>& names);
+
+// What is wrong, and where to read on.
+std::string ExplainUsage(const UsageError& error);
 
 }  // namespace SecPolicyCli

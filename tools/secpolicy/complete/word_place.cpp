@@ -1,7 +1,7 @@
 #include "word_place.h"
 
-#include <CLI/App.hpp>
 #include <algorithm>
+#include <deque>
 #include <set>
 #include <span>
 #include <utility>
@@ -11,23 +11,12 @@ namespace {
 
 bool IsOption(const std::string& word) { return word.size() > 1 && word.front() == '-'; }
 
-bool TakesValue(const CLI::Option& option) { return option.get_items_expected_max() > 0; }
-
-// An argument that takes all that is there, or an option that may be given again.
-bool IsList(const CLI::Option& option) { return option.get_expected_max() > 1; }
-
-// What the usage calls a value, without the words that it is one of: "FORMAT:{text,json}".
-std::string ValueName(const CLI::Option& option) {
-  if (option.get_positional()) return option.get_name(true);
-  const std::string type = option.get_type_name();
-  return type.substr(0, type.find(':'));
-}
+using Enter = std::function<CommandForm(const std::vector<std::string>&)>;
 
 // Walks a command line as the parser does, which refuses one that is not complete.
 class Walk {
  public:
-  Walk(CLI::App& app, const std::function<void(CLI::App&)>& defineVerb, const Offerings& all)
-      : levels{&app}, define(defineVerb), offerings(all) {}
+  Walk(const CommandForm& command, const Enter& enterKind) : levels{command}, enter(enterKind) {}
 
   void Take(const std::string& word) {
     if (expecting != nullptr) {
@@ -52,7 +41,7 @@ class Walk {
       PlaceOfOption(word);
     } else if (HasKinds()) {
       OfferKinds();
-    } else if (const CLI::Option* const argument = CurrentArgument()) {
+    } else if (const OptionForm* const argument = CurrentArgument()) {
       OfferFor(*argument);
     } else {
       OfferOptions();
@@ -61,37 +50,31 @@ class Walk {
   }
 
  private:
-  static std::vector<CLI::App*> KindsOf(CLI::App& level) {
-    return level.get_subcommands([](CLI::App*) { return true; });
-  }
-
-  bool HasKinds() const { return !isBehindDashes && !KindsOf(*levels.back()).empty(); }
+  bool HasKinds() const { return !isBehindDashes && !levels.back().kinds.empty(); }
 
   void EnterKind(const std::string& word) {
     if (levels.size() == 1 && word == "help" && !isHelp) {
       isHelp = true;
       return;
     }
-    const std::vector<CLI::App*> kinds = KindsOf(*levels.back());
-    const auto kind =
-        std::ranges::find(kinds, word, [](const CLI::App* each) { return each->get_name(); });
-    isLost = kind == kinds.end() || isHelp;
+    const std::vector<OfferedWord>& kinds = levels.back().kinds;
+    isLost = isHelp || std::ranges::find(kinds, word, &OfferedWord::word) == kinds.end();
     if (isLost) return;
-    levels.push_back(*kind);
-    if (levels.size() == 2) define(**kind);
+    path.push_back(word);
+    levels.push_back(enter(path));
   }
 
-  void TakeValue(const CLI::Option& option, const std::string& value) {
+  void TakeValue(const OptionForm& option, const std::string& value) {
     given.insert(&option);
-    if (option.check_lname("root")) place.root = value;
+    if (option.names.front() == "--root") place.root = value;
   }
 
   void TakeOption(const std::string& word) {
     const std::size_t sign = word.find('=');
-    const CLI::Option* const option = FindOption(word.substr(0, sign));
+    const OptionForm* const option = FindOption(word.substr(0, sign));
     if (option == nullptr) return;
     given.insert(option);
-    if (!TakesValue(*option)) return;
+    if (!option->takesValue) return;
     if (sign == std::string::npos) {
       expecting = option;
     } else {
@@ -99,9 +82,9 @@ class Walk {
     }
   }
 
-  const CLI::Option* FindOption(const std::string& name) const {
-    for (const CLI::App* level : levels) {
-      if (const CLI::Option* const option = level->get_option_no_throw(name)) return option;
+  const OptionForm* FindOption(const std::string& name) const {
+    for (const CommandForm& level : levels) {
+      if (const OptionForm* const option = level.FindOption(name)) return option;
     }
     return nullptr;
   }
@@ -109,40 +92,38 @@ class Walk {
   void PlaceOfOption(const std::string& word) {
     const std::size_t sign = word.find('=');
     if (sign == std::string::npos) return OfferOptions();
-    const CLI::Option* const option = FindOption(word.substr(0, sign));
-    if (option == nullptr || !TakesValue(*option)) return;
+    const OptionForm* const option = FindOption(word.substr(0, sign));
+    if (option == nullptr || !option->takesValue) return;
     place.fixed = word.substr(0, sign + 1);
     OfferFor(*option);
   }
 
-  void OfferFor(const CLI::Option& option) {
-    const auto own = offerings.find(&option);
-    place.offering = own == offerings.end() ? OfferingFor(ValueName(option)) : own->second;
+  void OfferFor(const OptionForm& option) {
+    place.offering = option.offering ? option.offering : OfferingFor(option.valueName);
   }
 
   void OfferKinds() {
     if (levels.size() == 1 && !isHelp) place.words.push_back({"help", "Explain a verb"});
-    for (const CLI::App* kind : KindsOf(*levels.back())) {
-      place.words.push_back({kind->get_name(), kind->get_description()});
-    }
+    const std::vector<OfferedWord>& kinds = levels.back().kinds;
+    place.words.insert(place.words.end(), kinds.begin(), kinds.end());
   }
 
   // The argument that the next word belongs to, with the words that it has already: behind "--" the
   // last, which is for the words of a command.
-  const CLI::Option* CurrentArgument() {
-    const std::vector<const CLI::Option*> all =
-        std::as_const(*levels.back()).get_options([](const CLI::Option* option) {
-          return option->get_positional();
-        });
+  const OptionForm* CurrentArgument() {
+    std::vector<const OptionForm*> all;
+    for (const OptionForm& option : levels.back().options) {
+      if (option.IsArgument()) all.push_back(&option);
+    }
     if (all.empty()) return nullptr;
     if (isBehindDashes) {
       Keep(argumentsBeforeDashes);
       return all.back();
     }
     std::size_t index = 0;
-    while (index < arguments.size() && index < all.size() && !IsList(*all[index])) ++index;
+    while (index < arguments.size() && index < all.size() && !all[index]->isList) ++index;
     if (index == all.size()) return nullptr;
-    Keep(IsList(*all[index]) ? index : 0);
+    Keep(all[index]->isList ? index : 0);
     return all[index];
   }
 
@@ -154,20 +135,21 @@ class Walk {
   void OfferOptions() {
     std::set<std::string> names;
     for (auto level = levels.rbegin(); level != levels.rend(); ++level) {
-      for (const CLI::Option* option : std::as_const(**level).get_options()) {
-        if (option->get_positional() || option->get_lnames().empty()) continue;
-        if (given.contains(option) && !IsList(*option)) continue;
-        const std::string name = "--" + option->get_lnames().front();
-        if (names.insert(name).second) place.words.push_back({name, option->get_description()});
+      for (const OptionForm& option : level->options) {
+        if (option.IsArgument() || !option.names.front().starts_with("--")) continue;
+        if (given.contains(&option) && !option.isList) continue;
+        const std::string& name = option.names.front();
+        if (names.insert(name).second) place.words.push_back({name, option.description});
       }
     }
   }
 
-  std::vector<CLI::App*> levels;  // the command, its verb, and the kind of that
-  const std::function<void(CLI::App&)>& define;
-  const Offerings& offerings;
-  const CLI::Option* expecting = nullptr;  // a value
-  std::set<const CLI::Option*> given;
+  std::deque<CommandForm>
+      levels;                     // the command, its verb, and the kind of that; they stay in place
+  std::vector<std::string> path;  // the names of the latter
+  const Enter& enter;
+  const OptionForm* expecting = nullptr;  // a value
+  std::set<const OptionForm*> given;
   std::vector<std::string> arguments;
   std::size_t argumentsBeforeDashes = 0;
   bool isBehindDashes = false;
@@ -178,9 +160,9 @@ class Walk {
 
 }  // namespace
 
-WordPlace FindPlace(CLI::App& app, const std::function<void(CLI::App& verb)>& define,
-                    const Offerings& offerings, const std::vector<std::string>& words) {
-  Walk walk(app, define, offerings);
+WordPlace FindPlace(const CommandForm& command, const Enter& enter,
+                    const std::vector<std::string>& words) {
+  Walk walk(command, enter);
   if (words.empty()) return walk.PlaceOf("");
   for (std::size_t index = 0; index + 1 < words.size(); ++index) walk.Take(words[index]);
   return walk.PlaceOf(words.back());

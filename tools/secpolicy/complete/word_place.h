@@ -1,17 +1,12 @@
 #pragma once
 
 #include <functional>
-#include <map>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "command_form.h"
 #include "offer.h"
-
-namespace CLI {
-class App;
-class Option;
-}  // namespace CLI
 
 namespace SecPolicyCli {
 
@@ -24,11 +19,10 @@ struct WordPlace {
   std::vector<std::string> before;  // the words of the same argument
 };
 
-using Offerings = std::map<const CLI::Option*, Offering>;
-
-// Finds out where the last of `words`, which are those behind the command's name, stands. `define`
-// adds its options to the verb that it is given.
-WordPlace FindPlace(CLI::App& app, const std::function<void(CLI::App& verb)>& define,
-                    const Offerings& offerings, const std::vector<std::string>& words);
+// Finds out where the last of `words`, which are those behind the command's name, stands. `enter`
+// tells of a verb or of a kind of it, by their names, what can stand behind it.
+WordPlace FindPlace(const CommandForm& command,
+                    const std::function<CommandForm(const std::vector<std::string>& names)>& enter,
+                    const std::vector<std::string>& words);
 
 }  // namespace SecPolicyCli
