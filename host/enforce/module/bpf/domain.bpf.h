@@ -1,0 +1,99 @@
+// In which domain who is, and what is refused there.
+#ifndef DOMAIN_BPF_H
+#define DOMAIN_BPF_H
+
+#include "kernel_types.bpf.h"
+// What the types are needed for.
+#include <asm-generic/errno-base.h>
+#include <bpf/bpf_helpers.h>
+#include <bpf/bpf_tracing.h>
+#include <stdbool.h>
+
+#include "host/enforce/module/map_entries.h"
+
+struct {
+  __uint(type, BPF_MAP_TYPE_ARRAY);
+  __uint(map_flags, BPF_F_MMAPABLE);
+  __type(key, __u32);
+  __type(value, __u64);
+  __uint(max_entries, kDomainEntries);
+} domains SEC(".maps");
+
+struct {
+  __uint(type, BPF_MAP_TYPE_ARRAY);
+  __type(key, __u32);
+  __type(value, struct ModuleRules);
+  __uint(max_entries, kDomainEntries* kEntriesOfDomain);
+} rules SEC(".maps");
+
+// Of the first thread of a process, by which all others go.
+struct {
+  __uint(type, BPF_MAP_TYPE_TASK_STORAGE);
+  __uint(map_flags, BPF_F_NO_PREALLOC);
+  __type(key, int);
+  __type(value, struct ModuleTask);
+} tasks SEC(".maps");
+
+struct {
+  __uint(type, BPF_MAP_TYPE_PERCPU_ARRAY);
+  __type(key, __u32);
+  __type(value, struct ModuleRefusals);
+  __uint(max_entries, kDomainEntries);
+} refusals SEC(".maps");
+
+struct {
+  __uint(type, BPF_MAP_TYPE_ARRAY);
+  __type(key, __u32);
+  __type(value, __u64);
+  __uint(max_entries, 1);
+} generation SEC(".maps");
+
+// Nothing for who is in no domain.
+static __always_inline struct ModuleTask* task_of(struct task_struct* thread) {
+  return bpf_task_storage_get(&tasks, thread->group_leader, 0, 0);
+}
+
+static __always_inline struct ModuleTask* current_task(void) {
+  return task_of(bpf_get_current_task_btf());
+}
+
+static __always_inline __u64 word_of(__u32 domain) {
+  __u64* word = bpf_map_lookup_elem(&domains, &domain);
+  return word ? *(volatile __u64*)word : kLevelAbsent;
+}
+
+static __always_inline __u32 level_of(__u64 word) { return (__u32)word; }
+
+// What has no rules has all zeroes.
+static __always_inline struct ModuleRules* rules_of(__u64 word) {
+  __u32 entry = word >> kEntryShift;
+  return bpf_map_lookup_elem(&rules, &entry);
+}
+
+static __always_inline void count(__u32 domain, bool is_refused) {
+  struct ModuleRefusals* counts = bpf_map_lookup_elem(&refusals, &domain);
+  if (!counts) return;
+  if (is_refused)
+    counts->refused++;
+  else
+    counts->passed++;
+}
+
+static __always_inline bool is_enforced(__u32 level) {
+  return level != kLevelPermissive && level != kLevelDisabled;
+}
+
+// What comes of an act that the rules of a domain of this level refuse.
+static __always_inline int refuse(__u32 domain, __u32 level) {
+  if (level == kLevelDisabled) return 0;
+  count(domain, is_enforced(level));
+  return is_enforced(level) ? -EPERM : 0;
+}
+
+// What no rule can grant to who is in a domain.
+static __always_inline int refuse_in_any_domain(void) {
+  struct ModuleTask* task = current_task();
+  return task ? refuse(task->domain, level_of(word_of(task->domain))) : 0;
+}
+
+#endif

@@ -1,0 +1,9 @@
+// The programs that the kernel runs at its hooks, by what they are about.
+#include "domain.bpf.h"
+
+#include "capabilities.bpf.h"
+#include "self_protection.bpf.h"
+#include "tasks.bpf.h"
+
+// What the helpers take.
+char taken_license[] SEC("license") = "Dual MIT/GPL";

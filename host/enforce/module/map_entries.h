@@ -1,0 +1,41 @@
+#pragma once
+
+#include <linux/types.h>
+
+#ifdef __cplusplus
+namespace Enforce {
+#endif
+
+// What the maps of the kernel's programs hold: for these programs, which are C, and for who writes
+// the maps.
+
+enum {
+  kModuleDomains = 512,
+  // Of no policy: who is in it is refused everything, by which is seen that the programs run.
+  kCanaryDomain = kModuleDomains,
+  kDomainEntries,
+};
+
+// The levels of a domain. One that there is not refuses what an enforcing one without rules does.
+enum { kLevelAbsent, kLevelEnforcing, kLevelPermissive, kLevelDisabled };
+
+// A domain in 64 bits, which change at once: its level in the lower half, and in the upper one in
+// which of its two entries its rules are.
+enum { kEntryShift = 32, kEntriesOfDomain = 2 };
+
+struct ModuleRules {
+  __u64 capabilities;  // those that are granted, by Linux's numbers as bits
+};
+
+struct ModuleTask {
+  __u32 domain;
+};
+
+struct ModuleRefusals {
+  __u64 refused;
+  __u64 passed;  // which an enforcing domain would have refused
+};
+
+#ifdef __cplusplus
+}  // namespace Enforce
+#endif

@@ -1,0 +1,238 @@
+#include "host/enforce/module/module.h"
+
+#include <bpf/bpf.h>
+#include <bpf/libbpf.h>
+#include <fcntl.h>
+#include <linux/magic.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/vfs.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <filesystem>
+#include <utility>
+#include <vector>
+
+#include "braxo/lib/exception.h"
+#include "braxo/misc/strcat.h"
+#include "host/enforce/module/canary.h"
+#include "host/enforce/module/module_maps.h"
+#include "module_programs.skel.h"
+
+using Braxo::Lib::BraxoException;
+using Braxo::Misc::StrCat;
+
+namespace Enforce {
+namespace {
+
+constexpr const char* kFileSystem = "/sys/fs/bpf";
+// Becomes kModulePins as a whole. That file system takes no names with dots.
+constexpr const char* kNewPins = "/sys/fs/bpf/secpolicy-new";
+
+struct NamedMap {
+  const char* name;
+  FileDescriptor ModuleMaps::*map;
+};
+constexpr std::array kMaps = {
+    NamedMap{"domains", &ModuleMaps::domains},       NamedMap{"rules", &ModuleMaps::rules},
+    NamedMap{"tasks", &ModuleMaps::tasks},           NamedMap{"refusals", &ModuleMaps::refusals},
+    NamedMap{"generation", &ModuleMaps::generation},
+};
+
+struct Destroy {
+  void operator()(module_programs* programs) const { module_programs__destroy(programs); }
+};
+using Programs = std::unique_ptr<module_programs, Destroy>;
+
+unsigned int NumberOf(Policy::Level level) {
+  switch (level) {
+    case Policy::Level::kEnforcing:
+      return kLevelEnforcing;
+    case Policy::Level::kPermissive:
+      return kLevelPermissive;
+    case Policy::Level::kDisabled:
+      break;
+  }
+  return kLevelDisabled;
+}
+
+void RequireDomain(unsigned int domain) {
+  if (domain >= kModuleDomains)
+    throw BraxoException(StrCat("the module: there is no domain ", domain));
+}
+
+void RequireFileSystem() {
+  struct statfs found = {};
+  Require(statfs(kFileSystem, &found) == 0, kFileSystem);
+  if (found.f_type != BPF_FS_MAGIC) {
+    throw BraxoException(
+        "the module: no bpf file system is mounted at /sys/fs/bpf, where it would be kept");
+  }
+}
+
+Programs LoadAndAttach() {
+  libbpf_set_print(nullptr);
+  Programs programs(module_programs__open());
+  Require(programs != nullptr, "cannot read the programs");
+  Require(module_programs__load(programs.get()) == 0, "cannot load the programs");
+  Require(module_programs__attach(programs.get()) == 0, "cannot attach the programs");
+  return programs;
+}
+
+std::unique_ptr<ModuleMaps> MapsOf(module_programs& programs) {
+  auto maps = std::make_unique<ModuleMaps>();
+  for (const auto& [name, map] : kMaps) {
+    const int number = bpf_object__find_map_fd_by_name(programs.obj, name);
+    (*maps).*map = FileDescriptor(fcntl(number, F_DUPFD_CLOEXEC, 0));
+    Require(((*maps).*map).IsOpen(), name);
+  }
+  maps->MapWords();
+  return maps;
+}
+
+// Programs are loaded and attached as well where the kernel never runs them.
+void RequireRefusal(ModuleMaps& maps) {
+  maps.Write(kCanaryDomain, {}, kLevelEnforcing);
+  if (IsRefused([](pid_t) {}))
+    throw BraxoException("the module: whoever starts it needs the capability cap_setpcap");
+  if (!IsRefused([&maps](pid_t child) { maps.Place(child, kCanaryDomain); })) {
+    throw BraxoException(
+        "the module: the kernel does not run its programs, since bpf is not among the security "
+        "modules that it was started with (lsm=)");
+  }
+}
+
+void Pin(module_programs& programs) {
+  Require(mkdir(kNewPins, 0700) == 0, kNewPins);
+  for (const auto& [name, map] : kMaps) {
+    const std::string path = StrCat(kNewPins, "/", name);
+    Require(bpf_obj_pin(bpf_object__find_map_fd_by_name(programs.obj, name), path.c_str()) == 0,
+            path.c_str());
+  }
+  const bpf_object_skeleton& skeleton = *programs.skeleton;
+  for (int index = 0; index < skeleton.prog_cnt; ++index) {
+    const std::string path = StrCat(kNewPins, "/link_", skeleton.progs[index].name);
+    Require(bpf_link__pin(*skeleton.progs[index].link, path.c_str()) == 0, path.c_str());
+  }
+  Require(rename(kNewPins, kModulePins) == 0, kModulePins);
+}
+
+void Remove(const char* pins) {
+  std::error_code error;
+  std::filesystem::remove_all(pins, error);
+  if (error)
+    throw BraxoException(StrCat("the module: cannot remove ", pins, ": ", error.message()));
+}
+
+FileDescriptor OpenPinned(const char* name) {
+  const std::string path = StrCat(kModulePins, "/", name);
+  FileDescriptor map(bpf_obj_get(path.c_str()));
+  Require(map.IsOpen(), path.c_str());
+  return map;
+}
+
+}  // namespace
+
+Module::Module(std::unique_ptr<ModuleMaps> those) : maps(std::move(those)) {}
+Module::Module(Module&&) noexcept = default;
+Module& Module::operator=(Module&&) noexcept = default;
+Module::~Module() = default;
+
+Module Module::Start() {
+  RequireFileSystem();
+  if (std::filesystem::exists(kModulePins)) throw BraxoException("the module: it runs already");
+  Remove(kNewPins);
+  const Programs programs = LoadAndAttach();
+  std::unique_ptr<ModuleMaps> maps = MapsOf(*programs);
+  RequireRefusal(*maps);
+  try {
+    Pin(*programs);
+  } catch (const BraxoException&) {
+    Remove(kNewPins);
+    throw;
+  }
+  return Module(std::move(maps));
+}
+
+std::optional<Module> Module::FindRunning() {
+  if (access(kModulePins, F_OK) != 0) return std::nullopt;
+  auto maps = std::make_unique<ModuleMaps>();
+  for (const auto& [name, map] : kMaps) (*maps).*map = OpenPinned(name);
+  maps->MapWords();
+  return Module(std::move(maps));
+}
+
+void Module::Stop() {
+  // The kernel ends programs a moment after nothing holds them.
+  if (const std::optional<Module> running = FindRunning()) {
+    for (unsigned int id = 0; id < kDomainEntries; ++id)
+      running->maps->WriteLevel(id, kLevelDisabled);
+  }
+  // Whoever is killed from here on has left what the next start removes.
+  if (rename(kModulePins, kNewPins) != 0 && errno != ENOENT) ThrowModuleError(kModulePins);
+  Remove(kNewPins);
+}
+
+void Module::Publish(const ModulePlan& plan, std::uint64_t generation) {
+  std::vector<bool> exists(kModuleDomains);
+  for (const auto& [id, level, rules] : plan) {
+    RequireDomain(id);
+    exists[id] = true;
+    maps->Write(id, rules, NumberOf(level));
+  }
+  for (unsigned int id = 0; id < kModuleDomains; ++id) {
+    if (!exists[id]) maps->WriteLevel(id, kLevelAbsent);
+  }
+  const __u32 only = 0;
+  Require(bpf_map_update_elem(maps->generation.Number(), &only, &generation, BPF_ANY) == 0,
+          "cannot write the generation");
+}
+
+std::uint64_t Module::Generation() const {
+  const __u32 only = 0;
+  std::uint64_t generation = 0;
+  Require(bpf_map_lookup_elem(maps->generation.Number(), &only, &generation) == 0,
+          "cannot read the generation");
+  return generation;
+}
+
+void Module::SetLevel(unsigned int domain, Policy::Level level) {
+  RequireDomain(domain);
+  maps->WriteLevel(domain, NumberOf(level));
+}
+
+void Module::Place(pid_t process, unsigned int domain) {
+  RequireDomain(domain);
+  maps->Place(process, domain);
+}
+
+std::optional<unsigned int> Module::DomainOf(pid_t process) const {
+  const FileDescriptor pidfd(syscall(SYS_pidfd_open, process, 0));
+  const int number = pidfd.Number();
+  ModuleTask task = {};
+  if (pidfd.IsOpen() && bpf_map_lookup_elem(maps->tasks.Number(), &number, &task) == 0)
+    return task.domain;
+  if (!pidfd.IsOpen() || errno != ENOENT)
+    ThrowModuleError(StrCat("cannot look up process ", process));
+  return std::nullopt;
+}
+
+ModuleRefusals Module::RefusalsIn(unsigned int domain) const {
+  RequireDomain(domain);
+  const int processors = libbpf_num_possible_cpus();
+  Require(processors > 0, "cannot count processors");
+  std::vector<ModuleRefusals> counts(static_cast<std::size_t>(processors));
+  Require(bpf_map_lookup_elem(maps->refusals.Number(), &domain, counts.data()) == 0,
+          "cannot read what was refused");
+  ModuleRefusals all = {};
+  for (const auto& [refused, passed] : counts) {
+    all.refused += refused;
+    all.passed += passed;
+  }
+  return all;
+}
+
+}  // namespace Enforce

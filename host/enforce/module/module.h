@@ -1,0 +1,65 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+
+#include "host/enforce/module/map_entries.h"
+#include "host/enforce/module/module_plan.h"
+#include "policy/level.h"
+
+namespace Enforce {
+
+// Where the programs and maps are kept while no process has them.
+inline constexpr const char* kModulePins = "/sys/fs/bpf/secpolicy";
+
+struct ModuleMaps;
+
+// The module: programs that the kernel runs for every process, and what they have been told. They
+// stay until they are stopped or the machine is, whether anybody has this object or not. Everything
+// throws Braxo::Lib::BraxoException, and takes CAP_SYS_ADMIN or CAP_BPF, outside of all domains. Of
+// those that write one may do so at a time, which is for the callers to see to.
+class Module {
+ public:
+  // Loads and starts the programs, which refuse nothing until something is published. Nothing is
+  // left of it when it throws, as it does where programs would not be run.
+  static Module Start();
+
+  // The one that runs; nothing where none does.
+  static std::optional<Module> FindRunning();
+
+  // Ends it: from here on nothing is refused, and who was in a domain is in none. Does nothing
+  // where none runs.
+  static void Stop();
+
+  Module(Module&&) noexcept;
+  Module& operator=(Module&&) noexcept;
+  ~Module();
+
+  // Tells it the rules and levels of all domains; those that are not in the plan refuse everything.
+  // The rules and the level of one domain change at once. At the end `generation` is kept: who
+  // finds another one than that of the plan knows that this was not completed, and publishes anew.
+  void Publish(const ModulePlan& plan, std::uint64_t generation);
+  std::uint64_t Generation() const;
+
+  // Counts at once for all processes of the domain, whose rules stay.
+  void SetLevel(unsigned int domain, Policy::Level level);
+
+  // Puts a process into a domain, with all its threads. Children that it has stay where they are.
+  void Place(pid_t process, unsigned int domain);
+
+  // The domain that the process is in; nothing when it is in none.
+  std::optional<unsigned int> DomainOf(pid_t process) const;
+
+  // How much was refused in a domain, or passed in a permissive one, since the module was started.
+  ModuleRefusals RefusalsIn(unsigned int domain) const;
+
+ private:
+  explicit Module(std::unique_ptr<ModuleMaps> those);
+
+  std::unique_ptr<ModuleMaps> maps;
+};
+
+}  // namespace Enforce

@@ -1,0 +1,44 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <string>
+
+#include "host/enforce/module/map_entries.h"
+#include "host/enforce/supervise/file_descriptor.h"
+
+namespace Enforce {
+
+// The maps of the running programs.
+struct ModuleMaps {
+  FileDescriptor domains;
+  FileDescriptor rules;
+  FileDescriptor tasks;
+  FileDescriptor refusals;
+  FileDescriptor generation;
+  std::uint64_t* words = nullptr;  // of the domains, as the programs see them
+
+  ModuleMaps() = default;
+  ModuleMaps(const ModuleMaps&) = delete;
+  ModuleMaps& operator=(const ModuleMaps&) = delete;
+  ~ModuleMaps();
+
+  // Makes `words` what is in `domains`.
+  void MapWords();
+
+  // Gives the domain these rules and this level (kLevelEnforcing and so on) at once.
+  void Write(unsigned int domain, const ModuleRules& newRules, unsigned int level);
+  void WriteLevel(unsigned int domain, unsigned int level);
+
+  // Puts a process into a domain.
+  void Place(pid_t process, unsigned int domain) const;
+};
+
+// Throws Braxo::Lib::BraxoException: "the module: WHAT: " and the system's text for errno.
+[[noreturn]] void ThrowModuleError(const std::string& what);
+
+// Throws that unless `result`, of a call, is none of a failure.
+void Require(bool isDone, const char* what);
+
+}  // namespace Enforce

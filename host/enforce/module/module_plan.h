@@ -1,0 +1,33 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "host/enforce/coverage.h"
+#include "host/enforce/module/map_entries.h"
+#include "policy/installed_policy.h"
+
+namespace Enforce {
+
+// What the module is told of a domain.
+struct ModuleDomain {
+  unsigned int id = 0;
+  Policy::Level level = Policy::Level::kEnforcing;
+  ModuleRules rules = {};
+};
+
+using ModulePlan = std::vector<ModuleDomain>;
+
+// What the module is told of these domains; all others there are not. `lastCapability` is the
+// highest number that the kernel knows, less than 63.
+ModulePlan PlanModule(const std::vector<Policy::InstalledDomain>& domains,
+                      unsigned int lastCapability);
+
+// What becomes of the rules of a domain, in order, where the module alone keeps them.
+std::vector<RuleFate> FatesByModule(const Policy::InstalledDomain& domain,
+                                    unsigned int lastCapability);
+
+// The plan for people, a line for each domain.
+std::string Dump(const ModulePlan& plan);
+
+}  // namespace Enforce
