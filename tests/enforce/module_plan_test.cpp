@@ -16,8 +16,12 @@ using Enforce::FatesByModule;
 using Enforce::ModulePlan;
 using Enforce::PlanModule;
 using Policy::InstalledDomain;
+using testing::AllOf;
+using testing::Each;
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::IsEmpty;
+using testing::SizeIs;
 
 constexpr unsigned int kLast = CAP_CHECKPOINT_RESTORE;
 
@@ -41,6 +45,30 @@ TEST(PlanModule, HasAllDomains) {
             "domain 511 disabled: none\n");
 }
 
+TEST(PlanModule, HasTheValuesThatPass) {
+  EXPECT_EQ(Dump(PlanModule({DomainOf({"-p socket_family 1 2 grant", "-p socket_family 10 grant",
+                                       "-p socket_family 2 revoke", "-p socket_type 3 revoke",
+                                       "-p prctl_option 5 grant", "-p prctl_option 5 revoke"})},
+                            kLast)),
+            "domain 0 enforcing: none\n"
+            "  socket_family: 1 10\n"
+            "  socket_type: 0-2 4-4294967295\n"
+            "  prctl_option: none\n");
+}
+
+TEST(PlanModule, LetsNothingPassThatThereIsNoRoomFor) {
+  std::vector<std::string> rules;
+  for (int number = 0; number < 33; ++number)
+    rules.push_back("-p ioctl_request " + std::to_string(2 * number) + " grant");
+  EXPECT_EQ(Dump(PlanModule({DomainOf(rules)}, kLast)),
+            "domain 0 enforcing: none\n  ioctl_request: none\n");
+  EXPECT_THAT(Told(FatesByModule(DomainOf(rules), kLast)),
+              AllOf(SizeIs(33), Each(HasSubstr("(refused, as ioctl_request has more than 32 ranges "
+                                               "of values)"))));
+  rules.pop_back();
+  EXPECT_THAT(Told(FatesByModule(DomainOf(rules), kLast)), IsEmpty());
+}
+
 TEST(PlanModule, GrantsByLinuxsNumbers) {
   const ModulePlan plan =
       PlanModule({DomainOf({"-c cap_chown grant", "-c cap_checkpoint_restore grant"})}, kLast);
@@ -51,20 +79,23 @@ TEST(PlanModule, GrantsByLinuxsNumbers) {
 
 TEST(PlanModule, OfNothingIsEmpty) { EXPECT_EQ(Dump(PlanModule({}, kLast)), ""); }
 
-TEST(FatesByModule, KeepsCapabilities) {
-  EXPECT_THAT(Told(FatesByModule(DomainOf({"-c cap_chown grant", "-c cap_kill revoke"}), kLast)),
+TEST(FatesByModule, KeepsCapabilitiesAndSomeChecks) {
+  EXPECT_THAT(Told(FatesByModule(DomainOf({"-c cap_chown grant", "-c cap_kill revoke",
+                                           "-p socket_type 1 grant", "-p socket_family 1 revoke",
+                                           "-p prctl_option 3 grant", "-p ioctl_request 7 grant"}),
+                                 kLast)),
               IsEmpty());
 }
 
 TEST(FatesByModule, TellsWhatItDoesNotKeepInOrder) {
   EXPECT_THAT(
-      Told(FatesByModule(
-          DomainOf({"-s read grant", "-c cap_chown grant", "-r /srv r", "-a object read revoke"}),
-          kLast)),
-      ElementsAre("notExpressible: -s read grant (the module keeps rules about capabilities alone)",
-                  "notExpressible: -r /srv r (the module keeps rules about capabilities alone)",
-                  "notExpressible: -a object read revoke (the module keeps rules about "
-                  "capabilities alone)"));
+      Told(FatesByModule(DomainOf({"-s read grant", "-c cap_chown grant", "-r /srv r",
+                                   "-a object read revoke", "-p kill_signal 9 grant"}),
+                         kLast)),
+      ElementsAre("notExpressible: -s read grant (the module does not keep such rules)",
+                  "notExpressible: -r /srv r (the module does not keep such rules)",
+                  "notExpressible: -a object read revoke (the module does not keep such rules)",
+                  "notExpressible: -p kill_signal 9 grant (the module does not keep such rules)"));
 }
 
 TEST(FatesByModule, TellsWhatAKernelDoesNotKnow) {

@@ -5,32 +5,42 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <grp.h>
 #include <gtest/gtest.h>
 #include <linux/bpf.h>
 #include <linux/capability.h>
 #include <sched.h>
+#include <sys/ioctl.h>
 #include <sys/mount.h>
+#include <sys/prctl.h>
 #include <sys/ptrace.h>
+#include <sys/socket.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <random>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "braxo/lib/exception.h"
+#include "enforce/domain_of.h"
+#include "policy/decision.h"
 
 namespace EnforceTest {
 namespace {
 
 using Enforce::Module;
 using Enforce::ModulePlan;
+using Enforce::PlanModule;
 using Policy::Level;
 
 constexpr unsigned int kDomain = 5;
@@ -116,6 +126,13 @@ bool KernelRunsPrograms() {
   return ("," + modules + ",").find(",bpf,") != std::string::npos;
 }
 
+// kDomain, with these rules.
+Policy::InstalledDomain Numbered(const std::vector<std::string>& rules) {
+  Policy::InstalledDomain domain = DomainOf(rules);
+  domain.id = kDomain;
+  return domain;
+}
+
 class ModuleTest : public testing::Test {
  protected:
   void SetUp() override {
@@ -132,9 +149,17 @@ class ModuleTest : public testing::Test {
     module = Module::Start();
   }
 
-  // kDomain may use these capabilities and kOther all.
+  // kDomain may use these capabilities and kOther all. No check keeps anybody from anything.
   static ModulePlan Granting(std::uint64_t capabilities, Level level = Level::kEnforcing) {
-    return {{kDomain, level, {capabilities}}, {kOther, Level::kEnforcing, {kAll}}};
+    Policy::InstalledDomain domain;
+    domain.id = kDomain;
+    domain.level = level;
+    Policy::InstalledDomain other;
+    other.id = kOther;
+    ModulePlan plan = PlanModule({domain, other}, CAP_LAST_CAP);
+    plan[0].rules.capabilities = capabilities;
+    plan[1].rules.capabilities = kAll;
+    return plan;
   }
 
   // What comes of an act in a domain.
@@ -225,6 +250,134 @@ TEST_F(ModuleTest, KeepsTheGeneration) {
   EXPECT_EQ(module->Generation(), 1U);
   module->Publish(Granting(0), 0x100000002);
   EXPECT_EQ(Module::FindRunning()->Generation(), 0x100000002U);
+}
+
+// ---- Checks
+
+int Socket(int family, int type) {
+  const int made = socket(family, type | SOCK_CLOEXEC, 0);
+  const int error = ErrorOf(made);
+  close(made);
+  return error;
+}
+
+// By the numbers of a program for 32 bits.
+int IoctlOfOtherArchitecture(int descriptor, int request) {
+  int result = 54;
+  asm volatile("int $0x80" : "+a"(result) : "b"(descriptor), "c"(request), "d"(0) : "memory");
+  return result < 0 ? -result : 0;
+}
+
+TEST_F(ModuleTest, ChecksTheIoctlsOfOtherArchitectures) {
+  const ModulePlan granting =
+      PlanModule({Numbered({"-p ioctl_request 0x5451 grant"})}, CAP_LAST_CAP);
+  module->Publish(granting, 2);
+  EXPECT_EQ(In(kDomain, [] { return IoctlOfOtherArchitecture(0, FIOCLEX); }), 0);
+  EXPECT_EQ(In(kDomain, [] { return IoctlOfOtherArchitecture(0, FIONCLEX); }), EPERM);
+  EXPECT_EQ(InChild([] { return IoctlOfOtherArchitecture(0, FIONCLEX); }), 0);
+}
+
+// ---- What the decision says, held against the kernel
+
+struct Try {
+  std::vector<Policy::Question> questions;  // all of which have to be answered by yes
+  Act act;
+};
+
+Policy::Question Passes(const std::string& check, int value) {
+  return Policy::ParameterQuestion{check, std::to_string(value)};
+}
+
+Policy::Question Uses(const std::string& capability) {
+  return Policy::WordsQuestion{Policy::RuleKind::kCapability, {capability}};
+}
+
+std::vector<Try> AllTries() {
+  std::vector<Try> tries;
+  for (const auto& [family, type] :
+       {std::pair{1, 1}, {1, 2}, {1, 5}, {2, 1}, {2, 2}, {10, 1}, {10, 2}, {16, 2}, {16, 3}}) {
+    tries.push_back({{Passes("socket_family", family), Passes("socket_type", type)},
+                     [family = family, type = type] { return Socket(family, type); }});
+  }
+  for (const int option :
+       {PR_GET_DUMPABLE, PR_GET_SECUREBITS, PR_GET_TIMERSLACK, PR_GET_NO_NEW_PRIVS}) {
+    tries.push_back({{Passes("prctl_option", option)},
+                     [option] { return ErrorOf(prctl(option, 0, 0, 0, 0)); }});
+  }
+  for (const int request : {FIOCLEX, FIONCLEX, FIONREAD}) {
+    tries.push_back({{Passes("ioctl_request", request)}, [request] {
+                       int value = 0;
+                       int ends[2];
+                       if (pipe(ends) != 0) return 99;
+                       const int error =
+                           ErrorOf(ioctl(ends[0], static_cast<unsigned long>(request), &value));
+                       close(ends[0]);
+                       close(ends[1]);
+                       return error;
+                     }});
+  }
+  tries.push_back({{Uses("cap_sys_chroot")}, ChangeRoot});
+  tries.push_back({{Uses("cap_sys_admin")}, [] { return ErrorOf(sethostname("host", 4)); }});
+  tries.push_back({{Uses("cap_setgid")}, [] { return ErrorOf(setgroups(0, nullptr)); }});
+  return tries;
+}
+
+std::string SomeRule(std::mt19937& chance) {
+  const auto one = [&chance](const std::vector<std::string>& words) {
+    return words[chance() % words.size()];
+  };
+  const std::string end = one({" grant", " grant", " revoke"});
+  switch (chance() % 5) {
+    case 0:
+      return "-p socket_family " + one({"1", "2", "10", "16", "1 2", "2 16", "0 4294967295"}) + end;
+    case 1:
+      return "-p socket_type " + one({"1", "2", "3", "5", "1 2", "2 5", "1 5"}) + end;
+    case 2:
+      return "-p prctl_option " + one({"3", "27", "30", "39", "3 30", "28 38"}) + end;
+    case 3:
+      return "-p ioctl_request " +
+             one({"0x5450", "0x5451", "0x541b", "0x5450 0x5451", "0 0x5450"}) + end;
+    default:
+      return "-c " + one({"cap_sys_chroot", "cap_sys_admin", "cap_setgid"}) + end;
+  }
+}
+
+Policy::InstalledDomain SomeDomain(unsigned int id) {
+  std::mt19937 chance(id);
+  std::vector<std::string> rules(chance() % 9);
+  for (std::string& rule : rules) rule = SomeRule(chance);
+  Policy::InstalledDomain domain = DomainOf(rules);
+  domain.id = id;
+  domain.level = chance() % 5 == 0 ? Level::kPermissive : Level::kEnforcing;
+  return domain;
+}
+
+bool IsAllowed(const Try& one, const Policy::InstalledDomain& domain) {
+  return std::ranges::all_of(one.questions, [&domain](const Policy::Question& question) {
+    return Decide(question, domain).IsAllowed();
+  });
+}
+
+TEST_F(ModuleTest, RefusesWhatTheDecisionRefuses) {
+  constexpr unsigned int kNumber = 60;
+  std::vector<Policy::InstalledDomain> domains;
+  for (unsigned int id = 0; id < kNumber; ++id) domains.push_back(SomeDomain(id));
+  module->Publish(PlanModule(domains, CAP_LAST_CAP), 2);
+  const std::vector<Try> tries = AllTries();
+  int allowed = 0;
+  int refused = 0;
+  for (const Policy::InstalledDomain& domain : domains) {
+    std::size_t next = 0;
+    const Worker worker([&tries, &next] { return tries[next++].act(); });
+    module->Place(worker.Process(), domain.id);
+    for (std::size_t number = 0; number < tries.size(); ++number) {
+      const bool isAllowed = IsAllowed(tries[number], domain);
+      EXPECT_EQ(worker.Do(), isAllowed ? 0 : EPERM) << "domain " << domain.id << ", try " << number;
+      ++(isAllowed ? allowed : refused);
+    }
+  }
+  EXPECT_GT(allowed, 200);
+  EXPECT_GT(refused, 200);
 }
 
 // ---- Who is in a domain
@@ -343,7 +496,7 @@ TEST_F(ModuleTest, NeedsNobodyToLive) {
   module.reset();
   Module::Stop();
   EXPECT_EQ(InChild([] {
-              Module::Start().Publish({{kDomain, Level::kEnforcing, {0}}}, 7);
+              Module::Start().Publish(Granting(0), 7);
               raise(SIGKILL);
               return 0;
             }),

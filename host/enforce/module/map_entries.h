@@ -23,8 +23,26 @@ enum { kLevelAbsent, kLevelEnforcing, kLevelPermissive, kLevelDisabled };
 // which of its two entries its rules are.
 enum { kEntryShift = 32, kEntriesOfDomain = 2 };
 
+// The parameter checks that are kept.
+enum { kCheckFamily, kCheckType, kCheckPrctl, kCheckIoctl, kModuleChecks };
+
+enum { kMostModuleRanges = 32 };
+
+// Both ends included.
+struct ModuleRange {
+  __u32 first;
+  __u32 last;
+};
+
+// The values that pass.
+struct ModuleCheck {
+  __u32 count;
+  struct ModuleRange ranges[kMostModuleRanges];
+};
+
 struct ModuleRules {
   __u64 capabilities;  // those that are granted, by Linux's numbers as bits
+  struct ModuleCheck checks[kModuleChecks];
 };
 
 struct ModuleTask {

@@ -73,10 +73,13 @@ void RequireFileSystem() {
   }
 }
 
+bool HasHook(const char* name) { return libbpf_find_vmlinux_btf_id(name, BPF_LSM_MAC) > 0; }
+
 Programs LoadAndAttach() {
   libbpf_set_print(nullptr);
   Programs programs(module_programs__open());
   Require(programs != nullptr, "cannot read the programs");
+  bpf_program__set_autoload(programs->progs.use_ioctl_compat, HasHook("file_ioctl_compat"));
   Require(module_programs__load(programs.get()) == 0, "cannot load the programs");
   Require(module_programs__attach(programs.get()) == 0, "cannot attach the programs");
   return programs;
@@ -114,6 +117,7 @@ void Pin(module_programs& programs) {
   }
   const bpf_object_skeleton& skeleton = *programs.skeleton;
   for (int index = 0; index < skeleton.prog_cnt; ++index) {
+    if (*skeleton.progs[index].link == nullptr) continue;
     const std::string path = StrCat(kNewPins, "/link_", skeleton.progs[index].name);
     Require(bpf_link__pin(*skeleton.progs[index].link, path.c_str()) == 0, path.c_str());
   }

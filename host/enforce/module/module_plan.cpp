@@ -1,9 +1,13 @@
 #include "host/enforce/module/module_plan.h"
 
+#include <array>
 #include <limits>
+#include <span>
+#include <string_view>
 
 #include "braxo/misc/strcat.h"
 #include "host/enforce/plan/capability_plan.h"
+#include "host/enforce/plan/value_set.h"
 #include "policy/capability.h"
 
 using Braxo::Misc::StrCat;
@@ -14,6 +18,10 @@ namespace {
 
 // The module takes no heed of who enters a domain: what a process has not it cannot use.
 constexpr std::uint64_t kOfEverybody = std::numeric_limits<std::uint64_t>::max();
+
+// By their places in the map.
+constexpr std::array<std::string_view, kModuleChecks> kChecks = {"socket_family", "socket_type",
+                                                                 "prctl_option", "ioctl_request"};
 
 CapabilityPlan CapabilitiesOf(const InstalledDomain& domain, unsigned int last) {
   return PlanCapabilities(domain, kOfEverybody, last);
@@ -28,22 +36,71 @@ std::string NamesOf(std::uint64_t capabilities) {
   return names.empty() ? " none" : names;
 }
 
+ValueSet PassingIn(const InstalledDomain& domain, std::string_view check) {
+  return PassingValues(RulesOfCheck(domain.rules, check));
+}
+
+bool HasRoom(const ValueSet& passing) { return passing.Ranges().size() <= kMostModuleRanges; }
+
+// What there is no room for does not pass.
+ModuleCheck CheckOf(const ValueSet& passing) {
+  ModuleCheck check = {};
+  if (!HasRoom(passing)) return check;
+  for (const auto& [first, last] : passing.Ranges()) check.ranges[check.count++] = {first, last};
+  return check;
+}
+
+ModuleRules RulesOf(const InstalledDomain& domain, unsigned int last) {
+  ModuleRules rules = {CapabilitiesOf(domain, last).kept, {}};
+  for (std::size_t check = 0; check < kChecks.size(); ++check)
+    rules.checks[check] = CheckOf(PassingIn(domain, kChecks[check]));
+  return rules;
+}
+
+// The fates of the rules about a check that is kept.
+void TellFates(const InstalledDomain& domain, std::string_view check,
+               std::vector<RuleFate>& fates) {
+  const bool hasRoom = HasRoom(PassingIn(domain, check));
+  for (const Policy::Rule* const rule : RulesOfCheck(domain.rules, check)) {
+    RuleFate fate{.rule = *rule, .place = PlaceOf(*rule, domain.rules)};
+    if (!hasRoom && rule->Grants()) {
+      Narrow(fate, StrCat("refused, as ", check, " has more than ", int{kMostModuleRanges},
+                          " ranges of values"));
+    }
+    fates[fate.place] = fate;
+  }
+}
+
+std::string TextOf(const ModuleCheck& check) {
+  std::string text;
+  for (const auto& [first, last] : std::span(check.ranges).first(check.count)) {
+    text += StrCat(" ", first);
+    if (first != last) text += StrCat("-", last);
+  }
+  return text.empty() ? " none" : text;
+}
+
+bool IsOpen(const ModuleCheck& check) {
+  return check.count == 1 && check.ranges[0].first == 0 &&
+         check.ranges[0].last == std::numeric_limits<std::uint32_t>::max();
+}
+
 }  // namespace
 
 ModulePlan PlanModule(const std::vector<InstalledDomain>& domains, unsigned int lastCapability) {
   ModulePlan plan;
-  for (const InstalledDomain& domain : domains) {
-    plan.push_back({domain.id, domain.level, {CapabilitiesOf(domain, lastCapability).kept}});
-  }
+  for (const InstalledDomain& domain : domains)
+    plan.push_back({domain.id, domain.level, RulesOf(domain, lastCapability)});
   return plan;
 }
 
 std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int lastCapability) {
   std::vector<RuleFate> fates;
   for (const Policy::Rule& rule : domain.rules) {
-    fates.push_back({rule, Fate::kNotExpressible, "the module keeps rules about capabilities alone",
+    fates.push_back({rule, Fate::kNotExpressible, "the module does not keep such rules",
                      PlaceOf(rule, domain.rules)});
   }
+  for (const std::string_view check : kChecks) TellFates(domain, check, fates);
   for (const RuleFate& fate : CapabilitiesOf(domain, lastCapability).fates) {
     fates[fate.place] = fate;
   }
@@ -55,6 +112,10 @@ std::string Dump(const ModulePlan& plan) {
   for (const ModuleDomain& domain : plan) {
     text += StrCat("domain ", domain.id, " ", Policy::TextOf(domain.level), ":",
                    NamesOf(domain.rules.capabilities), "\n");
+    for (std::size_t check = 0; check < kChecks.size(); ++check) {
+      const ModuleCheck& values = domain.rules.checks[check];
+      if (!IsOpen(values)) text += StrCat("  ", kChecks[check], ":", TextOf(values), "\n");
+    }
   }
   return text;
 }

@@ -27,7 +27,7 @@ ModulePlan PlanModule(const std::vector<Policy::InstalledDomain>& domains,
 std::vector<RuleFate> FatesByModule(const Policy::InstalledDomain& domain,
                                     unsigned int lastCapability);
 
-// The plan for people, a line for each domain.
+// The plan for people: a line for each domain, and one for each check that not all values pass.
 std::string Dump(const ModulePlan& plan);
 
 }  // namespace Enforce

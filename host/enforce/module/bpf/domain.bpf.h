@@ -4,7 +4,7 @@
 
 #include "kernel_types.bpf.h"
 // What the types are needed for.
-#include <asm-generic/errno-base.h>
+#include <asm-generic/errno.h>
 #include <bpf/bpf_helpers.h>
 #include <bpf/bpf_tracing.h>
 #include <stdbool.h>

@@ -23,6 +23,7 @@ struct inode {
 
 struct cred;
 struct dentry;
+struct file;
 struct linux_binprm;
 struct user_namespace;
 struct vfsmount;

@@ -2,6 +2,7 @@
 #include "domain.bpf.h"
 
 #include "capabilities.bpf.h"
+#include "checks.bpf.h"
 #include "self_protection.bpf.h"
 #include "tasks.bpf.h"
 
