@@ -111,6 +111,9 @@ def test_explains_words_and_who_else_has_them(client, web, policy):
     assert "`unlabeled`: a label that is built in\n" in client.at("hover", web, 0, 5)["contents"]["value"]
     assert "`nothing`: a label that no file declares\n" in client.at("hover", web, 1, 5)["contents"]["value"]
     assert "`noDom`: a domain that no file defines\n" in client.at("hover", web, 2, 16)["contents"]["value"]
+    client.change(web, "-a webContent read grant\n-f webContent webContent regular grant\n")
+    assert "Also in 2 other lines:\n\n- `domains/webDom:2`: `-f webContent webContent regular grant`\n- `fileLabels" \
+        in client.at("hover", web, 0, 5)["contents"]["value"]
     labels_file = policy / "fileLabels/base"
     client.open(labels_file)
     assert client.at("hover", labels_file, 0, 1)["contents"]["value"].startswith(

@@ -84,14 +84,20 @@ std::string Describe(LivePolicy& policy, const Symbol& symbol,
   return std::string("a ") + Policy::FormOf(symbol.kind).plainNoun;
 }
 
-// Other lines that speak of it than the one of the cursor.
+bool AreInOneLine(const Mention& one, const Mention& other) {
+  return one.file.source == other.file.source && one.line == other.line;
+}
+
+// Other lines that speak of it than the one of the cursor, each once.
 std::string ListOthers(const LivePolicy& policy, const std::vector<Mention>& mentions,
                        const Cursor& cursor) {
   std::string list;
   std::size_t count = 0;
+  const Mention* last = nullptr;
   for (const Mention& mention : mentions) {
     const bool isOwn = mention.file.source->Path() == cursor.path && mention.line == cursor.line;
-    if (isOwn || mention.Declares()) continue;
+    if (isOwn || mention.Declares() || (last != nullptr && AreInOneLine(*last, mention))) continue;
+    last = &mention;
     if (++count > kMostShown) continue;
     std::string words;
     for (const std::string& word : mention.file.source->Lines().at(mention.line)) {
