@@ -77,6 +77,6 @@ install_documents("${CMAKE_INSTALL_DOCDIR}" README.md CHANGELOG.md SECURITY.md
   docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
   docs/bundles.md docs/fleet.md docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
   docs/messages.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/report.md docs/runtime.md
-  docs/graph.svg docs/images/report.png)
+  docs/graph.svg docs/images/editor.png docs/images/monitoring.png docs/images/report.png docs/images/rollout.png)
 
 include(Rpm)

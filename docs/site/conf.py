@@ -20,6 +20,8 @@ include_patterns = ["*.md", "docs/*.md"]
 exclude_patterns = [entry.name for entry in ROOT.iterdir() if entry.is_dir() and entry.name != "docs"]
 
 myst_heading_anchors = 4
+# Images of a given width are written as in HTML.
+myst_enable_extensions = ["html_image"]
 highlight_language = "none"
 
 # What Doxygen has read in the public headers.
