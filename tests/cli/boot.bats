@@ -49,6 +49,10 @@ load helper
   rm -r "$root/tardisks"
   secpolicy boot
   exits 1
+  [[ $stderr == "secpolicy: boot: there is no directory /tardisks/ below this root, so nothing was changed. Put the tardisks there, or make it empty for a host without any." ]]
+  rm -r "$root/etc/zorvan/secpolicy"
+  secpolicy boot
+  exits 1
   [[ $stderr == "secpolicy: boot: there is no directory /tardisks/ below this root, so nothing was changed. Put the tardisks there, or name the root that they are in (--root DIR). 'secpolicy --root $root init' writes a first policy, for a host without any." ]]
   [[ ! -e $root/run/secpolicy ]]
 }

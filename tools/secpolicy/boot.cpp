@@ -87,13 +87,18 @@ ExitCode Plan(const Options& options) {
   return kWell;
 }
 
-ExitCode Boot(const Options& options) {
-  if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) {
-    return Refuse("boot", std::string("there is no directory ") + SecPolicy::kTardiskImagesDir +
-                              " below this root, so nothing was changed. Put the tardisks there, "
-                              "or name the root that they are in (--root DIR). " +
-                              Call("init") + " writes a first policy, for a host without any.");
+ExitCode RefuseWithoutTardisks() {
+  const std::string missing = std::string("there is no directory ") + SecPolicy::kTardiskImagesDir +
+                              " below this root, so nothing was changed. Put the tardisks there";
+  if (File_IsDirectory(SecPolicy::kPolicyRoot)) {
+    return Refuse("boot", missing + ", or make it empty for a host without any.");
   }
+  return Refuse("boot", missing + ", or name the root that they are in (--root DIR). " +
+                            Call("init") + " writes a first policy, for a host without any.");
+}
+
+ExitCode Boot(const Options& options) {
+  if (!File_IsDirectory(SecPolicy::kTardiskImagesDir)) return RefuseWithoutTardisks();
   return options.plan ? Plan(options) : BootNow(options);
 }
 
