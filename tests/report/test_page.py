@@ -120,6 +120,13 @@ def test_search_says_when_nothing_is_found(page):
     assert page.text() == "Search: no such thing\n\n0 results."
 
 
+def test_search_without_a_word_asks_for_one(page):
+    page.go("search")
+    assert page.text() == "Search\n\nType a part of a name, a path or a rule."
+    page.go("search", "")
+    assert page.text("h1") == "Search"
+
+
 def test_links_lead_on_and_back(page):
     page.click("main tbody a[href='#domain/sshDom']")
     page.wait_for("document.querySelector('h1').innerText === 'sshDom'")
@@ -151,7 +158,8 @@ def test_every_link_leads_somewhere(page):
 
 
 def test_unknown_addresses_are_told(page):
-    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"], ["graph", "cluster", "none"]):
+    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"], ["graph", "cluster", "none"],
+                  ["domain"], ["label"], ["file"], ["file", "none"]):
         page.go(*words)
         assert page.text("h1") == "Not in this policy"
 
@@ -322,7 +330,9 @@ def test_who_can_is_that_of_the_command(page, host, question):
 @pytest.mark.parametrize("words, problem", [
     (["*", "read", "etc"], "etc is no path: it begins with a slash."),
     (["*", "call", "reed"], "There is no system call reed."),
-    (["*", "pass", "bind_port", "x"], "x is not a number."), (["*", "read", ""], "Fill in what is asked for.")])
+    (["*", "pass", "bind_port", "x"], "x is not a number."),
+    (["sshDom", "pass", "bind_port", "99999999999999999999"],
+     "99999999999999999999 is too large: numbers go up to 0xffffffffffffffff."), (["*", "read", ""], "Fill in what is asked for.")])
 def test_what_cannot_be_asked_is_told(page, words, problem):
     page.go("ask", *words)
     assert page.text(".notice") == problem

@@ -22,6 +22,7 @@ function labelFor(question, path) {
 }
 
 const NUMBER = /^(\d+|0x[\da-f]+)$/i;
+const GREATEST = "0xffffffffffffffff";
 
 /** Why this cannot be asked; nothing for what can. */
 function whyNot(question, words) {
@@ -30,6 +31,7 @@ function whyNot(question, words) {
     const word = words[index];
     if (noun === "path" && !word.startsWith("/")) return `${word} is no path: it begins with a slash.`;
     if (noun === "number" && !NUMBER.test(word)) return `${word} is not a number.`;
+    if (noun === "number" && BigInt(word) > BigInt(GREATEST)) return `${word} is too large: numbers go up to ${GREATEST}.`;
     const known = wordsFor(noun);
     if (known && !known.includes(word)) return `There is no ${noun} ${word}.`;
   }

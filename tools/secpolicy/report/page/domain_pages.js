@@ -57,7 +57,7 @@ function waysOf(domain) {
   ];
 }
 
-function domainPage(name) {
+function domainPage(name = "") {
   const domain = domainByName.get(name);
   if (!domain) return nothingPage(`domain ${name}`);
   const gaps = isCovered ? domain.gaps : [];

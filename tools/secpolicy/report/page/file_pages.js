@@ -22,7 +22,8 @@ const covers = (rulePath, path) => rulePath === path || rulePath === "/"
 
 const isAbout = (rule, path) => data.rules.kind[rule] === KIND["-r"] && covers(wordOf(rule, 0), path);
 
-function filePage(path) {
+function filePage(path = "") {
+  if (!path.startsWith("/")) return nothingPage(`file ${path}`);
   const line = labelLineOf(path);
   const rules = numbersFrom(0, ruleCount).filter((rule) => isAbout(rule, path));
   const below = paths.filter((each) => each !== path && covers(path, each));

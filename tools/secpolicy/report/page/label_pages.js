@@ -23,7 +23,7 @@ const labelFacts = (name, object) => h("p", { class: "lede" },
   object ? `Object label, number ${object.id}. ` : "Label. ",
   domainByName.has(name) && ["There is a ", h("a", { href: addressOf("domain", name) }, "domain"), " of this name."]);
 
-function labelPage(name) {
+function labelPage(name = "") {
   if (!labels.includes(name)) return nothingPage(`label ${name}`);
   const rules = rulesWith(name);
   const files = labelLines.filter(({ label }) => label === name);

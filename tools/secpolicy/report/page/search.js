@@ -18,7 +18,8 @@ function search(query) {
   };
 }
 
-function searchPage(query) {
+function searchPage(query = "") {
+  if (query.trim() === "") return page("Search", note("Type a part of a name, a path or a rule."));
   const found = search(query);
   const count = found.domains.length + found.labels.length + found.paths.length + found.rules.length;
   announce(`${countOf(count, "result")} for ${query}`);
