@@ -60,7 +60,35 @@ print(base64.b64encode(hashlib.sha256(text[0].encode()).digest()).decode())' "$r
   secpolicy report /none -o /page.html
   fails_with report "there is no directory /none below this root. Name a policy directory, a saved state, or 'installed'."
   secpolicy report -o /none/page.html
-  fails_with report 'cannot write /none/page.html: No such file or directory'
+  fails_with report 'cannot write /none/page.html: there is no directory /none'
+  secpolicy report -o ''
+  fails_with report 'cannot write a file without a name'
+  secpolicy report -o .
+  fails_with report 'cannot write .: Is a directory'
   secpolicy report
   exits 2
+}
+
+@test "what is no file is written into, and stays" {
+  boot
+  secpolicy report -o /page.html
+  mkfifo "$root/pipe"
+  ln -s pipe "$root/link"
+  local name
+  for name in pipe link; do
+    cat "$root/pipe" >"$BATS_TEST_TMPDIR/read.html" 3>&- &
+    secpolicy report -o "/$name"
+    exits 0
+    wait $!
+    cmp "$root/page.html" "$BATS_TEST_TMPDIR/read.html"
+  done
+  [[ -p $root/pipe && -L $root/link ]]
+}
+
+@test "standard output is written on, whatever it is called" {
+  boot
+  secpolicy report -o /page.html
+  echo before >"$root/output"
+  "$SECPOLICY" --root "$root" report -o /output >>"$root/output" 2>/dev/null
+  cmp <(echo before && cat "$root/page.html") "$root/output"
 }
