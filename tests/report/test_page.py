@@ -78,6 +78,7 @@ def test_directory_tells_places_and_no_enforcement(browser, host, tmp_path):
     assert "/etc/zorvan/secpolicy/domains/plugins/cache:10" in browser.text()
     browser.go("domain", "bootDom")
     assert "/etc/zorvan/secpolicy/early/domains/bootDom:" in browser.text()
+    assert "Enforcement" not in browser.texts("#pages a")
     browser.go("enforcement")
     assert "it is told of the installed policy alone" in browser.text()
 
@@ -158,7 +159,7 @@ def test_every_link_leads_somewhere(page):
 
 
 def test_unknown_addresses_are_told(page):
-    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"], ["graph", "cluster", "none"],
+    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"], ["transitions", "cluster", "none"],
                   ["domain"], ["label"], ["file"], ["file", "none"]):
         page.go(*words)
         assert page.text("h1") == "Not in this policy"
@@ -178,7 +179,7 @@ def view_box(page):
 
 
 def test_graph_is_that_of_the_command(page, host):
-    page.go("graph")
+    page.go("transitions")
     dot = host.run("graph").stdout
     edges = set(re.findall(r'^  "([^"]+)" -> "([^"]+)"', dot, re.MULTILINE))
     assert {tuple(ends.split(" → ")) for ends in arrows_of(page)} == edges
@@ -186,7 +187,7 @@ def test_graph_is_that_of_the_command(page, host):
 
 
 def test_graph_zooms_and_moves(page):
-    page.go("graph")
+    page.go("transitions")
     whole = view_box(page)
     page.run("document.querySelector('svg.graph').focus()")
     page.press("+")
@@ -206,7 +207,7 @@ def test_graph_zooms_and_moves(page):
 
 
 def test_graph_is_dragged_and_followed(page):
-    page.go("graph")
+    page.go("transitions")
     whole = view_box(page)
     x, y = page.middle("a.node[href='#domain/sshDom']")
     page.mouse("mousePressed", x, y, button="left", buttons=1, clickCount=1)
@@ -214,13 +215,13 @@ def test_graph_is_dragged_and_followed(page):
     page.mouse("mouseMoved", x + 80, y + 60, button="left", buttons=1)
     page.mouse("mouseReleased", x + 80, y + 60, button="left", clickCount=1)
     assert view_box(page)[0] < whole[0]
-    assert page.run("location.hash") == "#graph"
+    assert page.run("location.hash") == "#transitions"
     page.click("a.node[href='#domain/sshDom']")
     page.wait_for("location.hash === '#domain/sshDom'")
 
 
 def test_graph_tells_what_comes_in_and_goes_out_of_the_node_in_focus(page):
-    page.go("graph")
+    page.go("transitions")
     page.run("document.querySelector(\"a.node[href='#domain/sshDom']\").focus()")
     assert "hostDom → sshDom" in arrows_of(page, "in")
     assert "sshDom → hostDom" in arrows_of(page, "out")
@@ -353,7 +354,8 @@ def test_changes_are_those_of_diff(browser, host, tmp_path):
     assert [rule["before"] for rule in changed["rules"]["changed"]] == ["-a sshKey write revoke"]
     assert browser.texts("main h2") == ["sshDom", "Objects"]
     assert browser.run("[...document.querySelectorAll('.difference li')].map((line) => line.textContent)") == [
-        "- Removed: -a sshKey write revoke", "+ Added: -a sshKey write grant", "+ Added: -s ptrace grant",
+        "- Removed: -a sshKey write revoke", "+ Added: -a sshKey write grant /edited/domains/sshDom:24",
+        "+ Added: -s ptrace grant /edited/domains/sshDom:34",
         "+ Added: moreData"]
 
 
@@ -387,7 +389,7 @@ CONTRASTS = """(() => {
     return faint;
 })()"""
 
-SOME_PAGES = [[""], ["domain", "sshDom"], ["label", "sshKey"], ["file", "/etc/ssh"], ["graph"], ["enforcement"],
+SOME_PAGES = [[""], ["domain", "sshDom"], ["label", "sshKey"], ["file", "/etc/ssh"], ["transitions"], ["enforcement"],
               ["ask", "sshDom", "read", "/etc/ssh"], ["ask", "*", "write", "/etc/ssh/host_key"], ["search", "ssh"]]
 
 
@@ -412,6 +414,40 @@ def test_small_screens_scroll_down_only(page):
     for words in SOME_PAGES:
         page.go(*words)
         assert page.run("document.documentElement.scrollWidth") <= 400, words
+
+
+def test_small_screens_show_rows_as_cards(page):
+    page.resize(360, 800)
+    for words in SOME_PAGES:
+        page.go(*words)
+        assert page.run("[...document.querySelectorAll('.wide')].every((each) => each.scrollWidth <= 320)"), words
+    page.go("")
+    level = "document.querySelector('main tbody td')"
+    assert page.run(f"getComputedStyle({level}, '::before').content") == '"Level "'
+    assert {"table", "row", "rowheader"} <= {role for role, _ in nodes_of(page)}
+
+
+def test_the_tab_of_the_page_is_in_sight(page):
+    page.resize(360, 800)
+    page.go("enforcement")
+    shown = "(({ left, right }) => [left, right])(document.querySelector('#pages [aria-current]').getBoundingClientRect())"
+    left, right = page.run(shown)
+    assert 0 <= left < right <= 360
+
+
+def test_texts_of_the_graph_lie_on_nothing_else(page):
+    page.go("transitions")
+    apart = """(() => {
+        const boxes = [...document.querySelectorAll(".way, .node rect")].map((each) => {
+            const { x, y, width, height } = each.getBBox();
+            return { left: x, right: x + width, top: y + 1, bottom: y + height - 1 };
+        });
+        const meet = (one, other) => one.left < other.right && other.left < one.right
+            && one.top < other.bottom && other.top < one.bottom;
+        return boxes.every((one) => boxes.every((other) => one === other || !meet(one, other)));
+    })()"""
+    assert page.run("document.querySelectorAll('.way').length") > 4
+    assert page.run(apart)
 
 
 CONTROLS = {"button", "link", "searchbox", "textbox", "combobox", "table", "region", "navigation", "group", "toolbar",
@@ -463,7 +499,7 @@ def test_hostile_names_are_text(browser, host, tmp_path):
     browser.console.clear()
     browser.open(host.report(tmp_path / "odd.html", "/odd", "--title", title))
     assert browser.run("document.title") == title
-    for words in [[""], ["domain", domain], ["label", label], ["file", path], ["files"], ["labels"], ["graph"],
+    for words in [[""], ["domain", domain], ["label", label], ["file", path], ["files"], ["labels"], ["transitions"],
                   ["search", "script"], ["ask", domain, "access", label, "read"], ["enforcement"]]:
         browser.go(*words)
         assert browser.text("h1") != "Not in this policy", words
@@ -494,11 +530,11 @@ def test_many_rules(browser, host, tmp_path):
     browser.wait_for(f"{shown} > 100")
     browser.run("dispatchEvent(new Event('beforeprint'))")
     assert browser.run(shown) == 320
-    browser.go("graph")
+    browser.go("transitions")
     boxes = browser.run("document.querySelectorAll('.node').length")
     assert 5 < boxes < 60
     browser.click(".node.cluster")
     browser.wait_for("document.querySelector('h1').innerText.startsWith('Cluster: ')")
-    browser.go("graph", "all")
+    browser.go("transitions", "all")
     assert browser.run("document.querySelectorAll('.node').length") == 301
     assert browser.console == []

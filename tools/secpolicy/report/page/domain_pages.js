@@ -34,7 +34,7 @@ const domainFacts = (domain) => h("p", { class: "lede" }, levelMark(domain.level
   ` Number ${domain.id}, ${countOf(domain.count, "rule")}`,
   domain.atRunTime && ", made at run time", domain.gone && ", no longer in any file", ". ",
   h("a", { href: addressOf("ask", domain.name) }, "Ask what it may do"), " · ",
-  h("a", { href: addressOf("graph", "domain", domain.name) }, "See its transitions"));
+  h("a", { href: addressOf("transitions", "domain", domain.name) }, "See its transitions"));
 
 function kindSections(domain) {
   const byKind = groupBy(rulesOf(domain), (rule) => data.rules.kind[rule]);

@@ -24,11 +24,16 @@ const capitalized = (text) => text[0].toUpperCase() + text.slice(1);
 /** The address of a page: its name, and what it is about. */
 const addressOf = (...words) => `#${words.map(encodeURIComponent).join("/")}`;
 
-const domainLink = (name) => h("a", { href: addressOf("domain", name), class: "domain" }, name);
-const labelLink = (name) => h("a", { href: addressOf("label", name) }, name);
+const joinBreakable = (parts) => parts.flatMap((part, index) => (index > 0 ? [h("wbr"), part] : part));
 
 /** A path that lines may be broken in, between its parts. */
-const breakable = (path) => path.split(/(?<=\/)/).flatMap((part, index) => (index > 0 ? [h("wbr"), part] : part));
+const breakable = (path) => joinBreakable(path.split(/(?<=\/)/));
+
+/** A name, likewise between its words. */
+const breakableName = (name) => joinBreakable(name.split(/(?<=[-_.])|(?<=[a-z])(?=[A-Z])/));
+
+const domainLink = (name) => h("a", { href: addressOf("domain", name), class: "domain" }, breakableName(name));
+const labelLink = (name) => h("a", { href: addressOf("label", name) }, breakableName(name));
 
 const pathLink = (path) => h("a", { href: addressOf("file", path) }, breakable(path));
 
@@ -75,7 +80,8 @@ function table(caption, columns, items, rowOf, look = "") {
     h("thead", {}, h("tr", {}, columns.map((column) => h("th", { scope: "col" }, column)))), body);
   const render = (item) => {
     const [head, ...cells] = rowOf(item);
-    return h("tr", {}, h("th", { scope: "row" }, head), cells.map((cell) => h("td", {}, cell)));
+    return h("tr", {}, h("th", { scope: "row" }, head),
+      cells.map((cell, index) => h("td", { "data-column": columns[index + 1] }, cell)));
   };
   const more = grow(body, items, render);
   return h("div", { class: "wide", role: "region", "aria-label": caption, tabindex: "0" }, whole, more);

@@ -29,10 +29,38 @@ function drawEdge(edge) {
   return edge.element;
 }
 
-/** The text of an arrow, on its middle, which only a line has that is shown. */
-function labelOf(edge) {
-  const { x, y } = edge.path.getPointAtLength(edge.path.getTotalLength() / 2);
-  return svg("text", { x, y: edge.isTurned ? y + 13 : y - 5, class: "way" }, edge.text);
+// ---- The texts of arrows, which only lines have places for that are shown
+
+const TEXT_PARTS = [0.5, 0.42, 0.58, 0.34, 0.66, 0.26, 0.74]; // of the way along the arrow, the best first
+const TEXT_HEIGHT = 13;
+const POINTS = 60;
+
+const pointOn = ({ path }, part) => path.getPointAtLength(path.getTotalLength() * part);
+const pointsOf = (edge) => numbersFrom(0, POINTS + 1).map((index) => pointOn(edge, index / POINTS));
+
+/** The place of the text at a part of the way: `x` and `y` are its middle. */
+function textBox(edge, part) {
+  const { x, y } = pointOn(edge, part);
+  return { x, y: edge.isTurned ? y + 9 : y - 9, width: textWidth(edge.text), height: TEXT_HEIGHT };
+}
+
+const meet = (one, other) => Math.abs(one.x - other.x) < (one.width + (other.width ?? 0)) / 2
+  && Math.abs(one.y - other.y) < (one.height + (other.height ?? 0)) / 2;
+
+/** The texts of arrows, each where it covers least of other arrows. One that would lie on a box or on another text is
+ *  left out: who points at the arrow is told it. */
+function drawTexts({ nodes, edges }) {
+  const points = new Map(edges.map((edge) => [edge, pointsOf(edge)]));
+  const taken = [...nodes];
+  return edges.filter(({ text }) => text !== "").flatMap((edge) => {
+    const others = edges.filter((other) => other !== edge).flatMap((other) => points.get(other));
+    const covered = (box) => others.filter((point) => meet(box, point)).length;
+    const free = TEXT_PARTS.map((part) => textBox(edge, part)).filter((box) => !taken.some((thing) => meet(box, thing)));
+    if (free.length === 0) return [];
+    const box = free.reduce((best, each) => (covered(each) < covered(best) ? each : best));
+    taken.push(box);
+    return [svg("text", { x: box.x, y: box.y + 4, class: "way" }, edge.text)];
+  });
 }
 
 function drawNode(node) {
@@ -104,7 +132,7 @@ function drawGraph(graph, name) {
   listenTo(drawing, view);
   whenShown(() => {
     view.fit();
-    if (isLabelled) texts.append(...graph.edges.filter(({ text }) => text !== "").map(labelOf));
+    if (isLabelled) texts.append(...drawTexts(graph));
   });
   return h("div", { class: "drawing" }, drawing, tools(view));
 }

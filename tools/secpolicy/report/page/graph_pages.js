@@ -17,8 +17,8 @@ const legend = () => note("A box is a domain: ", h("span", { class: "swatch perm
   " when it is permissive, ", h("span", { class: "swatch disabled" }, "dotted"),
   " when it is disabled. An arrow is a transition that is granted.");
 
-const ALL_BY_CLUSTER = [addressOf("graph"), "By clusters"];
-const ALL_DOMAINS = [addressOf("graph", "all"), `All ${countOf(domains.length, "domain")}`];
+const ALL_BY_CLUSTER = [addressOf("transitions"), "By clusters"];
+const ALL_DOMAINS = [addressOf("transitions", "all"), `All ${countOf(domains.length, "domain")}`];
 const leadTo = ([address, text]) => h("a", { href: address }, text);
 
 function graphPage(what = "", name = "") {
@@ -41,7 +41,7 @@ function aroundPage(name) {
   if (!domain) return nothingPage(`domain ${name}`);
   return page(["Transitions of ", domainLink(name)],
     drawGraph(aroundGraph(domain), `Transitions of ${name}`), legend(),
-    h("p", {}, leadTo([addressOf("graph"), "All transitions"])));
+    h("p", {}, leadTo([addressOf("transitions"), "All transitions"])));
 }
 
 function insidePage(name) {
@@ -49,7 +49,7 @@ function insidePage(name) {
   if (!graph) return nothingPage(`cluster of ${name}`);
   const { title, members } = clusters().find((cluster) => cluster.name === name);
   const isInside = new Set(members);
-  return page(`Cluster: ${title}`, h("p", {}, leadTo([addressOf("graph"), "All clusters"])),
+  return page(`Cluster: ${title}`, h("p", {}, leadTo([addressOf("transitions"), "All clusters"])),
     drawGraph(graph, title), legend(),
     section("In words", waysTable(transitions.filter(({ from, to }) => isInside.has(from) || isInside.has(to)))));
 }

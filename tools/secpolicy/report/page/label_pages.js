@@ -38,6 +38,8 @@ function labelPage(name = "") {
 function labelsPage() {
   const filesOf = groupBy(labelLines, ({ label }) => label);
   const numbers = new Map(objects.map(({ name, id }) => [name, id]));
-  return page("Labels", table("Labels", ["Label", "Number", "Lines that give it", "Uses in rules"], labels, (name) => [
-    labelLink(name), numbers.get(name) ?? "a domain", filesOf.get(name)?.length ?? 0, countUses(name)]));
+  const columns = ["Label", "Of", "Number", "Lines that give it", "Uses in rules"];
+  return page("Labels", table("Labels", columns, labels, (name) => [
+    labelLink(name), numbers.has(name) ? "objects" : "a domain", numbers.get(name) ?? nobody(),
+    filesOf.get(name)?.length ?? 0, countUses(name)]));
 }

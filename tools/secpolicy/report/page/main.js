@@ -4,10 +4,11 @@ const PAGES = {
   "": ["Domains", overviewPage],
   labels: ["Labels", labelsPage],
   files: ["Files", filesPage],
-  graph: ["Transitions", graphPage],
+  transitions: ["Transitions", graphPage],
   ask: ["Ask", askPage],
-  enforcement: ["Enforcement", enforcementPage],
+  enforcement: [isCovered || data.policy === "installed" ? "Enforcement" : undefined, enforcementPage],
   ...(data.against && { changes: ["Changes", changesPage] }),
+  graph: [undefined, graphPage],
   domain: [undefined, domainPage],
   label: [undefined, labelPage],
   file: [undefined, filePage],
@@ -15,7 +16,7 @@ const PAGES = {
 };
 
 // Which page of the list one is on.
-const IS_OF = { domain: "", label: "labels", file: "files" };
+const IS_OF = { domain: "", label: "labels", file: "files", graph: "transitions" };
 
 const main = document.getElementById("main");
 const query = document.getElementById("query");
@@ -37,6 +38,13 @@ function decoded(word) {
 
 const readAddress = () => location.hash.slice(1).split("/").map(decoded);
 
+/** Where not all tabs have room, they scroll. */
+function revealTab(link) {
+  const row = link.closest("nav");
+  const [tab, window] = [link.getBoundingClientRect(), row.getBoundingClientRect()];
+  row.scrollLeft += tab.left + tab.width / 2 - (window.left + window.width / 2);
+}
+
 function show() {
   const [name, ...words] = readAddress();
   growing.clear();
@@ -49,6 +57,7 @@ function show() {
     const isHere = link.hash.slice(1) === (IS_OF[name] ?? name);
     if (isHere) link.setAttribute("aria-current", "page");
     else link.removeAttribute("aria-current");
+    if (isHere) revealTab(link);
   }
   if (name !== "search") query.value = "";
   toShow.forEach((action) => action());

@@ -5,10 +5,13 @@ const NODE_PADDING = 14;
 
 const measure = document.createElement("canvas").getContext("2d");
 
-function widthOf(text) {
-  measure.font = "14px system-ui, sans-serif";
-  return Math.ceil(measure.measureText(text).width) + 2 * NODE_PADDING;
+function measureText(text, size) {
+  measure.font = `${size}px system-ui, sans-serif`;
+  return Math.ceil(measure.measureText(text).width);
 }
+
+const widthOf = (text) => measureText(text, 14) + 2 * NODE_PADDING;
+const textWidth = (text) => measureText(text, 10.5);
 
 /** A node: `title` is what stands in its box, `address` where it leads, `about` what is read of it. */
 const nodeOf = (title, address, about, look) =>
@@ -22,7 +25,7 @@ const describeDomain = (domain) => `${domain.name}, ${domain.level}, `
 const domainNode = (domain, look = "") =>
   nodeOf(domain.name, addressOf("domain", domain.name), describeDomain(domain), `${domain.level} ${look}`);
 
-const clusterNode = ({ name, title, members }, look = "") => nodeOf(title, addressOf("graph", "cluster", name),
+const clusterNode = ({ name, title, members }, look = "") => nodeOf(title, addressOf("transitions", "cluster", name),
   `${countOf(members.length, "domain")}, the cluster of ${name}`, `cluster ${look}`);
 
 /** A cluster with a single domain is that domain. */
