@@ -76,11 +76,13 @@ const Verb kReport = {
     "domains, labels and files to search and follow, the graph of transitions, who may do what "
     "and\n"
     "why, what of the installed policy this kernel can enforce, and with --against how it differs\n"
-    "from another one. The same policy makes the same bytes. Changes nothing.\n"
+    "from another one. The same policy makes the same bytes. Changes nothing. Every path is below\n"
+    "the root.\n"
     "\n"
     "Examples:\n"
     "  secpolicy report -o /tmp/policy.html\n"
     "  secpolicy report ./new --against installed -o /tmp/change.html   what would be new?\n"
+    "  secpolicy --root r report /new -o /page.html      of r/new, into r/page.html\n"
     "  secpolicy --root r report -o - >policy.html",
     Define};
 
