@@ -35,7 +35,7 @@ no_state() { echo "secpolicy: $1: nothing is installed below this root. Name the
   secpolicy rollback good
   exits 0
   [[ -z $output ]]
-  [[ $stderr == "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy --root $root label verify' compares them with the policy" ]]
+  [[ $stderr == "secpolicy: rollback: done; the policy files were not changed, and files keep the labels that they have: 'secpolicy --root $root label verify' compares them with the policy" ]]
   installed | diff "$BATS_TEST_TMPDIR/before" -
   secpolicy diff good installed
   exits 0
@@ -101,7 +101,7 @@ later  2026-01-02 03:04:05 UTC  $domains domains, $rules rules" ]]
   secpolicy rollback good
   exits 0
   says "secpolicy: rollback: this rollback cannot be recorded for 'status': Unable to use the host state /run/secpolicy/host.db: no"
-  ends_with "secpolicy: rollback: done; files keep the labels that they have, and 'secpolicy --root $root label verify' compares them with the policy"
+  ends_with "secpolicy: rollback: done; the policy files were not changed, and files keep the labels that they have: 'secpolicy --root $root label verify' compares them with the policy"
   secpolicy diff good installed
   exits 0
 }

@@ -41,8 +41,9 @@ ExitCode RollBack(const std::string& name) {
       },
       AdviseOnPrivilege,
       [] {
-        return "done; files keep the labels that they have, and " + Call("label verify") +
-               " compares them with the policy";
+        return "done; the policy files were not changed, and files keep the labels that they "
+               "have: " +
+               Call("label verify") + " compares them with the policy";
       });
 }
 
