@@ -68,7 +68,7 @@ refuses() {
   touch ../first/tool
   mkdir ../first/directory
   run --separate-stderr env PATH=$BATS_TEST_TMPDIR/first: "$LAUNCHER" --plan "$plan" -- tool
-  refuses "cannot execute tool: Permission denied"
+  refuses "cannot execute tool: it is not executable; 'chmod +x' makes it so"
   chmod +x tool ../second/tool
   run --separate-stderr env PATH=$BATS_TEST_TMPDIR/first:$BATS_TEST_TMPDIR/second: "$LAUNCHER" --plan "$plan" -- tool
   answers 0 second
@@ -92,7 +92,7 @@ refuses() {
 
 @test "what is no program ends it with 126" {
   launch --plan "$plan" -- /etc/passwd
-  refuses "cannot execute /etc/passwd: Permission denied"
+  refuses "cannot execute /etc/passwd: it is not executable; 'chmod +x' makes it so"
   launch --plan "$plan" -- /etc
   refuses "cannot execute /etc: Permission denied"
   printf 'neither\n' >"$BATS_TEST_TMPDIR/text"

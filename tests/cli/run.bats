@@ -73,7 +73,7 @@ not_confined() {
   # Of what is no program, no rule is missing.
   secpolicy run monitorDom -- /etc/services.conf
   exits 126
-  [[ $stderr == "secpolicy-run: cannot execute /etc/services.conf: Permission denied" ]]
+  [[ $stderr == "secpolicy-run: cannot execute /etc/services.conf: it is not executable; 'chmod +x' makes it so" ]]
 }
 
 # grant_app LINE...: these are the rules of appDom.
@@ -337,8 +337,19 @@ END
   secpolicy exec -- /bin/ls
   exits 0
   secpolicy exec -- nothing
-  exits 126
+  exits 127
   [[ $stderr == "secpolicy: exec: there is no program 'nothing' in PATH; nothing was started" ]]
+  local path
+  for path in /bin/nothing /bin/ls/nothing; do
+    secpolicy exec -- "$path"
+    exits 127
+    [[ $stderr == "secpolicy: exec: there is no program $path: No"*"; nothing was started" || $stderr == *"Not a directory"* ]]
+  done
+  secpolicy exec -- /etc/services.conf
+  not_confined exec
+  [[ $stderr == "secpolicy: exec: cannot execute /etc/services.conf: it is not executable; 'chmod +x' makes it so; nothing was started" ]]
+  secpolicy exec -- /etc
+  not_confined exec
 }
 
 @test "status lists who runs in a domain, and restore who keeps an older level" {

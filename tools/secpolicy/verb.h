@@ -10,8 +10,9 @@ enum ExitCode : int {
   kWell = 0,
   kFailed = 1,
   kUsage = 2,
-  kStopped = 3,       // the library stopped the load: a well-known domain is missing
-  kNotConfined = 126  // as of a shell that finds a program and cannot start it
+  kStopped = 3,        // the library stopped the load: a well-known domain is missing
+  kNotConfined = 126,  // as of a shell that finds a program and cannot start it
+  kNoProgram = 127     // as of one that finds none
 };
 
 // What a verb does when the command line has been read and the root has been entered.

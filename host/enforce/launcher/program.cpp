@@ -19,10 +19,10 @@ namespace Enforce {
 namespace {
 
 constexpr char kUsualPath[] = "/bin:/usr/bin";
+constexpr mode_t kExecutable = S_IXUSR | S_IXGRP | S_IXOTH;
 
 // True for a program that only a mount keeps from being executed: a broker outside may start it.
 bool IsMasked(const std::string& path, const struct stat& status) {
-  constexpr mode_t kExecutable = S_IXUSR | S_IXGRP | S_IXOTH;
   struct statvfs mount = {};
   return (status.st_mode & kExecutable) != 0 && statvfs(path.c_str(), &mount) == 0 &&
          (mount.f_flag & ST_NOEXEC) != 0;
@@ -54,21 +54,31 @@ Found SearchPath(const std::string& name, Executed where) {
   if (name.empty()) return {name, ENOENT};
   const char* const given = std::getenv("PATH");
   std::string_view unread = given == nullptr ? kUsualPath : given;
-  int reason = ENOENT;
+  Found refused = {name, ENOENT};
   while (true) {
     const std::size_t end = std::min(unread.find(':'), unread.size());
     const std::string path = PathIn(unread.substr(0, end), name);
     const int reasonHere = ReasonAgainst(path, where);
     if (reasonHere == 0) return {path, 0};
-    if (reasonHere == EACCES) reason = EACCES;
-    if (end == unread.size()) return {name, reason};
+    if (reasonHere == EACCES) refused = {path, EACCES};
+    if (end == unread.size()) return refused;
     unread.remove_prefix(end + 1);
   }
 }
 
-[[noreturn]] void RefuseProgram(const std::string& name, int reason) {
+// True for a file that nobody may execute.
+bool IsPlainFile(const std::string& path) {
+  struct stat status = {};
+  return stat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode) &&
+         (status.st_mode & kExecutable) == 0;
+}
+
+[[noreturn]] void RefuseProgram(const std::string& name, const Found& found) {
+  const int reason = found.reason;
   if (reason == ENOENT || reason == ENOTDIR) Refuse("there is no program " + name, kNotFound);
-  Refuse("cannot execute " + name + ": " + std::strerror(reason));
+  const bool isPlain = reason == EACCES && IsPlainFile(found.path);
+  Refuse("cannot execute " + name + ": " +
+         (isPlain ? "it is not executable; 'chmod +x' makes it so" : std::strerror(reason)));
 }
 
 }  // namespace
@@ -77,7 +87,7 @@ Program FindProgram(char* const* arguments, char* const* environment, Executed w
   const std::string name = arguments[0];
   const bool isPath = name.find('/') != std::string::npos;
   const Found found = isPath ? Found{name, ReasonAgainst(name, where)} : SearchPath(name, where);
-  if (found.reason != 0) RefuseProgram(name, found.reason);
+  if (found.reason != 0) RefuseProgram(name, found);
   return {found.path, -1, arguments, environment};
 }
 

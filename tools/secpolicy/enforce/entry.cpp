@@ -82,13 +82,20 @@ ExitCode EnterAsPublished(const std::string& verb, const Entry& entry) {
   return RunPermissive(verb, entry, RequireInstalledDomain(plan.domain, access), access);
 }
 
-ExitCode TellFailure(const std::string& verb, const std::function<ExitCode()>& enter) {
+void TellFailure(const std::string& verb, const std::string& failure) {
+  const std::string advice = AdviseOnForeignRoot();
+  std::cerr << "secpolicy: " << verb << ": " << Visible(failure) << "; nothing was started"
+            << (advice.empty() ? "" : ". " + advice) << std::endl;
+}
+
+ExitCode TryToEnter(const std::string& verb, const std::function<ExitCode()>& enter) {
   try {
     return enter();
+  } catch (const NoSuchProgram& failure) {
+    TellFailure(verb, failure.what());
+    return kNoProgram;
   } catch (const std::exception& failure) {
-    const std::string advice = AdviseOnForeignRoot();
-    std::cerr << "secpolicy: " << verb << ": " << Visible(failure.what()) << "; nothing was started"
-              << (advice.empty() ? "" : ". " + advice) << std::endl;
+    TellFailure(verb, failure.what());
     return kNotConfined;
   }
 }
@@ -110,7 +117,7 @@ void PrepareEntry() {
 }
 
 ExitCode EnterDomain(const std::string& verb, const Entry& entry, const EntryOptions& options) {
-  return TellFailure(verb, [&] {
+  return TryToEnter(verb, [&] {
     if (LinuxHost::IsStateForbidden()) return EnterAsPublished(verb, entry);
     SecPolicy::TeskAccessInterfaceImpl access;
     return EnterAsInstalled(verb, entry, access, options);
@@ -120,7 +127,7 @@ ExitCode EnterDomain(const std::string& verb, const Entry& entry, const EntryOpt
 ExitCode EnterDomain(const std::string& verb,
                      const std::function<Entry(SecPolicy::TeskAccessInterfaceImpl&)>& find,
                      const EntryOptions& options) {
-  return TellFailure(verb, [&] {
+  return TryToEnter(verb, [&] {
     // Whatever becomes of this process, the copy is removed first.
     std::optional<PublishedState> copy;
     if (LinuxHost::IsStateForbidden()) copy.emplace();

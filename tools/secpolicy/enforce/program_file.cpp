@@ -20,6 +20,24 @@ using Braxo::Lib::BraxoException;
 using LinuxHost::Descriptor;
 namespace Kernel = Enforce::Kernel;
 
+[[noreturn]] void RefuseUnfound(const std::string& path, const std::error_code& error) {
+  const std::string text = "there is no program " + path + ": " + error.message();
+  const bool isMissing =
+      error == std::errc::no_such_file_or_directory || error == std::errc::not_a_directory;
+  if (isMissing) throw NoSuchProgram(text);
+  throw BraxoException(text);
+}
+
+void RequireProgram(const std::string& path) {
+  using std::filesystem::perms;
+  constexpr perms kExecutable = perms::owner_exec | perms::group_exec | perms::others_exec;
+  std::error_code error;
+  const std::filesystem::file_status status = std::filesystem::status(path, error);
+  if (!std::filesystem::is_regular_file(status)) throw BraxoException(path + " is no program");
+  if ((status.permissions() & kExecutable) != perms::none) return;
+  throw BraxoException("cannot execute " + path + ": it is not executable; 'chmod +x' makes it so");
+}
+
 }  // namespace
 
 bool IsProgram(const std::string& path) {
@@ -44,8 +62,8 @@ std::optional<std::string> FindProgram(const std::string& program) {
 ProgramFile OpenProgram(const std::string& path) {
   std::error_code error;
   const std::string real = std::filesystem::canonical(path, error);
-  if (error) throw BraxoException("there is no program " + path + ": " + error.message());
-  if (!std::filesystem::is_regular_file(real, error)) throw BraxoException(real + " is no program");
+  if (error) RefuseUnfound(path, error);
+  RequireProgram(real);
   // Whoever puts a link in its way from here on stops it.
   Descriptor file(Kernel::OpenWithoutLinks(real.c_str(), Kernel::kForReading));
   if (!file.IsOpen()) LinuxHost::ThrowErrno("cannot open the program ", real);

@@ -3,9 +3,16 @@
 #include <optional>
 #include <string>
 
+#include "braxo/lib/exception.h"
 #include "host/linux/common/descriptor.h"
 
 namespace SecPolicyCli {
+
+// There is nothing where a program is said to be.
+class NoSuchProgram : public Braxo::Lib::BraxoException {
+ public:
+  using BraxoException::BraxoException;
+};
 
 // A program that was opened once, so that what is asked about is what is started.
 struct ProgramFile {
@@ -20,8 +27,9 @@ bool IsProgram(const std::string& path);
 // returned as it is.
 std::optional<std::string> FindProgram(const std::string& program);
 
-// Opens the program that `path` leads to. Throws Braxo::Lib::BraxoException when there is none, or
-// this user may not read it: then nobody knows its label.
+// Opens the program that `path` leads to. Throws NoSuchProgram when there is nothing, and
+// Braxo::Lib::BraxoException when that is no program, or this user may not read it: then nobody
+// knows its label.
 ProgramFile OpenProgram(const std::string& path);
 
 // The program that somebody else has opened, as this process sees it. Throws

@@ -46,7 +46,7 @@ Entry EntryOf(std::string domain, std::vector<std::string> command, ProgramFile 
 
 Entry EntryByExec(std::vector<std::string> command, SecPolicy::TeskAccessInterfaceImpl& access) {
   const auto path = FindProgram(command.front());
-  if (!path) throw BraxoException("there is no program '" + command.front() + "' in PATH");
+  if (!path) throw NoSuchProgram("there is no program '" + command.front() + "' in PATH");
   command.front() = *path;
   ProgramFile program = OpenProgram(*path);
   const Policy::InstalledDomain caller = CallersDomain(access);

@@ -13,8 +13,6 @@
 namespace SecPolicyCli {
 namespace {
 
-constexpr int kNotFound = 127;
-
 int proc = -1;
 
 }  // namespace
@@ -35,7 +33,7 @@ WatchedEnd RunWatched(const std::string& verb, const std::vector<std::string>& c
   if (end.startError == 0) return {true, static_cast<ExitCode>(end.exitStatus)};
   std::cerr << "secpolicy: " << verb << ": cannot start " << Visible(command.front()) << ": "
             << std::strerror(end.startError) << std::endl;
-  return {false, end.startError == ENOENT ? static_cast<ExitCode>(kNotFound) : kNotConfined};
+  return {false, end.startError == ENOENT ? kNoProgram : kNotConfined};
 }
 
 }  // namespace SecPolicyCli
