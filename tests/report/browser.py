@@ -13,7 +13,7 @@ import time
 CHROMIUM = shutil.which("chromium")
 OPTIONS = ["--headless=new", "--no-sandbox", "--disable-gpu", "--disable-dev-shm-usage", "--disable-extensions",
            "--disable-background-networking", "--no-first-run", "--hide-scrollbars", "--remote-debugging-pipe"]
-TIMEOUT = 20
+TIMEOUT = 60  # seconds, on a slow machine
 
 
 class PageError(Exception):
