@@ -159,8 +159,8 @@ def test_every_link_leads_somewhere(page):
 
 
 def test_unknown_addresses_are_told(page):
-    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"], ["transitions", "cluster", "none"],
-                  ["domain"], ["label"], ["file"], ["file", "none"]):
+    for words in (["domain", "none"], ["label", "none"], ["nothing"], ["ask", "none"],
+                  ["transitions", "cluster", "none"], ["domain"], ["label"], ["file"], ["file", "none"]):
         page.go(*words)
         assert page.text("h1") == "Not in this policy"
 
@@ -333,7 +333,8 @@ def test_who_can_is_that_of_the_command(page, host, question):
     (["*", "call", "reed"], "There is no system call reed."),
     (["*", "pass", "bind_port", "x"], "x is not a number."),
     (["sshDom", "pass", "bind_port", "99999999999999999999"],
-     "99999999999999999999 is too large: numbers go up to 0xffffffffffffffff."), (["*", "read", ""], "Fill in what is asked for.")])
+     "99999999999999999999 is too large: numbers go up to 0xffffffffffffffff."),
+    (["*", "read", ""], "Fill in what is asked for.")])
 def test_what_cannot_be_asked_is_told(page, words, problem):
     page.go("ask", *words)
     assert page.text(".notice") == problem
@@ -430,8 +431,8 @@ def test_small_screens_show_rows_as_cards(page):
 def test_the_tab_of_the_page_is_in_sight(page):
     page.resize(360, 800)
     page.go("enforcement")
-    shown = "(({ left, right }) => [left, right])(document.querySelector('#pages [aria-current]').getBoundingClientRect())"
-    left, right = page.run(shown)
+    tab = "document.querySelector('#pages [aria-current]').getBoundingClientRect()"
+    left, right = page.run(f"(({{ left, right }}) => [left, right])({tab})")
     assert 0 <= left < right <= 360
 
 

@@ -31,7 +31,8 @@ function whyNot(question, words) {
     const word = words[index];
     if (noun === "path" && !word.startsWith("/")) return `${word} is no path: it begins with a slash.`;
     if (noun === "number" && !NUMBER.test(word)) return `${word} is not a number.`;
-    if (noun === "number" && BigInt(word) > BigInt(GREATEST)) return `${word} is too large: numbers go up to ${GREATEST}.`;
+    const isTooLarge = noun === "number" && BigInt(word) > BigInt(GREATEST);
+    if (isTooLarge) return `${word} is too large: numbers go up to ${GREATEST}.`;
     const known = wordsFor(noun);
     if (known && !known.includes(word)) return `There is no ${noun} ${word}.`;
   }

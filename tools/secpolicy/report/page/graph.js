@@ -55,7 +55,8 @@ function drawTexts({ nodes, edges }) {
   return edges.filter(({ text }) => text !== "").flatMap((edge) => {
     const others = edges.filter((other) => other !== edge).flatMap((other) => points.get(other));
     const covered = (box) => others.filter((point) => meet(box, point)).length;
-    const free = TEXT_PARTS.map((part) => textBox(edge, part)).filter((box) => !taken.some((thing) => meet(box, thing)));
+    const free = TEXT_PARTS.map((part) => textBox(edge, part))
+      .filter((box) => !taken.some((thing) => meet(box, thing)));
     if (free.length === 0) return [];
     const box = free.reduce((best, each) => (covered(each) < covered(best) ? each : best));
     taken.push(box);
