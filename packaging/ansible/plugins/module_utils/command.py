@@ -14,6 +14,8 @@ class CommandFailed(Exception):
     def __init__(self, words, status, errors):
         super().__init__("'secpolicy {0}' ended with {1}: {2}".format(' '.join(words), status, last_line(errors)))
         self.problems = [line for line in errors.splitlines() if line]
+        # What the module tells beside, of what was done before.
+        self.result = {}
 
 
 class Command:
@@ -26,16 +28,17 @@ class Command:
         if self.root != '/':
             self.start += ['--root', self.root]
 
-    def run(self, *words):
-        """Fails unless all was well."""
+    def run(self, *words, operands=()):
+        """Fails unless all was well. No operand is taken for an option."""
+        words += after_options(operands)
         status, output, errors = self.module.run_command(self.start + list(words))
         if status != 0:
             raise CommandFailed(words, status, errors)
         return output
 
-    def ask(self, schema, *words):
+    def ask(self, schema, *words, operands=()):
         """The document that the command answers with, also where its exit status is a part of the answer."""
-        words += ('--format', 'json')
+        words += ('--format', 'json') + after_options(operands)
         status, output, errors = self.module.run_command(self.start + list(words))
         try:
             document = json.loads(output)
@@ -45,6 +48,10 @@ class Command:
             raise CommandFailed(words, status, 'the answer is of {0}, and {1} was expected'.format(
                 document.get('schema'), schema))
         return document
+
+
+def after_options(operands):
+    return ('--',) + tuple(operands) if operands else ()
 
 
 def last_line(text):
@@ -57,6 +64,6 @@ def run_module(module, work):
     try:
         module.exit_json(**work(module, Command(module)))
     except CommandFailed as failure:
-        module.fail_json(msg=str(failure), problems=failure.problems)
+        module.fail_json(msg=str(failure), problems=failure.problems, **failure.result)
     except OSError as failure:
         module.fail_json(msg=str(failure), problems=[])

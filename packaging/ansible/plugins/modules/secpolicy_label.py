@@ -86,7 +86,7 @@ def label(module, command):
 
 def changes_to_label(module, command):
     wanted, paths = module.params['label'], module.params['path']
-    found = command.ask('secpolicy.labels/1', 'label', 'get', *(recursion(module) + paths))['files']
+    found = command.ask('secpolicy.labels/1', 'label', 'get', *recursion(module), operands=paths)['files']
     changes = [(file['path'], told(file), wanted) for file in found if file['label'] != wanted or file['inherited']]
     # Those that have none, or are not there, are not among the labels that there are.
     known = {file['path'] for file in found}
@@ -94,7 +94,7 @@ def changes_to_label(module, command):
 
 
 def changes_to_policy(module, command):
-    plan = command.ask('secpolicy.label-relabel/1', 'label', 'relabel', '--dry-run', *module.params['path'])
+    plan = command.ask('secpolicy.label-relabel/1', 'label', 'relabel', '--dry-run', operands=module.params['path'])
     return [(change['path'], told(dict(change, label=change['before'])), change['after']) for change in plan['changes']]
 
 
@@ -104,9 +104,9 @@ def told(file):
 
 def give_labels(module, command):
     if module.params['label']:
-        command.run('label', 'set', *(recursion(module) + [module.params['label']] + module.params['path']))
+        command.run('label', 'set', *recursion(module), operands=[module.params['label']] + module.params['path'])
     else:
-        command.run('label', 'relabel', *module.params['path'])
+        command.run('label', 'relabel', operands=module.params['path'])
 
 
 def recursion(module):
