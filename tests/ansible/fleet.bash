@@ -3,14 +3,20 @@
 # needs_ansible: skips the test where it is not installed.
 needs_ansible() { command -v ansible-playbook >/dev/null || skip "ansible-core is not installed"; }
 
-# lay_out_fleet COUNT: in $fleet, booted roots h01, h02 and so on, an inventory, and a configuration.
+# lay_out_fleet COUNT: in $fleet, booted roots h01, h02 and so on, an inventory, and a configuration. A file h01.command
+# takes the place of the command of that host.
 # shellcheck disable=SC2154
 lay_out_fleet() {
   local number root
   mkdir -p "$fleet/collections/ansible_collections/secpolicy" "$fleet/bin" "$fleet/host_vars"
   ln -s "$SOURCE/packaging/ansible" "$fleet/collections/ansible_collections/secpolicy/secpolicy"
-  ln -s "$SECPOLICY" "$fleet/bin/secpolicy"
-  for number in $(seq -w 1 "$1"); do
+  cat >"$fleet/bin/secpolicy" <<END
+#!/bin/sh
+[ ! -e "\$2.command" ] || exec "\$2.command" "\$@"
+exec "$SECPOLICY" "\$@"
+END
+  chmod +x "$fleet/bin/secpolicy"
+  for number in $(seq -f %02g 1 "$1"); do
     root=$fleet/h$number
     mkdir "$root"
     "$SECPOLICY" --root "$root" init 2>/dev/null >&2
