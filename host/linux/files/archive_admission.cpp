@@ -83,6 +83,10 @@ ArchiveAdmission::ArchiveAdmission(const TardiskRules& given) : rules(given) {
   places.push_back({policy, policy + kTardiskPolicy,
                     "It belongs to the policy, which a tardisk brings only when it is named by "
                     "--policy-from"});
+  // A load exchanges directories there, and one of them becomes the policy.
+  const std::size_t name = policy.rfind('/') + 1;
+  places.push_back({policy.substr(0, name - 1), policy, "It belongs to the exchange of policies",
+                    policy.substr(name)});
   places.push_back({kKeyPlace, kKeyPlace, "It says whose policies this host takes"});
   for (const Place& place : places) {
     struct stat status;
@@ -178,7 +182,16 @@ void ArchiveAdmission::CheckProtectedPlaces(const std::string& name, const std::
   }
 }
 
+// As the policy, and the same hidden.
+bool ArchiveAdmission::IsSibling(const Place& place, const std::string& path) {
+  if (IsAtOrBelow(path, place.wayTo) || path.size() <= place.path.size()) return false;
+  std::string_view name = std::string_view(path).substr(place.path.size() + 1);
+  if (name.starts_with('.')) name.remove_prefix(1);
+  return IsSameName(name.substr(0, place.siblings.size()), place.siblings);
+}
+
 bool ArchiveAdmission::IsFree(const Place& place, const std::string& path) const {
+  if (!place.siblings.empty()) return !IsSibling(place, path);
   if (place.path == place.wayTo) return false;
   return mayBringPolicy || IsSameName(path, place.path) || IsAtOrBelow(path, place.wayTo);
 }
@@ -206,7 +219,8 @@ void ArchiveAdmission::NoticeAnotherName(const std::string& path, const struct s
     if (inodes[index] != std::pair(status.st_dev, status.st_ino)) continue;
     const Place place = places[index];
     if (place.path == path) continue;
-    places.push_back({path, path + place.wayTo.substr(place.path.size()), place.reason});
+    places.push_back(
+        {path, path + place.wayTo.substr(place.path.size()), place.reason, place.siblings});
   }
 }
 

@@ -38,6 +38,7 @@ class ArchiveAdmission {
     std::string path;
     std::string wayTo;  // it or what below it is free: all on this way has to be safe
     const char* reason;
+    std::string siblings = {};  // if any, only what has a name that begins so is not free
   };
 
   // What is there other than a directory once the archives before are unpacked.
@@ -53,6 +54,7 @@ class ArchiveAdmission {
   void CheckWay(const std::string& name, const std::string& path);
   void CheckProtectedPlaces(const std::string& name, const std::string& path, Kind present,
                             archive_entry* entry) const;
+  static bool IsSibling(const Place& place, const std::string& path);
   bool IsFree(const Place& place, const std::string& path) const;
   Kind KindAt(const std::string& path);
   void NoticeAnotherName(const std::string& path, const struct stat& status);

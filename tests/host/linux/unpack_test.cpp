@@ -596,6 +596,31 @@ TEST_F(UnpackTardisks, RefusesThePolicy) {
   EXPECT_FALSE(Exists("etc"));
 }
 
+// A load that was killed, or who goes back by hand, makes one of these the policy.
+TEST_F(UnpackTardisks, RefusesWhatLoadsKeepBesideThePolicy) {
+  rules.policyTardisks = {"disk.tgz"};
+  const std::string message = ": It belongs to the exchange of policies";
+  for (const std::string path :
+       {"etc/zorvan/secpolicy.previous/domains/appDom", "etc/zorvan/secpolicy.new",
+        "./etc//zorvan/SecPolicy.Replaced/objects/base", "etc/zorvan/.secpolicy.lock"}) {
+    EXPECT_EQ(Unpack(TarImage().File(path, "text")), kUnable + path + message);
+    EXPECT_EQ(Unpack(TarImage().Directory(path, 0755)), kUnable + path + message);
+    EXPECT_EQ(Unpack(TarImage().SymbolicLink(path, "/opt")), kUnable + path + message);
+  }
+  EXPECT_FALSE(Exists("etc"));
+  EXPECT_EQ(Unpack(TarImage().File("etc/zorvan/sec", "text")), "unpacked");
+  EXPECT_EQ(Unpack(TarImage().File("etc/zorvan/network/secpolicy.new", "text")), "unpacked");
+}
+
+TEST_F(UnpackTardisks, KnowsWhatIsBesideThePolicyByAnotherName) {
+  std::filesystem::create_directories(In("opt/zorvan"));
+  std::filesystem::create_directories(In("etc"));
+  std::filesystem::create_symlink("../opt/zorvan", In("etc/zorvan"));
+  const std::string path = "opt/zorvan/secpolicy.previous/domains/appDom";
+  EXPECT_EQ(Unpack(TarImage().File(path, "text")),
+            kUnable + path + ": It belongs to the exchange of policies");
+}
+
 TEST_F(UnpackTardisks, TakesThePolicyOfATardisk) {
   TarImage image;
   image.Directory("etc").Directory("etc/zorvan").Directory("etc/zorvan/secpolicy/");
