@@ -1,6 +1,7 @@
 // Loaded before a command: the BREAK_AT-th call of BREAK_CALL in it kills it, fails with the error
-// BREAK_ERROR, if that is given, or brings it the signal TERM, if that is the error. Calls that a command
-// makes anyway count from its first exchange of two directories on.
+// BREAK_ERROR, if that is given, or brings it the signal TERM or STOP, if that is the error. Calls that a
+// command makes anyway count from its first exchange of two directories on, and none in its children. When
+// two were exchanged, the shell takes AFTER_EXCHANGE.
 #define _GNU_SOURCE
 #include <errno.h>
 #include <fcntl.h>
@@ -13,12 +14,16 @@
 #include <unistd.h>
 
 static int calls;
+static pid_t self;
+
+__attribute__((constructor)) static void Begin(void) { self = getpid(); }
 
 static int Breaks(const char* call) {
-  if (strcmp(call, getenv("BREAK_CALL")) != 0 || ++calls != atoi(getenv("BREAK_AT"))) return 0;
+  if (getpid() != self || strcmp(call, getenv("BREAK_CALL")) != 0 || ++calls != atoi(getenv("BREAK_AT"))) return 0;
   const char* error = getenv("BREAK_ERROR");
   if (error == NULL) raise(SIGKILL);
   if (strcmp(error, "TERM") == 0) return raise(SIGTERM);
+  if (strcmp(error, "STOP") == 0) return raise(SIGSTOP);
   errno = atoi(error);
   return 1;
 }
@@ -27,8 +32,11 @@ static int exchanged;
 
 int renameat2(int from, const char* old, int to, const char* new, unsigned flags) {
   if (Breaks("renameat2")) return -1;
-  exchanged = 1;
-  return (int)syscall(SYS_renameat2, from, old, to, new, flags);
+  const int result = (int)syscall(SYS_renameat2, from, old, to, new, flags);
+  const char* command = getenv("AFTER_EXCHANGE");
+  if (++exchanged != 2 || command == NULL) return result;
+  unsetenv("LD_PRELOAD");
+  return system(command) == 0 ? result : -1;
 }
 
 int syncfs(int file) { return Breaks("syncfs") ? -1 : (int)syscall(SYS_syncfs, file); }

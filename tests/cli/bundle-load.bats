@@ -264,12 +264,9 @@ secpolicy: load: nothing would change" ]]
 }
 
 @test "a bundle with the policy of a tardisk is for hosts with that tardisk" {
-  cp -r "$BATS_FILE_TMPDIR/web" "$root/own"
-  mkdir -p "$root/own/tardisks"
-  cp -p "$policy/tardisks/"* "$root/own/tardisks"
   cp "$BATS_FILE_TMPDIR/key.pem" "$root"
-  "$SECPOLICY" bundle create "$policy" -o "$root/own.bundle" --key "$root/key.pem" 2>/dev/null || true
-  [[ -e $root/own.bundle ]] || secpolicy bundle create /etc/zorvan/secpolicy -o /own.bundle --key /key.pem
+  secpolicy bundle create /etc/zorvan/secpolicy -o /own.bundle --key /key.pem
+  exits 0
   takes own
   exits 0
   remember
@@ -333,22 +330,24 @@ bundle       web, serial 2, signed by "* && $output != *edited* && $output != *"
   refused "/1.bundle: it is older than what is installed: "*
 }
 
-# broken CALL AT [ERROR]: loads 3.bundle; this call of it fails with the error, TERM comes to it then, or it
-# is killed.
-broken() {
-  run --separate-stderr env "LD_PRELOAD=$BATS_FILE_TMPDIR/break.so" "BREAK_CALL=$1" "BREAK_AT=$2" ${3:+"BREAK_ERROR=$3"} \
-    "$SECPOLICY" --root "$root" load --bundle /3.bundle
+# break NAME CALL AT [ERROR]: loads NAME.bundle; this call of it fails with the error, TERM or STOP comes to it
+# then, or it is killed. It does what $after says in between, once its files are in place.
+break_load() {
+  exec env "LD_PRELOAD=$BATS_FILE_TMPDIR/break.so" "AFTER_EXCHANGE=${after-true}" "BREAK_CALL=$2" "BREAK_AT=$3" \
+    ${4:+"BREAK_ERROR=$4"} "$SECPOLICY" --root "$root" load --bundle "/$1.bundle"
 }
+
+# broken CALL AT [ERROR]: the same of 3.bundle, and keeps $status, $output and $stderr.
+broken() { run --separate-stderr break_load 3 "$@"; }
 
 @test "whenever it is killed, the policy is a whole one, and the next load mends the rest" {
   takes 1
   takes 2
-  local point serial
+  local point serial previous
   for point in "syncfs 1 2" "renameat2 1 2" "renameat2 2 2" "fsync 1 3" "unlinkat 1 3"; do
     # shellcheck disable=SC2086
     set -- $point
-    # That a load came before it is told by the second.
-    sleep 1
+    previous=$(jq .serial "$policy.previous/manifest.json")
     broken "$1" "$2"
     exits 137
     serial=$3
@@ -358,6 +357,10 @@ broken() {
     secpolicy load
     exits 0
     has "$serial"
+    # Whatever it is called, this one puts the copy of before back first.
+    takes 1
+    exits 1
+    [[ $(jq .serial "$policy.previous/manifest.json") == "$([[ $serial == 3 ]] && echo 2 || echo "$previous")" && ! -e $policy.new ]]
     takes 3
     exits 0
     has 3
@@ -366,6 +369,95 @@ broken() {
     has 2
     [[ ! -e $policy.new ]]
   done
+}
+
+@test "a bundle that cannot be loaded comes to no place where a boot would find it" {
+  takes 1
+  remember
+  local name
+  for name in signed-fault signed-stop; do
+    run --separate-stderr break_load "$name" renameat2 1
+    [[ $status -eq 1 || $status -eq 3 ]]
+    [[ $stderr == *"nothing was installed"* || $status -eq 3 ]]
+    everything | diff "$BATS_TEST_TMPDIR/before" -
+  done
+}
+
+@test "what goes wrong only when the files are in place takes them back, and a kill then leaves one that can be loaded" {
+  takes 1
+  takes 2
+  remember
+  local after="mv /tardisks /no-tardisks"
+  broken none 1
+  exits 1
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 error above); nothing was installed"
+  mv "$root/no-tardisks" "$root/tardisks"
+  everything | diff "$BATS_TEST_TMPDIR/before" -
+  broken renameat2 3
+  exits 137
+  mv "$root/no-tardisks" "$root/tardisks"
+  secpolicy status
+  [[ $output == *"
+bundle       web, serial 3, "*"; not what is installed"* ]]
+  secpolicy boot
+  exits 0
+  has 3
+}
+
+@test "a load that comes while the files are taken back finds those of before" {
+  takes 1
+  takes 2
+  local after="mv /tardisks /no-tardisks" tries
+  break_load 3 renameat2 3 STOP 2>/dev/null 3>&- &
+  local broken=$!
+  for ((tries = 0; tries < 100; ++tries)); do
+    [[ $(cut -d' ' -f3 "/proc/$broken/stat") == T ]] && break
+    sleep 0.05
+  done
+  [[ $(jq .serial "$policy/manifest.json") == 3 ]] || { kill -KILL "$broken"; return 1; }
+  mv "$root/no-tardisks" "$root/tardisks"
+  "$SECPOLICY" --root "$root" load 2>/dev/null 3>&- &
+  local load=$!
+  # It waits, and takes a fraction of this where it does not.
+  sleep 1
+  kill -CONT "$broken"
+  ! wait "$broken" || return 1
+  wait "$load"
+  has 2
+  secpolicy status
+  [[ $output == *"
+bundle       web, serial 2, "* && $output != *"not what is installed"* ]]
+}
+
+@test "what fails behind the load is told, and so is that the bundle is in place" {
+  takes 1
+  rm -f "$root/run/secpolicy/labels.index"
+  mkdir -p "$root/run/secpolicy/labels.index/full"
+  takes 2
+  exits 1
+  [[ $stderr == *"installed now: "* ]]
+  ends_with "secpolicy: load: web, serial 2, is in place; /etc/zorvan/secpolicy.previous has what was there before"
+  secpolicy status --format json
+  [[ $(jq -c '[.bundle.serial, .bundle.installed, .bundle.edited]' <<<"$output") == '[2,true,[]]' ]]
+  rm -r "$root/run/secpolicy/labels.index"
+  has 2
+}
+
+@test "what was put back by hand is not what is installed" {
+  takes 1
+  takes 2
+  rm -r "$policy"
+  mv "$policy.previous" "$policy"
+  secpolicy status
+  [[ $output == *"
+bundle       web, serial 1, "*"; not what is installed"* ]]
+  secpolicy load-early
+  secpolicy status
+  [[ $output == *"; not what is installed"* ]]
+  secpolicy load
+  has 1
+  secpolicy status
+  [[ $output != *"not what is installed"* ]]
 }
 
 @test "where the directories cannot be exchanged, nothing is changed" {
@@ -384,6 +476,7 @@ broken() {
   takes 2
   broken fsync 1 TERM
   exits 143
+  ends_with "secpolicy: load: web, serial 3, is in place; /etc/zorvan/secpolicy.previous has what was there before"
   has 3
   [[ ! -e $policy.new ]]
 }

@@ -42,4 +42,17 @@ std::optional<LoadRecord> LatestLoad(HostState& state) {
   return record;
 }
 
+void RecordLoadedBundle(HostState& state, const std::string& digest) {
+  Store& store = state.Database();
+  Transaction transaction(store);
+  store.Run("DELETE FROM loaded_bundle");
+  if (!digest.empty()) store.Run("INSERT INTO loaded_bundle VALUES (?1)", digest);
+  transaction.Commit();
+}
+
+std::string LoadedBundle(HostState& state) {
+  Rows rows = state.Database().Select("SELECT digest FROM loaded_bundle");
+  return rows.Next() ? rows.Text(0) : "";
+}
+
 }  // namespace LinuxHost

@@ -31,4 +31,9 @@ void RecordLoad(HostState& state, const LoadRecord& record);
 // Empty when nothing was recorded since the boot.
 std::optional<LoadRecord> LatestLoad(HostState& state);
 
+// Which bundle is what is installed, by the SHA-256 of its manifest; empty: none. Beside the
+// record, as not every load changes it.
+void RecordLoadedBundle(HostState& state, const std::string& digest);
+std::string LoadedBundle(HostState& state);
+
 }  // namespace LinuxHost

@@ -168,8 +168,9 @@ const StoreLayout kStateLayout = {
     .purpose = "host state",
     .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
     .applicationId = 0x5a6f7276,
-    .version = 4,
+    .version = 5,
     .schema = kTables,
+    .addition = "CREATE TABLE loaded_bundle (digest TEXT NOT NULL)",
     .firstRows = kFirstRows,
     .survivesPowerLoss = false,
 };

@@ -17,7 +17,7 @@ struct StateTable {
   bool isPutBack = false;    // by a rollback, as it was saved
 };
 
-inline constexpr std::array<StateTable, 18> kStateTables = {{
+inline constexpr std::array<StateTable, 19> kStateTables = {{
     {.name = "domain", .isPutBack = true},
     {.name = "role", .isPutBack = true},
     {.name = "guest_service", .isOfDomains = true, .isPutBack = true},
@@ -36,6 +36,7 @@ inline constexpr std::array<StateTable, 18> kStateTables = {{
     {.name = "label_origin"},
     {.name = "load_record"},
     {.name = "load_error"},
+    {.name = "loaded_bundle"},
 }};
 
 }  // namespace LinuxHost

@@ -50,6 +50,16 @@ TEST_F(LoadRecordTest, KeepsWhatItIsGiven) {
   EXPECT_THAT(record->errors, ElementsAre("second", "first"));
 }
 
+TEST_F(LoadRecordTest, KnowsTheLatestBundleWhateverElseWasLoaded) {
+  EXPECT_EQ(LoadedBundle(HostState::Current()), "");
+  LinuxHost::RecordLoadedBundle(HostState::Current(), "first");
+  LinuxHost::RecordLoadedBundle(HostState::Current(), "second");
+  RecordLoad(HostState::Current(), FailedLoad());
+  EXPECT_EQ(LoadedBundle(HostState::Current()), "second");
+  LinuxHost::RecordLoadedBundle(HostState::Current(), "");
+  EXPECT_EQ(LoadedBundle(HostState::Current()), "");
+}
+
 TEST_F(LoadRecordTest, IsOfTheLatestLoadAlone) {
   RecordLoad(HostState::Current(), FailedLoad());
   LoadRecord good;

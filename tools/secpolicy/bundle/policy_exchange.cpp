@@ -35,7 +35,7 @@ Descriptor Lock() {
   constexpr mode_t kOwn = 0600;
   std::error_code later;
   fs::create_directories(kPlace, later);
-  Descriptor file(open(kLock, O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC, kOwn));
+  Descriptor file(open(kLock, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, kOwn));
   if (!file.IsOpen()) ThrowErrno(kCannotReplace, SecPolicy::kPolicyRoot);
   if (flock(file.Number(), LOCK_EX | LOCK_NB) == 0) return file;
   if (errno != EWOULDBLOCK) ThrowErrno(kCannotReplace, SecPolicy::kPolicyRoot);
@@ -45,6 +45,25 @@ Descriptor Lock() {
 bool IsThere(const char* path) {
   struct stat status {};
   return lstat(path, &status) == 0;
+}
+
+// 0 where there is nothing.
+ino_t InodeOf(const char* path) {
+  struct stat status {};
+  return lstat(path, &status) == 0 ? status.st_ino : 0;
+}
+
+// The directory that is not a policy yet, or not any more, whatever its name; on the disk before
+// any name changes.
+bool NoteWaiting(const Descriptor& lock, ino_t directory) {
+  return pwrite(lock.Number(), &directory, sizeof directory, 0) == sizeof directory &&
+         fdatasync(lock.Number()) == 0;
+}
+
+bool IsWaiting(const Descriptor& lock, const char* path) {
+  ino_t noted = 0;
+  return pread(lock.Number(), &noted, sizeof noted, 0) == sizeof noted && noted != 0 &&
+         noted == InodeOf(path);
 }
 
 void Rename(const char* from, const char* to, unsigned flags) {
@@ -123,13 +142,19 @@ void WritePolicyTree(const std::string& dir, const std::vector<ArchiveEntry>& fi
   if (!made.IsOpen() || syncfs(made.Number()) != 0) ThrowErrno(kCannotWrite, dir);
 }
 
-PolicyExchange::PolicyExchange() : lock(Lock()) { RemoveNew(); }
+PolicyExchange::PolicyExchange() : lock(Lock()) {
+  if (IsWaiting(lock, kPreviousPolicy)) {
+    (IsThere(kNewPolicy) ? Swap : Move)(kPreviousPolicy, kNewPolicy);
+  }
+  RemoveNew();
+}
 
-// In between, the new policy waits in the place of the one before: what lies at the name for new
-// ones is never a policy that is wanted, and the policy itself is there at every moment.
+// In between, the new policy waits in the place of the one before, and its number is noted: the
+// policy itself is there at every moment.
 void PolicyExchange::PutInPlace(const std::vector<ArchiveEntry>& files) {
   WritePolicyTree(kNewPolicy, files);
   LinkTardiskPolicy();
+  if (!NoteWaiting(lock, InodeOf(kNewPolicy))) ThrowErrno(kCannotWrite, kLock);
   hadPolicy = IsThere(SecPolicy::kPolicyRoot);
   hadPrevious = IsThere(kPreviousPolicy);
   if (hadPolicy) {
@@ -150,6 +175,7 @@ void PolicyExchange::PutBack() {
     } else {
       Move(SecPolicy::kPolicyRoot, kNewPolicy);
     }
+    stage = Stage::kPrepared;
   }
   if (stage != Stage::kNothing && hadPolicy) {
     (hadPrevious ? Swap : Move)(kPreviousPolicy, kNewPolicy);
@@ -157,12 +183,13 @@ void PolicyExchange::PutBack() {
   stage = Stage::kNothing;
   RemoveNew();
   SyncPlace();
+  NoteWaiting(lock, 0);
 }
 
 void PolicyExchange::Finish() {
-  stage = Stage::kNothing;
   std::error_code later;  // the next one removes it
   fs::remove_all(kNewPolicy, later);
+  NoteWaiting(lock, 0);
 }
 
 }  // namespace SecPolicyCli

@@ -18,12 +18,12 @@ void WritePolicyTree(const std::string& dir, const std::vector<ArchiveEntry>& fi
 // Puts files in place of the host's policy directory, in one step, and can take that back. What
 // was there is kept as kPreviousPolicy; what was kept there before goes when it is done.
 //
-// Whenever the process is killed, the policy directory is a whole one, the new or the old, and a
-// later exchange needs to know nothing of this one: what is left beside it is removed unread.
+// Whenever the process is killed, the policy directory is a whole one, the new or the old. The next
+// exchange clears up beside it.
 class PolicyExchange {
  public:
-  // Removes what a killed one has left. Throws Refusal while another process exchanges, and
-  // BraxoException.
+  // Removes what a killed one has left, and puts back what it has moved. Throws Refusal while
+  // another process exchanges, and BraxoException.
   PolicyExchange();
   PolicyExchange(const PolicyExchange&) = delete;
   PolicyExchange& operator=(const PolicyExchange&) = delete;
@@ -34,6 +34,9 @@ class PolicyExchange {
 
   // All is as before. Throws BraxoException.
   void PutBack();
+
+  // Whether the files are the host's policy now.
+  bool IsInPlace() const { return stage == Stage::kInPlace; }
 
   // There is no way back any more.
   void Finish();

@@ -11,8 +11,9 @@ namespace SecPolicyCli {
 inline constexpr char kTrustedKeysDir[] = "/etc/secpolicy/bundle-keys";
 
 // The keys in `files` or, where none is named, all NAME.pem in kTrustedKeysDir. Throws Refusal when
-// there are none, for what is no key, and for what somebody else than this user and root could put
-// another key in place of; BraxoException when they cannot be read.
+// there are none, for what is no key, and for a file that others than this user and root may write,
+// of kTrustedKeysDir also for a directory above it; where `files` lie is for who names them to
+// know. Throws BraxoException when they cannot be read.
 std::vector<VerifyingKey> TrustedKeys(const std::vector<std::string>& files);
 
 }  // namespace SecPolicyCli

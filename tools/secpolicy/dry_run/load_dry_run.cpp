@@ -9,6 +9,7 @@
 #include <iterator>
 #include <sstream>
 #include <stdexcept>
+#include <utility>
 
 #include "forked.h"
 #include "host/linux/common/host_error.h"
@@ -35,15 +36,39 @@ void Redirect(int descriptor, const std::string& path) {
   close(file);
 }
 
-// Each as it happens: the load may end the process.
+std::string Replaced(std::string text, const std::string& old, const std::string& other) {
+  for (std::size_t at = text.find(old); at != std::string::npos;
+       at = text.find(old, at + other.size())) {
+    text.replace(at, old.size(), other);
+  }
+  return text;
+}
+
+// Each as it happens: the load may end the process. Who watches the load itself is told why it will
+// not come to that.
 class ErrorFile : public LoadWatcher {
  public:
-  explicit ErrorFile(const std::string& path) : file(path, std::ios::binary) {}
+  // The files are in `directory` where the load would have them in its own.
+  ErrorFile(const std::string& path, const LoadRequest& wanted, std::string directory)
+      : file(path, std::ios::binary), load(wanted), unpacked(std::move(directory)) {}
 
   void OnError(const std::string& message) override { file << message << '\0' << std::flush; }
 
+  void OnProblem(const SecPolicy::Problem& problem) override {
+    if (load.watcher == nullptr) return;
+    SecPolicy::Problem told = problem;
+    told.file = Replaced(problem.file, unpacked, load.policyDir);
+    load.watcher->OnProblem(told);
+  }
+
+  void OnOutcome(const LoadOutcome& outcome) override {
+    if (load.watcher != nullptr && outcome.code != kWell) load.watcher->OnOutcome(outcome);
+  }
+
  private:
   std::ofstream file;
+  const LoadRequest& load;
+  const std::string unpacked;
 };
 
 // But for files that are only there for the dry run, below `own`.
@@ -78,12 +103,7 @@ std::string ReadAll(const std::string& path) {
 // What was told in a dry run, with its files in `directory` where the load would have them.
 std::string ReadTold(const std::string& path, const std::string& directory,
                      const std::string& place) {
-  std::string text = ReadAll(path);
-  for (std::size_t at = text.find(directory); at != std::string::npos;
-       at = text.find(directory, at + place.size())) {
-    text.replace(at, directory.size(), place);
-  }
-  return text;
+  return Replaced(ReadAll(path), directory, place);
 }
 
 std::vector<std::string> SplitErrors(const std::string& text) {
@@ -117,7 +137,7 @@ LoadDryRun::LoadDryRun(const LoadRequest& load) {
       load.unpack(unpacked);
       dryRun.steps = OwnLoad(unpacked);
     }
-    ErrorFile errorFile(scratch.File("errors"));
+    ErrorFile errorFile(scratch.File("errors"), load, unpacked);
     dryRun.watcher = &errorFile;
     const ExitCode code = RunLoad(dryRun);
     if (code == kWell || !load.allOrNothing) WriteLabels(notes, scratch.File(""), labelFile);

@@ -1,6 +1,7 @@
 #include "load/bundle_load.h"
 
 #include <ctime>
+#include <iostream>
 #include <optional>
 
 #include "bundle/bundle_decision.h"
@@ -9,6 +10,7 @@
 #include "bundle/installed_bundle.h"
 #include "bundle/policy_exchange.h"
 #include "bundle/trusted_keys.h"
+#include "dry_run/load_dry_run.h"
 #include "ending.h"
 #include "host/linux/operation/text_digest.h"
 #include "kitlibs/file.h"
@@ -91,8 +93,19 @@ std::vector<ArchiveEntry> FilesToInstall(const VerifiedBundle& offered) {
   return files;
 }
 
-ExitCode Exchange(PolicyExchange& exchange, const std::vector<ArchiveEntry>& files,
-                  LoadRequest load) {
+// On a copy: what cannot be loaded never comes to where the next boot would find it.
+ExitCode Try(LoadRequest load, const std::vector<ArchiveEntry>& files) {
+  load.unpack = [&](const std::string& directory) { WritePolicyTree(directory, files); };
+  const LoadDryRun dryRun(load);
+  if (dryRun.Ending() != kWell) std::cerr << dryRun.Messages() << std::flush;
+  return dryRun.Ending();
+}
+
+ExitCode Exchange(PolicyExchange& exchange, const PolicyInPlace& policy,
+                  const VerifiedBundle& offered, LoadRequest load) {
+  const std::vector<ArchiveEntry> files = FilesToInstall(offered);
+  const ExitCode trial = Try(load, files);
+  if (trial != kWell) return trial;
   std::optional<BlockedSignals> blocked;
   load.begin = [&] {
     blocked.emplace();
@@ -100,7 +113,9 @@ ExitCode Exchange(PolicyExchange& exchange, const std::vector<ArchiveEntry>& fil
   };
   load.undo = [&] { exchange.PutBack(); };
   const ExitCode code = RunLoad(load);
+  if (!exchange.IsInPlace()) return code;
   exchange.Finish();
+  TellExchange(policy, offered.manifest);
   return code;
 }
 
@@ -122,9 +137,7 @@ ExitCode LoadBundle(const BundleChoice& choice, LoadRequest load) {
   load.allOrNothing = true;
   load.bundle = choice.file;
   if (policy.Is(offered.manifest)) return RunLoad(load);
-  const ExitCode code = Exchange(exchange, FilesToInstall(offered), load);
-  if (code == kWell) TellExchange(policy, offered.manifest);
-  return code;
+  return Exchange(exchange, policy, offered, load);
 }
 
 ExitCode PlanBundle(const BundleChoice& choice, LoadRequest load, PlanOptions options) {

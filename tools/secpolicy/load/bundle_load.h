@@ -17,8 +17,9 @@ struct BundleChoice {
 };
 
 // Verifies the bundle, puts it in place of the host's policy, and loads that as `load` says, all or
-// nothing: after a load that fails the policy of before is back. Throws Refusal for a bundle that
-// is not to be taken, and BraxoException; nothing was changed then.
+// nothing: what cannot be loaded on a copy is not put there, and after a load that fails the policy
+// of before is back. Throws Refusal for a bundle that is not to be taken, BraxoException, and
+// std::runtime_error when there can be no copy; nothing was changed then.
 ExitCode LoadBundle(const BundleChoice& choice, LoadRequest load);
 
 // Only shows what that would change.

@@ -3,10 +3,13 @@
 #include <ctime>
 #include <exception>
 #include <filesystem>
+#include <optional>
 
+#include "bundle/installed_bundle.h"
 #include "ending.h"
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/state_use.h"
+#include "secpolicy/policy_root.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
@@ -22,6 +25,13 @@ void Record(const RecordedLoad& load, const std::string& directory,
                                                     .errors = load.errors,
                                                     .removedRules = removed.rules,
                                                     .removedDomains = removed.domains.size()});
+}
+
+// The partner domains of any other directory are those of the host's own.
+std::string DigestOfBundle(const std::string& dir) {
+  if (CanonicalName(dir) != SecPolicy::kPolicyRoot) return "";
+  const std::optional<InstalledBundle> bundle = ReadInstalledBundle(dir);
+  return bundle ? bundle->digest : "";
 }
 
 }  // namespace
@@ -48,10 +58,25 @@ void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
   }
 }
 
+void RecordInstalledPolicy(const std::string& dir, bool isWhole) {
+  std::string digest;
+  try {
+    if (isWhole) digest = DigestOfBundle(dir);
+  } catch (const std::exception&) {
+    digest.clear();  // `status` tells what is wrong with the manifest
+  }
+  try {
+    LinuxHost::RecordLoadedBundle(LinuxHost::CurrentState(), digest);
+  } catch (const std::exception&) {
+    return;
+  }
+}
+
 void RecordEnding(const RecordedLoad& load) { Record(load, CanonicalName(load.policyDir), {}); }
 
 void RecordRollback(const std::string& name) {
   try {
+    LinuxHost::RecordLoadedBundle(LinuxHost::CurrentState(), "");
     Record({.verb = kRollback.name, .policyDir = {}, .ending = "done", .errors = {}}, name, {});
   } catch (const std::exception& failure) {
     Summarize(kRollback.name,

@@ -27,6 +27,10 @@ std::string CanonicalName(const std::string& dir);
 void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
                 const LoadListener& listener);
 
+// Keeps, for `status`, that the full policy in `dir` is what is installed, all of it or not.
+// Nothing is thrown: what cannot be kept is not claimed.
+void RecordInstalledPolicy(const std::string& dir, bool isWhole);
+
 // Keeps how a load ended that installed nothing. Throws what the host throws.
 void RecordEnding(const RecordedLoad& load);
 

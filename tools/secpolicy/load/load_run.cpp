@@ -104,7 +104,7 @@ class LoadRun {
     try {
       Install();
     } catch (const std::exception& raised) {
-      transaction.reset();
+      Abandon();
       Fail(raised);
     }
     if (hasBegun && !request.dryRun && (isInstalled || !stateIsNew)) FollowChange();
@@ -147,7 +147,7 @@ class LoadRun {
     if (!request.dryRun) labels.emplace(LinuxHost::LabelNotes::kForLater);
     for (const LoadStep& step : request.steps) Take(step);
     if (request.allOrNothing && !WentWell()) {
-      transaction.reset();
+      Abandon();
     } else if (request.allOrNothing && labels) {
       InstallAllOrNothing(*labels);
     } else {
@@ -189,13 +189,22 @@ class LoadRun {
     const std::vector<LinuxHost::LabelFailure> failures = labels.Apply();
     if (failures.empty()) return;
     ReportUnlabelled(failures);
+    RecordInstalled();
     RecordLoad(Ending(), ending, listener);
   }
 
   void Commit() {
+    RecordInstalled();
     RecordLoad(Ending(), ending, listener);
     transaction->Commit();
     isInstalled = true;
+  }
+
+  // Early policy is but a part of the host's.
+  void RecordInstalled() const {
+    if (request.steps.back().kind == LoadKind::kFull) {
+      RecordInstalledPolicy(request.policyDir, WentWell());
+    }
   }
 
   // The labels come before the commit: they can be taken back, and the commit cannot.
@@ -210,14 +219,19 @@ class LoadRun {
       ReportPutBack(journal.PutBack());
       throw;
     }
-    transaction.reset();
+    Abandon();
     ReportPutBack(journal.PutBack());
+  }
+
+  // Who loads next has waited for the transaction, and is to find the files of before.
+  void Abandon() {
+    if (!isInstalled) UndoBegin();
+    transaction.reset();
   }
 
   // All or nothing leaves no trace of itself. Where there was no state, there is to be none; its
   // journal goes with it.
   void RecordUndone(const RecordedLoad& record) {
-    UndoBegin();
     if (!request.allOrNothing) return RecordEnding(record);
     if (!stateIsNew) return;
     for (const char* part : {"", "-wal", "-shm"}) {
@@ -348,6 +362,7 @@ class LoadRun {
     std::cout.flush();
     RecordedLoad record = Ending();
     record.ending = "stopped";
+    UndoBegin();
     Attempt([&] {
       transaction->Undo();
       RecordUndone(record);

@@ -9,20 +9,13 @@ namespace SecPolicyCli {
 
 namespace {
 
-// A load of other files, a rollback, and that nothing was loaded since the files came: the files
-// are not what is installed then.
-bool HasLoaded(const std::optional<LinuxHost::LoadRecord>& load, const InstalledBundle& bundle) {
-  return load && load->ending == "done" && load->directory == SecPolicy::kPolicyRoot &&
-         load->time >= bundle.time;
-}
-
-std::optional<BundleStatus> ReadBundleStatus(const std::optional<LinuxHost::LoadRecord>& load) {
+std::optional<BundleStatus> ReadBundleStatus() {
   BundleStatus status;
   try {
     status.bundle = ReadInstalledBundle(SecPolicy::kPolicyRoot);
     if (!status.bundle) return std::nullopt;
     status.edits = FindEdits(SecPolicy::kPolicyRoot, status.bundle->manifest);
-    status.isLoaded = HasLoaded(load, *status.bundle);
+    status.isLoaded = LinuxHost::LoadedBundle(LinuxHost::CurrentState()) == status.bundle->digest;
   } catch (const std::exception& failure) {
     status = {.bundle = {}, .problem = failure.what(), .edits = {}};
   }
@@ -37,7 +30,7 @@ HostStatus ReadStatus() {
   status.policy = ReadInstalledPolicy(access);
   status.tardisks = ReadTardisks(access);
   status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
-  status.bundle = ReadBundleStatus(status.load);
+  status.bundle = ReadBundleStatus();
   status.worlds = LinuxHost::ListWorlds(LinuxHost::CurrentState());
   for (const Policy::InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);

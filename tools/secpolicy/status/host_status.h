@@ -18,17 +18,15 @@ struct BundleStatus {
   std::optional<InstalledBundle> bundle;  // nothing when it cannot be told
   std::string problem;                    // why
   std::vector<std::string> edits;         // files that differ from the bundle's
-  bool isLoaded = false;                  // the latest load was one of these files, and ended well
+  bool isLoaded = false;  // the latest full load was of this bundle, and all of it is installed
 };
 
 // What `status` tells of a host.
-
 struct HostStatus {
   Policy::InstalledPolicy policy;
   std::vector<InstalledTardisk> tardisks;
   std::optional<LinuxHost::LoadRecord> load;
   std::optional<BundleStatus> bundle;
-
   std::map<Policy::Level, std::vector<std::string>> domainsByLevel;
   std::map<Policy::RuleKind, std::size_t> rulesByKind;
   std::size_t ruleCount = 0;
