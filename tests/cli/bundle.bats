@@ -106,6 +106,7 @@ refused() {
   refused signed-version "its format is secpolicy.bundle/2, and this command knows secpolicy.bundle/1. A newer secpolicy may know it."
   refused signed-another "its manifest is that of no bundle"
   refused signed-no-serial "its manifest has no serial"
+  refused signed-far-serial "its serial is greater than 9007199254740992"
   bundle verify signed-no-json.bundle --key public.pem
   exits 1
   [[ $stderr == *"signed-no-json.bundle: its manifest is no JSON: "* ]]
@@ -185,6 +186,8 @@ refused() {
   exits 2
   bundle create web -o new.bundle --key key.pem --serial -1
   exits 2
+  bundle create web -o new.bundle --key key.pem --serial 9007199254740993
+  wrong_usage "bundle create" "--serial: '9007199254740993' is greater than 9007199254740992"
   bundle create web -o new.bundle --key key.pem --expires 2020-01-01
   exits 2
   [[ $stderr == *"cannot expire at 2020-01-01 00:00:00 UTC"* ]]

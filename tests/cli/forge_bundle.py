@@ -84,6 +84,7 @@ MANIFESTS = {
     "another": (b"secpolicy.bundle/1", b"something/1"),
     "no-json": (b"{", b""),
     "no-serial": (b'"serial"', b'"cereal"'),
+    "far-serial": (b'"serial": ', b'"serial": 9007199254740993, "first": '),
 }
 
 for name, change in CHANGES.items():

@@ -58,8 +58,11 @@ struct CreateOptions {
   std::string serial;
 };
 
-std::string CheckNumber(const std::string& word) {
-  return NumberIn(word) ? "" : "'" + word + "' is not a number";
+std::string CheckSerial(const std::string& word) {
+  const auto number = NumberIn(word);
+  if (!number) return "'" + word + "' is not a number";
+  if (*number <= kGreatestSerial) return "";
+  return "'" + word + "' is greater than " + std::to_string(kGreatestSerial);
 }
 
 constexpr std::int64_t kMostDays = 36500;
@@ -144,7 +147,7 @@ Action DefineCreate(Syntax& syntax) {
       .AddOption("--serial", options->serial,
                  "A number that is greater in each bundle of a policy; without it the time in "
                  "seconds")
-      .Check(CheckNumber)
+      .Check(CheckSerial)
       .NameValue("N");
   return [options] { return Create(*options); };
 }

@@ -27,6 +27,12 @@ std::int64_t NumberAt(const Json& json, const char* name) {
   throw BadManifest(std::string("its manifest has no ") + name);
 }
 
+std::int64_t SerialAt(const Json& json) {
+  const std::int64_t serial = NumberAt(json, "serial");
+  if (serial <= kGreatestSerial) return serial;
+  throw BadManifest("its serial is greater than " + std::to_string(kGreatestSerial));
+}
+
 std::int64_t TimeAt(const Json& json, const char* name) {
   if (const auto time = ReadUtcTime(TextAt(json, name))) return *time;
   throw BadManifest(std::string("its manifest has no ") + name);
@@ -78,7 +84,7 @@ Manifest ReadManifest(std::string_view text) {
   if (json == nullptr) throw BadManifest("its manifest is no JSON: " + std::get<std::string>(read));
   RequireSchema(*json);
   Manifest manifest{.name = TextAt(*json, "name"),
-                    .serial = NumberAt(*json, "serial"),
+                    .serial = SerialAt(*json),
                     .created = TimeAt(*json, "created"),
                     .expires = std::nullopt,
                     .key = TextAt(*json, "key"),

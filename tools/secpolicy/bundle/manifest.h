@@ -22,6 +22,9 @@ struct BundledFile {
   bool operator==(const BundledFile&) const = default;
 };
 
+// Who reads numbers as floating-point ones, as of metrics, knows no greater one exactly.
+inline constexpr std::int64_t kGreatestSerial = std::int64_t{1} << 53;
+
 // Times are in seconds since 1970.
 struct Manifest {
   std::string name;
