@@ -4,12 +4,7 @@ load helper
 
 setup_file() {
   cd "$BATS_FILE_TMPDIR" || return
-  openssl genpkey -algorithm ed25519 -out key.pem
-  openssl genpkey -algorithm ed25519 -out other.pem
-  chmod 600 ./*.pem
-  openssl pkey -in key.pem -pubout -out public.pem
-  openssl pkey -in other.pem -pubout -out other-public.pem
-  cp -r "$SOURCE/examples/host/etc/zorvan/secpolicy" web
+  make_keys_and_policy
   local serial
   for serial in 1 2 3; do
     echo "newLabel$serial" >>web/objects/base

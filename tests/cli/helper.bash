@@ -162,3 +162,14 @@ on_terminal() {
 without_colors() {
   sed $'s/\e\\[[0-9;]*m//g' "$1"
 }
+
+# make_keys_and_policy: what bundles are made of, in the working directory: two keys that sign, their public
+# halves, and the policy web.
+make_keys_and_policy() {
+  openssl genpkey -algorithm ed25519 -out key.pem
+  openssl genpkey -algorithm ed25519 -out other.pem
+  chmod 600 ./*.pem
+  openssl pkey -in key.pem -pubout -out public.pem
+  openssl pkey -in other.pem -pubout -out other-public.pem
+  cp -r "$SOURCE/examples/host/etc/zorvan/secpolicy" web
+}
