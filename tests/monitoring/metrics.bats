@@ -142,7 +142,7 @@ digest() {
   boot
   secpolicy status --format prometheus --output /nowhere/host.prom
   exits 1
-  ends_with "secpolicy: status: cannot write /nowhere/host.prom: No such file or directory"
+  ends_with "secpolicy: status: cannot write /nowhere/host.prom: there is no directory /nowhere"
   mkdir -p "$root/metrics/host.prom"
   secpolicy status --format prometheus --output /metrics/host.prom
   exits 1
