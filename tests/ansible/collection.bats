@@ -1,4 +1,4 @@
-# The collection for Ansible on eight hosts: changes that are told and not made, or made and not told,
+# The collection for Ansible on twenty hosts: changes that are told and not made, or made and not told,
 # and hosts that are left with half a policy, or reached after one that failed.
 
 bats_require_minimum_version 1.5.0
@@ -7,7 +7,7 @@ load fleet
 
 fleet=${BATS_FILE_TMPDIR-}
 
-hosts=(h{01..08})
+hosts=(h{01..20})
 
 setup_file() {
   command -v ansible-playbook >/dev/null || return 0
@@ -75,150 +75,175 @@ has_bundle() {
   play "$BATS_TEST_DIRNAME/rollout.yml" -e bundle=/1.bundle
   exits 0
   recap changed=1 "${hosts[@]}"
-  [[ $(result h08 .changes.domains_created) == '["webDom"]' ]]
+  [[ $(result h20 .changes.domains_created) == '["webDom"]' ]]
   local host
-  for host in h01 h08; do
+  for host in h01 h20; do
     has_rule "$host" '-r /srv r'
     has_bundle "$host" 1
   done
-  play "$BATS_TEST_DIRNAME/rollout.yml" -e bundle=/1.bundle --limit h01,h08
+  play "$BATS_TEST_DIRNAME/rollout.yml" -e bundle=/1.bundle
   exits 0
-  recap changed=0 h01 h08
-  [[ $(result h08 .replaced) == false ]]
+  recap changed=0 "${hosts[@]}"
+  [[ $(result h20 .replaced) == false ]]
 }
 
 @test "a host that fails on the way keeps its policy, and those after it are not touched" {
   # The load of this host cannot write what it installs: its disk is full.
-  cat >"$fleet/h02.command" <<END
+  cat >"$fleet/h04.command" <<END
 #!/bin/bash
 [[ " \$* " == *" --plan "* ]] || { trap '' XFSZ; ulimit -f 40; }
 exec "$SECPOLICY" "\$@"
 END
-  chmod +x "$fleet/h02.command"
-  everything h02 >"$BATS_TEST_TMPDIR/h02"
+  chmod +x "$fleet/h04.command"
   everything h04 >"$BATS_TEST_TMPDIR/h04"
+  everything h07 >"$BATS_TEST_TMPDIR/h07"
   play "$BATS_TEST_DIRNAME/rollout.yml" -e bundle=/2.bundle
-  rm "$fleet/h02.command"
+  rm "$fleet/h04.command"
   [[ $status -eq 2 ]]
-  recap changed=1 h01 h03
-  recap failed=1 h02
-  [[ $(result h02 '.problems | any(contains("disk"))') == true && $(result h02 .replaced) == false ]]
-  [[ ! -e $fleet/results/h04 ]]
+  recap changed=1 h01 h02 h03 h05 h06
+  recap failed=1 h04
+  [[ $(result h04 '.problems | any(contains("disk"))') == true && $(result h04 .replaced) == false ]]
+  [[ ! -e $fleet/results/h07 ]]
   has_rule h03 '-r /srv rw'
-  everything h02 | diff "$BATS_TEST_TMPDIR/h02" -
   everything h04 | diff "$BATS_TEST_TMPDIR/h04" -
+  everything h07 | diff "$BATS_TEST_TMPDIR/h07" -
 }
 
 @test "a host takes no older bundle, gives up its edits, and takes another of the same serial when told to" {
   local domains=etc/zorvan/secpolicy/domains
-  echo '-r /opt r' >>"$fleet/h04/$domains/webDom"
+  echo '-r /opt r' >>"$fleet/h14/$domains/webDom"
   everything h03 >"$BATS_TEST_TMPDIR/h03"
-  mv "$fleet/h05/etc/secpolicy/bundle-keys/fleet.pem" "$fleet/h05/public.pem"
-  printf 'bundle: /other.bundle\nkey: [/public.pem]\nallow_older: true\n' >"$fleet/host_vars/h05"
-  printf 'bundle: /1.bundle\n' | tee "$fleet/host_vars/"h0{3,4,6} >/dev/null
-  printf 'bundle: /2.bundle\ndigest: %064d\n' 0 >"$fleet/host_vars/h07"
-  play "$each" --limit h03,h04,h05,h06,h07
+  mv "$fleet/h15/etc/secpolicy/bundle-keys/fleet.pem" "$fleet/h15/public.pem"
+  printf 'bundle: /other.bundle\nkey: [/public.pem]\nallow_older: true\n' >"$fleet/host_vars/h15"
+  printf 'bundle: /1.bundle\n' | tee "$fleet/host_vars/"h{03,14,16} >/dev/null
+  printf 'bundle: /2.bundle\ndigest: %064d\n' 0 >"$fleet/host_vars/h17"
+  play "$each" --limit h03,h14,h15,h16,h17
   rm "$fleet/host_vars/"*
   [[ $status -eq 2 ]]
-  recap changed=0 h03 h06 h07
-  recap changed=1 h04 h05
-  recap failed=1 h03 h07
-  [[ $(result h04 '[.changes.edits_replaced, .before.edited, .replaced]') == '[1,1,true]' ]]
-  [[ $(result h05 '[.changes.rules_added, .replaced]') == '[0,true]' ]]
-  has_bundle h04 1
-  has_bundle h05 1
+  recap changed=0 h03 h16 h17
+  recap changed=1 h14 h15
+  recap failed=1 h03 h17
+  [[ $(result h14 '[.changes.edits_replaced, .before.edited, .replaced]') == '[1,1,true]' ]]
+  [[ $(result h15 '[.changes.rules_added, .replaced]') == '[0,true]' ]]
+  has_bundle h14 1
+  has_bundle h15 1
   [[ $(result h03 .msg) == *"'secpolicy load --bundle=/1.bundle "*"older"* ]]
   everything h03 | diff "$BATS_TEST_TMPDIR/h03" -
-  [[ $(result h07 .msg) == '"/2.bundle is another bundle, and nothing was changed: its digest is '* ]]
-  has_bundle h07 1
+  [[ $(result h17 .msg) == '"/2.bundle is another bundle, and nothing was changed: its digest is '* ]]
+  has_bundle h17 1
 }
 
 @test "a directory is installed as it is: the host's own, or one elsewhere until the next load" {
   local host domains=etc/zorvan/secpolicy/domains
-  for host in h04 h07; do cp -r "$fleet/$host/etc/zorvan/secpolicy" "$fleet/$host/-new"; done
-  echo '-s opne grant' >"$fleet/h07/-new/domains/webDom"
-  echo '-r /opt r' | tee "$fleet/h08/$domains/webDom" >"$fleet/h04/-new/domains/webDom"
-  printf 'src: -new\n' | tee "$fleet/host_vars/"h0{4,7} >/dev/null
-  everything h07 >"$BATS_TEST_TMPDIR/h07"
+  for host in h14 h17; do cp -r "$fleet/$host/etc/zorvan/secpolicy" "$fleet/$host/-new"; done
+  echo '-s opne grant' >"$fleet/h17/-new/domains/webDom"
+  echo '-r /opt r' | tee "$fleet/h18/$domains/webDom" >"$fleet/h14/-new/domains/webDom"
+  printf 'src: -new\n' | tee "$fleet/host_vars/"h{14,17} >/dev/null
+  everything h17 >"$BATS_TEST_TMPDIR/h17"
 
-  play "$each" --limit h04,h07,h08
+  play "$each" --limit h14,h17,h18
   [[ $status -eq 2 ]]
-  recap failed=1 h07
-  recap changed=1 h04 h08
-  [[ $(result h07 '.problems[0]') == *"webDom"*"unknown system call 'opne'"* ]]
-  [[ $(result h07 .msg) == '"the policy in -new has errors, and nothing was changed"' ]]
-  everything h07 | diff "$BATS_TEST_TMPDIR/h07" -
-  has_rule h08 '-r /opt r'
-  has_rule h04 '-r /opt r'
-  grep -qx -e '-r /srv r' "$fleet/h04/$domains/webDom"
+  recap failed=1 h17
+  recap changed=1 h14 h18
+  [[ $(result h17 '.problems[0]') == *"webDom"*"unknown system call 'opne'"* ]]
+  [[ $(result h17 .msg) == '"the policy in -new has errors, and nothing was changed"' ]]
+  everything h17 | diff "$BATS_TEST_TMPDIR/h17" -
+  has_rule h18 '-r /opt r'
+  has_rule h14 '-r /opt r'
+  grep -qx -e '-r /srv r' "$fleet/h14/$domains/webDom"
 
-  play "$each" --limit h04,h08
+  play "$each" --limit h14,h18
   exits 0
-  recap changed=0 h04 h08
+  recap changed=0 h14 h18
   rm "$fleet/host_vars/"*
-  on h04 load
-  has_bundle h04 1
+  on h14 load
+  has_bundle h14 1
 }
 
 @test "labels and levels are set once, and facts tell them" {
-  touch "$fleet/h05/etc/zorvan/file"
-  play "$BATS_TEST_DIRNAME/modules.yml" --limit h05
+  touch "$fleet/h15/etc/zorvan/file"
+  play "$BATS_TEST_DIRNAME/modules.yml" --limit h15
   exits 0
-  [[ $(on h05 label get /etc/zorvan/file) == *": policyFile" ]]
+  [[ $(on h15 label get /etc/zorvan/file) == *": policyFile" ]]
 }
 
 @test "a role begins at the canary, and puts policy and levels back where it is not well" {
-  printf '[canary]\nh06\n' >"$fleet/canary"
-  roll_out 2 --limit h06 -e '{"secpolicy_rollout_enforcing": ["webDom"]}'
+  printf '[canary]\nh16\n' >"$fleet/canary"
+  roll_out 2 --limit h16 -e '{"secpolicy_rollout_enforcing": ["webDom"]}'
   exits 0
-  has_bundle h06 2
-  [[ $(level h06 webDom) == enforcing ]]
-  on h06 settings enforcement webDom permissive
-  on h06 restore
-  [[ $(level h06 hostDom) == permissive ]]
-  on h06 settings list >"$BATS_TEST_TMPDIR/settings"
-  everything h05 >"$BATS_TEST_TMPDIR/h05"
+  has_bundle h16 2
+  [[ $(level h16 webDom) == enforcing && ! -e $fleet/h16/var/cache/secpolicy-rollout/unfinished ]]
+  on h16 settings enforcement webDom permissive
+  on h16 restore
+  [[ $(level h16 hostDom) == permissive ]]
+  on h16 settings list >"$BATS_TEST_TMPDIR/settings"
+  everything h15 >"$BATS_TEST_TMPDIR/h15"
 
-  roll_out 4 -i "$fleet/hosts" -i "$fleet/canary" --limit h05,h06 \
+  roll_out 4 -i "$fleet/hosts" -i "$fleet/canary" --limit h15,h16 \
     -e '{"secpolicy_rollout_enforcing": ["hostDom", "lateDom", "webDom"]}' \
     -e "secpolicy_rollout_check=$BATS_TEST_DIRNAME/unwell.yml"
   [[ $status -eq 2 ]]
-  recap failed=1 h06
-  recap rescued=1 h06
-  recap ignored=0 h06
-  [[ $(result h06 .msg) == *"Ask the service: The service does not answer. The host has now web, serial 2; latest load: "* ]]
-  has_bundle h06 2
-  [[ $(level h06 hostDom) == permissive && $(level h06 webDom) == permissive ]]
-  run ! on h06 display lateDom
-  on h06 settings list | diff "$BATS_TEST_TMPDIR/settings" -
-  grep -qx -e '-r /usr r' "$fleet/h06/etc/zorvan/secpolicy.previous/domains/webDom"
-  everything h05 | diff "$BATS_TEST_TMPDIR/h05" -
+  recap failed=1 h16
+  recap rescued=1 h16
+  recap ignored=0 h16
+  [[ $(result h16 .msg) == *"Ask the service: The service does not answer. The host has now web, serial 2; latest load: "* ]]
+  has_bundle h16 2
+  [[ $(level h16 hostDom) == permissive && $(level h16 webDom) == permissive ]]
+  run ! on h16 display lateDom
+  on h16 settings list | diff "$BATS_TEST_TMPDIR/settings" -
+  grep -qx -e '-r /usr r' "$fleet/h16/etc/zorvan/secpolicy.previous/domains/webDom"
+  everything h15 | diff "$BATS_TEST_TMPDIR/h15" -
 }
 
 @test "a role that cannot put a bundle back says what the host has" {
-  local policy=/etc/zorvan/secpolicy until_boot
-  until_boot="The host has now web, serial 3, which is not what is installed; latest load: load of $policy.previous, done"
-  # One had this bundle, and something else installed; one fails to restart; one installs, and says that it has failed.
+  local policy=/etc/zorvan/secpolicy task until_boot
+  until_boot="The host has now web, serial 4, which is not what is installed; latest load: load of $policy.previous, done"
+  # One had this bundle, and something else installed; one fails to restart; one installs, and says that
+  # it has failed; one is killed when it has installed.
   on h01 save good
-  on h01 load --bundle /3.bundle
+  on h01 load --bundle /4.bundle
   on h01 rollback good
-  echo 'secpolicy_rollout_restart: [no-such-service]' >"$fleet/host_vars/h02"
+  echo 'secpolicy_rollout_restart: [no-such-service]' >"$fleet/host_vars/h12"
   cat >"$fleet/h03.command" <<END
 #!/bin/bash
 "$SECPOLICY" "\$@" || exit
-[[ " \$* " != *" --bundle="* || " \$* " == *" --plan "* ]] || { echo "no words" >&2; exit 1; }
+[[ " \$* " != *" --bundle="* || " \$* " == *" --plan "* ]] || { echo "secpolicy: no words" >&2; exit 1; }
 END
-  chmod +x "$fleet/h03.command"
-  roll_out 3 --limit h01,h02,h03 -e '{"secpolicy_steps": ["100%"]}' \
+  sed '3s/.*/[[ " $* " != *" --bundle="* || " $* " == *" --plan "* ]] || kill -KILL "$PPID"/' "$fleet/h03.command" >"$fleet/h05.command"
+  chmod +x "$fleet/"h0{3,5}.command
+  roll_out 4 --limit h01,h03,h05,h12 -e '{"secpolicy_steps": ["100%"]}' \
     -e "secpolicy_rollout_check=$BATS_TEST_DIRNAME/unwell.yml"
-  rm "$fleet/host_vars/h02" "$fleet/h03.command"
+  rm "$fleet/host_vars/h12" "$fleet/"h0{3,5}.command
   [[ $status -eq 2 ]]
-  recap failed=1 h01 h03
-  recap failed=2 h02
-  [[ $(result h01 .msg) == *"does not answer. The host has now web, serial 3; latest load: load of $policy, done"* ]]
-  has_bundle h01 3
-  [[ $(result h02 .msg) == *"Restart services now: failed. $until_boot"* ]]
-  has_rule h02 '-r /srv r'
-  [[ $(result h03 .msg) == *"Install it: "*" no words. $until_boot"* ]]
+  recap failed=1 h01 h03 h05
+  recap failed=2 h12
+  [[ $(result h01 .msg) == *"does not answer. The host has now web, serial 4; latest load: load of $policy, done"* ]]
+  has_bundle h01 4
+  [[ $(result h12 .msg) == *"Restart services now: failed. $until_boot"* ]]
+  has_rule h12 '-r /srv r'
+  [[ $(result h03 .msg) == *"Install it: "*": secpolicy: no words. $until_boot"* ]]
   has_rule h03 '-r /srv rw'
+  has_bundle h05 4
+  [[ $(level h05 lateDom) == enforcing ]]
+
+  # The next run does what was left to do, and knows what there was before.
+  roll_out 4 --limit h05 -e "secpolicy_rollout_check=$BATS_TEST_DIRNAME/unwell.yml"
+  [[ $status -eq 2 ]]
+  for task in 'Install it' 'Begin with new domains' 'Install the files before, until the next boot'; do
+    grep -A 1 -F ": $task] " <<<"$output" | grep -qx 'changed: \[h05\]'
+  done
+  [[ $(result h05 .msg) == *"does not answer. $until_boot"* && ! -e $fleet/h05/var/cache/secpolicy-rollout/unfinished ]]
+  has_rule h05 '-r /srv rw'
+}
+
+@test "a role finds what is misspelt before it changes anything" {
+  echo 'secpolicy_rollout_restrat: [sshd]' >"$fleet/host_vars/h08"
+  echo 'secpolicy_rollout_check: /no/such.yml' >"$fleet/host_vars/h09"
+  echo 'secpolicy_rollout_enforcing: [lateDom, wbeDom]' >"$fleet/host_vars/h10"
+  ANSIBLE_STRATEGY=free roll_out 4 --check --limit h08,h09,h10 -e '{"secpolicy_steps": ["100%"]}'
+  rm "$fleet/host_vars/"*
+  [[ $status -eq 2 ]]
+  [[ $(result h08 .msg) == '"The role has no variable secpolicy_rollout_restrat"' ]]
+  [[ $(result h09 .) == *'/no/such.yml'* ]]
+  [[ $(result h10 .msg) == '"Enforce: not installed, so nothing was changed: wbeDom.'* ]]
 }

@@ -12,7 +12,7 @@ class CommandFailed(Exception):
     """What the command said, and what it had been asked."""
 
     def __init__(self, words, status, errors):
-        super().__init__("'secpolicy {0}' ended with {1}: {2}".format(' '.join(words), status, last_line(errors)))
+        super().__init__("'secpolicy {0}' ended with {1}: {2}".format(' '.join(words), status, reason(errors)))
         self.problems = [line for line in errors.splitlines() if line]
         # What the module tells beside, of what was done before.
         self.result = {}
@@ -54,9 +54,10 @@ def after_options(operands):
     return ('--',) + tuple(operands) if operands else ()
 
 
-def last_line(text):
-    lines = text.strip().splitlines()
-    return lines[-1] if lines else 'it wrote nothing'
+def reason(errors):
+    """The last line that says what went wrong; a hint at how the command is used may follow it."""
+    lines = errors.strip().splitlines() or ['it wrote nothing']
+    return ([line for line in lines if line.startswith('secpolicy:')] or lines)[-1]
 
 
 def run_module(module, work):

@@ -27,11 +27,16 @@ options:
       - If not, what is stored is forgotten, also of a domain that is not installed any more.
     type: bool
     default: true
+  planned:
+    description: Domains that are still to be installed, which have no level yet in check mode. Of any other domain it is told that there is none.
+    type: list
+    elements: str
+    default: []
 extends_documentation_fragment:
   - secpolicy.secpolicy.root
 attributes:
   check_mode:
-    description: Tells which domains would get another level, and gives none. A domain may be one that is still to be installed.
+    description: Tells which domains would get another level, and gives none.
     support: full
   diff_mode:
     description: Shows the domains that get another level.
@@ -91,8 +96,9 @@ def set_levels(module, command):
     domains, wanted = module.params['domain'], module.params['level']
     installed = installed_levels(command)
     stored = command.ask('secpolicy.settings/1', 'settings', 'list')['enforcement']
-    unknown = [domain for domain in domains if domain not in installed]
-    if unknown and module.params['stored'] and not module.check_mode:
+    known = set(installed).union(module.params['planned'] if module.check_mode else [])
+    unknown = [domain for domain in domains if domain not in known]
+    if unknown and module.params['stored']:
         module.fail_json(msg='not installed, so nothing was changed: ' + ', '.join(unknown), problems=[])
     changed = [domain for domain in domains if not has_level(module, installed.get(domain), stored.get(domain))]
     result = dict(changed=bool(changed), domains=changed, before={domain: before(domain, installed, stored) for domain in changed})
@@ -143,7 +149,8 @@ def main():
     module = AnsibleModule(
         argument_spec=dict(domain=dict(type='list', elements='str', required=True),
                            level=dict(type='str', required=True, choices=['enforcing', 'permissive', 'disabled']),
-                           stored=dict(type='bool', default=True), **ROOT_ARGUMENT),
+                           stored=dict(type='bool', default=True),
+                           planned=dict(type='list', elements='str', default=[]), **ROOT_ARGUMENT),
         supports_check_mode=True)
     run_module(module, set_levels)
 

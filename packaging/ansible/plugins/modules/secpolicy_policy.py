@@ -41,6 +41,12 @@ options:
     description: Whether the I(bundle) may be older than what the host has, or be of another policy.
     type: bool
     default: false
+  unfinished:
+    description:
+      - File on the host that says what is to follow a load of the I(bundle); it is written before the load.
+      - Who has done that removes it. While it is there, what has begun is not finished, and the same I(bundle) is C(changed) again,
+        with the domains that it has created and the bundle C(before) as they were told the first time.
+    type: path
 extends_documentation_fragment:
   - secpolicy.secpolicy.root
 attributes:
@@ -158,6 +164,7 @@ from ansible.module_utils.basic import AnsibleModule
 from ansible_collections.secpolicy.secpolicy.plugins.module_utils.command import ROOT_ARGUMENT, CommandFailed, run_module
 from ansible_collections.secpolicy.secpolicy.plugins.module_utils.plan import counts_of, diff_of
 from ansible_collections.secpolicy.secpolicy.plugins.module_utils.source import Bundle, Directory, identity
+from ansible_collections.secpolicy.secpolicy.plugins.module_utils.unfinished import Unfinished
 
 HOST_POLICY = '/etc/zorvan/secpolicy'
 SHOWN_PROBLEMS = 100
@@ -172,13 +179,17 @@ def install(module, command):
     if plan['ending'] != 'done':
         module.fail_json(msg='the policy in {0} has errors, and nothing was changed'.format(source.name),
                          problems=plan['errors'][:SHOWN_PROBLEMS])
-    result = dict(changed=source.replaces or not plan['changesNothing'] or not is_loaded(status, source),
-                  replaced=source.replaces, before=identity(bundle),
+    needed = source.replaces or not plan['changesNothing'] or not is_loaded(status, source)
+    result = dict(changed=needed, replaced=source.replaces, before=identity(bundle),
                   changes=dict(counts_of(plan), edits_replaced=len(source.edited)))
+    begun = Unfinished(module, plan)
+    begun.complete(result)
     if module._diff:
         result['diff'] = source.diff() + [diff_of(plan)]
-    if result['changed'] and not module.check_mode:
-        install_now(source, command, result)
+    if not module.check_mode:
+        begun.write(result)
+        if needed:
+            install_now(source, command, result)
     return result
 
 
@@ -209,9 +220,9 @@ def main():
     module = AnsibleModule(
         argument_spec=dict(src=dict(type='path', default=HOST_POLICY), bundle=dict(type='path'), digest=dict(type='str'),
                            key=dict(type='list', elements='path', default=[], no_log=False),
-                           allow_older=dict(type='bool', default=False), **ROOT_ARGUMENT),
+                           allow_older=dict(type='bool', default=False), unfinished=dict(type='path'), **ROOT_ARGUMENT),
         mutually_exclusive=[('src', 'bundle')],
-        required_by=dict(digest='bundle'),
+        required_by=dict(digest='bundle', unfinished='bundle'),
         supports_check_mode=True)
     run_module(module, install)
 
