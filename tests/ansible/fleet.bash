@@ -16,12 +16,13 @@ lay_out_fleet() {
 exec "$SECPOLICY" "\$@"
 END
   chmod +x "$fleet/bin/secpolicy"
+  root=$fleet/h01
+  mkdir "$root"
+  "$SECPOLICY" --root "$root" init 2>/dev/null >&2
+  "$SECPOLICY" --root "$root" boot 2>/dev/null
   for number in $(seq -f %02g 1 "$1"); do
-    root=$fleet/h$number
-    mkdir "$root"
-    "$SECPOLICY" --root "$root" init 2>/dev/null >&2
-    "$SECPOLICY" --root "$root" boot 2>/dev/null
-    echo "h$number root=$root"
+    [[ $number == 01 ]] || cp -a "$root" "$fleet/h$number"
+    echo "h$number root=$fleet/h$number"
   done >"$fleet/hosts"
   cat >>"$fleet/hosts" <<END
 [all:vars]
