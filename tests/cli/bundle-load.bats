@@ -305,6 +305,16 @@ secpolicy: load: nothing would change" ]]
   refused "/etc/zorvan/secpolicy/manifest.json does not tell which bundle is installed: its manifest is no JSON: "*
 }
 
+@test "a host that was never booted is told to boot, also by a plan" {
+  rm -r "$root/run/secpolicy"
+  for plan in "" --plan; do
+    takes 1 $plan
+    exits 1
+    [[ $stderr == "secpolicy: load: nothing is installed below this root. Name the root that was booted "* ]]
+  done
+  [[ ! -e $root/run/secpolicy && ! -e $policy.new ]]
+}
+
 @test "an image that has the bundle unpacked is a host that took it" {
   local booted=$root
   root=$BATS_TEST_TMPDIR/image

@@ -12,6 +12,7 @@
 #include "bundle/trusted_keys.h"
 #include "dry_run/load_dry_run.h"
 #include "ending.h"
+#include "host/linux/operation/state_use.h"
 #include "host/linux/operation/text_digest.h"
 #include "kitlibs/file.h"
 #include "load/blocked_signals.h"
@@ -130,6 +131,7 @@ Json Describe(const VerifiedBundle& offered, const PolicyInPlace& policy) {
 }  // namespace
 
 ExitCode LoadBundle(const BundleChoice& choice, LoadRequest load) {
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState(load.verb);
   const VerifiedBundle offered(choice);
   PolicyExchange exchange;
   const PolicyInPlace policy;
@@ -141,6 +143,7 @@ ExitCode LoadBundle(const BundleChoice& choice, LoadRequest load) {
 }
 
 ExitCode PlanBundle(const BundleChoice& choice, LoadRequest load, PlanOptions options) {
+  if (LinuxHost::IsStateMissing()) return RefuseWithoutState(load.verb);
   const VerifiedBundle offered(choice);
   const PolicyInPlace policy;
   RequireSuitable(policy, offered, choice);
