@@ -14,16 +14,14 @@
 namespace SecPolicyCli {
 namespace {
 
-std::vector<BundledFile> FilesIn(const std::string& dir) {
+// Those of tardisks, or all others.
+std::vector<BundledFile> FilesIn(const std::string& dir, bool ofTardisks) {
   std::vector<BundledFile> files;
   for (const auto& [name, path] : ListPolicyTree(dir)) {
+    if (IsTardiskPolicy(name) != ofTardisks) continue;
     files.push_back(DescribeFile({name, ReadFile(path, kLargestBundle).bytes}));
   }
   return files;
-}
-
-void DropTardiskPolicy(std::vector<BundledFile>& files) {
-  std::erase_if(files, [](const BundledFile& file) { return IsTardiskPolicy(file.path); });
 }
 
 }  // namespace
@@ -48,10 +46,8 @@ std::optional<InstalledBundle> ReadInstalledBundle(const std::string& dir) {
 
 std::vector<std::string> FindEdits(const std::string& dir, const Manifest& manifest) {
   std::vector<BundledFile> named = manifest.files;
-  std::vector<BundledFile> found = FilesIn(dir);
-  DropTardiskPolicy(named);
-  DropTardiskPolicy(found);
-  return EditedFiles(named, found);
+  std::erase_if(named, [](const BundledFile& file) { return IsTardiskPolicy(file.path); });
+  return EditedFiles(named, FilesIn(dir, false));
 }
 
 bool IsTardiskPolicy(const std::string& name) {
@@ -59,7 +55,7 @@ bool IsTardiskPolicy(const std::string& name) {
 }
 
 std::string FindForeignTardiskPolicy(const std::string& dir, const Manifest& manifest) {
-  const std::vector<BundledFile> found = FilesIn(dir);
+  const std::vector<BundledFile> found = FilesIn(dir, true);
   for (const BundledFile& file : manifest.files) {
     if (IsTardiskPolicy(file.path) && std::ranges::find(found, file) == found.end()) {
       return file.path;

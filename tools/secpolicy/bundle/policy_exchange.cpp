@@ -42,16 +42,13 @@ Descriptor Lock() {
   throw Refusal("another bundle is being loaded, so nothing was changed. Try it again.");
 }
 
-bool IsThere(const char* path) {
-  struct stat status {};
-  return lstat(path, &status) == 0;
-}
-
 // 0 where there is nothing.
 ino_t InodeOf(const char* path) {
   struct stat status {};
   return lstat(path, &status) == 0 ? status.st_ino : 0;
 }
+
+bool IsThere(const char* path) { return InodeOf(path) != 0; }
 
 // The directory that is not a policy yet, or not any more, whatever its name; on the disk before
 // any name changes.
