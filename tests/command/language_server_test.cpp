@@ -12,9 +12,9 @@
 #include <variant>
 #include <vector>
 
+#include "json_reader.h"
 #include "lsp/format.h"
 #include "lsp/framing.h"
-#include "lsp/json_reader.h"
 #include "lsp/text_document.h"
 #include "secpolicy/secpolicy.h"
 #include "support/temporary_directory.h"

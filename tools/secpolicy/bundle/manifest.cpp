@@ -4,7 +4,7 @@
 #include <variant>
 
 #include "host/linux/operation/text_digest.h"
-#include "lsp/json_reader.h"
+#include "json_reader.h"
 #include "text/format.h"
 
 namespace SecPolicyCli {
