@@ -1,10 +1,7 @@
 // The module on the kernel of a whole machine: hunts for a way that a process has out of its
 // domain, for a moment in which a refused act passes, and for a refusal outside of domains.
 
-#include "host/enforce/module/module.h"
-
 #include <fcntl.h>
-#include <gmock/gmock.h>
 #include <grp.h>
 #include <gtest/gtest.h>
 #include <linux/bpf.h>
@@ -22,161 +19,17 @@
 #include <algorithm>
 #include <cerrno>
 #include <csignal>
-#include <cstdio>
 #include <filesystem>
-#include <fstream>
-#include <functional>
 #include <random>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include "braxo/lib/exception.h"
-#include "enforce/domain_of.h"
 #include "policy/decision.h"
+#include "vm/module_fixture.h"
 
 namespace EnforceTest {
 namespace {
-
-using Enforce::Module;
-using Enforce::ModulePlan;
-using Enforce::PlanModule;
-using Policy::Level;
-
-constexpr unsigned int kDomain = 5;
-constexpr unsigned int kOther = 6;
-constexpr std::uint64_t kChroot = std::uint64_t{1} << CAP_SYS_CHROOT;
-constexpr std::uint64_t kAll = ~std::uint64_t{0};
-
-// 0 or the error number of an act.
-using Act = std::function<int()>;
-
-int ErrorOf(long result) { return result < 0 ? errno : 0; }
-
-int ChangeRoot() { return ErrorOf(chroot("/")); }
-
-int ResultOf(pid_t child) {
-  int status = 0;
-  waitpid(child, &status, 0);
-  return WIFEXITED(status) ? WEXITSTATUS(status) : 1000 + WTERMSIG(status);
-}
-
-int InChild(const Act& act) {
-  const pid_t child = fork();
-  if (child == 0) _exit(act());
-  return ResultOf(child);
-}
-
-// A process that does something when it is told, any number of times.
-class Worker {
- public:
-  explicit Worker(const Act& act) {
-    EXPECT_EQ(pipe(orders), 0);
-    EXPECT_EQ(pipe(results), 0);
-    process = fork();
-    if (process == 0) Serve(act);
-    close(orders[0]);
-    close(results[1]);
-  }
-  ~Worker() {
-    close(orders[1]);
-    close(results[0]);
-    ResultOf(process);
-  }
-  Worker(const Worker&) = delete;
-  Worker& operator=(const Worker&) = delete;
-
-  pid_t Process() const { return process; }
-
-  int Do() const {
-    int result = -1;
-    EXPECT_EQ(write(orders[1], "", 1), 1);
-    EXPECT_EQ(read(results[0], &result, sizeof(result)), static_cast<ssize_t>(sizeof(result)));
-    return result;
-  }
-
- private:
-  [[noreturn]] void Serve(const Act& act) const {
-    close(orders[1]);
-    char order = 0;
-    while (read(orders[0], &order, 1) == 1) {
-      const int result = act();
-      if (write(results[1], &result, sizeof(result)) != sizeof(result)) break;
-    }
-    _exit(0);
-  }
-
-  int orders[2] = {};
-  int results[2] = {};
-  pid_t process = -1;
-};
-
-std::string MessageOf(const std::function<void()>& act) {
-  try {
-    act();
-  } catch (const Braxo::Lib::BraxoException& exception) {
-    return exception.what();
-  }
-  return "nothing was thrown";
-}
-
-bool KernelRunsPrograms() {
-  std::ifstream file("/sys/kernel/security/lsm");
-  const std::string modules{std::istreambuf_iterator<char>(file), {}};
-  return ("," + modules + ",").find(",bpf,") != std::string::npos;
-}
-
-// kDomain, with these rules.
-Policy::InstalledDomain Numbered(const std::vector<std::string>& rules) {
-  Policy::InstalledDomain domain = DomainOf(rules);
-  domain.id = kDomain;
-  return domain;
-}
-
-class ModuleTest : public testing::Test {
- protected:
-  void SetUp() override {
-    if (!KernelRunsPrograms()) GTEST_SKIP() << "bpf is not among this kernel's security modules";
-    module = Module::FindRunning();
-    if (!module) module = Module::Start();
-    module->Publish(Granting(kChroot), 1);
-  }
-  static void TearDownTestSuite() { Module::Stop(); }
-
-  // To load it takes most of the time, so it is done by tests of what it takes with it.
-  void Restart() {
-    Module::Stop();
-    module = Module::Start();
-  }
-
-  // kDomain may use these capabilities and kOther all. No check keeps anybody from anything.
-  static ModulePlan Granting(std::uint64_t capabilities, Level level = Level::kEnforcing) {
-    Policy::InstalledDomain domain;
-    domain.id = kDomain;
-    domain.level = level;
-    Policy::InstalledDomain other;
-    other.id = kOther;
-    ModulePlan plan = PlanModule({domain, other}, CAP_LAST_CAP);
-    plan[0].rules.capabilities = capabilities;
-    plan[1].rules.capabilities = kAll;
-    return plan;
-  }
-
-  // What comes of an act in a domain.
-  int In(unsigned int domain, const Act& act) {
-    const Worker worker(act);
-    module->Place(worker.Process(), domain);
-    return worker.Do();
-  }
-
-  // The domain refuses it, and outside it works.
-  void ExpectRefused(const Act& act) {
-    EXPECT_EQ(In(kDomain, act), EPERM);
-    EXPECT_EQ(InChild(act), 0);
-  }
-
-  std::optional<Module> module;
-};
 
 // ---- Capabilities and levels
 

@@ -28,6 +28,8 @@ enum { kCheckFamily, kCheckType, kCheckPrctl, kCheckIoctl, kModuleChecks };
 
 enum { kMostModuleRanges = 32 };
 
+enum { kBytesOfEvents = 1 << 18 };
+
 // Both ends included.
 struct ModuleRange {
   __u32 first;
@@ -47,6 +49,25 @@ struct ModuleRules {
 
 struct ModuleTask {
   __u32 domain;
+};
+
+// What rules are about, and what no rule grants.
+enum {
+  kActUseCapability,  // value: its number
+  kActPassValue,      // detail: the check; value: what was passed
+  kActReachModule,    // of self-protection
+};
+
+// What was refused, or passed in a permissive domain where an enforcing one would have refused it.
+struct ModuleEvent {
+  __u64 time;   // in nanoseconds since the machine was started
+  __u64 value;  // by the act
+  __u32 process;
+  __u32 domain;
+  __u32 act;
+  __u32 detail;  // by the act
+  __u32 isRefused;
+  char program[16];
 };
 
 struct ModuleRefusals {

@@ -39,7 +39,7 @@ struct NamedMap {
 constexpr std::array kMaps = {
     NamedMap{"domains", &ModuleMaps::domains},       NamedMap{"rules", &ModuleMaps::rules},
     NamedMap{"tasks", &ModuleMaps::tasks},           NamedMap{"refusals", &ModuleMaps::refusals},
-    NamedMap{"generation", &ModuleMaps::generation},
+    NamedMap{"generation", &ModuleMaps::generation}, NamedMap{"events", &ModuleMaps::events},
 };
 
 struct Destroy {

@@ -17,6 +17,7 @@ struct ModuleMaps {
   FileDescriptor tasks;
   FileDescriptor refusals;
   FileDescriptor generation;
+  FileDescriptor events;
   std::uint64_t* words = nullptr;  // of the domains, as the programs see them
 
   ModuleMaps() = default;

@@ -13,5 +13,5 @@ int BPF_PROG(use_capability, const struct cred* cred, struct user_namespace* spa
   if (granted && level_of(word) != kLevelAbsent && granted->capabilities >> (capability & 63) & 1)
     return 0;
   if (options & CAP_OPT_NOAUDIT) return is_enforced(level_of(word)) ? -EPERM : 0;
-  return refuse(task->domain, level_of(word));
+  return refuse(task->domain, level_of(word), act(kActUseCapability, 0, capability));
 }

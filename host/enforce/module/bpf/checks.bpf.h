@@ -18,7 +18,7 @@ static __always_inline int check_value(int check, __u32 value) {
   __u64 word = word_of(task->domain);
   struct ModuleRules* granted = rules_of(word);
   if (granted && level_of(word) != kLevelAbsent && passes(&granted->checks[check], value)) return 0;
-  return refuse(task->domain, level_of(word));
+  return refuse(task->domain, level_of(word), act(kActPassValue, check, value));
 }
 
 SEC("lsm/socket_create")

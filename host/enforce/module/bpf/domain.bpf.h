@@ -48,6 +48,24 @@ struct {
   __uint(max_entries, 1);
 } generation SEC(".maps");
 
+// For whoever reads it. What there is no room for is only counted.
+struct {
+  __uint(type, BPF_MAP_TYPE_RINGBUF);
+  __uint(max_entries, kBytesOfEvents);
+} events SEC(".maps");
+
+// What somebody asks for; its detail and value are of its kind.
+struct ModuleAct {
+  __u32 kind;
+  __u32 detail;
+  __u64 value;
+};
+
+static __always_inline struct ModuleAct act(__u32 kind, __u32 detail, __u64 value) {
+  struct ModuleAct asked = {kind, detail, value};
+  return asked;
+}
+
 // Nothing for who is in no domain.
 static __always_inline struct ModuleTask* task_of(struct task_struct* thread) {
   return bpf_task_storage_get(&tasks, thread->group_leader, 0, 0);
@@ -83,17 +101,33 @@ static __always_inline bool is_enforced(__u32 level) {
   return level != kLevelPermissive && level != kLevelDisabled;
 }
 
+static __always_inline void tell(__u32 domain, bool is_refused, struct ModuleAct asked) {
+  struct ModuleEvent* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
+  if (!event) return;
+  event->time = bpf_ktime_get_boot_ns();
+  event->value = asked.value;
+  event->process = bpf_get_current_pid_tgid() >> 32;
+  event->domain = domain;
+  event->act = asked.kind;
+  event->detail = asked.detail;
+  event->isRefused = is_refused;
+  bpf_get_current_comm(event->program, sizeof(event->program));
+  bpf_ringbuf_submit(event, 0);
+}
+
 // What comes of an act that the rules of a domain of this level refuse.
-static __always_inline int refuse(__u32 domain, __u32 level) {
+static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct asked) {
   if (level == kLevelDisabled) return 0;
   count(domain, is_enforced(level));
+  tell(domain, is_enforced(level), asked);
   return is_enforced(level) ? -EPERM : 0;
 }
 
 // What no rule can grant to who is in a domain.
 static __always_inline int refuse_in_any_domain(void) {
   struct ModuleTask* task = current_task();
-  return task ? refuse(task->domain, level_of(word_of(task->domain))) : 0;
+  if (!task) return 0;
+  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
 }
 
 #endif

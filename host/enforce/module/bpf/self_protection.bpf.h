@@ -33,7 +33,7 @@ static __always_inline int protect_process(struct task_struct* process) {
   if (!task) return 0;
   struct ModuleTask* other = task_of(process);
   if (other && other->domain == task->domain) return 0;
-  return refuse(task->domain, level_of(word_of(task->domain)));
+  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
 }
 
 SEC("lsm/ptrace_access_check")
