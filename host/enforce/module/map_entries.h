@@ -28,7 +28,10 @@ enum { kCheckFamily, kCheckType, kCheckPrctl, kCheckIoctl, kModuleChecks };
 
 enum { kMostModuleRanges = 32 };
 
-enum { kBytesOfEvents = 1 << 18 };
+enum { kBytesOfEvents = 1 << 20 };
+
+// What follows an event that is about a file: its path, which ends in a zero.
+enum { kBytesOfShortPath = 256, kBytesOfPath = 4096 };
 
 // Both ends included.
 struct ModuleRange {
@@ -51,21 +54,50 @@ struct ModuleTask {
   __u32 domain;
 };
 
-// What rules are about, and what no rule grants.
+// What rules are about, and what no rule grants. Of files the event has the label, and the path
+// where the hook knows it; of those that are made, the label of the directory and the path of the
+// entry.
 enum {
   kActUseCapability,  // value: its number
   kActPassValue,      // detail: the check; value: what was passed
   kActReachModule,    // of self-protection
+  kActUseFile,        // detail: bits of kUse..., all that was asked for at once
+  kActMakeFile,       // detail: kMake...
+  kActMakeSocket,     // detail: kSocket..., of a unix socket that has a path
+  kActCall,           // value: the number of the system call, of this machine's own architecture
+  kActEnter,          // value: the domain; the label and the path are the program's
+  kModuleActs,
 };
+
+// Ways to use a file, as bits.
+enum {
+  kUseRead = 1 << 0,
+  kUseWrite = 1 << 1,
+  kUseExecute = 1 << 2,
+  kUseList = 1 << 3,
+  kUseRemove = 1 << 4,
+  kUseTruncate = 1 << 5,
+};
+
+enum { kMakeRegular, kMakeDirectory, kMakeSymlink, kMakeFifo, kMakeCharDevice, kMakeBlockDevice };
+
+enum { kSocketStream, kSocketDatagram, kSocketSeqpacket };
+
+// Labels are numbered from 2 on.
+enum { kNoModuleLabel };
 
 // What was refused, or passed in a permissive domain where an enforcing one would have refused it.
 struct ModuleEvent {
-  __u64 time;   // in nanoseconds since the machine was started
-  __u64 value;  // by the act
+  __u64 time;     // in nanoseconds since the machine was started
+  __u64 started;  // when the process was: who has its number and started then is the same
+  __u64 value;    // by the act
   __u32 process;
+  __u32 parent;
+  __u32 user;
   __u32 domain;
   __u32 act;
   __u32 detail;  // by the act
+  __u32 label;   // of the file
   __u32 isRefused;
   char program[16];
 };
@@ -73,6 +105,7 @@ struct ModuleEvent {
 struct ModuleRefusals {
   __u64 refused;
   __u64 passed;  // which an enforcing domain would have refused
+  __u64 untold;  // of both, those that there was no room for among the events
 };
 
 #ifdef __cplusplus

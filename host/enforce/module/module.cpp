@@ -131,13 +131,6 @@ void Remove(const char* pins) {
     throw BraxoException(StrCat("the module: cannot remove ", pins, ": ", error.message()));
 }
 
-FileDescriptor OpenPinned(const char* name) {
-  const std::string path = StrCat(kModulePins, "/", name);
-  FileDescriptor map(bpf_obj_get(path.c_str()));
-  Require(map.IsOpen(), path.c_str());
-  return map;
-}
-
 }  // namespace
 
 Module::Module(std::unique_ptr<ModuleMaps> those) : maps(std::move(those)) {}
@@ -226,17 +219,7 @@ std::optional<unsigned int> Module::DomainOf(pid_t process) const {
 
 ModuleRefusals Module::RefusalsIn(unsigned int domain) const {
   RequireDomain(domain);
-  const int processors = libbpf_num_possible_cpus();
-  Require(processors > 0, "cannot count processors");
-  std::vector<ModuleRefusals> counts(static_cast<std::size_t>(processors));
-  Require(bpf_map_lookup_elem(maps->refusals.Number(), &domain, counts.data()) == 0,
-          "cannot read what was refused");
-  ModuleRefusals all = {};
-  for (const auto& [refused, passed] : counts) {
-    all.refused += refused;
-    all.passed += passed;
-  }
-  return all;
+  return SumOf(maps->refusals, domain);
 }
 
 }  // namespace Enforce

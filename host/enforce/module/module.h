@@ -7,15 +7,11 @@
 #include <optional>
 
 #include "host/enforce/module/map_entries.h"
+#include "host/enforce/module/module_maps.h"
 #include "host/enforce/module/module_plan.h"
 #include "policy/level.h"
 
 namespace Enforce {
-
-// Where the programs and maps are kept while no process has them.
-inline constexpr const char* kModulePins = "/sys/fs/bpf/secpolicy";
-
-struct ModuleMaps;
 
 // The module: programs that the kernel runs for every process, and what they have been told. They
 // stay until they are stopped or the machine is, whether anybody has this object or not. Everything

@@ -1,6 +1,7 @@
 #include "host/enforce/module/module_maps.h"
 
 #include <bpf/bpf.h>
+#include <bpf/libbpf.h>
 #include <sys/mman.h>
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -8,6 +9,7 @@
 #include <atomic>
 #include <cerrno>
 #include <cstring>
+#include <vector>
 
 #include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
@@ -37,6 +39,30 @@ void ThrowModuleError(const std::string& what) {
 
 void Require(bool isDone, const char* what) {
   if (!isDone) ThrowModuleError(what);
+}
+
+std::string PinOf(const char* name) { return StrCat(kModulePins, "/", name); }
+
+FileDescriptor OpenPinned(const char* name) {
+  const std::string path = PinOf(name);
+  FileDescriptor map(bpf_obj_get(path.c_str()));
+  Require(map.IsOpen(), path.c_str());
+  return map;
+}
+
+ModuleRefusals SumOf(const FileDescriptor& refusals, unsigned int domain) {
+  const int processors = libbpf_num_possible_cpus();
+  Require(processors > 0, "cannot count processors");
+  std::vector<ModuleRefusals> counts(static_cast<std::size_t>(processors));
+  Require(bpf_map_lookup_elem(refusals.Number(), &domain, counts.data()) == 0,
+          "cannot read what was refused");
+  ModuleRefusals all = {};
+  for (const ModuleRefusals& one : counts) {
+    all.refused += one.refused;
+    all.passed += one.passed;
+    all.untold += one.untold;
+  }
+  return all;
 }
 
 ModuleMaps::~ModuleMaps() {

@@ -36,6 +36,18 @@ struct ModuleMaps {
   void Place(pid_t process, unsigned int domain) const;
 };
 
+// Where programs and maps are kept while no process has them.
+inline constexpr const char* kModulePins = "/sys/fs/bpf/secpolicy";
+
+// The path of what is kept there by this name.
+std::string PinOf(const char* name);
+
+// Opens the map that is kept there. Throws where there is none.
+FileDescriptor OpenPinned(const char* name);
+
+// All that was counted in the map `refusals` for a domain.
+ModuleRefusals SumOf(const FileDescriptor& refusals, unsigned int domain);
+
 // Throws Braxo::Lib::BraxoException: "the module: WHAT: " and the system's text for errno.
 [[noreturn]] void ThrowModuleError(const std::string& what);
 

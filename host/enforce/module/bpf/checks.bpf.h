@@ -12,12 +12,16 @@ static __always_inline bool passes(struct ModuleCheck* check, __u32 value) {
 }
 
 // Of a domain that there is not, no value passes.
+static __always_inline bool has_passed(__u64 word, int check, __u32 value) {
+  struct ModuleRules* granted = rules_of(word);
+  return granted && level_of(word) != kLevelAbsent && passes(&granted->checks[check], value);
+}
+
 static __always_inline int check_value(int check, __u32 value) {
   struct ModuleTask* task = current_task();
   if (!task) return 0;
   __u64 word = word_of(task->domain);
-  struct ModuleRules* granted = rules_of(word);
-  if (granted && level_of(word) != kLevelAbsent && passes(&granted->checks[check], value)) return 0;
+  if (has_passed(word, check, value)) return 0;
   return refuse(task->domain, level_of(word), act(kActPassValue, check, value));
 }
 
@@ -37,7 +41,12 @@ int BPF_PROG(use_prctl, int option, unsigned long first, unsigned long second, u
 
 SEC("lsm/file_ioctl")
 int BPF_PROG(use_ioctl, struct file* file, unsigned int request, unsigned long argument) {
-  return check_value(kCheckIoctl, request);
+  struct ModuleTask* task = current_task();
+  if (!task) return 0;
+  __u64 word = word_of(task->domain);
+  if (has_passed(word, kCheckIoctl, request)) return 0;
+  return refuse_path(task->domain, level_of(word), act(kActPassValue, kCheckIoctl, request),
+                     &file->f_path);
 }
 
 // Calls of programs for 32 bits, which older kernels hand to the other hook.

@@ -1,4 +1,4 @@
-// In which domain who is, and what is refused there.
+// In which domain who is, and which rules count there.
 #ifndef DOMAIN_BPF_H
 #define DOMAIN_BPF_H
 
@@ -35,36 +35,11 @@ struct {
 } tasks SEC(".maps");
 
 struct {
-  __uint(type, BPF_MAP_TYPE_PERCPU_ARRAY);
-  __type(key, __u32);
-  __type(value, struct ModuleRefusals);
-  __uint(max_entries, kDomainEntries);
-} refusals SEC(".maps");
-
-struct {
   __uint(type, BPF_MAP_TYPE_ARRAY);
   __type(key, __u32);
   __type(value, __u64);
   __uint(max_entries, 1);
 } generation SEC(".maps");
-
-// For whoever reads it. What there is no room for is only counted.
-struct {
-  __uint(type, BPF_MAP_TYPE_RINGBUF);
-  __uint(max_entries, kBytesOfEvents);
-} events SEC(".maps");
-
-// What somebody asks for; its detail and value are of its kind.
-struct ModuleAct {
-  __u32 kind;
-  __u32 detail;
-  __u64 value;
-};
-
-static __always_inline struct ModuleAct act(__u32 kind, __u32 detail, __u64 value) {
-  struct ModuleAct asked = {kind, detail, value};
-  return asked;
-}
 
 // Nothing for who is in no domain.
 static __always_inline struct ModuleTask* task_of(struct task_struct* thread) {
@@ -88,46 +63,8 @@ static __always_inline struct ModuleRules* rules_of(__u64 word) {
   return bpf_map_lookup_elem(&rules, &entry);
 }
 
-static __always_inline void count(__u32 domain, bool is_refused) {
-  struct ModuleRefusals* counts = bpf_map_lookup_elem(&refusals, &domain);
-  if (!counts) return;
-  if (is_refused)
-    counts->refused++;
-  else
-    counts->passed++;
-}
-
 static __always_inline bool is_enforced(__u32 level) {
   return level != kLevelPermissive && level != kLevelDisabled;
-}
-
-static __always_inline void tell(__u32 domain, bool is_refused, struct ModuleAct asked) {
-  struct ModuleEvent* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
-  if (!event) return;
-  event->time = bpf_ktime_get_boot_ns();
-  event->value = asked.value;
-  event->process = bpf_get_current_pid_tgid() >> 32;
-  event->domain = domain;
-  event->act = asked.kind;
-  event->detail = asked.detail;
-  event->isRefused = is_refused;
-  bpf_get_current_comm(event->program, sizeof(event->program));
-  bpf_ringbuf_submit(event, 0);
-}
-
-// What comes of an act that the rules of a domain of this level refuse.
-static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct asked) {
-  if (level == kLevelDisabled) return 0;
-  count(domain, is_enforced(level));
-  tell(domain, is_enforced(level), asked);
-  return is_enforced(level) ? -EPERM : 0;
-}
-
-// What no rule can grant to who is in a domain.
-static __always_inline int refuse_in_any_domain(void) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
 }
 
 #endif

@@ -9,6 +9,18 @@
 
 struct task_struct {
   struct task_struct* group_leader;
+  struct task_struct* real_parent;
+  __s32 tgid;
+  __u64 start_boottime;
+};
+
+struct path {
+  struct vfsmount* mnt;
+  struct dentry* dentry;
+};
+
+struct file {
+  struct path f_path;
 };
 
 struct super_block {
@@ -23,7 +35,6 @@ struct inode {
 
 struct cred;
 struct dentry;
-struct file;
 struct linux_binprm;
 struct user_namespace;
 struct vfsmount;

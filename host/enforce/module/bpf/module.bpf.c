@@ -1,5 +1,5 @@
 // The programs that the kernel runs at its hooks, by what they are about.
-#include "domain.bpf.h"
+#include "refusal.bpf.h"
 
 #include "capabilities.bpf.h"
 #include "checks.bpf.h"

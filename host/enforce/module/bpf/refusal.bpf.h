@@ -1,0 +1,148 @@
+// What is refused in a domain, and who is told.
+#ifndef REFUSAL_BPF_H
+#define REFUSAL_BPF_H
+
+#include "domain.bpf.h"
+
+struct {
+  __uint(type, BPF_MAP_TYPE_PERCPU_ARRAY);
+  __type(key, __u32);
+  __type(value, struct ModuleRefusals);
+  __uint(max_entries, kDomainEntries);
+} refusals SEC(".maps");
+
+// For whoever reads it. What there is no room for is only counted.
+struct {
+  __uint(type, BPF_MAP_TYPE_RINGBUF);
+  __uint(max_entries, kBytesOfEvents);
+} events SEC(".maps");
+
+struct EventWithShortPath {
+  struct ModuleEvent event;
+  char path[kBytesOfShortPath];
+};
+
+struct EventWithPath {
+  struct ModuleEvent event;
+  char path[kBytesOfPath];
+};
+
+// What somebody asks for; its detail and value are of its kind.
+struct ModuleAct {
+  __u32 kind;
+  __u32 detail;
+  __u64 value;
+  __u32 label;  // of a file
+};
+
+static __always_inline struct ModuleAct act(__u32 kind, __u32 detail, __u64 value) {
+  struct ModuleAct asked = {kind, detail, value, kNoModuleLabel};
+  return asked;
+}
+
+static __always_inline struct ModuleAct act_on_file(__u32 kind, __u32 detail, __u32 label) {
+  struct ModuleAct asked = {kind, detail, 0, label};
+  return asked;
+}
+
+static __always_inline void describe(struct ModuleEvent* event, __u32 domain, __u32 level,
+                                     struct ModuleAct asked) {
+  struct task_struct* process = bpf_get_current_task_btf()->group_leader;
+  event->time = bpf_ktime_get_boot_ns();
+  event->started = process->start_boottime;
+  event->value = asked.value;
+  event->process = process->tgid;
+  event->parent = process->real_parent->tgid;
+  event->user = (__u32)bpf_get_current_uid_gid();
+  event->domain = domain;
+  event->act = asked.kind;
+  event->detail = asked.detail;
+  event->label = asked.label;
+  event->isRefused = is_enforced(level);
+  bpf_get_current_comm(event->program, sizeof(event->program));
+}
+
+static __always_inline bool tell(__u32 domain, __u32 level, struct ModuleAct asked) {
+  struct ModuleEvent* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
+  if (!event) return false;
+  describe(event, domain, level, asked);
+  bpf_ringbuf_submit(event, 0);
+  return true;
+}
+
+// Most paths are short, and then many events have room.
+static __always_inline bool tell_path(__u32 domain, __u32 level, struct ModuleAct asked,
+                                      struct path* path) {
+  struct EventWithShortPath* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
+  if (!event) return false;
+  if (bpf_d_path(path, event->path, sizeof(event->path)) > 0) {
+    describe(&event->event, domain, level, asked);
+    bpf_ringbuf_submit(event, 0);
+    return true;
+  }
+  bpf_ringbuf_discard(event, 0);
+  struct EventWithPath* longer = bpf_ringbuf_reserve(&events, sizeof(*longer), 0);
+  if (!longer) return false;
+  if (bpf_d_path(path, longer->path, sizeof(longer->path)) <= 0) longer->path[0] = 0;
+  describe(&longer->event, domain, level, asked);
+  bpf_ringbuf_submit(longer, 0);
+  return true;
+}
+
+// A path that is known already, of `length` bytes without its zero.
+static __always_inline bool tell_text(__u32 domain, __u32 level, struct ModuleAct asked,
+                                      const char* path, __u32 length) {
+  if (length < kBytesOfShortPath) {
+    struct EventWithShortPath* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
+    if (!event) return false;
+    bpf_probe_read_kernel_str(event->path, sizeof(event->path), path);
+    describe(&event->event, domain, level, asked);
+    bpf_ringbuf_submit(event, 0);
+    return true;
+  }
+  struct EventWithPath* longer = bpf_ringbuf_reserve(&events, sizeof(*longer), 0);
+  if (!longer) return false;
+  bpf_probe_read_kernel_str(longer->path, sizeof(longer->path), path);
+  describe(&longer->event, domain, level, asked);
+  bpf_ringbuf_submit(longer, 0);
+  return true;
+}
+
+// What comes of an act that the rules of a domain of this level refuse.
+static __always_inline int count(__u32 domain, __u32 level, bool is_told) {
+  struct ModuleRefusals* counts = bpf_map_lookup_elem(&refusals, &domain);
+  if (counts) {
+    counts->refused += is_enforced(level);
+    counts->passed += !is_enforced(level);
+    counts->untold += !is_told;
+  }
+  return is_enforced(level) ? -EPERM : 0;
+}
+
+static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct asked) {
+  if (level == kLevelDisabled) return 0;
+  return count(domain, level, tell(domain, level, asked));
+}
+
+// The same for a file, in those hooks that may ask for its path: those that the kernel lets sleep.
+static __always_inline int refuse_path(__u32 domain, __u32 level, struct ModuleAct asked,
+                                       struct path* path) {
+  if (level == kLevelDisabled) return 0;
+  return count(domain, level, tell_path(domain, level, asked, path));
+}
+
+// The same for a path that is known already.
+static __always_inline int refuse_text(__u32 domain, __u32 level, struct ModuleAct asked,
+                                       const char* path, __u32 length) {
+  if (level == kLevelDisabled) return 0;
+  return count(domain, level, tell_text(domain, level, asked, path, length));
+}
+
+// What no rule can grant to who is in a domain.
+static __always_inline int refuse_in_any_domain(void) {
+  struct ModuleTask* task = current_task();
+  if (!task) return 0;
+  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
+}
+
+#endif
