@@ -107,6 +107,10 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
   return fates;
 }
 
+std::string_view NameOfCheck(unsigned int check) {
+  return check < kChecks.size() ? kChecks[check] : std::string_view();
+}
+
 std::string Dump(const ModulePlan& plan) {
   std::string text;
   for (const ModuleDomain& domain : plan) {

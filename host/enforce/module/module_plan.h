@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "host/enforce/coverage.h"
@@ -26,6 +27,9 @@ ModulePlan PlanModule(const std::vector<Policy::InstalledDomain>& domains,
 // What becomes of the rules of a domain, in order, where the module alone keeps them.
 std::vector<RuleFate> FatesByModule(const Policy::InstalledDomain& domain,
                                     unsigned int lastCapability);
+
+// The word of a check, by its place in the map; empty when there is none.
+std::string_view NameOfCheck(unsigned int check);
 
 // The plan for people: a line for each domain, and one for each check that not all values pass.
 std::string Dump(const ModulePlan& plan);
