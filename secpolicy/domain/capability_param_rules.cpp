@@ -8,11 +8,11 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_CapabilityParamRule;
 
-constexpr std::size_t kTokenCount = 4;
-constexpr std::size_t kTokenCountWithoutSecondParam = 3;
+constexpr std::size_t kMostTokens = 4;
+constexpr std::size_t kFewestTokens = 3;
 
 void TakeParamCheck(TeskAccess_CapabilityParamRule& rule, RuleLine& line) {
-  line.RequireCount(kTokenCountWithoutSecondParam, kTokenCount);
+  line.RequireCount(kFewestTokens, kMostTokens);
   rule.paramCheck = line.Take();
   rule.firstParam = line.Take();
   if (line.Left() > 1) rule.secondParam = line.Take();

@@ -7,7 +7,7 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_CapabilityRule;
 
-constexpr std::array kTokens = {
+constexpr std::array kCapabilityTokens = {
     RuleToken{&TeskAccess_CapabilityRule::capability,
               TeskCtl::Security::TESKACCESS_KEYWORD_CAPABILITY},
 };
@@ -17,7 +17,7 @@ constexpr std::array kTokens = {
 void CapabilityRules::AddRule(unsigned int line, const std::string& domainName,
                               unsigned int domainId, std::queue<std::string> args,
                               TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kCapabilityTokens);
 }
 
 void CapabilityRules::Set(TeskAccessInterfaceImpl& access) {
@@ -28,6 +28,6 @@ void CapabilityRules::ReadSystemRules(unsigned int domainId, TeskAccessInterface
   access.GetCapabilityRules(domainId, rules);
 }
 
-void CapabilityRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
+void CapabilityRules::PrintRules() { PrintEach(keyword, rules, kCapabilityTokens); }
 
 }  // namespace SecPolicy

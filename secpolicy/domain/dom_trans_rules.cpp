@@ -7,12 +7,12 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_DomTransRule;
 
-constexpr std::size_t kTokenCount = 4;
+constexpr std::size_t kTransitionTokenCount = 4;
 
 // The target is looked up before the rest of the line is read: a line that names an unknown domain
 // says so, whatever else is wrong with it.
 void TakeTransition(TeskAccess_DomTransRule& rule, RuleLine& line) {
-  line.RequireCount(kTokenCount);
+  line.RequireCount(kTransitionTokenCount);
   rule.label = line.Take();
   rule.targetDomain = line.Take();
   rule.targetDomainId = line.FindDomain(rule.targetDomain);

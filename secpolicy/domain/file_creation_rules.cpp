@@ -7,7 +7,7 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_FileCreationRule;
 
-constexpr std::array kTokens = {
+constexpr std::array kFileCreationTokens = {
     RuleToken{&TeskAccess_FileCreationRule::label, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL},
     RuleToken{&TeskAccess_FileCreationRule::secondLabel,
               TeskCtl::Security::TESKACCESS_KEYWORD_LABEL},
@@ -20,7 +20,7 @@ constexpr std::array kTokens = {
 void FileCreationRules::AddRule(unsigned int line, const std::string& domainName,
                                 unsigned int domainId, std::queue<std::string> args,
                                 TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kFileCreationTokens);
 }
 
 void FileCreationRules::Set(TeskAccessInterfaceImpl& access) {
@@ -31,6 +31,6 @@ void FileCreationRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfa
   access.GetFileCreationRules(domainId, rules);
 }
 
-void FileCreationRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
+void FileCreationRules::PrintRules() { PrintEach(keyword, rules, kFileCreationTokens); }
 
 }  // namespace SecPolicy

@@ -7,7 +7,7 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_ObjectAccessRule;
 
-constexpr std::array kTokens = {
+constexpr std::array kObjectAccessTokens = {
     RuleToken{&TeskAccess_ObjectAccessRule::label, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL},
     RuleToken{&TeskAccess_ObjectAccessRule::accessKind,
               TeskCtl::Security::TESKACCESS_KEYWORD_OBJECT_ACCESS},
@@ -18,7 +18,7 @@ constexpr std::array kTokens = {
 void ObjectAccessRules::AddRule(unsigned int line, const std::string& domainName,
                                 unsigned int domainId, std::queue<std::string> args,
                                 TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kObjectAccessTokens);
 }
 
 void ObjectAccessRules::Set(TeskAccessInterfaceImpl& access) {
@@ -29,6 +29,6 @@ void ObjectAccessRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfa
   access.GetObjectAccessRules(domainId, rules);
 }
 
-void ObjectAccessRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
+void ObjectAccessRules::PrintRules() { PrintEach(keyword, rules, kObjectAccessTokens); }
 
 }  // namespace SecPolicy

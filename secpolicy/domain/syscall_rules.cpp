@@ -7,7 +7,7 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_SyscallRule;
 
-constexpr std::array kTokens = {
+constexpr std::array kSyscallTokens = {
     RuleToken{&TeskAccess_SyscallRule::syscall, TeskCtl::Security::TESKACCESS_KEYWORD_SYSCALL},
 };
 
@@ -15,7 +15,7 @@ constexpr std::array kTokens = {
 
 void SyscallRules::AddRule(unsigned int line, const std::string& domainName, unsigned int domainId,
                            std::queue<std::string> args, TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kSyscallTokens);
 }
 
 void SyscallRules::Set(TeskAccessInterfaceImpl& access) {
@@ -26,6 +26,6 @@ void SyscallRules::ReadSystemRules(unsigned int domainId, TeskAccessInterfaceImp
   access.GetSyscallRules(domainId, rules);
 }
 
-void SyscallRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
+void SyscallRules::PrintRules() { PrintEach(keyword, rules, kSyscallTokens); }
 
 }  // namespace SecPolicy

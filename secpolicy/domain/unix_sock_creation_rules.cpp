@@ -7,7 +7,7 @@ namespace {
 
 using TeskCtl::Security::TeskAccess_UnixSockCreationRule;
 
-constexpr std::array kTokens = {
+constexpr std::array kUnixSockTokens = {
     RuleToken{&TeskAccess_UnixSockCreationRule::label, TeskCtl::Security::TESKACCESS_KEYWORD_LABEL},
     RuleToken{&TeskAccess_UnixSockCreationRule::sockKind,
               TeskCtl::Security::TESKACCESS_KEYWORD_UNIX_SOCK_CREATION},
@@ -18,7 +18,7 @@ constexpr std::array kTokens = {
 void UnixSockCreationRules::AddRule(unsigned int line, const std::string& domainName,
                                     unsigned int domainId, std::queue<std::string> args,
                                     TeskAccessInterfaceImpl& access) {
-  AppendRule(rules, {line, domainName, domainId, args, access}, kTokens);
+  AppendRule(rules, {line, domainName, domainId, args, access}, kUnixSockTokens);
 }
 
 void UnixSockCreationRules::Set(TeskAccessInterfaceImpl& access) {
@@ -30,6 +30,6 @@ void UnixSockCreationRules::ReadSystemRules(unsigned int domainId,
   access.GetUnixSockCreationRules(domainId, rules);
 }
 
-void UnixSockCreationRules::PrintRules() { PrintEach(keyword, rules, kTokens); }
+void UnixSockCreationRules::PrintRules() { PrintEach(keyword, rules, kUnixSockTokens); }
 
 }  // namespace SecPolicy

@@ -7,7 +7,7 @@
 namespace SecPolicy {
 namespace {
 
-constexpr char kFailure[] = "Failure in file labels policy";
+constexpr char kFileLabelFailure[] = "Failure in file labels policy";
 
 bool ParseFiles(const std::string& dir, FileLabelPolicy& policy, TeskAccessInterfaceImpl& access,
                 PolicyObserver& observer) {
@@ -46,10 +46,10 @@ void LoadPolicyFileLabels(const std::string& dir, TeskAccessInterfaceImpl& acces
   // What was read before a bad line is applied too.
   if (!CarryOn(observer, [&] { policy.SetFileLabels(access, observer); })) {
     ReportError("Error in setting some file labels.", observer);
-    RaiseError(kFailure);
+    RaiseError(kFileLabelFailure);
   }
   SecpolicyInfo("Set all file labels");
-  if (!parsed) RaiseError(kFailure);
+  if (!parsed) RaiseError(kFileLabelFailure);
 }
 
 }  // namespace SecPolicy

@@ -8,7 +8,7 @@
 namespace SecPolicy {
 namespace {
 
-constexpr char kFailure[] = "Failure in object policy";
+constexpr char kObjectFailure[] = "Failure in object policy";
 
 bool ParseFiles(const std::string& dir, ObjectPolicy& policy, PolicyObserver& observer) {
   std::map<std::string, std::string> files;
@@ -41,10 +41,10 @@ void LoadPolicyObjects(const std::string& dir, TeskAccessInterfaceImpl& access,
     TellFailure(dir, observer, [&] { policy.SetObjects(access); });
   } catch (const Braxo::Lib::BraxoException&) {
     ReportError("Error in defining some objects", observer);
-    RaiseError(kFailure);
+    RaiseError(kObjectFailure);
   }
   SecpolicyInfo("Objects defined and obsolete objects removed");
-  if (!parsed) RaiseError(kFailure);
+  if (!parsed) RaiseError(kObjectFailure);
 }
 
 void DisplayPolicyObjects(TeskAccessInterfaceImpl& access) {

@@ -182,7 +182,7 @@ void SetSocket(Inquiry& inquiry) {
   if (isAdministered) inquiry.AskCapability("cap_net_admin");
 }
 
-void MakeSocket(Inquiry& inquiry) {
+void AskForSocket(Inquiry& inquiry) {
   const std::uint32_t family = inquiry.Word(0);
   constexpr std::uint32_t kTypes = 0xff;
   const bool isInternet = family == AF_INET || family == AF_INET6;
@@ -207,7 +207,7 @@ void MakeNode(Inquiry& inquiry, mode_t mode) {
 }
 
 // The first `count` arguments are identities; -1 leaves one as it is.
-void TakeIdentities(Inquiry& inquiry, int count, const Identity& own, const char* capability) {
+void AskForIdentities(Inquiry& inquiry, int count, const Identity& own, const char* capability) {
   for (int argument = 0; argument < count; ++argument) {
     const std::uint32_t wanted = inquiry.Word(argument);
     if (wanted != kUnchanged && !own.Has(wanted)) return inquiry.AskCapability(capability);
@@ -215,24 +215,24 @@ void TakeIdentities(Inquiry& inquiry, int count, const Identity& own, const char
 }
 
 template <int count>
-void TakeUsers(Inquiry& inquiry) {
-  TakeIdentities(inquiry, count, inquiry.Actor().user, "cap_setuid");
+void AskForUsers(Inquiry& inquiry) {
+  AskForIdentities(inquiry, count, inquiry.Actor().user, "cap_setuid");
 }
 
 template <int count>
-void TakeGroups(Inquiry& inquiry) {
-  TakeIdentities(inquiry, count, inquiry.Actor().group, "cap_setgid");
+void AskForGroups(Inquiry& inquiry) {
+  AskForIdentities(inquiry, count, inquiry.Actor().group, "cap_setgid");
 }
 
-using Reader = void (*)(Inquiry&);
+using PrivilegedCall = void (*)(Inquiry&);
 
 // Calls that take one, or do for some of their arguments.
-const std::map<std::string_view, Reader>& Readers() {
+const std::map<std::string_view, PrivilegedCall>& PrivilegedCalls() {
   constexpr auto kHere = AT_FDCWD;
   constexpr auto kKept = LastLink::kKept;
   constexpr auto kFollowed = LastLink::kFollowed;
   using I = Inquiry;
-  static const std::map<std::string_view, Reader> readers = {
+  static const std::map<std::string_view, PrivilegedCall> calls = {
       {"acct", [](I& i) { i.AskCapability("cap_sys_pacct"); }},
       {"adjtimex", [](I& i) { AdjustTime(i, 0); }},
       {"chmod", [](I& i) { Chmod(i, i.PlaceOf(kHere, 0, kFollowed)); }},
@@ -269,22 +269,22 @@ const std::map<std::string_view, Reader>& Readers() {
       {"rt_tgsigqueueinfo", [](I& i) { AskSignal(i, i.Number(1)); }},
       {"sched_setscheduler", SetScheduler},
       {"setdomainname", [](I& i) { i.AskCapability("cap_sys_admin"); }},
-      {"setfsgid", TakeGroups<1>},
-      {"setfsuid", TakeUsers<1>},
-      {"setgid", TakeGroups<1>},
+      {"setfsgid", AskForGroups<1>},
+      {"setfsuid", AskForUsers<1>},
+      {"setgid", AskForGroups<1>},
       {"setgroups", [](I& i) { i.AskCapability("cap_setgid"); }},
       {"sethostname", [](I& i) { i.AskCapability("cap_sys_admin"); }},
       {"setns", [](I& i) { i.AskCapability("cap_sys_admin"); }},
       {"setpriority", SetPriority},
-      {"setregid", TakeGroups<2>},
-      {"setresgid", TakeGroups<3>},
-      {"setresuid", TakeUsers<3>},
-      {"setreuid", TakeUsers<2>},
+      {"setregid", AskForGroups<2>},
+      {"setresgid", AskForGroups<3>},
+      {"setresuid", AskForUsers<3>},
+      {"setreuid", AskForUsers<2>},
       {"setrlimit", [](I& i) { AskLimit(i, i.Word(0), i.Address(1)); }},
       {"setsockopt", SetSocket},
       {"settimeofday", [](I& i) { i.AskCapability("cap_sys_time"); }},
-      {"setuid", TakeUsers<1>},
-      {"socket", MakeSocket},
+      {"setuid", AskForUsers<1>},
+      {"socket", AskForSocket},
       {"swapoff", [](I& i) { i.AskCapability("cap_sys_admin"); }},
       {"swapon", [](I& i) { i.AskCapability("cap_sys_admin"); }},
       {"tgkill", [](I& i) { AskSignal(i, i.Number(1)); }},
@@ -296,7 +296,7 @@ const std::map<std::string_view, Reader>& Readers() {
       {"utimes", [](I& i) { SetTimes(i, i.PlaceOf(kHere, 0, kFollowed), 1); }},
       {"vhangup", [](I& i) { i.AskCapability("cap_sys_tty_config"); }},
   };
-  return readers;
+  return calls;
 }
 
 }  // namespace
@@ -321,11 +321,11 @@ void AskOwner(Inquiry& inquiry, const Place& place) {
   if (!IsOwner(inquiry, FactsOf(place))) inquiry.AskCapability("cap_fowner");
 }
 
-bool TakesCapability(std::string_view call) { return Readers().contains(call); }
+bool TakesCapability(std::string_view call) { return PrivilegedCalls().contains(call); }
 
 void AskCapabilities(Inquiry& inquiry, std::string_view call) {
-  const auto reader = Readers().find(call);
-  if (reader != Readers().end()) reader->second(inquiry);
+  const auto reader = PrivilegedCalls().find(call);
+  if (reader != PrivilegedCalls().end()) reader->second(inquiry);
 }
 
 }  // namespace Enforce

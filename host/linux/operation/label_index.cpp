@@ -30,7 +30,7 @@ using Braxo::Misc::StrCat;
 using Enforce::IndexedRoot;
 using Enforce::LabelIndex;
 
-constexpr char kPurpose[] = "label index";
+constexpr char kIndexPurpose[] = "label index";
 constexpr char kAdvice[] = "Run \"secpolicy load\", which makes a new one";
 
 std::uint64_t RootDevice() {
@@ -40,7 +40,7 @@ std::uint64_t RootDevice() {
 }
 
 // Positive, and none that stands for something else.
-std::int64_t NewSerial() {
+std::int64_t NewIndexSerial() {
   std::int64_t serial = 0;
   if (getrandom(&serial, sizeof serial, 0) != sizeof serial) {
     ThrowErrno("Unable to number the label index");
@@ -55,7 +55,7 @@ LabelIndex ReadIndexOf(HostState& state) {
   if (isGone || state.LabelIndex() == kNeverLabelled) {
     throw HostError(ENOENT, StrCat("There is no label index ", file, ". ", kAdvice));
   }
-  RequirePrivateFile(file, kPurpose);
+  RequirePrivateFile(file, kIndexPurpose);
   LabelIndex index = LabelIndex::Read(file);
   const IndexedRoot wanted = {.device = RootDevice(),
                               .serial = static_cast<std::uint64_t>(state.LabelIndex())};
@@ -88,7 +88,7 @@ std::optional<std::vector<Enforce::LabelledPlace>> FindPlaces() {
 
 // Returns whether it is the one of the labels as they are.
 bool MakeIndex(HostState& state) {
-  const std::int64_t serial = NewSerial();
+  const std::int64_t serial = NewIndexSerial();
   Store& store = state.Database();
   const std::int64_t making = -serial;
   store.Run("UPDATE state SET label_index = ?1", making);

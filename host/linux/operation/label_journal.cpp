@@ -31,7 +31,7 @@ namespace {
 
 using Braxo::Misc::StrCat;
 
-constexpr char kPurpose[] = "journal of labels";
+constexpr char kJournalPurpose[] = "journal of labels";
 constexpr std::size_t kWrittenAtOnce = 1 << 16;
 
 // What a line of the journal begins with. The first line names the attribute; the files that follow
@@ -162,7 +162,7 @@ bool PutLineBack(JournalReader& reader, Undoing& undoing) {
 // Empty when there is none. Throws EWOULDBLOCK when another process has it.
 std::optional<LabelJournal> LabelJournal::TakeIfThere(const std::string& path) {
   if (access(path.c_str(), F_OK) != 0 && errno == ENOENT) return std::nullopt;
-  RequirePrivateFile(path, kPurpose);
+  RequirePrivateFile(path, kJournalPurpose);
   Descriptor file(open(path.c_str(), O_RDWR | O_NOFOLLOW | O_CLOEXEC));
   if (!file.IsOpen()) ThrowErrno("Unable to open the journal of labels ", path);
   if (flock(file.Number(), LOCK_EX | LOCK_NB) != 0) {
@@ -185,7 +185,7 @@ bool LabelJournal::IsStillThere() const {
 LabelJournal::LabelJournal(const std::string& statePath) : file(-1) {
   const std::string wanted = JournalBeside(statePath);
   for (;;) {
-    PreparePrivateFile(wanted, kPurpose);
+    PreparePrivateFile(wanted, kJournalPurpose);
     auto taken = TakeIfThere(wanted);
     if (!taken) continue;
     taken->PutBack();

@@ -48,7 +48,7 @@ std::string CurrentText(const std::string& serial) {
 // What the mark is while plans are in the making: it is the text of no number, so no plan counts.
 std::string MakingText(const std::string& serial) { return StrCat("making ", CurrentText(serial)); }
 
-std::string NewSerial() {
+std::string NewPlanSerial() {
   std::uint64_t serial = 0;
   if (getrandom(&serial, sizeof serial, 0) != sizeof serial) {
     ThrowErrno("Unable to number the plans");
@@ -149,7 +149,7 @@ std::optional<std::string> FindSerial() {
 // Whoever commits removes the mark first. It is written while nobody can commit, so that it stands
 // for the state as the last commit has left it, and no commit that is under way removes it.
 PlansInTheMaking::PlansInTheMaking()
-    : state(HostState::Current().shared_from_this()), serial(NewSerial()) {
+    : state(HostState::Current().shared_from_this()), serial(NewPlanSerial()) {
   PlanDirectory directory;
   const Transaction others(state->Database());
   directory.WriteCurrent(MakingText(serial));

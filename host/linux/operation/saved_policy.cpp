@@ -28,7 +28,7 @@ using Braxo::Misc::StrCat;
 namespace LinuxHost {
 namespace {
 
-constexpr char kPurpose[] = "saved state";
+constexpr char kSavedPurpose[] = "saved state";
 
 // A file that takes its name only when it is complete.
 class FileInTheMaking {
@@ -196,7 +196,7 @@ void PutTablesBack(Store& store) {
 void SaveState(const std::string& from, const std::string& to, bool replace) {
   MakeDirectory(std::filesystem::path(to).parent_path());
   FileInTheMaking file(to);
-  PreparePrivateFile(file.Path(), kPurpose);
+  PreparePrivateFile(file.Path(), kSavedPurpose);
   CopyDatabase(from, CopyOf::kState, file.Path());
   Seal(file.Path());
   const std::string damage = FindBrokenSeal(file.Path());

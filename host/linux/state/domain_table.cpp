@@ -19,9 +19,9 @@ using TeskCtl::Security::TeskAccessKsi_DefaultDom;
 namespace LinuxHost {
 namespace {
 
-constexpr TextLimit kName = {.noun = "domain name",
-                             .whenEmpty = "a domain name must not be empty",
-                             .maxSize = kMaxDomainName};
+constexpr TextLimit kDomainName = {.noun = "domain name",
+                                   .whenEmpty = "a domain name must not be empty",
+                                   .maxSize = kMaxDomainName};
 constexpr TextLimit kService = {.noun = "guest-communication service",
                                 .whenEmpty = "a guest-communication service must not be empty",
                                 .maxSize = 255};
@@ -155,7 +155,7 @@ unsigned int DomainTable::Create(const std::string& name, TeskAccessKsi_DefaultD
 
 unsigned int DomainTable::Insert(const std::string& name, TeskAccessKsi_DefaultDom defaultRules,
                                  bool createdAtRunTime) {
-  RequireText(name, kName);
+  RequireText(name, kDomainName);
   if (defaultRules != TeskCtl::Security::TESKACCESS_DEFAULT_DOM_NONE &&
       defaultRules != TeskCtl::Security::TESKACCESS_DEFAULT_DOM_CHECK_ACCESS) {
     throw HostError(EINVAL, StrCat("unknown default rules ", static_cast<int>(defaultRules),

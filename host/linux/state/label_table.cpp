@@ -16,7 +16,8 @@ using Braxo::Misc::StrCat;
 namespace LinuxHost {
 namespace {
 
-constexpr TextLimit kName = {.noun = "label", .whenEmpty = "a label needs a name", .maxSize = 255};
+constexpr TextLimit kLabelName = {
+    .noun = "label", .whenEmpty = "a label needs a name", .maxSize = 255};
 
 }  // namespace
 
@@ -58,7 +59,7 @@ std::map<std::string, long> LabelTable::All() {
 }
 
 void LabelTable::Add(const std::vector<std::string>& added) {
-  for (const auto& name : added) RequireText(name, kName);
+  for (const auto& name : added) RequireText(name, kLabelName);
   Transaction transaction(base.Database());
   base.Refresh();
   const std::vector<std::string> missing = Missing(added);

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <fstream>
 #include <iterator>
 #include <string_view>
@@ -129,6 +130,11 @@ std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
   }
   CheckEntries(run, dir, expected, skipped);
   return opened;
+}
+
+bool IsObjectLabel(CheckRun& run, const std::string& name) {
+  constexpr std::uint32_t kNoSuchLabel = 1;
+  return run.access.LookupLabel(name, TeskCtl::Security::TESKACCESS_LABEL_OBJECT) != kNoSuchLabel;
 }
 
 bool IsMissing(const std::string& path) {

@@ -31,7 +31,7 @@ struct NamedFile {
 };
 
 // A policy file that defines a domain.
-struct NamedDomain {
+struct DomainSource {
   const SourceFile* file = nullptr;
   std::string name;
   unsigned int id = 0;
@@ -88,6 +88,9 @@ std::vector<NamedFile> OpenPolicyFiles(CheckRun& run, const std::string& dir,
 void CheckEntries(CheckRun& run, const std::string& dir, const std::string& expected,
                   const Code& skipped);
 
+// True when an object has this name. Throws what the host throws.
+bool IsObjectLabel(CheckRun& run, const std::string& name);
+
 // True when there is surely nothing at `path`.
 bool IsMissing(const std::string& path);
 
@@ -106,9 +109,9 @@ void CheckFileLabels(CheckRun& run, const std::string& dir);
 
 // The steps of CheckDomains: defines the domains of the files, of which those are returned that the
 // host took; and checks the lines of a file.
-std::vector<NamedDomain> DefineDomains(CheckRun& run, const std::vector<NamedFile>& files,
-                                       const std::string& prefix);
-void CheckDomain(CheckRun& run, const NamedDomain& domain, const std::string& prefix);
+std::vector<DomainSource> DefineDomains(CheckRun& run, const std::vector<NamedFile>& files,
+                                        const std::string& prefix);
+void CheckDomain(CheckRun& run, const DomainSource& domain, const std::string& prefix);
 
 // Looks for domains that every host needs below `dir`, and for what nobody uses.
 void CheckUse(CheckRun& run, const std::string& dir);

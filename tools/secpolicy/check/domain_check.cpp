@@ -264,9 +264,9 @@ std::string DescribeRest(std::size_t files) {
 }  // namespace
 
 // Creates the domains in the scratch state, as a load does before it reads any file.
-std::vector<NamedDomain> DefineDomains(CheckRun& run, const std::vector<NamedFile>& files,
-                                       const std::string& prefix) {
-  std::vector<NamedDomain> domains;
+std::vector<DomainSource> DefineDomains(CheckRun& run, const std::vector<NamedFile>& files,
+                                        const std::string& prefix) {
+  std::vector<DomainSource> domains;
   for (std::size_t index = 0; index < files.size(); ++index) {
     const NamedFile& named = files[index];
     const std::string name = prefix + named.name;
@@ -289,7 +289,7 @@ std::vector<NamedDomain> DefineDomains(CheckRun& run, const std::vector<NamedFil
   return domains;
 }
 
-void CheckDomain(CheckRun& run, const NamedDomain& domain, const std::string& prefix) {
+void CheckDomain(CheckRun& run, const DomainSource& domain, const std::string& prefix) {
   // Partner domains are entered by the service that belongs to them.
   if (!prefix.empty()) run.enteredDomains.insert(domain.name);
   DomainCheck(run, *domain.file, domain.name, domain.id).CheckLines();
@@ -297,7 +297,7 @@ void CheckDomain(CheckRun& run, const NamedDomain& domain, const std::string& pr
 
 void CheckDomains(CheckRun& run, const DomainsDir& dir) {
   const std::vector<NamedFile> files = OpenPolicyFiles(run, dir.path, dir.expected);
-  for (const NamedDomain& domain : DefineDomains(run, files, dir.prefix)) {
+  for (const DomainSource& domain : DefineDomains(run, files, dir.prefix)) {
     CheckDomain(run, domain, dir.prefix);
   }
 }

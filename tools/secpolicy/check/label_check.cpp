@@ -16,9 +16,6 @@ namespace {
 
 using Braxo::Lib::BraxoException;
 using SecPolicy::FileLabel;
-using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
-
-constexpr std::uint32_t kNoSuchLabel = 1;
 
 struct LabelLine {
   const SourceFile* file;
@@ -54,7 +51,7 @@ void ReadLabels(CheckRun& run, const SourceFile& file, std::vector<LabelLine>& l
 bool CheckLabel(CheckRun& run, const LabelLine& line) {
   const auto& [path, label, recursive, policyFile, lineNumber] = line.label;
   run.usedLabels.insert(label);
-  if (run.access.LookupLabel(label, TESKACCESS_LABEL_OBJECT) != kNoSuchLabel) return true;
+  if (IsObjectLabel(run, label)) return true;
   run.diagnostics.Add(line.file->AtWord(Codes::kUnknownWord, line.line, 1,
                                         "Invalid label (" + label + ") for file " + path,
                                         HintForLabel(run, label)));

@@ -7,11 +7,10 @@ namespace SecPolicyCli {
 namespace {
 
 using Policy::WordKind;
-using enum Policy::WordKind;
 
 // Of the policy of tardisks, which no domain has.
 constexpr char kExceptionKeyword[] = "-E";
-constexpr std::array kExceptionWords = {kLabel, kDomain};
+constexpr std::array kExceptionWords = {WordKind::kLabel, WordKind::kDomain};
 constexpr LineForm kException = {.usage = "-E LABEL DOMAIN", .words = kExceptionWords};
 
 Vocabulary& VocabularyOf(CheckRun& run, WordKind kind) {
@@ -29,7 +28,7 @@ Hint Suggest(CheckRun& run, WordKind kind, const std::string& word) {
   constexpr char kCapabilityPrefix[] = "cap_";
   Vocabulary& table = VocabularyOf(run, kind);
   const std::string nearest = table.Nearest(word);
-  if (!nearest.empty() || kind != kCapability) return AskFor(nearest);
+  if (!nearest.empty() || kind != WordKind::kCapability) return AskFor(nearest);
   return AskFor(table.Nearest(kCapabilityPrefix + word));
 }
 
@@ -49,7 +48,7 @@ Hint SuggestOrList(CheckRun& run, WordKind kind, const std::string& word) {
 
 std::vector<std::string> WordsOf(CheckRun& run, WordKind kind) {
   std::vector<std::string> words;
-  if (kind == kDomain) {
+  if (kind == WordKind::kDomain) {
     for (const auto& [name, file] : run.domains) words.push_back(name);
   }
   const auto& table = Policy::FormOf(kind).table;
@@ -78,12 +77,12 @@ Hint HintForRule(CheckRun& run, const Code& code, const SourceFile::Words& words
   }
   if (index > form->words.size()) return "";
   const WordKind kind = form->words[index - 1];
-  if (kind == kLabel) return HintForLabel(run, words[index]);
+  if (kind == WordKind::kLabel) return HintForLabel(run, words[index]);
   return SuggestOrList(run, kind, words[index]);
 }
 
 Hint HintForLabel(CheckRun& run, const std::string& word) {
-  const Hint suggestion = Suggest(run, kLabel, word);
+  const Hint suggestion = Suggest(run, WordKind::kLabel, word);
   return suggestion.text.empty() ? "labels are declared in objects/" : suggestion;
 }
 

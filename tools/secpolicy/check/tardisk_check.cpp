@@ -7,14 +7,11 @@ namespace SecPolicyCli {
 namespace {
 
 using Braxo::Lib::BraxoException;
-using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
-
-constexpr std::uint32_t kNoSuchLabel = 1;
 
 // An exception names a label only to set it: what the host thinks of it shows no earlier.
 void CheckLabel(CheckRun& run, const SourceFile& file, unsigned int line,
                 const std::string& tardisk, const std::string& label) {
-  if (run.access.LookupLabel(label, TESKACCESS_LABEL_OBJECT) != kNoSuchLabel) return;
+  if (IsObjectLabel(run, label)) return;
   run.diagnostics.Add(file.AtWord(Codes::kUnknownWord, line, 1,
                                   "Invalid label (" + label + ") for file " + tardisk,
                                   HintForLabel(run, label)));

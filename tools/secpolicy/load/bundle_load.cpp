@@ -120,7 +120,7 @@ ExitCode Exchange(PolicyExchange& exchange, const PolicyInPlace& policy,
   return code;
 }
 
-Json Describe(const VerifiedBundle& offered, const PolicyInPlace& policy) {
+Json DescribeBundle(const VerifiedBundle& offered, const PolicyInPlace& policy) {
   return {{"name", offered.manifest.name},
           {"serial", offered.manifest.serial},
           {"key", offered.manifest.key},
@@ -152,7 +152,7 @@ ExitCode PlanBundle(const BundleChoice& choice, LoadRequest load, PlanOptions op
   load.bundle = choice.file;
   const std::vector<ArchiveEntry> files = FilesToInstall(offered);
   load.unpack = [&](const std::string& directory) { WritePolicyTree(directory, files); };
-  options.bundle = Describe(offered, policy);
+  options.bundle = DescribeBundle(offered, policy);
   return PlanLoad(load, options);
 }
 

@@ -189,7 +189,7 @@ void LivePolicy::CheckDomainsDir(std::size_t number) {
     DomainFile& file = domainFiles.emplace_back(path, name, number, unwanted);
     if (Open(file)) opened.push_back({file.domain.file, name});
   }
-  std::vector<NamedDomain> defined;
+  std::vector<DomainSource> defined;
   Collect(names, [&] { defined = DefineDomains(*run, opened, domains.prefix); });
   auto next = defined.begin();
   for (std::size_t index = first; index < domainFiles.size(); ++index) {

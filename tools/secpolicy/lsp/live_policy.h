@@ -72,10 +72,11 @@ class LivePolicy {
           lines(unwanted) {}
 
     std::string path;
-    std::string name;    // of the file
-    std::size_t dir;     // the number of its directory among those of domains
-    NamedDomain domain;  // without a file when it cannot be read, without a name when it is refused
-    Findings bytes;      // with the file itself
+    std::string name;  // of the file
+    std::size_t dir;   // the number of its directory among those of domains
+    DomainSource
+        domain;      // without a file when it cannot be read, without a name when it is refused
+    Findings bytes;  // with the file itself
     Findings lines;
   };
 

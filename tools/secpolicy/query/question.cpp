@@ -17,7 +17,6 @@ namespace {
 using Braxo::Lib::BraxoException;
 using LinuxHost::LabelOrigin;
 using Policy::FileAccess;
-using enum Policy::WordKind;
 using Policy::RuleKind;
 using Policy::WordKind;
 using SecPolicy::TeskAccessInterfaceImpl;
@@ -27,7 +26,7 @@ constexpr std::size_t kShortTable = 16;
 
 const std::string kCapabilityPrefix = "cap_";
 
-bool CanBeDomain(WordKind kind) { return kind == kDomain || kind == kLabel; }
+bool CanBeDomain(WordKind kind) { return kind == WordKind::kDomain || kind == WordKind::kLabel; }
 
 bool IsKnown(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
   unsigned int id = 0;
@@ -86,13 +85,13 @@ void RequireNumber(const std::string& word) {
 }  // namespace
 
 std::string FindWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
-  if (kind == kDomain) return FindDomain(word, access).name;
+  if (kind == WordKind::kDomain) return FindDomain(word, access).name;
   if (IsKnown(kind, word, access)) return word;
-  if (kind == kLabel) {
+  if (kind == WordKind::kLabel) {
     if (const auto name = FindObjectByNumber(word, access)) return *name;
   }
   std::vector<std::string> known = KnownWords(kind, access);
-  if (kind == kCapability && !word.starts_with(kCapabilityPrefix)) {
+  if (kind == WordKind::kCapability && !word.starts_with(kCapabilityPrefix)) {
     std::string name = kCapabilityPrefix + word;
     if (IsKnown(kind, name, access)) return name;
     for (std::string& other : known) other.erase(0, kCapabilityPrefix.size());
@@ -103,8 +102,8 @@ std::string FindWord(WordKind kind, const std::string& word, TeskAccessInterface
 namespace {
 
 std::string ReadWord(WordKind kind, const std::string& word, TeskAccessInterfaceImpl& access) {
-  if (kind != kPath && kind != kNumber) return FindWord(kind, word, access);
-  kind == kPath ? RequirePath(word) : RequireNumber(word);
+  if (kind != WordKind::kPath && kind != WordKind::kNumber) return FindWord(kind, word, access);
+  kind == WordKind::kPath ? RequirePath(word) : RequireNumber(word);
   return word;
 }
 
@@ -225,6 +224,7 @@ Policy::Question AskRules(const Question& question, TeskAccessInterfaceImpl& acc
 }  // namespace
 
 std::span<const QuestionForm> QuestionForms() {
+  using enum WordKind;
   static const std::vector<QuestionForm> forms = {
       {"read", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kRead},
       {"write", "PATH", {kPath}, RuleKind::kFilePath, FileAccess::kWrite},
@@ -261,7 +261,7 @@ Question ReadQuestion(const std::vector<std::string>& words, TeskAccessInterface
   for (std::size_t index = 0; index < form.words.size(); ++index) {
     question.words.push_back(ReadWord(form.words[index], words[index + 1], access));
   }
-  if (form.words.front() != kPath) {
+  if (form.words.front() != WordKind::kPath) {
     question.asked = AskRules(question, access);
   } else if (form.kind == RuleKind::kFilePath) {
     AskAboutFile(question, access);
@@ -272,7 +272,7 @@ Question ReadQuestion(const std::vector<std::string>& words, TeskAccessInterface
 }
 
 void RefuseDomain(const std::string& name, TeskAccessInterfaceImpl& access) {
-  RefuseWord(FormOf(kDomain).plainNoun, name, DomainNames(access));
+  RefuseWord(FormOf(WordKind::kDomain).plainNoun, name, DomainNames(access));
 }
 
 }  // namespace SecPolicyCli

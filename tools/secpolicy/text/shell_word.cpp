@@ -7,7 +7,7 @@
 namespace SecPolicyCli {
 namespace {
 
-bool IsPlain(const std::string& word) {
+bool NeedsNoQuotes(const std::string& word) {
   return !word.empty() && std::ranges::all_of(word, [](unsigned char letter) {
     return std::isalnum(letter) != 0 || std::strchr("/._-+:@%,=", letter) != nullptr;
   });
@@ -16,7 +16,7 @@ bool IsPlain(const std::string& word) {
 }  // namespace
 
 std::string ShellWord(const std::string& word) {
-  if (IsPlain(word)) return word;
+  if (NeedsNoQuotes(word)) return word;
   std::string quoted = "\"";
   for (const char letter : word) {
     if (letter != '\0' && std::strchr("\"\\$`", letter) != nullptr) quoted += '\\';
