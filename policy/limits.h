@@ -7,6 +7,9 @@
 // Limits that every host has.
 namespace Policy {
 
+// Of a line of a policy file, in bytes. A longer one is cut there and ends its file.
+inline constexpr std::size_t kLongestLine = 1023;
+
 // Of the name of a domain, in bytes.
 inline constexpr std::size_t kLongestDomainName = 63;
 

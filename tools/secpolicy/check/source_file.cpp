@@ -5,27 +5,25 @@
 #include <queue>
 #include <utility>
 
+#include "policy/limits.h"
 #include "secpolicy/secpolicy.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
 
-// What fits the reader's buffer.
-constexpr std::size_t kLongestLine = 1023;
-
 // Up to the first line that is too long, of which one character too many is kept: a file may hold
 // anything, and the reader stops there too.
 std::vector<std::string> ReadLines(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
-  std::array<char, kLongestLine + 2> buffer;
+  std::array<char, Policy::kLongestLine + 2> buffer;
   std::vector<std::string> texts;
   while (file.good()) {
     file.getline(buffer.data(), buffer.size());
     const auto taken = static_cast<std::size_t>(file.gcount());
     const bool hasLineFeed = taken > 0 && file.good();
     texts.emplace_back(buffer.data(), taken - (hasLineFeed ? 1 : 0));
-    if (texts.back().size() > kLongestLine) break;
+    if (texts.back().size() > Policy::kLongestLine) break;
   }
   return texts;
 }
@@ -91,12 +89,12 @@ void SourceFile::CheckBytes(DiagnosticList& diagnostics) const {
   for (const std::string_view text : texts) {
     ++number;
     const std::size_t nul = text.find('\0');
-    if (nul < kLongestLine) {
+    if (nul < Policy::kLongestLine) {
       diagnostics.Add(AtBytes(Codes::kNulByte, number, nul, 1,
                               "a NUL byte ends this line; what follows it is not read"));
     }
-    if (text.size() <= kLongestLine) continue;
-    diagnostics.Add(AtBytes(Codes::kLongLine, number, kLongestLine, 1,
+    if (text.size() <= Policy::kLongestLine) continue;
+    diagnostics.Add(AtBytes(Codes::kLongLine, number, Policy::kLongestLine, 1,
                             "this line has more than 1023 characters: the rest of it and all lines "
                             "below it are not read"));
     break;

@@ -5,12 +5,12 @@
 #include <string_view>
 #include <utility>
 
+#include "policy/limits.h"
 #include "text/visible.h"
 
 namespace SecPolicyCli {
 namespace {
 
-constexpr std::size_t kLongestLine = 1023;
 constexpr std::size_t kCommentGap = 3;
 
 // The lines of a file, whose columns are found group by group.
@@ -19,7 +19,7 @@ class Columns {
   Columns(FileRole fileRole, const TextDocument& text) : role(fileRole) {
     for (std::size_t number = 1; number <= text.LineCount(); ++number) {
       lines.emplace_back(text.Line(number));
-      if (lines.back().size() > kLongestLine) isCut = true;
+      if (lines.back().size() > Policy::kLongestLine) isCut = true;
       rows.push_back(isCut ? Row{} : ReadRow(lines.back()));
     }
   }
@@ -101,8 +101,8 @@ class Columns {
       if (rows[index].words.empty()) continue;
       std::string line = Write(rows[index], layout);
       // What would be too long to be read is set apart by single spaces, as far as that helps.
-      if (line.size() > kLongestLine) line = Write(rows[index], {});
-      if (line.size() <= kLongestLine) lines[index] = std::move(line);
+      if (line.size() > Policy::kLongestLine) line = Write(rows[index], {});
+      if (line.size() <= Policy::kLongestLine) lines[index] = std::move(line);
     }
   }
 

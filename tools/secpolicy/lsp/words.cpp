@@ -4,6 +4,7 @@
 #include <queue>
 #include <span>
 
+#include "policy/limits.h"
 #include "secpolicy/secpolicy.h"
 
 namespace SecPolicyCli {
@@ -39,8 +40,7 @@ bool IsVerdict(FileRole role, const std::vector<PlacedWord>& words, std::size_t 
 bool IsGrantWord(const std::string& word) { return word == "grant" || word == "revoke"; }
 
 std::string_view ReadPart(std::string_view line) {
-  constexpr std::size_t kLongestLine = 1023;
-  line = line.substr(0, kLongestLine);
+  line = line.substr(0, Policy::kLongestLine);
   line = line.substr(0, line.find('\0'));
   return line.substr(0, line.find('#'));
 }
