@@ -219,9 +219,11 @@ sshDom pass bind_port -1|'-1' is not an unsigned number, decimal or hexadecimal 
 sshDom pass bind_port 8x|'8x' is not an unsigned number, decimal or hexadecimal with 0x
 END
   secpolicy why sshDom
-  wrong_usage why "WHAT is required"
+  wrong_usage why "why: WHAT is required"
   secpolicy why
-  wrong_usage why "DOMAIN is required"
+  wrong_usage why "why: DOMAIN is required"
+  secpolicy why --last-refusal sshDom read /
+  wrong_usage why "why: with --last-refusal no WHAT is asked"
 }
 
 @test "--format json" {
@@ -342,4 +344,75 @@ END
   secpolicy why "$(domain_id sshDom)" use cap_net_bind_service
   answers 0 "yes: sshDom may use cap_net_bind_service" \
     "$root/etc/zorvan/secpolicy/domains/sshDom:$(grep -n cap_net_bind "$policy/domains/sshDom" | cut -d: -f1): -c cap_net_bind_service grant"
+}
+
+# note LINE...: these are the latest refusals, each what is asked of a domain, and what else is to be said.
+note() {
+  local line
+  for line; do
+    jq -cn --argjson noted "$line" '{schema: "secpolicy.refusal/1", time: "2026-11-22T15:00:00Z", count: 1, refused: true,
+      ofNoRule: false, act: "", asked: [], path: null, label: null,
+      process: {id: 812, user: 33, program: "sshd", path: "/usr/sbin/sshd", parent: 1, parentPath: null}} + $noted'
+  done >"$root/run/secpolicy/refusals"
+  chmod 600 "$root/run/secpolicy/refusals"
+}
+
+@test "--last-refusal explains the newest one, as it is asked" {
+  boot
+  note '{"domain": "sshDom", "asked": ["write", "/etc/ssh/host_key"], "label": "hostConfig", "count": 3}' \
+    '{"domain": "monitorDom", "asked": ["call", "ptrace"], "refused": false}'
+  secpolicy why --last-refusal
+  exits 1
+  [[ ${lines[0]} == "2026-11-22 15:00:00 UTC: monitorDom would be refused: call ptrace, by /usr/sbin/sshd, process 812 of user 33" ]]
+  [[ $(tail -n +2 <<<"$output") == "$("$SECPOLICY" --root "$root" why monitorDom call ptrace)" ]]
+  secpolicy why --last-refusal sshDom
+  exits 1
+  [[ ${lines[0]} == "2026-11-22 15:00:00 UTC: sshDom was refused: write /etc/ssh/host_key, by /usr/sbin/sshd, process 812 of user 33, 3 times" ]]
+  [[ $(tail -n +2 <<<"$output" | head -n -1) == "$("$SECPOLICY" --root "$root" why sshDom write /etc/ssh/host_key)" ]]
+  [[ ${lines[-1]} == "label when it was refused: hostConfig" ]]
+  secpolicy why --last-refusal "$(domain_id sshDom)" --format json
+  exits 1
+  fits_schema why
+  jq -e '.question.action == "write" and .refusal.process.id == 812 and .refusal.count == 3' <<<"$output"
+  # What the rules grant by now is told so.
+  note '{"domain": "sshDom", "asked": ["read", "/etc/ssh/host_key"]}'
+  secpolicy why --last-refusal
+  exits 0
+  shows "yes: sshDom may read /etc/ssh/host_key"
+}
+
+@test "--last-refusal tells of what no rule grants, and of what cannot be asked" {
+  boot
+  note '{"domain": "sshDom", "act": "reach what enforces the policy", "ofNoRule": true}'
+  secpolicy why --last-refusal
+  answers 1 "2026-11-22 15:00:00 UTC: sshDom was refused: reach what enforces the policy, by /usr/sbin/sshd, process 812 of user 33" \
+    "no: no rule grants to reach what enforces the policy"
+  secpolicy why --last-refusal --format json
+  exits 1
+  fits_schema why
+  note '{"domain": "sshDom", "act": "use a file"}'
+  secpolicy why --last-refusal
+  exits 1
+  shows "which rule decides is not known"
+}
+
+@test "--last-refusal without any says what to do" {
+  boot
+  secpolicy why --last-refusal
+  exits 1
+  [[ -z $output && $stderr == "secpolicy: why: no refusal is known: secpolicy-log notes them while it runs, which 'systemctl enable --now secpolicy-log' sees to" ]]
+  note '{"domain": "sshDom", "asked": ["read", "/"]}'
+  secpolicy why --last-refusal monitorDom
+  exits 1
+  [[ -z $output && $stderr == "secpolicy: why: no refusal in monitorDom is among the latest, which are in $root/run/secpolicy/refusals" ]]
+  # What is no refusal is passed over.
+  printf '%s\n' '{"domain": 7}' 'text' '' >>"$root/run/secpolicy/refusals"
+  secpolicy why --last-refusal
+  [[ ${lines[0]} == *": sshDom was refused: read /, by "* ]]
+  secpolicy why --last-refusal sshDon
+  exits 2
+  chmod 666 "$root/run/secpolicy/refusals"
+  secpolicy why --last-refusal
+  exits 1
+  [[ -z $output && $stderr == "secpolicy: why: Refusing the latest refusals: other users may write /run/secpolicy/refusals. "* ]]
 }

@@ -10,16 +10,23 @@
 #include "query/ask.h"
 #include "query/named.h"
 #include "query/question.h"
+#include "refusal.h"
+#include "refusals/last_refusal.h"
 #include "verb.h"
 
 namespace SecPolicyCli {
 namespace {
 
-ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
-                const std::string& format) {
+struct Arguments {
+  std::string domain;
+  std::vector<std::string> words;
+  bool isLastRefusal = false;
+};
+
+ExitCode Answer(const Arguments& asked, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  const Policy::InstalledDomain domain = RequireInstalledDomain(name, access);
-  const Question question = ReadQuestion(words, access);
+  const Policy::InstalledDomain domain = RequireInstalledDomain(asked.domain, access);
+  const Question question = ReadQuestion(asked.words, access);
   const Policy::Decision decision = Policy::Decide(question.asked, domain);
   if (format == "json") {
     std::cout << WhyToJson(question, domain, decision).Text();
@@ -29,14 +36,28 @@ ExitCode Answer(const std::string& name, const std::vector<std::string>& words,
   return decision.IsAllowed() ? kWell : kFailed;
 }
 
+void RequireQuestion(const Arguments& asked) {
+  if (asked.isLastRefusal && asked.words.empty()) return;
+  if (asked.isLastRefusal) throw QuestionError("with --last-refusal no WHAT is asked");
+  if (asked.domain.empty()) throw QuestionError("DOMAIN is required");
+  if (asked.words.empty()) throw QuestionError("WHAT is required");
+}
+
 Action Define(Syntax& syntax) {
-  const auto domain = std::make_shared<std::string>();
-  const auto words = std::make_shared<std::vector<std::string>>();
-  syntax.AddOption("DOMAIN", *domain, "The domain that is asked about, by its name or its number")
-      .Require();
-  syntax.AddList("WHAT", *words, "What it does, see below").Require();
+  const auto asked = std::make_shared<Arguments>();
+  syntax.AddOption("DOMAIN", asked->domain,
+                   "The domain that is asked about, by its name or its number");
+  syntax.AddList("WHAT", asked->words, "What it does, see below");
+  syntax.AddFlag("--last-refusal", asked->isLastRefusal,
+                 "Explain what the module has refused last, in the domain or in any");
   const auto format = AddAnswerFormat(syntax);
-  return [=] { return Ask("why", [=] { return Answer(*domain, *words, *format); }); };
+  return [=] {
+    RequireQuestion(*asked);
+    return Ask("why", [=] {
+      return asked->isLastRefusal ? ExplainLastRefusal(asked->domain, *format)
+                                  : Answer(*asked, *format);
+    });
+  };
 }
 
 }  // namespace
@@ -58,13 +79,18 @@ const Verb kWhy = {
     "  create-socket OBJECT KIND                a unix socket: stream, dgram, seqpacket\n"
     "  pass CHECK NUMBER                        a parameter check\n"
     "\n"
+    "With --last-refusal, WHAT is what the module has refused last, as secpolicy-log has noted "
+    "it;\n"
+    "only root may read that.\n"
+    "\n"
     "Exit status: 0 yes, 1 no, 2 a word is not known.\n"
     "\n"
     "Examples:\n"
     "  secpolicy why sshDom read /etc/ssh/host_key\n"
     "  secpolicy why appDom call mount\n"
     "  secpolicy why appDom pass bind_port 80\n"
-    "  secpolicy why globalVMDom create vmDisk vmDisk symlink",
+    "  secpolicy why globalVMDom create vmDisk vmDisk symlink\n"
+    "  secpolicy why --last-refusal",
     Define};
 
 }  // namespace SecPolicyCli

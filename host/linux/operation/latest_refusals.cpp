@@ -1,0 +1,60 @@
+#include "host/linux/operation/latest_refusals.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/common/private_file.h"
+#include "host/linux/common/used_paths.h"
+#include "host/linux/common/write_all.h"
+
+namespace LinuxHost {
+namespace {
+
+constexpr char kPurpose[] = "latest refusals";
+
+// Nobody else makes files in this directory.
+void Replace(const std::string& path, const std::string& text) {
+  const std::string fresh = Braxo::Misc::StrCat(path, ".new");
+  unlink(fresh.c_str());
+  constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  const Descriptor file(open(fresh.c_str(), kFlags, S_IRUSR | S_IWUSR));
+  if (!file.IsOpen() || !WriteAll(file.Number(), text) ||
+      rename(fresh.c_str(), path.c_str()) != 0) {
+    ThrowErrno("Unable to write ", path);
+  }
+}
+
+}  // namespace
+
+std::string LatestRefusalsFile() {
+  const std::string& state = StatePath();
+  return Braxo::Misc::StrCat(state.substr(0, state.rfind('/')), "/refusals");
+}
+
+void WriteLatestRefusals(const std::string& text) {
+  const std::string path = LatestRefusalsFile();
+  PreparePrivateFile(path, kPurpose);
+  Replace(path, text);
+}
+
+std::optional<std::string> ReadLatestRefusals() {
+  const std::string path = LatestRefusalsFile();
+  struct stat status {};
+  if (lstat(path.c_str(), &status) != 0 && errno == ENOENT) return std::nullopt;
+  status = RequirePrivateFile(path, kPurpose);
+  const Descriptor file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+  std::string text(static_cast<std::size_t>(status.st_size), '\0');
+  const ssize_t count = file.IsOpen() ? read(file.Number(), text.data(), text.size()) : -1;
+  if (count < 0) ThrowErrno("Unable to read ", path);
+  text.resize(static_cast<std::size_t>(count));
+  return text;
+}
+
+}  // namespace LinuxHost
