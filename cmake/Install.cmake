@@ -62,6 +62,18 @@ install(FILES completions/_secpolicy
   DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
 install(FILES completions/secpolicy.fish
   DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d")
+if(TARGET secpolicy_log)
+  install(TARGETS secpolicy_log)
+  install(FILES docs/man/secpolicy-log.8 DESTINATION "${CMAKE_INSTALL_MANDIR}/man8")
+  install(FILES completions/secpolicy-log.bash RENAME secpolicy-log
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions")
+  install(FILES completions/_secpolicy-log
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/vendor-completions")
+  install(FILES completions/secpolicy-log.fish
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d")
+  configure_file(packaging/systemd/secpolicy-log.service.in secpolicy-log.service @ONLY)
+  install(FILES "${PROJECT_BINARY_DIR}/secpolicy-log.service" DESTINATION "${SECPOLICY_UNITS}")
+endif()
 foreach(unit boot restore load metrics drift)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")

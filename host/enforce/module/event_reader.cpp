@@ -2,16 +2,25 @@
 
 #include <bpf/bpf.h>
 #include <bpf/libbpf.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 #include <utility>
 #include <vector>
 
+#include "braxo/lib/exception.h"
 #include "host/enforce/module/module_maps.h"
 
 namespace Enforce {
 namespace {
+
+// Who has no rights to look is told of that by what is opened.
+FileDescriptor OpenEvents() {
+  if (access(kModulePins, F_OK) != 0 && errno == ENOENT)
+    throw Braxo::Lib::BraxoException("the module: it does not run, so it refuses nothing");
+  return OpenPinned("events");
+}
 
 __u32 IdOf(const FileDescriptor& map) {
   bpf_map_info info = {};
@@ -22,10 +31,10 @@ __u32 IdOf(const FileDescriptor& map) {
 
 }  // namespace
 
-void EventReader::End::operator()(ring_buffer* ring) const { ring_buffer__free(ring); }
+void EventReader::End::operator()(ring_buffer* ended) const { ring_buffer__free(ended); }
 
 EventReader::EventReader(TakeEvent takeEvent)
-    : take(std::move(takeEvent)), events(OpenPinned("events")), refusals(OpenPinned("refusals")) {
+    : take(std::move(takeEvent)), events(OpenEvents()), refusals(OpenPinned("refusals")) {
   ring.reset(ring_buffer__new(events.Number(), Take, this, nullptr));
   Require(ring != nullptr, "cannot read events");
 }

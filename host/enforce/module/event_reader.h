@@ -41,7 +41,7 @@ class EventReader {
 
  private:
   struct End {
-    void operator()(ring_buffer* ring) const;
+    void operator()(ring_buffer* ended) const;
   };
 
   static int Take(void* self, void* data, std::size_t size);

@@ -15,7 +15,7 @@ struct EventForm {
 };
 
 // In the order of Event.
-constexpr std::array<EventForm, 8> kForms = {{
+constexpr std::array<EventForm, 10> kForms = {{
     {"840401faa7694a3f99c654ce45357c01", LOG_INFO},
     {"1df6f2e4bf3049699bc7ebf5cb11431f", LOG_ERR},
     {"50acbe999869435dab522730651b031b", LOG_CRIT},
@@ -24,6 +24,8 @@ constexpr std::array<EventForm, 8> kForms = {{
     {"eb912851ab2e404d931614e7abde76bd", LOG_NOTICE},
     {"9d8b91af9e9a4f0ab4348815cfd06536", LOG_WARNING},
     {"f88412bf019d41e1b51e7b85a86c3e79", LOG_WARNING},
+    {"3abfec11643a484cb873e0dda124b9b4", LOG_WARNING},
+    {"8be76e4adb1b4b4d83acbd7e60a4b2b1", LOG_WARNING},
 }};
 
 Event EventOf(ExitCode code) {

@@ -18,7 +18,9 @@ enum class Event {
   kLevelChanged,
   kRolledBack,
   kDrifted,
-  kWouldBeRefused
+  kWouldBeRefused,
+  kRefused,
+  kUntold
 };
 
 // Tells it of an event; nothing where this command is not under a journal. `fields` are those that

@@ -1,6 +1,7 @@
 #include "asked_rules.h"
 
 #include <algorithm>
+#include <iterator>
 #include <optional>
 #include <variant>
 
@@ -37,23 +38,28 @@ std::string ActionOf(RuleKind kind, Policy::FileAccess access = {}) {
   return form->action;
 }
 
-// Makes the text of a question of each kind.
+// The words of a question of each kind.
 struct Wording {
-  std::string operator()(const Policy::FileQuestion& asked) const {
-    return ActionOf(RuleKind::kFilePath, asked.access) + " " + asked.path;
+  using Words = std::vector<std::string>;
+
+  Words operator()(const Policy::FileQuestion& asked) const {
+    return {ActionOf(RuleKind::kFilePath, asked.access), asked.path};
   }
-  std::string operator()(const Policy::CreationQuestion& asked) const {
+  Words operator()(const Policy::CreationQuestion& asked) const {
     const bool isFile = asked.kind == RuleKind::kFileCreation;
-    return (isFile ? "make " : "make-socket ") + asked.path + " " + asked.what;
+    return {isFile ? "make" : "make-socket", asked.path, asked.what};
   }
-  std::string operator()(const Policy::EntryQuestion& asked) const {
-    return ActionOf(RuleKind::kDomainTransition) + " " + asked.domain;
+  Words operator()(const Policy::EntryQuestion& asked) const {
+    return {ActionOf(RuleKind::kDomainTransition), asked.domain};
   }
-  std::string operator()(const Policy::ParameterQuestion& asked) const {
-    return ActionOf(RuleKind::kParameterCheck) + " " + asked.check + " " + asked.number;
+  Words operator()(const Policy::ParameterQuestion& asked) const {
+    return {ActionOf(RuleKind::kParameterCheck), asked.check, asked.number};
   }
-  std::string operator()(const Policy::WordsQuestion& asked) const {
-    return ActionOf(asked.kind) + " " + asked.words[0];
+  Words operator()(const Policy::WordsQuestion& asked) const {
+    Words words = {ActionOf(asked.kind)};
+    std::ranges::copy_if(asked.words, std::back_inserter(words),
+                         [](const std::string& word) { return !word.empty(); });
+    return words;
   }
 };
 
@@ -86,7 +92,15 @@ bool IsGranted(const Policy::Question& question, const Policy::InstalledDomain& 
   return wider && Decide(*wider, domain).granted;
 }
 
-std::string TextOf(const Policy::Question& question) { return std::visit(Wording(), question); }
+std::vector<std::string> WordsOf(const Policy::Question& question) {
+  return std::visit(Wording(), question);
+}
+
+std::string TextOf(const Policy::Question& question) {
+  std::string text;
+  for (const std::string& word : WordsOf(question)) text += (text.empty() ? "" : " ") + word;
+  return text;
+}
 
 std::string DirectoryOf(const std::string& path) {
   return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));

@@ -2,6 +2,7 @@
 
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "policy/decision.h"
 #include "secpolicy/secpolicy.h"
@@ -19,7 +20,10 @@ std::optional<Policy::WordsQuestion> WiderCapability(const Policy::WordsQuestion
 // True when rules grant it, or a wider capability.
 bool IsGranted(const Policy::Question& question, const Policy::InstalledDomain& domain);
 
-// The question as 'why' is asked it: "read /etc/shadow".
+// The question as 'why' is asked it: "read", "/etc/shadow".
+std::vector<std::string> WordsOf(const Policy::Question& question);
+
+// The same as one text.
 std::string TextOf(const Policy::Question& question);
 
 // The directory that a path is in.

@@ -76,16 +76,11 @@ std::string TextOf(const RefusedAct& refused) {
 }
 
 Json ToJson(const RefusedAct& refused) {
-  return {{"time", IsoTime(refused.time)},
-          {"count", refused.count},
-          {"domain", refused.domain},
-          {"refused", refused.isRefused},
-          {"ofNoRule", refused.isOfNoRule},
-          {"act", ActOf(refused)},
-          {"asked", refused.question},
-          {"path", TextOrNull(refused.path)},
-          {"label", TextOrNull(refused.label)},
-          {"process", ToJson(refused.process)}};
+  return {{"time", IsoTime(refused.time)},      {"count", refused.count},
+          {"domain", refused.domain},           {"refused", refused.isRefused},
+          {"ofNoRule", refused.isOfNoRule},     {"act", ActOf(refused)},
+          {"asked", refused.question},          {"path", TextOrNull(refused.path)},
+          {"label", TextOrNull(refused.label)}, {"process", ToJson(refused.process)}};
 }
 
 std::optional<RefusedAct> ReadRefusedAct(const Json& json) {

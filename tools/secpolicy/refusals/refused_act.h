@@ -15,21 +15,21 @@ struct RefusedProcess {
   std::int64_t parent = 0;
   std::int64_t user = 0;
   std::string program;        // its name, as the kernel keeps it
-  std::string path;           // of its file; empty where that is not known any more
+  std::string path = {};      // of its file; empty where that is not known any more
   std::string parentProgram;  // the same of its parent
 };
 
 // What the module has refused, or would have refused in a domain that is not permissive.
 struct RefusedAct {
-  std::int64_t time = 0;   // in seconds since 1970, when it came first
-  std::int64_t count = 1;  // how often it was refused within a second
-  std::string domain;      // its name, or its number where it has gone
+  std::int64_t time = 0;    // in seconds since 1970, when it came first
+  std::int64_t count = 1;   // how often it was refused within a second
+  std::string domain = {};  // its name, or its number where it has gone
   bool isRefused = true;
-  bool isOfNoRule = false;            // no rule grants such an act
-  std::vector<std::string> question;  // as `why` is asked; empty where it cannot be
-  std::string act;                    // what it was then
-  std::string path;                   // of the file that it was about, if any
-  std::string label;                  // that the file had, or its directory
+  bool isOfNoRule = false;                 // no rule grants such an act
+  std::vector<std::string> question = {};  // as `why` is asked; empty where it cannot be
+  std::string act = {};                    // what it was then
+  std::string path = {};                   // of the file that it was about, if any
+  std::string label = {};                  // that the file had, or its directory
   RefusedProcess process = {};
 };
 
