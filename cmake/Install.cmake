@@ -51,7 +51,11 @@ install(FILES "${PROJECT_BINARY_DIR}/secpolicy.pc" DESTINATION "${CMAKE_INSTALL_
 # The command, with the libraries that are never linked to, only loaded by the verbs that need them.
 set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME secpolicy)
 install(TARGETS secpolicy_cli)
-install(TARGETS secpolicyhost_archive secpolicy_signature
+set(late_libraries secpolicyhost_archive secpolicy_signature)
+if(TARGET secpolicy_module)
+  list(APPEND late_libraries secpolicy_module)
+endif()
+install(TARGETS ${late_libraries}
   LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/secpolicy" NAMELINK_SKIP)
 install(TARGETS secpolicy_run DESTINATION "${CMAKE_INSTALL_LIBEXECDIR}/secpolicy")
 install(FILES docs/man/secpolicy.5 DESTINATION "${CMAKE_INSTALL_MANDIR}/man5")

@@ -19,8 +19,12 @@ endif()
 add_test(NAME package.needed_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-needed-libraries" "$<TARGET_FILE:secpolicy>")
 
-# What a boot alone needs is loaded by a boot alone, and what signs by the verb that does.
+# What a boot alone needs is loaded by a boot alone, what signs by the verb that does, and what tells the
+# kernel where that keeps the policy.
+if(TARGET secpolicy_module)
+  set(module_library "$<TARGET_FILE:secpolicy_module>")
+endif()
 add_test(NAME package.late_libraries
   COMMAND "${CMAKE_CURRENT_LIST_DIR}/check-late-libraries"
-    "$<TARGET_FILE:secpolicy_cli>" "$<TARGET_FILE:secpolicyhost_archive>"
-    "$<TARGET_FILE:secpolicy_signature>")
+    "$<TARGET_FILE:secpolicy_cli>" "$<TARGET_FILE:secpolicyhost>" "$<TARGET_FILE:secpolicyhost_archive>"
+    "$<TARGET_FILE:secpolicy_signature>" ${module_library})

@@ -196,6 +196,10 @@ std::uint64_t Module::Generation() const {
   return generation;
 }
 
+bool Module::IsRefusing() const {
+  return IsRefused([this](pid_t child) { maps->Place(child, kCanaryDomain); });
+}
+
 void Module::SetLevel(unsigned int domain, Policy::Level level) {
   RequireDomain(domain);
   maps->WriteLevel(domain, NumberOf(level));

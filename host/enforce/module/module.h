@@ -40,6 +40,9 @@ class Module {
   void Publish(const ModulePlan& plan, std::uint64_t generation);
   std::uint64_t Generation() const;
 
+  // Tries anew whether the kernel runs the programs: a process that may nothing has to be refused.
+  bool IsRefusing() const;
+
   // Counts at once for all processes of the domain, whose rules stay.
   void SetLevel(unsigned int domain, Policy::Level level);
 

@@ -4,8 +4,8 @@
 
 #include <string>
 
+#include "host/linux/common/late_library.h"
 #include "host/linux/files/archive_entry_point.h"
-#include "host/linux/operation/late_library.h"
 
 namespace LinuxHost {
 namespace {

@@ -7,7 +7,7 @@
 
 #include "bundle/read_file.h"
 #include "bundle/signature/entry_point.h"
-#include "host/linux/operation/late_library.h"
+#include "host/linux/common/late_library.h"
 #include "host/linux/operation/text_digest.h"
 #include "refusal.h"
 
