@@ -5,7 +5,7 @@ load helper
 @test "--help shows every verb and the exit status" {
   run --separate-stderr "$SECPOLICY" --help
   exits 0
-  for verb in init new explain lsp bundle boot check load load-early restore status display drift domain file-policy capability param-check run exec observe features why who-can rules path words graph diff save history saved rollback label settings; do
+  for verb in init new explain lsp bundle boot check load load-early restore status display drift domain file-policy capability param-check run exec observe features why who-can rules path words graph diff save history saved rollback label settings module; do
     [[ $output == *"  $verb "* ]]
     grep --quiet --extended-regexp "^  secpolicy( --root r)? $verb( |$)" <<<"$output"
   done
@@ -28,7 +28,7 @@ load helper
 }
 
 @test "--help of every verb has an example" {
-  for verb in init new explain lsp bundle boot check load load-early restore status display drift domain file-policy capability param-check run exec observe features why who-can rules path words graph diff save history saved rollback label settings; do
+  for verb in init new explain lsp bundle boot check load load-early restore status display drift domain file-policy capability param-check run exec observe features why who-can rules path words graph diff save history saved rollback label settings module; do
     run --separate-stderr "$SECPOLICY" "$verb" --help
     exits 0
     [[ $output == *"Example"*"secpolicy "*"$verb"* ]]

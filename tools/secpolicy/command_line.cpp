@@ -182,7 +182,12 @@ void Syntax::BeforeRoot(const Option& option, void (*step)()) {
   preparations.emplace_back(option.option, step);
 }
 
-Option Syntax::Verbose() const { return {*app.get_parent()->get_option("--verbose"), offerings}; }
+// Kinds of a verb have it of the command, too.
+Option Syntax::Verbose() const {
+  CLI::App* command = app.get_parent();
+  while (command->get_parent() != nullptr) command = command->get_parent();
+  return {*command->get_option("--verbose"), offerings};
+}
 
 CommandLine::CommandLine(const Description& description, std::span<const VerbGroup> verbGroups)
     : app(std::make_unique<CLI::App>(description.about, "secpolicy")), groups(verbGroups) {

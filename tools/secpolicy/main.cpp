@@ -11,6 +11,7 @@
 #include "command_line.h"
 #include "complete/completion.h"
 #include "ending.h"
+#include "host/linux/kernel/module_publication.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
 #include "refusal.h"
@@ -27,7 +28,8 @@ namespace {
 
 const VerbGroup kVerbs[] = {
     {"Write a policy", {&kInit, &kNew, &kCheck, &kExplain, &kWords, &kLsp}},
-    {"Install it", {&kBoot, &kLoad, &kLoadEarly, &kBundle, &kRestore, &kSettings, &kLabel}},
+    {"Install it",
+     {&kBoot, &kLoad, &kLoadEarly, &kBundle, &kRestore, &kSettings, &kLabel, &kModule}},
     {"See what is installed", {&kStatus, &kDisplay, &kGraph, &kReport, &kDiff, &kDrift}},
     {"Ask about it", {&kWhy, &kWhoCan, &kRules, &kPath, &kFeatures}},
     {"Change it at run time", {&kDomain, &kFilePolicy, &kCapability, &kParamCheck}},
@@ -76,6 +78,7 @@ constexpr char kFooter[] =
     "With programs below the root, or on a host that was booted:\n"
     "  secpolicy run appDom -- /bin/sh              # in this domain\n"
     "  secpolicy exec -- /usr/sbin/sshd             # in that of its label\n"
+    "  secpolicy module start                       # every process, by the kernel itself\n"
     "  secpolicy observe -- /usr/bin/webd           # which rules would it need?\n"
     "  secpolicy lsp                                # for an editor, as one types\n"
     "  secpolicy bundle show web.bundle             # what was signed for many hosts?\n"
@@ -123,16 +126,7 @@ ExitCode FlushOutput(ExitCode code) {
   return code == kWell ? kFailed : code;
 }
 
-ExitCode Run(int argc, char** argv, Terminal& terminal) {
-  CommandLine commandLine({kAbout, kFooter, "secpolicy " SECPOLICY_VERSION}, kVerbs);
-  if (argc > 1 && std::string_view(argv[1]) == kAskForWords) {
-    return Complete(commandLine, {argv + 2, argv + argc});
-  }
-  const auto showHelp = [&](const std::string& text) {
-    terminal.Prepare(commandLine, true);
-    std::cout << FitTerminal(text);
-  };
-  if (const auto end = commandLine.Read(argc, argv, showHelp)) return *end;
+ExitCode Act(const CommandLine& commandLine, Terminal& terminal) {
   bool isInRoot = false;
   try {
     terminal.Prepare(commandLine, commandLine.AskedVerb().isLong);
@@ -155,6 +149,34 @@ ExitCode Run(int argc, char** argv, Terminal& terminal) {
               << std::endl;
     return kFailed;
   }
+}
+
+// The commits of a verb are told the module at once, and loudly where that fails.
+ExitCode ActAndPublish(const CommandLine& commandLine, Terminal& terminal) {
+  const LinuxHost::HeldPublication held;
+  const ExitCode code = Act(commandLine, terminal);
+  try {
+    LinuxHost::PublishCommitted();
+    return code;
+  } catch (const std::exception& failure) {
+    Summarize(commandLine.AskedCommand(),
+              std::string("the policy is installed, and the kernel was not told of it: ") +
+                  failure.what());
+    return code == kWell ? kFailed : code;
+  }
+}
+
+ExitCode Run(int argc, char** argv, Terminal& terminal) {
+  CommandLine commandLine({kAbout, kFooter, "secpolicy " SECPOLICY_VERSION}, kVerbs);
+  if (argc > 1 && std::string_view(argv[1]) == kAskForWords) {
+    return Complete(commandLine, {argv + 2, argv + argc});
+  }
+  const auto showHelp = [&](const std::string& text) {
+    terminal.Prepare(commandLine, true);
+    std::cout << FitTerminal(text);
+  };
+  if (const auto end = commandLine.Read(argc, argv, showHelp)) return *end;
+  return ActAndPublish(commandLine, terminal);
 }
 
 // Puts something that can be neither read nor written in place of the standard descriptors that the

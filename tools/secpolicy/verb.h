@@ -55,6 +55,7 @@ extern const Verb kSettings;
 extern const Verb kGraph;
 extern const Verb kReport;
 extern const Verb kLabel;
+extern const Verb kModule;
 extern const Verb kStatus;
 extern const Verb kDrift;
 extern const Verb kDomain;

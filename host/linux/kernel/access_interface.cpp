@@ -11,6 +11,7 @@
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/kernel/module_publication.h"
 #include "host/linux/state/host_state.h"
 #include "policy/rule.h"
 #include "teskctl/security.h"
@@ -72,6 +73,7 @@ class TeskAccessInterfaceImpl::Impl {
   HostState& Any() { return *state; }
 
  private:
+  const LinuxHost::CommitFollower follower;
   std::shared_ptr<HostState> state = HostState::Current().shared_from_this();
 };
 

@@ -14,6 +14,7 @@
 
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/kernel/module_publication.h"
 #include "host/linux/kernel/user_memory.h"
 #include "host/linux/state/host_state.h"
 #include "secpolicyhost/mode_param.h"
@@ -270,6 +271,7 @@ namespace Zorvan::Kernel {
 
 CallResult Call(std::uint32_t number, std::initializer_list<std::uint64_t> args) {
   const LinuxHost::ErrnoGuard guard;
+  const LinuxHost::CommitFollower follower;
   try {
     return LinuxHost::Run(number, args);
   } catch (const LinuxHost::HostError& error) {

@@ -3,20 +3,48 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <utility>
 
+#include "host/linux/state/module_place.h"
 #include "host/linux/state/plan_place.h"
 #include "host/linux/state/schema.h"
 
 namespace LinuxHost {
+namespace {
 
-// Plans are of the state before the commit, which others may see as soon as it is made. Where they
-// cannot be ended, nothing may change.
+thread_local bool hasCommittedForModule = false;
+
+bool IsRemoved(const std::string& path) { return unlink(path.c_str()) == 0 || errno == ENOENT; }
+
+// What the commits of a state make old.
+struct MadeFromState {
+  explicit MadeFromState(const std::string& state)
+      : plans(CurrentPlansOf(state)),
+        module(ModuleMarkOf(state)),
+        published(PublishedMarkOf(state)) {}
+
+  bool End() const {
+    if (!IsRemoved(plans)) return false;
+    if (access(module.c_str(), F_OK) != 0) return true;
+    hasCommittedForModule = true;
+    return IsRemoved(published);
+  }
+
+  std::string plans;
+  std::string module;
+  std::string published;
+};
+
+}  // namespace
+
+// Plans, and what the module was told, are of the state before the commit, which others may see as
+// soon as it is made. Where they cannot be ended, nothing may change.
 StateBase::StateBase(const std::string& path, const std::string& shownAs)
-    : database(path, kStateLayout, shownAs, [current = CurrentPlansOf(path)] {
-        return unlink(current.c_str()) == 0 || errno == ENOENT;
-      }) {
+    : database(path, kStateLayout, shownAs, [made = MadeFromState(path)] { return made.End(); }) {
   Refresh();
 }
+
+bool StateBase::TakeCommitForModule() { return std::exchange(hasCommittedForModule, false); }
 
 void StateBase::Refresh() {
   if (marked && database.IsAt(seen)) return;

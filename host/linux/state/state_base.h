@@ -23,6 +23,9 @@ class StateBase {
 
   Store& Database() { return database; }
 
+  // True once when this thread has committed something to the state that the module keeps.
+  static bool TakeCommitForModule();
+
   // Looks at the versions, so that what other processes have changed since is read again when it is
   // wanted. Looks at the database only when something was committed since the last call.
   void Refresh();

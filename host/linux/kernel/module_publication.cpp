@@ -1,0 +1,153 @@
+#include "host/linux/kernel/module_publication.h"
+
+#include <fcntl.h>
+#include <sys/random.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <charconv>
+#include <cstdint>
+#include <cstdio>
+#include <fstream>
+#include <memory>
+#include <string>
+
+#include "braxo/misc/strcat.h"
+#include "host/linux/common/descriptor.h"
+#include "host/linux/common/errno_guard.h"
+#include "host/linux/common/host_error.h"
+#include "host/linux/common/late_library.h"
+#include "host/linux/common/used_paths.h"
+#include "host/linux/common/write_all.h"
+#include "host/linux/services/system_log.h"
+#include "host/linux/state/host_state.h"
+#include "host/linux/state/module_place.h"
+
+namespace LinuxHost {
+namespace {
+
+using Braxo::Misc::StrCat;
+using Enforce::RunningModule;
+
+// Of the calling thread: how many do not want to be followed yet.
+thread_local int holders = 0;
+
+// No generation of a module that was told nothing.
+constexpr std::uint64_t kNothingPublished = 0;
+
+// Never one that was there before: an old mark stands for nothing.
+std::uint64_t NewGeneration() {
+  std::uint64_t generation = kNothingPublished;
+  while (generation == kNothingPublished) {
+    if (getrandom(&generation, sizeof generation, 0) != sizeof generation) {
+      ThrowErrno("Unable to number what the module is told");
+    }
+  }
+  return generation;
+}
+
+std::uint64_t PublishedGeneration() {
+  std::ifstream file(PublishedMarkOf(StatePath()));
+  std::uint64_t generation = kNothingPublished;
+  return file >> generation ? generation : kNothingPublished;
+}
+
+void WriteFile(const std::string& path, const std::string& content) {
+  const std::string made = path + ".new";
+  constexpr int kFlags = O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC;
+  const Descriptor file(open(made.c_str(), kFlags, S_IRUSR | S_IWUSR));
+  if (!file.IsOpen() || !WriteAll(file.Number(), content) ||
+      rename(made.c_str(), path.c_str()) != 0) {
+    ThrowErrno("Unable to write ", path);
+  }
+}
+
+void Remove(const std::string& path) {
+  if (unlink(path.c_str()) != 0 && errno != ENOENT) ThrowErrno("Unable to remove ", path);
+}
+
+Policy::InstalledPolicy ReadInstalled() {
+  TeskCtl::Security::TeskAccessInterfaceImpl access;
+  return Policy::ReadPolicy(access);
+}
+
+void Publish(RunningModule& running) {
+  const HeldPublication held;
+  HostState& state = HostState::Current();
+  // Only as a lock, which ends without a commit.
+  const Transaction others(state.Database());
+  const std::uint64_t generation = NewGeneration();
+  running.Publish(ReadInstalled(), generation);
+  WriteFile(PublishedMarkOf(StatePath()), StrCat(generation, "\n"));
+}
+
+// Whoever has committed can be told nothing else: its own work is done.
+void LogFailure(const std::string& failure) noexcept {
+  try {
+    LogInformation(StrCat("The module was not told what was installed: ", failure));
+  } catch (const Braxo::Lib::BraxoException&) {
+    return;
+  }
+}
+
+// Where it has ended otherwise than by a stop, that is told once.
+void PublishToRunning() {
+  const auto running = ModuleLibrary().find();
+  if (running) return Publish(*running);
+  EndPublishing();
+  throw HostError(ESRCH,
+                  "The module does not run any more, so the kernel keeps nothing of the policy. "
+                  "\"secpolicy module start\" starts it");
+}
+
+}  // namespace
+
+const Enforce::ModuleFunctions& ModuleLibrary() {
+  static const auto& functions = *static_cast<const Enforce::ModuleFunctions*>(FindInLateLibrary(
+      "libsecpolicy-module.so.1", "SecPolicyModule", "keeps a policy in the kernel",
+      "It is installed with this command where that was built with clang, "
+      "bpftool and libbpf: install such a package of secpolicy, and libbpf"));
+  return functions;
+}
+
+bool IsStateOfModule() { return access(ModuleMarkOf(StatePath()).c_str(), F_OK) == 0; }
+
+bool IsPublishedTo(const RunningModule& running) {
+  const std::uint64_t generation = PublishedGeneration();
+  return IsStateOfModule() && generation != kNothingPublished && generation == running.Generation();
+}
+
+void BeginPublishing(RunningModule& running) {
+  Remove(PublishedMarkOf(StatePath()));
+  WriteFile(ModuleMarkOf(StatePath()), "");
+  Publish(running);
+}
+
+void EndPublishing() {
+  Remove(ModuleMarkOf(StatePath()));
+  Remove(PublishedMarkOf(StatePath()));
+}
+
+void PublishCommitted() {
+  if (!StateBase::TakeCommitForModule()) return;
+  if (IsStateOfModule()) PublishToRunning();
+}
+
+CommitFollower::CommitFollower() noexcept { ++holders; }
+
+CommitFollower::~CommitFollower() {
+  if (--holders != 0) return;
+  const ErrnoGuard guard;
+  try {
+    PublishCommitted();
+  } catch (const Braxo::Lib::BraxoException& failure) {
+    LogFailure(failure.what());
+  }
+}
+
+HeldPublication::HeldPublication() noexcept { ++holders; }
+
+HeldPublication::~HeldPublication() { --holders; }
+
+}  // namespace LinuxHost
