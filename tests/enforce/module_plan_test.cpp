@@ -54,6 +54,14 @@ TEST(PlanModule, HasTheValuesThatPass) {
             "  socket_family: 1 10\n"
             "  socket_type: 0-2 4-4294967295\n"
             "  prctl_option: none\n");
+  EXPECT_EQ(Dump(PlanModule({DomainOf({"-p bind_port 80 grant", "-p connect_port 25 revoke",
+                                       "-p set_uid 1000 1999 grant", "-p set_gid 0 revoke"})},
+                            kLast)),
+            "domain 0 enforcing: none\n"
+            "  bind_port: 80\n"
+            "  connect_port: 0-24 26-4294967295\n"
+            "  set_uid: 1000-1999\n"
+            "  set_gid: 1-4294967295\n");
 }
 
 TEST(PlanModule, LetsNothingPassThatThereIsNoRoomFor) {
@@ -82,7 +90,9 @@ TEST(PlanModule, OfNothingIsEmpty) { EXPECT_EQ(Dump(PlanModule({}, kLast)), "");
 TEST(FatesByModule, KeepsCapabilitiesAndSomeChecks) {
   EXPECT_THAT(Told(FatesByModule(DomainOf({"-c cap_chown grant", "-c cap_kill revoke",
                                            "-p socket_type 1 grant", "-p socket_family 1 revoke",
-                                           "-p prctl_option 3 grant", "-p ioctl_request 7 grant"}),
+                                           "-p prctl_option 3 grant", "-p ioctl_request 7 grant",
+                                           "-p bind_port 80 grant", "-p connect_port 25 revoke",
+                                           "-p set_uid 1000 grant", "-p set_gid 0 revoke"}),
                                  kLast)),
               IsEmpty());
 }
@@ -96,6 +106,23 @@ TEST(FatesByModule, TellsWhatItDoesNotKeepInOrder) {
                   "notExpressible: -r /srv r (the module does not keep such rules)",
                   "notExpressible: -a object read revoke (the module does not keep such rules)",
                   "notExpressible: -p kill_signal 9 grant (the module does not keep such rules)"));
+}
+
+TEST(FatesByModule, TellsSocketsThatGoPastPorts) {
+  const std::vector<std::string> grants = {
+      "-p socket_family 2 10 grant", "-p socket_family 17 grant", "-p socket_family 21 revoke",
+      "-p socket_type 1 2 grant", "-p socket_type 3 grant"};
+  EXPECT_THAT(Told(FatesByModule(DomainOf(grants), kLast)), IsEmpty());
+  for (const char* const port : {"-p bind_port 80 grant", "-p connect_port 25 revoke"}) {
+    std::vector<std::string> rules = grants;
+    rules.emplace_back(port);
+    EXPECT_THAT(
+        Told(FatesByModule(DomainOf(rules), kLast)),
+        ElementsAre("narrowed: -p socket_family 17 grant (sockets that go past rules for "
+                    "ports are refused)",
+                    "narrowed: -p socket_type 3 grant (sockets that go past rules for ports "
+                    "are refused)"));
+  }
 }
 
 TEST(FatesByModule, TellsWhatAKernelDoesNotKnow) {

@@ -24,7 +24,17 @@ enum { kLevelAbsent, kLevelEnforcing, kLevelPermissive, kLevelDisabled };
 enum { kEntryShift = 32, kEntriesOfDomain = 2 };
 
 // The parameter checks that are kept.
-enum { kCheckFamily, kCheckType, kCheckPrctl, kCheckIoctl, kModuleChecks };
+enum {
+  kCheckFamily,
+  kCheckType,
+  kCheckPrctl,
+  kCheckIoctl,
+  kCheckBindPort,
+  kCheckConnectPort,
+  kCheckUser,
+  kCheckGroup,
+  kModuleChecks
+};
 
 enum { kMostModuleRanges = 32 };
 
@@ -66,6 +76,7 @@ enum {
   kActMakeSocket,     // detail: kSocket..., of a unix socket that has a path
   kActCall,           // value: the number of the system call, of this machine's own architecture
   kActEnter,          // value: the domain; the label and the path are the program's
+  kActPassPorts,      // detail: the type of a socket whose ports nobody sees; value: its family
   kModuleActs,
 };
 

@@ -1,5 +1,7 @@
 #include "host/enforce/module/module_plan.h"
 
+#include <sys/socket.h>
+
 #include <array>
 #include <limits>
 #include <span>
@@ -7,6 +9,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/enforce/plan/capability_plan.h"
+#include "host/enforce/plan/port_check.h"
 #include "host/enforce/plan/value_set.h"
 #include "policy/capability.h"
 
@@ -20,8 +23,9 @@ namespace {
 constexpr std::uint64_t kOfEverybody = std::numeric_limits<std::uint64_t>::max();
 
 // By their places in the map.
-constexpr std::array<std::string_view, kModuleChecks> kChecks = {"socket_family", "socket_type",
-                                                                 "prctl_option", "ioctl_request"};
+constexpr std::array<std::string_view, kModuleChecks> kChecks = {
+    "socket_family", "socket_type",  "prctl_option", "ioctl_request",
+    "bind_port",     "connect_port", "set_uid",      "set_gid"};
 
 CapabilityPlan CapabilitiesOf(const InstalledDomain& domain, unsigned int last) {
   return PlanCapabilities(domain, kOfEverybody, last);
@@ -71,6 +75,35 @@ void TellFates(const InstalledDomain& domain, std::string_view check,
   }
 }
 
+// What is refused beside rules for ports: where other addresses lead to them, or packets are
+// written by the process itself.
+bool IsAboutSocketsPastPorts(const Policy::Rule& rule) {
+  constexpr std::uint32_t kFirstNewerFamily = 46;
+  static const ValueSet families({{AF_PACKET, AF_PACKET},
+                                  {AF_RDS, AF_RDS},
+                                  {AF_PPPOX, AF_PPPOX},
+                                  {AF_TIPC, AF_TIPC},
+                                  {AF_RXRPC, AF_RXRPC},
+                                  {AF_KCM, AF_KCM},
+                                  {AF_XDP, AF_XDP},
+                                  {kFirstNewerFamily, std::numeric_limits<std::uint32_t>::max()}});
+  static const ValueSet types({{SOCK_RAW, SOCK_RAW}, {SOCK_SEQPACKET, SOCK_SEQPACKET}});
+  const Policy::Rule* const one = &rule;
+  const ValueSet values = PassingValues({&one, 1});
+  if (rule.words[0] == kChecks[kCheckFamily]) return !values.Within(families).IsEmpty();
+  return rule.words[0] == kChecks[kCheckType] && !values.Within(types).IsEmpty();
+}
+
+void TellSocketsPastPorts(const InstalledDomain& domain, std::vector<RuleFate>& fates) {
+  if (ReadPortCheck(domain, kBindPort).IsOpen() && ReadPortCheck(domain, kConnectPort).IsOpen())
+    return;
+  for (RuleFate& fate : fates) {
+    const bool isOfCheck = fate.rule.kind == Policy::RuleKind::kParameterCheck;
+    if (isOfCheck && fate.rule.Grants() && IsAboutSocketsPastPorts(fate.rule))
+      Narrow(fate, "sockets that go past rules for ports are refused");
+  }
+}
+
 std::string TextOf(const ModuleCheck& check) {
   std::string text;
   for (const auto& [first, last] : std::span(check.ranges).first(check.count)) {
@@ -101,6 +134,7 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
                      PlaceOf(rule, domain.rules)});
   }
   for (const std::string_view check : kChecks) TellFates(domain, check, fates);
+  TellSocketsPastPorts(domain, fates);
   for (const RuleFate& fate : CapabilitiesOf(domain, lastCapability).fates) {
     fates[fate.place] = fate;
   }

@@ -1,4 +1,8 @@
 // Rules about the parameters of calls.
+#ifndef CHECKS_BPF_H
+#define CHECKS_BPF_H
+
+#include "refusal.bpf.h"
 
 // Whoever asks for no change of its own is told so by this hook, and the kernel goes on.
 #define NOT_HANDLED (-ENOSYS)
@@ -25,13 +29,6 @@ static __always_inline int check_value(int check, __u32 value) {
   return refuse(task->domain, level_of(word), act(kActPassValue, check, value));
 }
 
-SEC("lsm/socket_create")
-int BPF_PROG(make_socket, int family, int type, int protocol, int is_of_kernel) {
-  if (is_of_kernel) return 0;
-  int result = check_value(kCheckFamily, family);
-  return result ? result : check_value(kCheckType, type);
-}
-
 SEC("lsm/task_prctl")
 int BPF_PROG(use_prctl, int option, unsigned long first, unsigned long second, unsigned long third,
              unsigned long fourth) {
@@ -54,3 +51,5 @@ SEC("?lsm/file_ioctl_compat")
 int BPF_PROG(use_ioctl_compat, struct file* file, unsigned int request, unsigned long argument) {
   return check_value(kCheckIoctl, request);
 }
+
+#endif

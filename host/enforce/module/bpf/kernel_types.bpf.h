@@ -23,6 +23,50 @@ struct file {
   struct path f_path;
 };
 
+typedef struct {
+  __u32 val;
+} kuid_t;
+
+typedef struct {
+  __u32 val;
+} kgid_t;
+
+struct group_info {
+  int ngroups;
+  kgid_t gid[];
+};
+
+struct cred {
+  kuid_t uid;
+  kuid_t euid;
+  kuid_t suid;
+  kuid_t fsuid;
+  kgid_t gid;
+  kgid_t egid;
+  kgid_t sgid;
+  kgid_t fsgid;
+  struct group_info* group_info;
+};
+
+struct sock_common {
+  unsigned short skc_family;
+  __u16 skc_num;
+};
+
+struct sock {
+  struct sock_common __sk_common;
+};
+
+struct socket {
+  short type;
+  struct sock* sk;
+};
+
+struct msghdr {
+  void* msg_name;
+  int msg_namelen;
+};
+
 struct super_block {
   unsigned long s_magic;
 };
@@ -33,9 +77,9 @@ struct inode {
 
 #pragma clang attribute pop
 
-struct cred;
 struct dentry;
 struct linux_binprm;
+struct sockaddr;
 struct user_namespace;
 struct vfsmount;
 

@@ -3,7 +3,9 @@
 
 #include "capabilities.bpf.h"
 #include "checks.bpf.h"
+#include "identities.bpf.h"
 #include "self_protection.bpf.h"
+#include "sockets.bpf.h"
 #include "tasks.bpf.h"
 
 // What the helpers take.
