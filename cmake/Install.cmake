@@ -78,7 +78,7 @@ if(TARGET secpolicy_log)
   configure_file(packaging/systemd/secpolicy-log.service.in secpolicy-log.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-log.service" DESTINATION "${SECPOLICY_UNITS}")
 endif()
-foreach(unit boot restore load metrics drift)
+foreach(unit boot restore load module metrics drift)
   configure_file(packaging/systemd/secpolicy-${unit}.service.in secpolicy-${unit}.service @ONLY)
   install(FILES "${PROJECT_BINARY_DIR}/secpolicy-${unit}.service" DESTINATION "${SECPOLICY_UNITS}")
 endforeach()
@@ -92,7 +92,7 @@ install(DIRECTORY docs/schema DESTINATION "${CMAKE_INSTALL_DOCDIR}/docs")
 install_documents("${CMAKE_INSTALL_DOCDIR}" README.md CHANGELOG.md SECURITY.md
   docs/getting-started.md docs/confine-a-service.md docs/add-a-tardisk.md docs/why-refused.md
   docs/bundles.md docs/fleet.md docs/policy-format.md docs/diagnostics.md docs/enforcement.md docs/json.md docs/linux-host.md
-  docs/messages.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/report.md docs/runtime.md
+  docs/messages.md docs/module.md docs/monitoring.md docs/performance.md docs/python.md docs/queries.md docs/report.md docs/runtime.md
   docs/graph.svg docs/images/editor.png docs/images/monitoring.png docs/images/report.png docs/images/rollout.png)
 
 include(Rpm)

@@ -98,6 +98,7 @@ EOF
   for unit in boot restore load; do
     grep -q "^ExecStart=/.*/secpolicy $unit$" "$PREFIX/lib/systemd/system/secpolicy-$unit.service"
   done
+  grep -q "^ExecStart=/.*/secpolicy module start$" "$PREFIX/lib/systemd/system/secpolicy-module.service"
   for unit in metrics drift; do
     [[ -f $PREFIX/lib/systemd/system/secpolicy-$unit.service && -f $PREFIX/lib/systemd/system/secpolicy-$unit.timer ]]
   done

@@ -130,7 +130,7 @@ rpm_files() {
 @test "the units can be verified, expose little, and none is enabled" {
   needs_debian
   local unit
-  for unit in boot load restore metrics drift; do
+  for unit in boot load module restore metrics drift; do
     run inside systemd-analyze verify --man=no "secpolicy-$unit.service"
     [[ $status -eq 0 && -z $output ]]
     inside systemd-analyze security --offline=true --threshold=40 --no-pager \
