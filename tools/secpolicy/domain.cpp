@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <iomanip>
 #include <iostream>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -61,11 +62,17 @@ Action DefineCreate(Syntax& syntax) {
 }
 
 std::vector<std::string> WorldsIn(const NamedDomain& domain) {
-  std::vector<std::string> worlds;
+  std::set<int> worlds;
   for (const LinuxHost::PlacedWorld& world : LinuxHost::ListWorlds(LinuxHost::CurrentState())) {
-    if (world.domainId == domain.id) worlds.push_back(std::to_string(world.id));
+    if (world.domainId == domain.id) worlds.insert(world.id);
   }
-  return worlds;
+  for (const int world : LinuxHost::ListKeptWorlds(LinuxHost::CurrentState(), domain.id)) {
+    worlds.insert(world);
+  }
+  std::vector<std::string> words;
+  words.reserve(worlds.size());
+  for (const int world : worlds) words.push_back(std::to_string(world));
+  return words;
 }
 
 std::string WhyNotDestroyed(const NamedDomain& domain) {

@@ -17,7 +17,7 @@
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
-#include "host/linux/common/late_library.h"
+#include "host/linux/common/module_library.h"
 #include "host/linux/common/used_paths.h"
 #include "host/linux/common/write_all.h"
 #include "host/linux/services/system_log.h"
@@ -102,14 +102,6 @@ void PublishToRunning() {
 }
 
 }  // namespace
-
-const Enforce::ModuleFunctions& ModuleLibrary() {
-  static const auto& functions = *static_cast<const Enforce::ModuleFunctions*>(FindInLateLibrary(
-      "libsecpolicy-module.so.1", "SecPolicyModule", "keeps a policy in the kernel",
-      "It is installed with this command where that was built with clang, "
-      "bpftool and libbpf: install such a package of secpolicy, and libbpf"));
-  return functions;
-}
 
 bool IsStateOfModule() { return access(ModuleMarkOf(StatePath()).c_str(), F_OK) == 0; }
 

@@ -8,10 +8,6 @@
 // module throws.
 namespace LinuxHost {
 
-// The module's library, loaded now unless it is there already. Throws with what to do where it is
-// missing.
-const Enforce::ModuleFunctions& ModuleLibrary();
-
 // True while the state in use is the one that the module keeps, whether it runs or not.
 bool IsStateOfModule();
 

@@ -153,6 +153,25 @@ void RefuseHomelessWorlds(HostState& state) {
   }
 }
 
+// The module knows a domain by its number, and a process cannot be taken from one to the other in
+// the same moment.
+void RefuseMovingWorlds(HostState& state) {
+  std::vector<std::pair<unsigned int, std::string>> moving;
+  {
+    Rows rows = state.Database().Select(
+        "SELECT d.id, d.name FROM main.domain AS d JOIN saved.domain AS s ON s.name = d.name "
+        "WHERE s.id <> d.id ORDER BY d.name");
+    while (rows.Next()) {
+      moving.emplace_back(static_cast<unsigned int>(rows.Integer(0)), rows.Text(1));
+    }
+  }
+  for (const auto& [id, name] : moving) {
+    if (state.Worlds().KeptIn(id).empty()) continue;
+    throw HostError(EBUSY, StrCat("worlds run in the domain '", name,
+                                  "', which has another number in it. End them, and run it again"));
+  }
+}
+
 // Domains may have changed places since, so what belongs to worlds follows the names; by way of
 // negative numbers, as two domains may have swapped theirs.
 constexpr Sql kMoveWorlds[] = {
@@ -212,6 +231,7 @@ void RestorePolicy(const std::string& copy) {
 
   Transaction transaction(store);
   RefuseHomelessWorlds(state);
+  RefuseMovingWorlds(state);
   for (const Sql& statement : kMoveWorlds) store.Run(statement);
   PutTablesBack(store);
   RenewLabels(state);

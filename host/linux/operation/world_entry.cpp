@@ -57,6 +57,10 @@ std::vector<PlacedWorld> ListWorlds(HostState& state) {
   return worlds;
 }
 
+std::vector<int> ListKeptWorlds(HostState& state, unsigned int id) {
+  return state.Worlds().KeptIn(id);
+}
+
 std::optional<PlacedWorld> FindWorldAbove(HostState& state, int process) {
   const std::vector<PlacedWorld> worlds = ListWorlds(state);
   for (pid_t above = process; above > 0; above = ParentOf(above)) {

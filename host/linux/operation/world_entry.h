@@ -25,6 +25,9 @@ struct PlacedWorld {
 // counts.
 std::vector<PlacedWorld> ListWorlds(HostState& state);
 
+// The processes that the module has in the domain `id`, in ascending order.
+std::vector<int> ListKeptWorlds(HostState& state, unsigned int id);
+
 // The process itself or the nearest one above it that is among them: a child is in the domain of
 // its parent. Nothing where none is, and where processes cannot be looked at.
 std::optional<PlacedWorld> FindWorldAbove(HostState& state, int process);

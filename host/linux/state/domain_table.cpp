@@ -131,10 +131,11 @@ std::optional<HostError> DomainTable::Refusal(const DomainReference& reference) 
                                   reference.name, "'"));
 }
 
-// A domain's name is also its label, with the same identifier; kNoLabel is therefore no slot.
-unsigned int DomainTable::LowestFreeSlot() const {
+// A domain's name is also its label, with the same identifier; kNoLabel is therefore no slot. Nor
+// is one in which the module still has processes: they would get the rules of the new domain.
+unsigned int DomainTable::LowestFreeSlot() {
   for (unsigned int id = 0; id < kDomainSlots; ++id) {
-    if (id != kNoLabel && !slots[id]) return id;
+    if (id != kNoLabel && !slots[id] && !worlds.IsKeptIn(id)) return id;
   }
   return kDomainSlots;
 }
@@ -268,9 +269,9 @@ std::vector<std::string> DomainTable::GuestServices(unsigned int id) {
   return services;
 }
 
-DomainReferences DomainTable::CountReferences(const Domain& domain) {
+DomainReferences DomainTable::CountReferences(const Domain& domain, bool isNow) {
   DomainReferences references;
-  references.worlds = worlds.CountIn(domain.id);
+  references.worlds = worlds.CountIn(domain.id, isNow);
   Rows rows = base.Database().Select(
       "SELECT count(*) FROM rule WHERE kind = 'domain transition' AND word2 = ?1 AND granted AND "
       "domain_id <> ?2",
@@ -288,7 +289,7 @@ std::optional<DomainDescription> DomainTable::Describe(unsigned int id) {
       "SELECT id, name, level, default_rules, created_at_run_time FROM domain WHERE id = ?1", id);
   if (!rows.Next()) return std::nullopt;
   DomainDescription description{.domain = ReadDomain(rows), .references = {}};
-  description.references = CountReferences(description.domain);
+  description.references = CountReferences(description.domain, false);
   return description;
 }
 

@@ -60,7 +60,8 @@ class DomainTable {
   void AddGuestService(unsigned int id, const std::string& service);
   std::vector<std::string> GuestServices(unsigned int id);
 
-  DomainReferences CountReferences(const Domain& domain);
+  // `isNow`: as WorldTable::CountIn() has it.
+  DomainReferences CountReferences(const Domain& domain, bool isNow = true);
 
   // The domain as it is now, with what refers to it; empty when there is none.
   std::optional<DomainDescription> Describe(unsigned int id);
@@ -76,7 +77,7 @@ class DomainTable {
   class Change;
 
   void Load();
-  unsigned int LowestFreeSlot() const;
+  unsigned int LowestFreeSlot();
   unsigned int RolesOf(unsigned int id);
   unsigned int Insert(const std::string& name,
                       TeskCtl::Security::TeskAccessKsi_DefaultDom defaultRules,

@@ -1,6 +1,7 @@
 #include "host/linux/state/world_table.h"
 
 #include <cerrno>
+#include <map>
 #include <string>
 
 #include "braxo/misc/strcat.h"
@@ -11,6 +12,17 @@
 using Braxo::Misc::StrCat;
 
 namespace LinuxHost {
+namespace {
+
+unsigned int CountOf(const std::map<int, unsigned int>& worlds, unsigned int domainId) {
+  unsigned int count = 0;
+  for (const auto& [world, domain] : worlds) {
+    if (domain == domainId) ++count;
+  }
+  return count;
+}
+
+}  // namespace
 
 void WorldTable::RequireAlive(int world) {
   if (!IsAlive(world)) throw HostError(ESRCH, StrCat("no world has the identifier ", world));
@@ -27,6 +39,7 @@ void WorldTable::Place(int world, unsigned int domainId, const std::string& leve
 }
 
 std::optional<unsigned int> WorldTable::FindDomainOf(int world) {
+  if (const auto domain = kept.FindDomainOf(world)) return domain;
   Rows rows = store.Select("SELECT started, domain_id FROM world WHERE id = ?1", world);
   if (!rows.Next() || !IsStill(world, rows.Integer(0))) return std::nullopt;
   return static_cast<unsigned int>(rows.Integer(1));
@@ -50,13 +63,27 @@ std::vector<World> WorldTable::All() {
   return worlds;
 }
 
-unsigned int WorldTable::CountIn(unsigned int domainId) {
-  unsigned int count = 0;
+unsigned int WorldTable::CountIn(unsigned int domainId, bool isNow) {
+  const std::map<int, unsigned int> those = isNow ? kept.Read() : kept.ReadRecent();
+  unsigned int count = CountOf(those, domainId);
   Rows rows = store.Select("SELECT id, started FROM world WHERE domain_id = ?1", domainId);
   while (rows.Next()) {
-    if (IsStill(static_cast<int>(rows.Integer(0)), rows.Integer(1))) ++count;
+    const auto id = static_cast<int>(rows.Integer(0));
+    if (!those.contains(id) && IsStill(id, rows.Integer(1))) ++count;
   }
   return count;
+}
+
+std::vector<int> WorldTable::KeptIn(unsigned int domainId) const {
+  std::vector<int> found;
+  for (const auto& [world, domain] : kept.Read()) {
+    if (domain == domainId) found.push_back(world);
+  }
+  return found;
+}
+
+bool WorldTable::IsKeptIn(unsigned int domainId) {
+  return CountOf(kept.ReadRecent(), domainId) != 0;
 }
 
 }  // namespace LinuxHost

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "host/linux/state/kept_worlds.h"
 #include "host/linux/state/store.h"
 
 namespace LinuxHost {
@@ -16,10 +17,11 @@ struct World {
 };
 
 // The worlds, which are processes, and the domains that they were placed in. A world runs in the
-// start domain until it is placed elsewhere. Failures are HostErrors.
+// start domain until it is placed elsewhere. Those that the module has in a domain are worlds of
+// it, whatever else is known of them. Failures are HostErrors, or what the module throws.
 class WorldTable {
  public:
-  explicit WorldTable(Store& database) : store(database) {}
+  explicit WorldTable(Store& database) : store(database), kept(database.Path()) {}
 
   // Throws with ESRCH when no such process lives.
   static void RequireAlive(int world);
@@ -38,11 +40,19 @@ class WorldTable {
   // The same, but nothing for one that was never placed.
   std::optional<unsigned int> FindDomainOf(int world);
 
-  // The number of living worlds that were placed in the domain.
-  unsigned int CountIn(unsigned int domainId);
+  // The number of living worlds that were placed in the domain; of those that the module has there
+  // as of a moment ago, unless `isNow`.
+  unsigned int CountIn(unsigned int domainId, bool isNow = true);
+
+  // Those that the module has there, in ascending order of their identifiers.
+  std::vector<int> KeptIn(unsigned int domainId) const;
+
+  // True when the module had some there a moment ago.
+  bool IsKeptIn(unsigned int domainId);
 
  private:
   Store& store;
+  KeptWorlds kept;
 };
 
 }  // namespace LinuxHost
