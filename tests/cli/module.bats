@@ -41,7 +41,8 @@ elsewhere="the module is a part of the machine's kernel, which keeps the policy 
   secpolicy file-policy add appDom r /srv/jobs
   exits 1
   # Below a root the library is out of sight, as it is for a machine's state in a mount of its own.
-  [[ $stderr == "secpolicy: file-policy add: done"$'\n'"secpolicy: file-policy add: the policy is installed, and the kernel was not told of it: Unable to load what keeps a policy in the kernel: "*": install such a package of secpolicy, and libbpf" ]]
+  says "secpolicy: file-policy add: done"
+  [[ $stderr == *$'\n'"secpolicy: file-policy add: the policy is installed, and the kernel was not told of it: Unable to load what keeps a policy in the kernel: "*": install such a package of secpolicy, and libbpf" ]]
   [[ ! -e $root/run/secpolicy/module.published ]]
   secpolicy file-policy list appDom
   [[ $output == *"/srv/jobs"* ]]

@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "enforce/domain_plan.h"
+#include "module/module_status.h"
 #include "query/ask.h"
 #include "query/named.h"
 #include "text/visible.h"
@@ -32,6 +33,11 @@ const char* TextOf(Enforce::Namespace mounts) {
   return "no";
 }
 
+const char* TextOf(const ModuleKernel& kernel) {
+  if (!kernel.runsPrograms) return "not known, as it does not tell its security modules";
+  return *kernel.runsPrograms ? "yes" : "no, as bpf is not among its security modules";
+}
+
 std::string YesOrNo(bool isSo) { return isSo ? "yes" : "no"; }
 
 void WriteFeatures(const Features& features) {
@@ -39,14 +45,18 @@ void WriteFeatures(const Features& features) {
             << (features.landlock == 0 ? "no" : "version " + std::to_string(features.landlock))
             << "\nfilters of system calls: " << YesOrNo(features.seccomp)
             << "\nfilters that ask a supervisor: " << YesOrNo(features.notifies)
-            << "\nmounts of one's own: " << TextOf(Enforce::ProbeMounts()) << '\n';
+            << "\nmounts of one's own: " << TextOf(Enforce::ProbeMounts())
+            << "\nmodule for the whole machine: " << TextOf(ReadModuleKernel()) << '\n';
 }
 
 Json ToJson(const Features& features) {
+  Json module;
+  if (const auto runs = ReadModuleKernel().runsPrograms) module = *runs;
   return {{"landlock", features.landlock},
           {"seccomp", features.seccomp},
           {"seccompNotify", features.notifies},
-          {"mountNamespace", TextOf(Enforce::ProbeMounts())}};
+          {"mountNamespace", TextOf(Enforce::ProbeMounts())},
+          {"module", module}};
 }
 
 ExitCode ShowFeatures(const std::string& format) {

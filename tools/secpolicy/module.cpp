@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "enforce/domain_plan.h"
+#include "host/linux/common/module_library.h"
 #include "host/linux/kernel/module_publication.h"
 #include "host/linux/operation/state_use.h"
 #include "installed/installed_policy.h"
@@ -28,13 +29,9 @@ using Enforce::RuleFate;
 
 constexpr std::size_t kTitleWidth = 9;
 
-std::string Processes(std::size_t count) {
-  return std::to_string(count) + (count == 1 ? " process" : " processes");
-}
-
 // The kernel is the machine's, and so is what it keeps.
 void RequireMachine() {
-  if (!PlacesOfRoot().empty() || !LinuxHost::IsStateAtUsualPlace()) {
+  if (!IsOfMachine()) {
     throw Refusal(
         "the module is a part of the machine's kernel, which keeps the policy of the machine "
         "itself, and none below another root or in another state");
@@ -117,9 +114,7 @@ std::vector<std::string> EnforcingDomains() {
 std::size_t CountConfined(const Enforce::RunningModule& running) {
   if (LinuxHost::IsStateMissing()) return 0;
   SecPolicy::TeskAccessInterfaceImpl access;
-  std::size_t count = 0;
-  for (const KeptDomain& domain : ReadKeptDomains(running, access)) count += domain.processes;
-  return count;
+  return SumOf(ReadKeptDomains(running, access)).processes;
 }
 
 ExitCode Stop(bool isForced) {
@@ -150,49 +145,21 @@ void WriteLine(const std::string& title, const std::string& text) {
   std::cout << padded << Visible(text) << '\n';
 }
 
-std::string DescribeKernel(const ModuleKernel& kernel) {
-  std::string text = "Linux " + kernel.release;
-  if (!kernel.runsPrograms) return text + ", which does not tell its security modules";
-  return text + (*kernel.runsPrograms ? ", with bpf among" : ", without bpf among") +
-         " its security modules";
-}
-
-std::string DescribeDomain(const KeptDomain& domain) {
-  return domain.name + " " + TextOf(domain.level) + ": " + Processes(domain.processes) + ", " +
-         std::to_string(domain.refused) + " refused, " + std::to_string(domain.passed) +
-         " let pass";
-}
-
 void WriteText(const ModuleStatus& status) {
-  WriteLine("kernel", DescribeKernel(status.kernel));
+  WriteLine("kernel", Describe(status.kernel));
   WriteLine("module", status.isRunning ? "runs" : "does not run");
   if (!status.isRunning) return;
   WriteLine("canary", status.isRefusing ? "refused" : "not refused");
   WriteLine("policy", status.isPublished ? "as it is installed" : "behind what is installed");
   WriteLine("domains", std::to_string(status.domains.size()));
-  for (const KeptDomain& domain : status.domains) WriteLine("", DescribeDomain(domain));
+  for (const KeptDomain& domain : status.domains)
+    WriteLine("", domain.name + " " + TextOf(domain.level) + ": " + Describe(domain));
 }
 
 void WriteJson(const ModuleStatus& status) {
-  Json domains = Json::Array();
-  for (const KeptDomain& domain : status.domains) {
-    domains.Append({{"name", domain.name},
-                    {"level", TextOf(domain.level)},
-                    {"processes", domain.processes},
-                    {"refused", domain.refused},
-                    {"passed", domain.passed}});
-  }
-  Json runsPrograms;
-  if (status.kernel.runsPrograms) runsPrograms = *status.kernel.runsPrograms;
-  std::cout << Json{
-      {"schema", "secpolicy.module/1"},
-      {"kernel", status.kernel.release},
-      {"runsPrograms", runsPrograms},
-      {"running", status.isRunning},
-      {"refusing", status.isRefusing},
-      {"published", status.isPublished},
-      {"domains",
-       domains}}.Text();
+  Json json = {{"schema", "secpolicy.module/1"}};
+  for (const auto& [name, value] : MembersOf(status)) json[name] = value;
+  std::cout << json.Text();
 }
 
 std::string Conclude(const ModuleStatus& status) {

@@ -121,6 +121,14 @@ void WriteErrors(const LinuxHost::LoadRecord& load) {
   }
 }
 
+std::string DescribeModule(const ModuleStatus& module) {
+  if (!module.problem.empty()) return module.problem;
+  if (!module.isRunning) return module.isWanted ? "does not run any more" : "does not run";
+  return std::string(module.isRefusing ? "refuses" : "does not refuse") +
+         ", told what is installed" + (module.isPublished ? "" : " before the latest change") +
+         ": " + Describe(SumOf(module.domains));
+}
+
 void WriteText(const HostStatus& status) {
   WriteLine("policy", status.IsLoaded() ? "loaded" : "not loaded");
   WriteLine("latest load", status.load ? DescribeLoad(*status.load) : "none by this command");
@@ -142,6 +150,10 @@ void WriteText(const HostStatus& status) {
   }
   for (const std::string& domain : status.domainsWithoutFile) {
     WriteLine("in no file", "domain " + domain);
+  }
+  if (status.module) {
+    WriteLine("kernel", Describe(status.module->kernel));
+    WriteLine("module", DescribeModule(*status.module));
   }
   WriteLine("worlds", std::to_string(status.worlds.size()));
   for (const auto& world : status.worlds) WriteLine("", DescribeWorld(world, status));
@@ -192,7 +204,7 @@ void WriteJson(const HostStatus& status) {
   if (status.load) load = ToJson(*status.load);
   Json bundle;
   if (status.bundle) bundle = ToJson(*status.bundle);
-  const Json screen = {
+  Json screen = {
       {"schema", "secpolicy.status/1"},
       {"loaded", status.IsLoaded()},
       {"latestLoad", load},
@@ -205,6 +217,11 @@ void WriteJson(const HostStatus& status) {
       {"inNoFile", {{"domains", status.domainsWithoutFile}, {"rules", status.rulesWithoutLine}}},
       {"worlds", WorldsToJson(status)},
       {"tardisks", ToJson(status.tardisks)}};
+  if (status.module) {
+    Json module = Json::Object();
+    for (const auto& [name, value] : MembersOf(*status.module)) module[name] = value;
+    screen["module"] = module;
+  }
   std::cout << screen.Text();
 }
 
@@ -214,12 +231,15 @@ ExitCode EndWith(const HostStatus& status, bool isBooted) {
   if (!status.IsLoaded()) {
     text = "no policy is loaded. " + Call(isBooted ? "load" : "boot") + " loads one";
   }
+  if (status.IsModuleBroken()) {
+    text = "the kernel does not keep what is installed. " + Call("module status") + " says why";
+  }
   if (problems) {
     text =
         "the latest load did not end well. " + Call("check") + " shows every problem of the files";
   }
   Summarize("status", text);
-  return problems || !status.IsLoaded() ? kFailed : kWell;
+  return problems || !status.IsLoaded() || status.IsModuleBroken() ? kFailed : kWell;
 }
 
 struct Options {
@@ -289,10 +309,10 @@ const Verb kStatus = {
     "status", "Show on one screen whether the policy is loaded, and how that went",
     "Prints the latest load with its errors, the bundle that the policy came from and what was "
     "edited\n"
-    "since, the domains by enforcement level, and how many objects, rules of each kind and "
-    "tardisks\n"
-    "there are. Exit status: 0 the policy is loaded,\n"
-    "1 it is not, or the latest load did not end well.\n"
+    "since, the domains by enforcement level, how many objects, rules of each kind and tardisks\n"
+    "there are, and whether the kernel keeps it. Exit status: 0 the policy is loaded, 1 it is "
+    "not,\n"
+    "the latest load did not end well, or a kernel that is to keep it does not.\n"
     "With --format prometheus it writes metrics in the text format of that monitoring system; "
     "they\n"
     "say themselves whether the host was booted and how the load went, so the exit status is 0 "

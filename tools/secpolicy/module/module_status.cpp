@@ -9,9 +9,12 @@
 #include <map>
 #include <system_error>
 
+#include "host/enforce/module/module_maps.h"
+#include "host/linux/common/module_library.h"
 #include "host/linux/kernel/module_publication.h"
 #include "host/linux/operation/state_use.h"
 #include "policy/installed_policy.h"
+#include "root.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -43,7 +46,9 @@ std::map<unsigned int, std::size_t> CountProcesses(const Enforce::RunningModule&
   return counts;
 }
 
+// Where there are no pins, there is nothing to load a library for.
 void ReadRunning(ModuleStatus& status) {
+  if (!status.isWanted && access(Enforce::kModulePins, F_OK) != 0) return;
   const auto running = LinuxHost::ModuleLibrary().find();
   if (running == nullptr) return;
   status.isRunning = true;
@@ -66,8 +71,43 @@ ModuleKernel ReadModuleKernel() {
   return kernel;
 }
 
+bool IsOfMachine() { return PlacesOfRoot().empty() && LinuxHost::IsStateAtUsualPlace(); }
+
+std::string Describe(const ModuleKernel& kernel) {
+  std::string text = "Linux " + kernel.release;
+  if (!kernel.runsPrograms) return text + ", which does not tell its security modules";
+  return text + (*kernel.runsPrograms ? ", with bpf among" : ", without bpf among") +
+         " its security modules";
+}
+
+std::string Processes(std::size_t count) {
+  return std::to_string(count) + (count == 1 ? " process" : " processes");
+}
+
+std::string Describe(const KeptDomain& domain) {
+  return Processes(domain.processes) + ", " + std::to_string(domain.refused) + " refused, " +
+         std::to_string(domain.passed) + " let pass";
+}
+
+std::vector<Json::Member> MembersOf(const ModuleStatus& status) {
+  Json domains = Json::Array();
+  for (const KeptDomain& domain : status.domains) {
+    domains.Append({{"name", domain.name},
+                    {"level", TextOf(domain.level)},
+                    {"processes", domain.processes},
+                    {"refused", domain.refused},
+                    {"passed", domain.passed}});
+  }
+  Json runsPrograms;
+  if (status.kernel.runsPrograms) runsPrograms = *status.kernel.runsPrograms;
+  return {{"kernel", status.kernel.release}, {"runsPrograms", runsPrograms},
+          {"running", status.isRunning},     {"refusing", status.isRefusing},
+          {"published", status.isPublished}, {"domains", domains}};
+}
+
 ModuleStatus ReadModuleStatus() {
   ModuleStatus status;
+  status.isWanted = LinuxHost::IsStateOfModule();
   status.kernel = ReadModuleKernel();
   try {
     ReadRunning(status);
@@ -75,6 +115,16 @@ ModuleStatus ReadModuleStatus() {
     status.problem = failure.what();
   }
   return status;
+}
+
+KeptDomain SumOf(const std::vector<KeptDomain>& domains) {
+  KeptDomain sum;
+  for (const KeptDomain& domain : domains) {
+    sum.processes += domain.processes;
+    sum.refused += domain.refused;
+    sum.passed += domain.passed;
+  }
+  return sum;
 }
 
 std::vector<KeptDomain> ReadKeptDomains(const Enforce::RunningModule& running,

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host/enforce/module/entry_point.h"
+#include "json.h"
 #include "policy/level.h"
 #include "secpolicy/secpolicy.h"
 
@@ -33,7 +34,8 @@ struct KeptDomain {
 
 struct ModuleStatus {
   ModuleKernel kernel;
-  std::string problem;  // why it cannot be told whether the module runs; empty when it can
+  bool isWanted = false;  // it was started for what is installed
+  std::string problem;    // why it cannot be told whether the module runs; empty when it can
   bool isRunning = false;
   bool isRefusing = false;   // tried anew
   bool isPublished = false;  // it was told all that is installed
@@ -42,9 +44,27 @@ struct ModuleStatus {
   bool IsWell() const { return isRunning && isRefusing && isPublished; }
 };
 
+// True where it is about the machine itself: below no other root, and with no state of its own.
+bool IsOfMachine();
+
+// "Linux RELEASE, with bpf among its security modules".
+std::string Describe(const ModuleKernel& kernel);
+
+// "1 process", "2 processes".
+std::string Processes(std::size_t count);
+
+// "2 processes, 3 refused, 0 let pass".
+std::string Describe(const KeptDomain& domain);
+
+// For programs: all but the schema.
+std::vector<Json::Member> MembersOf(const ModuleStatus& status);
+
 // Throws what the host throws. What the module does not tell is in `problem`. What is asked takes a
 // process for a moment, unless the module does not run.
 ModuleStatus ReadModuleStatus();
+
+// All of them together, without a name.
+KeptDomain SumOf(const std::vector<KeptDomain>& domains);
 
 // The domains that are installed, as `running` keeps them.
 std::vector<KeptDomain> ReadKeptDomains(const Enforce::RunningModule& running,

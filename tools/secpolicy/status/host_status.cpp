@@ -31,6 +31,7 @@ HostStatus ReadStatus() {
   status.tardisks = ReadTardisks(access);
   status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
   status.bundle = ReadBundleStatus();
+  if (IsOfMachine()) status.module = ReadModuleStatus();
   status.worlds = LinuxHost::ListWorlds(LinuxHost::CurrentState());
   for (const Policy::InstalledDomain& domain : status.policy.domains) {
     status.domainsByLevel[domain.level].push_back(domain.name);

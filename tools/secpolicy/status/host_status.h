@@ -10,6 +10,7 @@
 #include "host/linux/operation/load_record.h"
 #include "host/linux/operation/world_entry.h"
 #include "installed/installed_policy.h"
+#include "module/module_status.h"
 
 namespace SecPolicyCli {
 
@@ -34,10 +35,13 @@ struct HostStatus {
       domainsWithoutFile;  // what loads have installed and no file has any more
   std::size_t rulesWithoutLine = 0;
   std::vector<LinuxHost::PlacedWorld> worlds;
+  std::optional<ModuleStatus> module;  // of the machine itself alone
 
   // Beside the one that is built in, there are domains only when something was loaded.
   bool IsLoaded() const { return policy.domains.size() > 1; }
   bool HasProblems() const { return load && load->ending != "done"; }
+  // Whether the kernel is to keep the policy, and does not.
+  bool IsModuleBroken() const { return module && module->isWanted && !module->IsWell(); }
 };
 
 // Throws what the host throws.

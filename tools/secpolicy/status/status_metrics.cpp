@@ -119,6 +119,24 @@ Gauge Count(const char* name, const char* help, std::size_t count) {
   return {name, help, {{{}, static_cast<double>(count)}}};
 }
 
+// Of the machine itself.
+std::vector<Gauge> ModuleGauges(const ModuleStatus& module) {
+  const KeptDomain all = SumOf(module.domains);
+  return {
+      Count("secpolicy_module_wanted", "1 when the kernel is to keep the policy for every process.",
+            module.isWanted),
+      Count("secpolicy_module_refusing", "1 when it refuses, which was tried.", module.isRefusing),
+      Count("secpolicy_module_published", "1 when it was told all that is installed.",
+            module.isPublished),
+      Count("secpolicy_module_processes", "Processes that the kernel has in domains.",
+            all.processes),
+      {"secpolicy_module_refusals",
+       "What the kernel has refused in domains since the module was started, or let pass in "
+       "permissive ones.",
+       {{{{"outcome", "refused"}}, static_cast<double>(all.refused)},
+        {{{"outcome", "passed"}}, static_cast<double>(all.passed)}}}};
+}
+
 }  // namespace
 
 std::string MetricsOf(const HostStatus& status) {
@@ -137,6 +155,7 @@ std::string MetricsOf(const HostStatus& status) {
       Count("secpolicy_objects", "Installed object labels.", status.policy.objects.size()));
   gauges.push_back(Count("secpolicy_tardisks", "Tardisks of the host.", status.tardisks.size()));
   gauges.push_back(WorldGauge(status));
+  if (status.module) std::ranges::move(ModuleGauges(*status.module), std::back_inserter(gauges));
   gauges.push_back(Count("secpolicy_rules_without_file",
                          "Rules that a load has installed, no file has any more, and that stay.",
                          status.rulesWithoutLine));
