@@ -9,6 +9,7 @@
 #include "environment.h"
 #include "execution.h"
 #include "host/enforce/broker/message.h"
+#include "host/linux/kernel/module_publication.h"
 #include "host/linux/operation/log_use.h"
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
@@ -54,6 +55,8 @@ ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
   if (!MaySurrender(verb, compiled, options)) return kNotConfined;
   const auto program = ProgramOf(entry);
   if (program && KeepsAllRules(compiled)) RequireExecutable(*program, domain, access);
+  // This process does not end as others do: a new label index was a commit.
+  LinuxHost::PublishCommitted();
   LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
   std::cerr << std::flush;
   if (compiled.plan.level == Policy::Level::kPermissive) {
