@@ -102,6 +102,12 @@ EOF
   for unit in metrics drift; do
     [[ -f $PREFIX/lib/systemd/system/secpolicy-$unit.service && -f $PREFIX/lib/systemd/system/secpolicy-$unit.timer ]]
   done
+  [[ ! -e $BUILD_DIR/bin/secpolicy-log ]] || {
+    [[ -x $PREFIX/bin/secpolicy-log && -f $PREFIX/share/man/man8/secpolicy-log.8 ]]
+    [[ -f $PREFIX/share/bash-completion/completions/secpolicy-log && -f $PREFIX/share/zsh/vendor-completions/_secpolicy-log ]]
+    [[ -f $PREFIX/share/fish/vendor_completions.d/secpolicy-log.fish ]]
+    grep -q '^ExecStart=/.*/secpolicy-log$' "$PREFIX/lib/systemd/system/secpolicy-log.service"
+  }
   [[ -f $PREFIX/lib/systemd/catalog/secpolicy.catalog && -f $PREFIX/share/doc/secpolicy/examples/monitoring/alerts.yaml ]]
 }
 

@@ -44,7 +44,7 @@ download_debian() {
 # A Debian without anything of ours but what our packages need of others, and then with them. None
 # where it cannot be had.
 make_debian() {
-  local needed=libarchive13,libseccomp2,libsqlite3-0,libstdc++6,zlib1g
+  local needed=libarchive13,libbpf1,libseccomp2,libsqlite3-0,libstdc++6,zlib1g
   download_debian "$needed,busybox-static,systemd"
   [[ -d $DEBIAN ]] || return 0
   files >"$BATS_FILE_TMPDIR/clean"
@@ -130,7 +130,7 @@ rpm_files() {
 @test "the units can be verified, expose little, and none is enabled" {
   needs_debian
   local unit
-  for unit in boot load module restore metrics drift; do
+  for unit in boot load module restore metrics drift log; do
     run inside systemd-analyze verify --man=no "secpolicy-$unit.service"
     [[ $status -eq 0 && -z $output ]]
     inside systemd-analyze security --offline=true --threshold=40 --no-pager \

@@ -51,7 +51,7 @@ std::optional<InstalledDomain> ReadDomain(unsigned int id) {
 
 void AddLabel(Enforce::EventNames& names, const ModuleEvent& event,
               TeskAccessInterfaceImpl& access) {
-  if (event.label == Enforce::kNoModuleLabel) return;
+  if (event.label <= Enforce::kLabelNone) return;
   names.label = access.GetLabel(event.label, TESKACCESS_LABEL_OBJECT);
   names.labelIsBuiltIn = access.IsPredefinedLabel(names.label, TESKACCESS_LABEL_OBJECT);
 }

@@ -24,17 +24,31 @@ struct FileUse {
 };
 
 constexpr std::array<FileUse, 6> kFileUses = {{
-    {kUseRead, FileAccess::kRead, "read"},
-    {kUseWrite, FileAccess::kWrite, "write"},
-    {kUseExecute, FileAccess::kExecute, "execute"},
-    {kUseList, FileAccess::kList, "list"},
-    {kUseRemove, FileAccess::kRemove, "remove"},
-    {kUseTruncate, FileAccess::kTruncate, "truncate"},
+    {kAccessRead, FileAccess::kRead, "read"},
+    {kAccessWrite, FileAccess::kWrite, "write"},
+    {kAccessExecute, FileAccess::kExecute, "execute"},
+    {kAccessList, FileAccess::kList, "list"},
+    {kAccessRemove, FileAccess::kRemove, "remove"},
+    {kAccessTruncate, FileAccess::kTruncate, "truncate"},
 }};
 
-constexpr std::array<const char*, 6> kFileKinds = {"regular", "directory",   "symlink",
-                                                   "fifo",    "char_device", "block_device"};
-constexpr std::array<const char*, 3> kSocketKinds = {"stream", "dgram", "seqpacket"};
+struct NewFile {
+  __u32 bit;
+  RuleKind kind;
+  const char* word;
+};
+
+constexpr std::array<NewFile, 9> kNewFiles = {{
+    {kMakeRegular, RuleKind::kFileCreation, "regular"},
+    {kMakeDirectory, RuleKind::kFileCreation, "directory"},
+    {kMakeLink, RuleKind::kFileCreation, "symlink"},
+    {kMakeFifo, RuleKind::kFileCreation, "fifo"},
+    {kMakeCharacterDevice, RuleKind::kFileCreation, "char_device"},
+    {kMakeBlockDevice, RuleKind::kFileCreation, "block_device"},
+    {kMakeStream, RuleKind::kUnixSocketCreation, "stream"},
+    {kMakeDatagram, RuleKind::kUnixSocketCreation, "dgram"},
+    {kMakeSequence, RuleKind::kUnixSocketCreation, "seqpacket"},
+}};
 
 Questions Ask(RuleKind kind, std::string_view word) {
   if (word.empty()) return {};
@@ -58,15 +72,18 @@ Questions AskUse(const ModuleEvent& event, const std::string& path, const EventN
   return questions;
 }
 
-template <std::size_t count>
-Questions AskCreation(RuleKind kind, const std::array<const char*, count>& kinds,
-                      const ModuleEvent& event, const std::string& path, const EventNames& names) {
-  if (event.detail >= count || path.empty()) return {};
-  return {Policy::CreationQuestion{.kind = kind,
-                                   .what = kinds[event.detail],
-                                   .path = path,
-                                   .directoryLabel = names.label,
-                                   .labelIsBuiltIn = names.labelIsBuiltIn}};
+Questions AskCreation(const ModuleEvent& event, const std::string& path, const EventNames& names) {
+  Questions questions;
+  if (path.empty()) return questions;
+  for (const auto& [bit, kind, word] : kNewFiles) {
+    if ((event.detail & bit) == 0) continue;
+    questions.emplace_back(Policy::CreationQuestion{.kind = kind,
+                                                    .what = word,
+                                                    .path = path,
+                                                    .directoryLabel = names.label,
+                                                    .labelIsBuiltIn = names.labelIsBuiltIn});
+  }
+  return questions;
 }
 
 Questions AskCapability(const ModuleEvent& event) {
@@ -111,9 +128,7 @@ Questions QuestionsOf(const ModuleEvent& event, const std::string& path, const E
     case kActUseFile:
       return AskUse(event, path, names);
     case kActMakeFile:
-      return AskCreation(RuleKind::kFileCreation, kFileKinds, event, path, names);
-    case kActMakeSocket:
-      return AskCreation(RuleKind::kUnixSocketCreation, kSocketKinds, event, path, names);
+      return AskCreation(event, path, names);
     case kActCall:
       return AskCall(event);
     case kActEnter:
