@@ -1,13 +1,31 @@
 // Rules about capabilities: who has one may use it where a rule of its domain grants it.
+#include "calling.bpf.h"
 
 // Whoever asks in this way will not be told of a refusal, and is not counted.
 #define CAP_OPT_NOAUDIT 2
+
+#define CAP_SYS_ADMIN 21
+
+// Calls that make or change a mount of nobody's yet, which no hook is at but that this capability is
+// asked for.
+static __always_inline bool is_about_mounts(__u32 call) {
+  return call == 428     // open_tree
+         || call == 430  // fsopen
+         || call == 432  // fsmount
+         || call == 433  // fspick
+         || call == 442  // mount_setattr
+         || call == 467; // open_tree_attr
+}
 
 SEC("lsm/capable")
 int BPF_PROG(use_capability, const struct cred* cred, struct user_namespace* space, int capability,
              unsigned int options) {
   struct ModuleTask* task = current_task();
   if (!task) return 0;
+  if (capability == CAP_SYS_ADMIN && is_about_mounts(number_of_call())) {
+    int result = refuse_in_any_domain();
+    if (result) return result;
+  }
   __u64 word = word_of(task->domain);
   struct ModuleRules* granted = rules_of(word);
   if (granted && level_of(word) != kLevelAbsent && granted->capabilities >> (capability & 63) & 1)

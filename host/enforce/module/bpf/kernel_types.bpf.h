@@ -10,6 +10,7 @@
 struct task_struct {
   struct task_struct* group_leader;
   struct task_struct* real_parent;
+  const struct cred* cred;
   __s32 tgid;
   __u64 start_boottime;
 };
@@ -20,6 +21,8 @@ struct path {
 };
 
 struct file {
+  __u32 f_mode;
+  struct inode* f_inode;
   struct path f_path;
 };
 
@@ -67,12 +70,41 @@ struct msghdr {
   int msg_namelen;
 };
 
+struct pt_regs {
+#if defined(__TARGET_ARCH_arm64)
+  __s32 syscallno;
+#else
+  unsigned long orig_ax;
+#endif
+};
+
+struct key_type {
+  const char* name;
+};
+
+struct key {
+  struct key_type* type;
+};
+
+struct io_uring_cmd {
+  __u32 cmd_op;
+};
+
 struct super_block {
   unsigned long s_magic;
 };
 
 struct inode {
   struct super_block* i_sb;
+};
+
+struct qstr {
+  const unsigned char* name;
+};
+
+struct dentry {
+  struct qstr d_name;
+  struct inode* d_inode;
 };
 
 #pragma clang attribute pop
