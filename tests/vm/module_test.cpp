@@ -20,6 +20,7 @@
 #include <cerrno>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
 #include <random>
 #include <string>
 #include <thread>
@@ -393,6 +394,52 @@ TEST(ModuleWithoutSecurityModule, IsNotStarted) {
             "the module: the kernel does not run its programs, since bpf is not among the security "
             "modules that it was started with (lsm=)");
   EXPECT_FALSE(std::filesystem::exists(Enforce::kModulePins));
+}
+
+// What a machine that is locked down to a certain degree does; tests/vm/all locks it down.
+bool IsLockedDown(const std::string& degree) {
+  std::ifstream file("/sys/kernel/security/lockdown");
+  const std::string modes{std::istreambuf_iterator<char>(file), {}};
+  return modes.find("[" + degree + "]") != std::string::npos;
+}
+
+TEST_F(ModuleTest, RefusesBelowAKernelThatIsLockedDownForIntegrity) {
+  if (!IsLockedDown("integrity")) GTEST_SKIP() << "this kernel is not";
+  Restart();
+  module->Publish(Granting(0), 2);
+  ExpectRefused(ChangeRoot);
+}
+
+TEST(ModuleBelowConfidentiality, IsNotStarted) {
+  if (!IsLockedDown("confidentiality")) GTEST_SKIP() << "this kernel is not";
+  EXPECT_EQ(MessageOf([] { Module::Start(); }),
+            "the module: the kernel takes no such programs, since it is locked down "
+            "(lockdown=confidentiality)");
+  EXPECT_FALSE(Module::FindRunning().has_value());
+}
+
+// What the kernel was told is replaced for one process alone.
+TEST_F(ModuleTest, IsNotStartedWhereItIsTurnedOff) {
+  Module::Stop();
+  const auto messageWith = [](const char* told) {
+    return InChild([told] {
+      if (unshare(CLONE_NEWNS) != 0) return 99;
+      if (mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0) return 98;
+      std::ofstream("/tmp/cmdline") << told;
+      if (mount("/tmp/cmdline", "/proc/cmdline", nullptr, MS_BIND, nullptr) != 0) return 97;
+      const std::string message = MessageOf([] { Module::Start(); });
+      if (message == "nothing was thrown") return 0;
+      return message ==
+                     "the module: it is turned off by secpolicy.module=off of the kernel's "
+                     "command line"
+                 ? 1
+                 : 96;
+    });
+  };
+  EXPECT_EQ(messageWith("quiet secpolicy.module=off rw\n"), 1);
+  EXPECT_FALSE(Module::FindRunning().has_value());
+  EXPECT_EQ(messageWith("quiet secpolicy.module=on secpolicy.module=offline rw\n"), 0);
+  EXPECT_TRUE(Module::FindRunning().has_value());
 }
 
 }  // namespace

@@ -13,6 +13,8 @@
 #include <cerrno>
 #include <cstdio>
 #include <filesystem>
+#include <fstream>
+#include <sstream>
 #include <utility>
 #include <vector>
 
@@ -74,6 +76,35 @@ void RequireFileSystem() {
 }
 
 bool HasHook(const char* name) { return libbpf_find_vmlinux_btf_id(name, BPF_LSM_MAC) > 0; }
+
+// The first line of a file; empty where there is none.
+std::string LineOf(const char* path) {
+  std::ifstream file(path);
+  std::string line;
+  std::getline(file, line);
+  return line;
+}
+
+// For whoever cannot use the machine otherwise.
+void RequireNotTurnedOff() {
+  std::istringstream words(LineOf("/proc/cmdline"));
+  for (std::string word; words >> word;) {
+    if (word == kModuleOff) {
+      throw BraxoException(
+          StrCat("the module: it is turned off by ", kModuleOff, " of the kernel's command line"));
+    }
+  }
+}
+
+// Who locks the kernel down that far wants nobody to read its memory, as the programs do.
+void RequireNotLockedDown() {
+  const std::string modes = LineOf("/sys/kernel/security/lockdown");
+  if (modes.find("[confidentiality]") != std::string::npos) {
+    throw BraxoException(
+        "the module: the kernel takes no such programs, since it is locked down "
+        "(lockdown=confidentiality)");
+  }
+}
 
 Programs LoadAndAttach() {
   libbpf_set_print(nullptr);
@@ -139,6 +170,8 @@ Module& Module::operator=(Module&&) noexcept = default;
 Module::~Module() = default;
 
 Module Module::Start() {
+  RequireNotTurnedOff();
+  RequireNotLockedDown();
   RequireFileSystem();
   if (std::filesystem::exists(kModulePins)) throw BraxoException("the module: it runs already");
   Remove(kNewPins);

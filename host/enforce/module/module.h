@@ -13,6 +13,9 @@
 
 namespace Enforce {
 
+// A word of the kernel's command line, with which nothing is started.
+inline constexpr const char* kModuleOff = "secpolicy.module=off";
+
 // The module: programs that the kernel runs for every process, and what they have been told. They
 // stay until they are stopped or the machine is, whether anybody has this object or not. Everything
 // throws Braxo::Lib::BraxoException, and takes CAP_SYS_ADMIN or CAP_BPF, outside of all domains. Of
@@ -20,7 +23,8 @@ namespace Enforce {
 class Module {
  public:
   // Loads and starts the programs, which refuse nothing until something is published. Nothing is
-  // left of it when it throws, as it does where programs would not be run.
+  // left of it when it throws, as it does where programs would not be run, where the kernel is locked
+  // down so far that it takes none, and where kModuleOff says so.
   static Module Start();
 
   // The one that runs; nothing where none does.
