@@ -69,12 +69,12 @@ TEST(QuestionsOf, AsksForEachUseOfAFile) {
     const char* byPath;
     const char* byLabel;
   } uses[] = {
-      {Enforce::kAccessRead, "-r /etc/key r", "-a sshKey read grant"},
-      {Enforce::kAccessWrite, "-r /etc/key w", "-a sshKey write grant"},
-      {Enforce::kAccessExecute, "-r /etc/key x", "-a sshKey execute grant"},
-      {Enforce::kAccessList, "-r /etc/key r", "-a sshKey list grant"},
-      {Enforce::kAccessRemove, "-r /etc/key w", "-a sshKey remove grant"},
-      {Enforce::kAccessTruncate, "-r /etc/key w", "-a sshKey truncate grant"},
+      {Enforce::kUseRead, "-r /etc/key r", "-a sshKey read grant"},
+      {Enforce::kUseWrite, "-r /etc/key w", "-a sshKey write grant"},
+      {Enforce::kUseExecute, "-r /etc/key x", "-a sshKey execute grant"},
+      {Enforce::kUseList, "-r /etc/key r", "-a sshKey list grant"},
+      {Enforce::kUseRemove, "-r /etc/key w", "-a sshKey remove grant"},
+      {Enforce::kUseTruncate, "-r /etc/key w", "-a sshKey truncate grant"},
   };
   for (const auto& [use, byPath, byLabel] : uses) {
     const ModuleEvent event = Event(Enforce::kActUseFile, use, 0);
@@ -90,46 +90,35 @@ TEST(QuestionsOf, AsksForEachUseOfAFile) {
 
 TEST(QuestionsOf, AsksForAllUsesAtOnce) {
   const std::vector<Question> asked = QuestionsOf(
-      Event(Enforce::kActUseFile, Enforce::kAccessRead | Enforce::kAccessWrite, 0), "/etc/key", {});
+      Event(Enforce::kActUseFile, Enforce::kUseRead | Enforce::kUseWrite, 0), "/etc/key", {});
   ASSERT_THAT(asked, SizeIs(2));
   EXPECT_TRUE(IsGranted(asked[0], "-r /etc r"));
   EXPECT_FALSE(IsGranted(asked[1], "-r /etc r"));
 }
 
 TEST(QuestionsOf, AsksToMakeFilesAndSockets) {
-  const struct {
-    unsigned int bit;
-    const char* word;
-    bool isByPath;
-  } files[] = {
-      {Enforce::kMakeRegular, "regular", true},
-      {Enforce::kMakeDirectory, "directory", true},
-      {Enforce::kMakeLink, "symlink", true},
-      {Enforce::kMakeFifo, "fifo", true},
-      {Enforce::kMakeCharacterDevice, "char_device", false},
-      {Enforce::kMakeBlockDevice, "block_device", false},
-  };
-  for (const auto& [bit, word, isByPath] : files) {
+  const char* const kinds[] = {"regular", "directory",   "symlink",
+                               "fifo",    "char_device", "block_device"};
+  for (unsigned int kind = 0; kind < std::size(kinds); ++kind) {
     const Question asked =
-        Only(QuestionsOf(Event(Enforce::kActMakeFile, bit, 0), "/srv/new", {.label = "spool"}));
-    EXPECT_TRUE(IsGranted(asked, std::string("-f spool spool ") + word + " grant"));
-    EXPECT_FALSE(IsGranted(asked, std::string("-f other spool ") + word + " grant"));
-    EXPECT_EQ(IsGranted(asked, "-r /srv w"), isByPath);
+        Only(QuestionsOf(Event(Enforce::kActMakeFile, kind, 0), "/srv/new", {.label = "spool"}));
+    EXPECT_TRUE(IsGranted(asked, std::string("-f spool spool ") + kinds[kind] + " grant"));
+    EXPECT_FALSE(IsGranted(asked, std::string("-f other spool ") + kinds[kind] + " grant"));
+    EXPECT_EQ(IsGranted(asked, "-r /srv w"), kind < 4);
   }
-  const struct {
-    unsigned int bit;
-    const char* word;
-  } sockets[] = {{Enforce::kMakeStream, "stream"},
-                 {Enforce::kMakeDatagram, "dgram"},
-                 {Enforce::kMakeSequence, "seqpacket"}};
-  for (const auto& [bit, word] : sockets) {
-    const Question asked =
-        Only(QuestionsOf(Event(Enforce::kActMakeFile, bit, 0), "/srv/s", {.label = "spool"}));
-    EXPECT_TRUE(IsGranted(asked, std::string("-u spool ") + word + " grant"));
-    EXPECT_FALSE(IsGranted(asked, std::string("-u other ") + word + " grant"));
-  }
-  EXPECT_THAT(QuestionsOf(Event(Enforce::kActMakeFile, 0, 0), "/srv/new", {}), IsEmpty());
-  EXPECT_THAT(QuestionsOf(Event(Enforce::kActMakeFile, Enforce::kMakeFifo, 0), "", {}), IsEmpty());
+  const Question socket = Only(QuestionsOf(
+      Event(Enforce::kActMakeSocket, Enforce::kSocketDatagram, 0), "/srv/s", {.label = "spool"}));
+  EXPECT_TRUE(IsGranted(socket, "-u spool dgram grant"));
+  EXPECT_FALSE(IsGranted(socket, "-u spool stream grant"));
+  EXPECT_THAT(QuestionsOf(Event(Enforce::kActMakeFile, 6, 0), "/srv/new", {}), IsEmpty());
+  EXPECT_THAT(QuestionsOf(Event(Enforce::kActMakeSocket, 3, 0), "/srv/new", {}), IsEmpty());
+  EXPECT_THAT(QuestionsOf(Event(Enforce::kActMakeFile, 0, 0), "", {}), IsEmpty());
+  EXPECT_TRUE(
+      IsGranted(Only(QuestionsOf(Event(Enforce::kActMakeFile, 0, 0), "", {.label = "spool"})),
+                "-f spool spool regular grant"));
+  EXPECT_TRUE(
+      IsGranted(Only(QuestionsOf(Event(Enforce::kActMakeSocket, 0, 0), "", {.label = "spool"})),
+                "-u spool stream grant"));
 }
 
 TEST(QuestionsOf, AsksForACall) {
@@ -152,6 +141,7 @@ TEST(QuestionsOf, AsksToEnterADomain) {
 TEST(QuestionsOf, AsksNothingOfWhatNoRuleGrants) {
   const ModuleEvent event = Event(Enforce::kActReachModule, 0, 0);
   EXPECT_TRUE(IsOfNoRule(event));
+  EXPECT_TRUE(IsOfNoRule(Event(Enforce::kActPassPorts, 1, 45)));
   EXPECT_FALSE(IsOfNoRule(Event(Enforce::kActCall, 0, 0)));
   EXPECT_THAT(QuestionsOf(event, "/etc/key", {.label = "sshKey"}), IsEmpty());
   EXPECT_THAT(QuestionsOf(Event(Enforce::kModuleActs, 0, 0), "/etc/key", {}), IsEmpty());

@@ -70,7 +70,7 @@ TEST_F(ModuleEventsTest, TellsWhoWasRefusedWhat) {
   EXPECT_EQ(event.parent, static_cast<__u32>(getpid()));
   EXPECT_EQ(event.user, 0U);
   EXPECT_EQ(event.isRefused, 1U);
-  EXPECT_EQ(event.label, static_cast<__u32>(Enforce::kLabelUnknown));
+  EXPECT_EQ(event.label, static_cast<__u32>(Enforce::kNoModuleLabel));
   EXPECT_STREQ(event.program, "module_tests");
   EXPECT_EQ(all[0].path, "");
   timespec now = {};

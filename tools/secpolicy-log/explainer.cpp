@@ -27,6 +27,9 @@ using TeskCtl::Security::TESKACCESS_LABEL_OBJECT;
 
 constexpr std::int64_t kSecond = 1'000'000'000;
 
+// What is less says that there is none, or none that is known.
+constexpr unsigned int kFirstLabel = 2;
+
 std::int64_t NowBy(clockid_t clock) {
   timespec now = {};
   clock_gettime(clock, &now);
@@ -51,7 +54,7 @@ std::optional<InstalledDomain> ReadDomain(unsigned int id) {
 
 void AddLabel(Enforce::EventNames& names, const ModuleEvent& event,
               TeskAccessInterfaceImpl& access) {
-  if (event.label <= Enforce::kLabelNone) return;
+  if (event.label < kFirstLabel) return;
   names.label = access.GetLabel(event.label, TESKACCESS_LABEL_OBJECT);
   names.labelIsBuiltIn = access.IsPredefinedLabel(names.label, TESKACCESS_LABEL_OBJECT);
 }
@@ -84,9 +87,21 @@ Question Refused(const std::vector<Question>& asked, const InstalledDomain& doma
   return asked.front();
 }
 
+// Of what no question can be asked.
 std::string ActOf(const ModuleEvent& event) {
-  if (Enforce::IsOfNoRule(event)) return "reach what enforces the policy, or past it";
-  return "do something that has no name here (" + std::to_string(event.act) + ")";
+  switch (event.act) {
+    case Enforce::kActReachModule:
+      return "reach what enforces the policy, or past it";
+    case Enforce::kActPassPorts:
+      return "use a socket whose ports nobody sees (family " + std::to_string(event.value) +
+             ", type " + std::to_string(event.detail) + ")";
+    case Enforce::kActUseFile:
+    case Enforce::kActMakeFile:
+    case Enforce::kActMakeSocket:
+      return "use or make a file without a known path or label";
+    default:
+      return "do something that has no name here (" + std::to_string(event.act) + ")";
+  }
 }
 
 std::string Joined(const std::vector<std::string>& parts) {

@@ -60,29 +60,6 @@ struct ModuleRules {
   struct ModuleCheck checks[kModuleChecks];
 };
 
-// Labels that are none of a policy: that of a file nobody can tell, and that of one that surely has
-// none.
-enum { kLabelUnknown, kLabelNone };
-
-// What may be done with a file that is there, and what may be made in a directory, as bits.
-enum {
-  kAccessRead = 1 << 0,
-  kAccessWrite = 1 << 1,
-  kAccessExecute = 1 << 2,
-  kAccessList = 1 << 3,
-  kAccessRemove = 1 << 4,
-  kAccessTruncate = 1 << 5,
-  kMakeRegular = 1 << 6,
-  kMakeDirectory = 1 << 7,
-  kMakeLink = 1 << 8,
-  kMakeFifo = 1 << 9,
-  kMakeCharacterDevice = 1 << 10,
-  kMakeBlockDevice = 1 << 11,
-  kMakeStream = 1 << 12,
-  kMakeDatagram = 1 << 13,
-  kMakeSequence = 1 << 14,
-};
-
 struct ModuleTask {
   __u32 domain;
 };
@@ -94,13 +71,31 @@ enum {
   kActUseCapability,  // value: its number
   kActPassValue,      // detail: the check; value: what was passed
   kActReachModule,    // of self-protection
-  kActUseFile,        // detail: the accesses, as bits
-  kActMakeFile,       // detail: the kind, as a bit
+  kActUseFile,        // detail: bits of kUse..., all that was asked for at once
+  kActMakeFile,       // detail: kMake...
+  kActMakeSocket,     // detail: kSocket..., of a unix socket that has a path
   kActCall,           // value: the number of the system call, of this machine's own architecture
   kActEnter,          // value: the domain; the label and the path are the program's
   kActPassPorts,      // detail: the type of a socket whose ports nobody sees; value: its family
   kModuleActs,
 };
+
+// Ways to use a file, as bits.
+enum {
+  kUseRead = 1 << 0,
+  kUseWrite = 1 << 1,
+  kUseExecute = 1 << 2,
+  kUseList = 1 << 3,
+  kUseRemove = 1 << 4,
+  kUseTruncate = 1 << 5,
+};
+
+enum { kMakeRegular, kMakeDirectory, kMakeSymlink, kMakeFifo, kMakeCharDevice, kMakeBlockDevice };
+
+enum { kSocketStream, kSocketDatagram, kSocketSeqpacket };
+
+// Labels are numbered from 2 on.
+enum { kNoModuleLabel };
 
 // What was refused, or passed in a permissive domain where an enforcing one would have refused it.
 struct ModuleEvent {

@@ -24,31 +24,17 @@ struct FileUse {
 };
 
 constexpr std::array<FileUse, 6> kFileUses = {{
-    {kAccessRead, FileAccess::kRead, "read"},
-    {kAccessWrite, FileAccess::kWrite, "write"},
-    {kAccessExecute, FileAccess::kExecute, "execute"},
-    {kAccessList, FileAccess::kList, "list"},
-    {kAccessRemove, FileAccess::kRemove, "remove"},
-    {kAccessTruncate, FileAccess::kTruncate, "truncate"},
+    {kUseRead, FileAccess::kRead, "read"},
+    {kUseWrite, FileAccess::kWrite, "write"},
+    {kUseExecute, FileAccess::kExecute, "execute"},
+    {kUseList, FileAccess::kList, "list"},
+    {kUseRemove, FileAccess::kRemove, "remove"},
+    {kUseTruncate, FileAccess::kTruncate, "truncate"},
 }};
 
-struct NewFile {
-  __u32 bit;
-  RuleKind kind;
-  const char* word;
-};
-
-constexpr std::array<NewFile, 9> kNewFiles = {{
-    {kMakeRegular, RuleKind::kFileCreation, "regular"},
-    {kMakeDirectory, RuleKind::kFileCreation, "directory"},
-    {kMakeLink, RuleKind::kFileCreation, "symlink"},
-    {kMakeFifo, RuleKind::kFileCreation, "fifo"},
-    {kMakeCharacterDevice, RuleKind::kFileCreation, "char_device"},
-    {kMakeBlockDevice, RuleKind::kFileCreation, "block_device"},
-    {kMakeStream, RuleKind::kUnixSocketCreation, "stream"},
-    {kMakeDatagram, RuleKind::kUnixSocketCreation, "dgram"},
-    {kMakeSequence, RuleKind::kUnixSocketCreation, "seqpacket"},
-}};
+constexpr std::array<const char*, 6> kFileKinds = {"regular", "directory",   "symlink",
+                                                   "fifo",    "char_device", "block_device"};
+constexpr std::array<const char*, 3> kSocketKinds = {"stream", "dgram", "seqpacket"};
 
 Questions Ask(RuleKind kind, std::string_view word) {
   if (word.empty()) return {};
@@ -72,18 +58,24 @@ Questions AskUse(const ModuleEvent& event, const std::string& path, const EventN
   return questions;
 }
 
-Questions AskCreation(const ModuleEvent& event, const std::string& path, const EventNames& names) {
-  Questions questions;
-  if (path.empty()) return questions;
-  for (const auto& [bit, kind, word] : kNewFiles) {
-    if ((event.detail & bit) == 0) continue;
-    questions.emplace_back(Policy::CreationQuestion{.kind = kind,
-                                                    .what = word,
-                                                    .path = path,
-                                                    .directoryLabel = names.label,
-                                                    .labelIsBuiltIn = names.labelIsBuiltIn});
-  }
-  return questions;
+// What is made has the label of its directory, unless a rule says otherwise.
+Questions AskByLabel(RuleKind kind, const char* what, const std::string& label) {
+  if (label.empty()) return {};
+  if (kind == RuleKind::kUnixSocketCreation)
+    return {WordsQuestion{.kind = kind, .words = {label, what}}};
+  return {WordsQuestion{.kind = kind, .words = {label, label, what}}};
+}
+
+template <std::size_t count>
+Questions AskCreation(RuleKind kind, const std::array<const char*, count>& kinds,
+                      const ModuleEvent& event, const std::string& path, const EventNames& names) {
+  if (event.detail >= count) return {};
+  if (path.empty()) return AskByLabel(kind, kinds[event.detail], names.label);
+  return {Policy::CreationQuestion{.kind = kind,
+                                   .what = kinds[event.detail],
+                                   .path = path,
+                                   .directoryLabel = names.label,
+                                   .labelIsBuiltIn = names.labelIsBuiltIn}};
 }
 
 Questions AskCapability(const ModuleEvent& event) {
@@ -117,7 +109,9 @@ Questions AskEntry(const EventNames& names) {
 
 }  // namespace
 
-bool IsOfNoRule(const ModuleEvent& event) { return event.act == kActReachModule; }
+bool IsOfNoRule(const ModuleEvent& event) {
+  return event.act == kActReachModule || event.act == kActPassPorts;
+}
 
 Questions QuestionsOf(const ModuleEvent& event, const std::string& path, const EventNames& names) {
   switch (event.act) {
@@ -128,7 +122,9 @@ Questions QuestionsOf(const ModuleEvent& event, const std::string& path, const E
     case kActUseFile:
       return AskUse(event, path, names);
     case kActMakeFile:
-      return AskCreation(event, path, names);
+      return AskCreation(RuleKind::kFileCreation, kFileKinds, event, path, names);
+    case kActMakeSocket:
+      return AskCreation(RuleKind::kUnixSocketCreation, kSocketKinds, event, path, names);
     case kActCall:
       return AskCall(event);
     case kActEnter:

@@ -16,7 +16,8 @@ struct EventNames {
   std::vector<Policy::Rule> ways = {};  // into it
 };
 
-// True for what is refused in any domain, whatever its rules are.
+// True for what no rule grants: what is refused in any domain, and sockets past the checks of
+// ports.
 bool IsOfNoRule(const ModuleEvent& event);
 
 // What the rules were asked, of the file at `path`, which is empty where it is not known: of a file

@@ -36,7 +36,7 @@ struct ModuleAct {
 };
 
 static __always_inline struct ModuleAct act(__u32 kind, __u32 detail, __u64 value) {
-  struct ModuleAct asked = {kind, detail, value, kLabelUnknown};
+  struct ModuleAct asked = {kind, detail, value, kNoModuleLabel};
   return asked;
 }
 
