@@ -118,7 +118,7 @@ is_told() {
 @test "each kind of entry is explained, and the catalogue is taken" {
   local ids
   mapfile -t ids < <(grep -oE '"[0-9a-f]{32}"' "$SOURCE/tools/secpolicy/monitor/journal.cpp" | tr -d '"' | sort)
-  [[ ${#ids[@]} -eq 8 ]]
+  [[ ${#ids[@]} -eq 10 ]]
   diff <(printf '%s\n' "${ids[@]}") <(sed -n 's/^-- //p' "$SOURCE/packaging/systemd/secpolicy.catalog" | sort)
   command -v journalctl >/dev/null || skip "journalctl, which takes catalogues, is not installed"
   local host=$BATS_TEST_TMPDIR/host

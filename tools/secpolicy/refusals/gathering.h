@@ -5,6 +5,7 @@
 #include <deque>
 #include <map>
 #include <string>
+#include <string_view>
 #include <tuple>
 #include <vector>
 
