@@ -79,27 +79,6 @@ TEST_F(ModuleTest, ObeysALevelAtOnce) {
   }
 }
 
-TEST_F(ModuleTest, OpensNothingWhilePoliciesAreSwapped) {
-  module->Publish(Granting(0), 2);
-  const auto tries = [] {
-    for (int number = 0; number < 20000; ++number) {
-      if (ChangeRoot() != EPERM) return 0;
-    }
-    return EPERM;
-  };
-  const pid_t child = fork();
-  if (child == 0) {
-    raise(SIGSTOP);
-    _exit(tries());
-  }
-  waitpid(child, nullptr, WUNTRACED);
-  module->Place(child, kDomain);
-  kill(child, SIGCONT);
-  for (std::uint64_t number = 0; number < 200; ++number)
-    module->Publish(Granting(number % 2 == 0 ? kAll & ~kChroot : 0), number);
-  EXPECT_EQ(ResultOf(child), EPERM);
-}
-
 TEST_F(ModuleTest, KeepsTheGeneration) {
   EXPECT_EQ(module->Generation(), 1U);
   module->Publish(Granting(0), 0x100000002);

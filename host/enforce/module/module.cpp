@@ -4,6 +4,7 @@
 #include <bpf/libbpf.h>
 #include <fcntl.h>
 #include <linux/magic.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/vfs.h>
@@ -162,6 +163,13 @@ void Remove(const char* pins) {
     throw BraxoException(StrCat("the module: cannot remove ", pins, ": ", error.message()));
 }
 
+// Held by one of those that write, until it is closed or its holder is killed.
+FileDescriptor LockPins() {
+  FileDescriptor pins(open(kModulePins, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  Require(pins.IsOpen() && flock(pins.Number(), LOCK_EX) == 0, kModulePins);
+  return pins;
+}
+
 }  // namespace
 
 Module::Module(std::unique_ptr<ModuleMaps> those) : maps(std::move(those)) {}
@@ -207,6 +215,7 @@ void Module::Stop() {
 }
 
 void Module::Publish(const ModulePlan& plan, std::uint64_t generation) {
+  const FileDescriptor lock = LockPins();
   std::vector<bool> exists(kModuleDomains);
   for (const auto& [id, level, rules] : plan) {
     RequireDomain(id);
@@ -235,6 +244,7 @@ bool Module::IsRefusing() const {
 
 void Module::SetLevel(unsigned int domain, Policy::Level level) {
   RequireDomain(domain);
+  const FileDescriptor lock = LockPins();
   maps->WriteLevel(domain, NumberOf(level));
 }
 

@@ -18,8 +18,8 @@ inline constexpr const char* kModuleOff = "secpolicy.module=off";
 
 // The module: programs that the kernel runs for every process, and what they have been told. They
 // stay until they are stopped or the machine is, whether anybody has this object or not. Everything
-// throws Braxo::Lib::BraxoException, and takes CAP_SYS_ADMIN or CAP_BPF, outside of all domains. Of
-// those that write one may do so at a time, which is for the callers to see to.
+// throws Braxo::Lib::BraxoException, and takes CAP_SYS_ADMIN or CAP_BPF, outside of all domains.
+// Those that publish or set a level at once do so one after the other.
 class Module {
  public:
   // Loads and starts the programs, which refuse nothing until something is published. Nothing is
