@@ -196,8 +196,9 @@ AssembledRoot AssembleRoot(const TardiskRules& rules, const std::function<void()
   const AtRoot atRoot;
   // A root that has never run has no place for what runs.
   mkdir("/run", 0755);
-  // A state that cannot be used is told before a file is changed.
+  // A state that cannot be used, or is in use, is told before a file is changed.
   AssembledRoot root;
+  HostState::Current().Worlds().RequireNoneKept();
   root.labelAttribute = UsableLabelAttribute(HostState::Current().Directory());
   const std::vector<std::string> images = ListImages(rules);
   UnpackTardisks(images, rules, root);

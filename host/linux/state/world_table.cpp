@@ -82,6 +82,15 @@ std::vector<int> WorldTable::KeptIn(unsigned int domainId) const {
   return found;
 }
 
+void WorldTable::RequireNoneKept() const {
+  for (const auto& [world, domain] : kept.Read()) {
+    if (domain == kStartDomain) continue;
+    throw HostError(EBUSY, StrCat("The kernel keeps domains in which worlds run, such as ", world,
+                                  ", and a boot would take them away. \"secpolicy load\" installs "
+                                  "the policy without that; else end them, or the module"));
+  }
+}
+
 bool WorldTable::IsKeptIn(unsigned int domainId) {
   return CountOf(kept.ReadRecent(), domainId) != 0;
 }

@@ -47,6 +47,10 @@ class WorldTable {
   // Those that the module has there, in ascending order of their identifiers.
   std::vector<int> KeptIn(unsigned int domainId) const;
 
+  // Throws when the module has any in another domain than the start domain: the domain's number
+  // would be given to another.
+  void RequireNoneKept() const;
+
   // True when the module had some there a moment ago.
   bool IsKeptIn(unsigned int domainId);
 
