@@ -110,11 +110,20 @@ inline bool KernelRunsPrograms() {
   return ("," + modules + ",").find(",bpf,") != std::string::npos;
 }
 
+// What keeps nobody from files.
+inline constexpr const char* kAllFiles = "-r / rwx";
+
 // kDomain, with these rules.
-inline Policy::InstalledDomain Numbered(const std::vector<std::string>& rules) {
+inline Policy::InstalledDomain NumberedStrictly(const std::vector<std::string>& rules) {
   Policy::InstalledDomain domain = DomainOf(rules);
   domain.id = kDomain;
   return domain;
+}
+
+// It may use all files besides.
+inline Policy::InstalledDomain Numbered(std::vector<std::string> rules) {
+  rules.emplace_back(kAllFiles);
+  return NumberedStrictly(rules);
 }
 
 class ModuleTest : public testing::Test {
@@ -133,12 +142,12 @@ class ModuleTest : public testing::Test {
     module = Module::Start();
   }
 
-  // kDomain may use these capabilities and kOther all. No check keeps anybody from anything.
+  // kDomain may use these capabilities and kOther all. No check keeps anybody from anything, and
+  // all files may be used.
   static ModulePlan Granting(std::uint64_t capabilities, Level level = Level::kEnforcing) {
-    Policy::InstalledDomain domain;
-    domain.id = kDomain;
+    Policy::InstalledDomain domain = Numbered({});
     domain.level = level;
-    Policy::InstalledDomain other;
+    Policy::InstalledDomain other = Numbered({});
     other.id = kOther;
     ModulePlan plan = PlanModule({domain, other}, CAP_LAST_CAP);
     plan[0].rules.capabilities = capabilities;

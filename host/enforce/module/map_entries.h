@@ -58,7 +58,91 @@ struct ModuleCheck {
 struct ModuleRules {
   __u64 capabilities;  // those that are granted, by Linux's numbers as bits
   struct ModuleCheck checks[kModuleChecks];
+  __u32 hasPaths;  // whether any rule is about a path
 };
+
+// Labels that are none of a policy: that of a file nobody can tell, and that of one that surely has
+// none.
+enum { kLabelUnknown, kLabelNone };
+
+// Beside the label of a file: its disk does not have it yet.
+enum { kLabelIsUnwritten = 1U << 31 };
+
+enum {
+  kMostLabelledFiles = 1 << 20,
+  kMostFileSystems = 1 << 12,
+  kMostKnownDirectories = 1 << 16,
+};
+
+// A file, for as long as there is one: the number of its inode is used again, with another
+// generation.
+struct ModuleFile {
+  __u64 inode;
+  __u32 device;
+  __u32 generation;
+};
+
+enum { kMostLabelRules = 1 << 18, kMostPathRules = 1 << 18 };
+
+// Kinds of files that rules give a new label to, from kMakeShift on.
+enum { kLabelledKinds = 6 };
+
+struct ModuleLabelKey {
+  __u32 entry;
+  __u32 label;
+};
+
+// What rules say of the files with a label, and of directories with it. What is refused counts.
+struct ModuleLabelRules {
+  __u32 granted;
+  __u32 refused;
+  __u32 newLabels[kLabelledKinds];  // 0: that of the directory
+};
+
+// The hash of a path, which nobody can tell beforehand.
+struct ModulePathKey {
+  __u64 hash;
+  __u64 entry;
+};
+
+// What rules say of a path, as bits.
+enum {
+  kPathExecute = 1 << 0,
+  kPathWrite = 1 << 1,
+  kPathRead = 1 << 2,
+  kPathHasRule = 1 << 3,
+  kPathIsAboveRule = 1 << 4,  // some rule is about what is beneath
+  kPathBits = 5,
+};
+
+// By which paths are hashed: the multiplier is odd, and the other one its inverse.
+struct ModuleHashing {
+  __u64 basis;
+  __u64 multiplier;
+  __u64 inverse;
+};
+
+enum { kPathsOfDirectory = 4 };
+
+// What was found out about a directory, for as long as nothing was moved or labelled since.
+struct ModuleDirectory {
+  __u64 label;  // with the epoch that it is of, see kEpochShift
+  // What rules say of it, in the lowest kPathBits, and by what they have been found, hashed.
+  __u64 paths[kPathsOfDirectory];
+  __u64 hash;   // of its path
+  __u64 check;  // of the former and of what it has been found by
+};
+
+// The label that the file gets which a thread is about to make.
+struct ModuleMaking {
+  __u64 entry;
+  __u64 name;
+  __u32 label;  // 0: none of its own
+};
+
+// Of a label and the epoch that it is of, in 64 bits, which change at once, this is the latter.
+// Labels with numbers beyond are looked for each time.
+enum { kEpochShift = 24 };
 
 struct ModuleTask {
   __u32 domain;
@@ -93,6 +177,33 @@ enum {
 enum { kMakeRegular, kMakeDirectory, kMakeSymlink, kMakeFifo, kMakeCharDevice, kMakeBlockDevice };
 
 enum { kSocketStream, kSocketDatagram, kSocketSeqpacket };
+
+// What rules grant: the uses of a file that is there, and above them what may be made in a
+// directory.
+enum {
+  kAllUses = (1 << 6) - 1,
+  kMakeShift = 6,
+  kMayMakeRegular = 1 << (kMakeShift + kMakeRegular),
+  kMayMakeDirectory = 1 << (kMakeShift + kMakeDirectory),
+  kMayMakeLink = 1 << (kMakeShift + kMakeSymlink),
+  kMayMakeFifo = 1 << (kMakeShift + kMakeFifo),
+  kMayMakeCharacterDevice = 1 << (kMakeShift + kMakeCharDevice),
+  kMayMakeBlockDevice = 1 << (kMakeShift + kMakeBlockDevice),
+  kSocketShift = kMakeShift + kMakeBlockDevice + 1,
+  kMayMakeStream = 1 << (kSocketShift + kSocketStream),
+  kMayMakeDatagram = 1 << (kSocketShift + kSocketDatagram),
+  kMayMakeSequence = 1 << (kSocketShift + kSocketSeqpacket),
+  kMayMakeDevice = kMayMakeCharacterDevice | kMayMakeBlockDevice,
+  kMayMakeSocket = kMayMakeStream | kMayMakeDatagram | kMayMakeSequence,
+};
+
+// What permission for a path grants, and what is refused without it.
+enum {
+  kRightsToRead = kUseRead | kUseList,
+  kRightsToExecute = kUseExecute,
+  kRightsToWrite = kUseWrite | kUseRemove | kUseTruncate | kMayMakeRegular | kMayMakeDirectory |
+                   kMayMakeLink | kMayMakeFifo | kMayMakeSocket,
+};
 
 // Labels are numbered from 2 on.
 enum { kNoModuleLabel };

@@ -22,6 +22,9 @@
 #include "braxo/lib/exception.h"
 #include "braxo/misc/strcat.h"
 #include "host/enforce/module/canary.h"
+#include "host/enforce/module/file_maps.h"
+#include "host/enforce/module/label_learning.h"
+#include "host/enforce/module/label_writing.h"
 #include "host/enforce/module/module_maps.h"
 #include "module_programs.skel.h"
 
@@ -40,9 +43,18 @@ struct NamedMap {
   FileDescriptor ModuleMaps::*map;
 };
 constexpr std::array kMaps = {
-    NamedMap{"domains", &ModuleMaps::domains},       NamedMap{"rules", &ModuleMaps::rules},
-    NamedMap{"tasks", &ModuleMaps::tasks},           NamedMap{"refusals", &ModuleMaps::refusals},
-    NamedMap{"generation", &ModuleMaps::generation}, NamedMap{"events", &ModuleMaps::events},
+    NamedMap{"domains", &ModuleMaps::domains},
+    NamedMap{"rules", &ModuleMaps::rules},
+    NamedMap{"tasks", &ModuleMaps::tasks},
+    NamedMap{"refusals", &ModuleMaps::refusals},
+    NamedMap{"generation", &ModuleMaps::generation},
+    NamedMap{"events", &ModuleMaps::events},
+    NamedMap{"labels", &ModuleMaps::labels},
+    NamedMap{"devices", &ModuleMaps::devices},
+    NamedMap{"epoch", &ModuleMaps::epoch},
+    NamedMap{"hashing", &ModuleMaps::hashing},
+    NamedMap{"paths", &ModuleMaps::paths},
+    NamedMap{"label_rules", &ModuleMaps::labelRules},
 };
 
 struct Destroy {
@@ -112,6 +124,7 @@ Programs LoadAndAttach() {
   Programs programs(module_programs__open());
   Require(programs != nullptr, "cannot read the programs");
   bpf_program__set_autoload(programs->progs.use_ioctl_compat, HasHook("file_ioctl_compat"));
+  bpf_program__set_autoload(programs->progs.truncate_file, HasHook("file_truncate"));
   Require(module_programs__load(programs.get()) == 0, "cannot load the programs");
   Require(module_programs__attach(programs.get()) == 0, "cannot attach the programs");
   return programs;
@@ -185,6 +198,7 @@ Module Module::Start() {
   Remove(kNewPins);
   const Programs programs = LoadAndAttach();
   std::unique_ptr<ModuleMaps> maps = MapsOf(*programs);
+  ChooseHashing(*maps);
   RequireRefusal(*maps);
   try {
     Pin(*programs);
@@ -205,7 +219,8 @@ std::optional<Module> Module::FindRunning() {
 
 void Module::Stop() {
   // The kernel ends programs a moment after nothing holds them.
-  if (const std::optional<Module> running = FindRunning()) {
+  if (std::optional<Module> running = FindRunning()) {
+    running->WriteLabels();
     for (unsigned int id = 0; id < kDomainEntries; ++id)
       running->maps->WriteLevel(id, kLevelDisabled);
   }
@@ -217,14 +232,17 @@ void Module::Stop() {
 void Module::Publish(const ModulePlan& plan, std::uint64_t generation) {
   const FileDescriptor lock = LockPins();
   std::vector<bool> exists(kModuleDomains);
-  for (const auto& [id, level, rules] : plan) {
-    RequireDomain(id);
-    exists[id] = true;
-    maps->Write(id, rules, NumberOf(level));
+  for (const ModuleDomain& domain : plan) {
+    RequireDomain(domain.id);
+    exists[domain.id] = true;
   }
+  WriteFileRules(*maps, plan);
+  for (const ModuleDomain& domain : plan)
+    maps->Write(domain.id, domain.rules, NumberOf(domain.level));
   for (unsigned int id = 0; id < kModuleDomains; ++id) {
     if (!exists[id]) maps->WriteLevel(id, kLevelAbsent);
   }
+  RemoveUnusedFileRules(*maps);
   const __u32 only = 0;
   Require(bpf_map_update_elem(maps->generation.Number(), &only, &generation, BPF_ANY) == 0,
           "cannot write the generation");
@@ -263,6 +281,10 @@ std::optional<unsigned int> Module::DomainOf(pid_t process) const {
     ThrowModuleError(StrCat("cannot look up process ", process));
   return std::nullopt;
 }
+
+std::vector<UnlabelledMount> Module::LearnLabels() { return Enforce::LearnLabels(*maps); }
+
+std::size_t Module::WriteLabels() { return Enforce::WriteLabels(*maps); }
 
 ModuleRefusals Module::RefusalsIn(unsigned int domain) const {
   RequireDomain(domain);

@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "host/enforce/module/map_entries.h"
 #include "host/enforce/module/module_maps.h"
@@ -15,6 +17,16 @@ namespace Enforce {
 
 // A word of the kernel's command line, with which nothing is started.
 inline constexpr const char* kModuleOff = "secpolicy.module=off";
+
+// A mounted file system whose files have labels that the module cannot tell, so that it grants
+// nothing by them.
+struct UnlabelledMount {
+  std::string place;
+  std::string type;  // "btrfs"
+  std::string why;
+
+  bool operator==(const UnlabelledMount&) const = default;
+};
 
 // The module: programs that the kernel runs for every process, and what they have been told. They
 // stay until they are stopped or the machine is, whether anybody has this object or not. Everything
@@ -30,8 +42,8 @@ class Module {
   // The one that runs; nothing where none does.
   static std::optional<Module> FindRunning();
 
-  // Ends it: from here on nothing is refused, and who was in a domain is in none. Does nothing
-  // where none runs.
+  // Ends it: from here on nothing is refused, and who was in a domain is in none. The labels of new
+  // files are written first, as by WriteLabels(). Does nothing where none runs.
   static void Stop();
 
   Module(Module&&) noexcept;
@@ -55,6 +67,16 @@ class Module {
 
   // The domain that the process is in; nothing when it is in none.
   std::optional<unsigned int> DomainOf(pid_t process) const;
+
+  // Lets it learn the labels of all files of the file systems that are mounted in this mount
+  // namespace and were not learned yet, by reading them. Until then it knows the label of no file,
+  // and so of those that are mounted later. Returns those of which it cannot learn them.
+  std::vector<UnlabelledMount> LearnLabels();
+
+  // Writes the labels of new files, which -f rules have given them in the kernel alone, to the
+  // files themselves. Takes CAP_SYS_ADMIN and CAP_DAC_READ_SEARCH. Returns of how many this could
+  // not be done, as of those in a file system that lies in memory.
+  std::size_t WriteLabels();
 
   // How much was refused in a domain, or passed in a permissive one, since the module was started.
   ModuleRefusals RefusalsIn(unsigned int domain) const;

@@ -25,9 +25,14 @@ void Store(std::uint64_t& word, std::uint64_t entry, unsigned int level) {
   std::atomic_ref(word).store(entry << kEntryShift | level, std::memory_order_release);
 }
 
-// Of a domain's two entries the one that its rules are in.
-std::uint64_t EntryOf(std::uint64_t& word) {
-  return std::atomic_ref(word).load(std::memory_order_acquire) >> kEntryShift;
+std::uint64_t Load(std::uint64_t& word) {
+  return std::atomic_ref(word).load(std::memory_order_acquire);
+}
+
+std::uint64_t* Map(const FileDescriptor& map, std::size_t size, const char* failure) {
+  void* const memory = mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_SHARED, map.Number(), 0);
+  Require(memory != MAP_FAILED, failure);
+  return static_cast<std::uint64_t*>(memory);
 }
 
 }  // namespace
@@ -67,25 +72,38 @@ ModuleRefusals SumOf(const FileDescriptor& refusals, unsigned int domain) {
 
 ModuleMaps::~ModuleMaps() {
   if (words != nullptr) munmap(words, kBytesOfWords);
+  if (now != nullptr) munmap(now, sizeof(*now));
 }
 
 void ModuleMaps::MapWords() {
-  void* const memory =
-      mmap(nullptr, kBytesOfWords, PROT_READ | PROT_WRITE, MAP_SHARED, domains.Number(), 0);
-  Require(memory != MAP_FAILED, "cannot map the levels of domains");
-  words = static_cast<std::uint64_t*>(memory);
+  words = Map(domains, kBytesOfWords, "cannot map the levels of domains");
+  now = Map(epoch, sizeof(*now), "cannot map the epoch");
+}
+
+void ModuleMaps::BeginEpoch() const { std::atomic_ref(*now).fetch_add(1); }
+
+__u32 ModuleMaps::EntryOf(unsigned int domain) const {
+  return static_cast<__u32>(Load(words[domain]) >> kEntryShift);
+}
+
+__u32 ModuleMaps::NextEntryOf(unsigned int domain) const {
+  const __u32 first = domain * kEntriesOfDomain;
+  return EntryOf(domain) == first ? first + 1 : first;
+}
+
+unsigned int ModuleMaps::LevelOf(unsigned int domain) const {
+  return static_cast<__u32>(Load(words[domain]));
 }
 
 void ModuleMaps::Write(unsigned int domain, const ModuleRules& newRules, unsigned int level) {
-  const std::uint64_t first = std::uint64_t{domain} * kEntriesOfDomain;
-  const auto unused = static_cast<__u32>(EntryOf(words[domain]) == first ? first + 1 : first);
+  const __u32 unused = NextEntryOf(domain);
   Require(bpf_map_update_elem(rules.Number(), &unused, &newRules, BPF_ANY) == 0,
           "cannot write rules");
   Store(words[domain], unused, level);
 }
 
 void ModuleMaps::WriteLevel(unsigned int domain, unsigned int level) {
-  Store(words[domain], EntryOf(words[domain]), level);
+  Store(words[domain], EntryOf(domain), level);
 }
 
 void ModuleMaps::Place(pid_t process, unsigned int domain) const {

@@ -18,15 +18,32 @@ struct ModuleMaps {
   FileDescriptor refusals;
   FileDescriptor generation;
   FileDescriptor events;
+  FileDescriptor labels;
+  FileDescriptor devices;
+  FileDescriptor epoch;
+  FileDescriptor hashing;
+  FileDescriptor paths;
+  FileDescriptor labelRules;
   std::uint64_t* words = nullptr;  // of the domains, as the programs see them
+  std::uint64_t* now = nullptr;    // the epoch, likewise
 
   ModuleMaps() = default;
   ModuleMaps(const ModuleMaps&) = delete;
   ModuleMaps& operator=(const ModuleMaps&) = delete;
   ~ModuleMaps();
 
-  // Makes `words` what is in `domains`.
+  // Makes `words` what is in `domains`, and `now` what is in `epoch`.
   void MapWords();
+
+  // From here on nothing counts that programs have found out before about directories.
+  void BeginEpoch() const;
+
+  // Of a domain's two entries the one that its rules are in, and the other one.
+  __u32 EntryOf(unsigned int domain) const;
+  __u32 NextEntryOf(unsigned int domain) const;
+
+  // kLevelEnforcing and so on.
+  unsigned int LevelOf(unsigned int domain) const;
 
   // Gives the domain these rules and this level (kLevelEnforcing and so on) at once.
   void Write(unsigned int domain, const ModuleRules& newRules, unsigned int level);

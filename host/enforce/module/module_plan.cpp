@@ -12,6 +12,7 @@
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/plan/value_set.h"
 #include "policy/capability.h"
+#include "policy/decision.h"
 
 using Braxo::Misc::StrCat;
 using Policy::InstalledDomain;
@@ -55,7 +56,9 @@ ModuleCheck CheckOf(const ValueSet& passing) {
 }
 
 ModuleRules RulesOf(const InstalledDomain& domain, unsigned int last) {
-  ModuleRules rules = {CapabilitiesOf(domain, last).kept, {}};
+  ModuleRules rules = {};
+  rules.capabilities = CapabilitiesOf(domain, last).kept;
+  rules.hasPaths = Policy::RulesOf(domain, Policy::RuleKind::kFilePath).empty() ? 0 : 1;
   for (std::size_t check = 0; check < kChecks.size(); ++check)
     rules.checks[check] = CheckOf(PassingIn(domain, kChecks[check]));
   return rules;
@@ -120,10 +123,13 @@ bool IsOpen(const ModuleCheck& check) {
 
 }  // namespace
 
-ModulePlan PlanModule(const std::vector<InstalledDomain>& domains, unsigned int lastCapability) {
+ModulePlan PlanModule(const std::vector<InstalledDomain>& domains, unsigned int lastCapability,
+                      const LabelNumbers& labels) {
   ModulePlan plan;
-  for (const InstalledDomain& domain : domains)
-    plan.push_back({domain.id, domain.level, RulesOf(domain, lastCapability)});
+  for (const InstalledDomain& domain : domains) {
+    plan.push_back(
+        {domain.id, domain.level, RulesOf(domain, lastCapability), PlanFiles(domain, labels)});
+  }
   return plan;
 }
 
@@ -138,6 +144,7 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
   for (const RuleFate& fate : CapabilitiesOf(domain, lastCapability).fates) {
     fates[fate.place] = fate;
   }
+  for (const RuleFate& fate : FileFates(domain)) fates[fate.place] = fate;
   return fates;
 }
 
@@ -154,6 +161,7 @@ std::string Dump(const ModulePlan& plan) {
       const ModuleCheck& values = domain.rules.checks[check];
       if (!IsOpen(values)) text += StrCat("  ", kChecks[check], ":", TextOf(values), "\n");
     }
+    text += Dump(domain.files);
   }
   return text;
 }

@@ -7,12 +7,73 @@
 
 #pragma clang attribute push(__attribute__((preserve_access_index)), apply_to = record)
 
+struct cred;
+
+struct mnt_namespace {
+  __u64 event;  // grows with each change of its mounts
+};
+
+struct nsproxy {
+  struct mnt_namespace* mnt_ns;
+};
+
 struct task_struct {
   struct task_struct* group_leader;
   struct task_struct* real_parent;
   const struct cred* cred;
   __s32 tgid;
   __u64 start_boottime;
+  struct nsproxy* nsproxy;
+};
+
+struct user_namespace {
+  int level;
+};
+
+// The first 32 of them, whatever the kernel has them in.
+struct kernel_capabilities {
+  __u32 first;
+};
+
+struct dentry;
+
+struct super_block {
+  __u32 s_dev;
+  unsigned long s_flags;
+  unsigned long s_magic;
+  struct dentry* s_root;
+};
+
+struct inode {
+  unsigned short i_mode;
+  __u32 i_nlink;
+  __u32 i_generation;
+  unsigned long i_ino;
+  struct super_block* i_sb;
+};
+
+struct qstr {
+  __u32 hash;
+  __u32 len;
+  const unsigned char* name;
+};
+
+struct dentry {
+  struct dentry* d_parent;
+  struct qstr d_name;
+  struct inode* d_inode;
+  struct super_block* d_sb;
+};
+
+struct vfsmount {
+  struct dentry* mnt_root;
+};
+
+struct mount {
+  struct mount* mnt_parent;
+  struct dentry* mnt_mountpoint;
+  struct vfsmount mnt;
+  struct mnt_namespace* mnt_ns;
 };
 
 struct path {
@@ -22,6 +83,7 @@ struct path {
 
 struct file {
   __u32 f_mode;
+  __u32 f_flags;
   struct inode* f_inode;
   struct path f_path;
 };
@@ -49,6 +111,8 @@ struct cred {
   kgid_t sgid;
   kgid_t fsgid;
   struct group_info* group_info;
+  struct kernel_capabilities cap_effective;
+  struct user_namespace* user_ns;
 };
 
 struct sock_common {
@@ -90,29 +154,18 @@ struct io_uring_cmd {
   __u32 cmd_op;
 };
 
-struct super_block {
-  unsigned long s_magic;
+struct vm_area_struct {
+  struct file* vm_file;
 };
 
-struct inode {
-  struct super_block* i_sb;
-};
-
-struct qstr {
-  const unsigned char* name;
-};
-
-struct dentry {
-  struct qstr d_name;
-  struct inode* d_inode;
+struct renamedata {
+  struct dentry* old_dentry;
+  struct dentry* new_dentry;
 };
 
 #pragma clang attribute pop
 
-struct dentry;
 struct linux_binprm;
 struct sockaddr;
-struct user_namespace;
-struct vfsmount;
 
 #endif

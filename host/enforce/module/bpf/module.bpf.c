@@ -3,7 +3,10 @@
 
 #include "capabilities.bpf.h"
 #include "checks.bpf.h"
+#include "files.bpf.h"
 #include "identities.bpf.h"
+#include "labels.bpf.h"
+#include "paths.bpf.h"
 #include "self_protection.bpf.h"
 #include "sockets.bpf.h"
 #include "tasks.bpf.h"

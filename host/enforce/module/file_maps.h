@@ -1,0 +1,18 @@
+#pragma once
+
+#include "host/enforce/module/module_maps.h"
+#include "host/enforce/module/module_plan.h"
+
+namespace Enforce {
+
+// Has the module hash paths in a way that nobody can tell.
+void ChooseHashing(const ModuleMaps& maps);
+
+// Writes the rules about files below the entries that the domains use next. Nobody goes by them
+// before the domain's word names that entry.
+void WriteFileRules(const ModuleMaps& maps, const ModulePlan& plan);
+
+// Removes those that no domain uses, once nobody goes by them anymore.
+void RemoveUnusedFileRules(const ModuleMaps& maps);
+
+}  // namespace Enforce
