@@ -10,6 +10,7 @@
 #include <sys/stat.h>
 #include <sys/un.h>
 #include <sys/wait.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -198,7 +199,15 @@ class Measurer {
 
 // ---- Policies
 
-// As many of each kind as there is room for.
+const Enforce::LabelNumbers kLabels = [] {
+  constexpr unsigned int kFirst = 1000;
+  Enforce::LabelNumbers numbers;
+  for (unsigned int number = kFirst; number < kFirst + 70; ++number)
+    numbers["label" + std::to_string(number)] = number;
+  return numbers;
+}();
+
+// As many of each kind of check as there is room for, and some about labels.
 std::vector<std::string> ManyRules() {
   std::vector<std::string> rules;
   for (const char* const check :
@@ -206,7 +215,17 @@ std::vector<std::string> ManyRules() {
     for (int value = 0; value < Enforce::kMostModuleRanges; ++value)
       rules.push_back("-p " + std::string(check) + " " + std::to_string(2 * value) + " grant");
   }
+  for (const auto& [label, number] : kLabels) rules.push_back("-a " + label + " read grant");
   return rules;
+}
+
+// The files of a file system are labelled as its root is.
+void LabelFiles() {
+  for (const char* const root : {"/", "/dev", "/run"}) {
+    Require(setxattr(root, "security.bpf.zorvan", &kLabels.begin()->second, sizeof(unsigned int),
+                     0) == 0,
+            "label");
+  }
 }
 
 // kMeasured has these rules, and all others many.
@@ -228,6 +247,7 @@ std::size_t NumberOfRules(const std::vector<Policy::InstalledDomain>& domains) {
 const std::vector<std::string> kRules = {
     "-c cap_chown grant",       "-p socket_family 1 2 grant", "-p socket_family 10 grant",
     "-p socket_type 1 2 grant", "-p prctl_option 3 4 grant",  "-p prctl_option 15 16 grant",
+    "-a label1000 read grant",  "-a label1000 execute grant", "-a label1000 write grant",
 };
 
 // ---- The table
@@ -308,8 +328,10 @@ bool Bench() {
   const Costs first = before.Measure(listener);
 
   Module module = Module::Start();
+  LabelFiles();
+  module.LearnLabels();
   const std::vector<Policy::InstalledDomain> domains = DomainsWith(kRules);
-  const Enforce::ModulePlan plan = Enforce::PlanModule(domains, CAP_LAST_CAP);
+  const Enforce::ModulePlan plan = Enforce::PlanModule(domains, CAP_LAST_CAP, kLabels);
   const double publication = CostOfOnce([&module, &plan] { module.Publish(plan, 1); });
 
   std::vector<Column> columns;

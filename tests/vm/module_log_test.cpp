@@ -74,7 +74,7 @@ class ModuleLogTest : public ModuleTest {
   }
 
   void Publish(const std::vector<std::string>& rules, Level level = Level::kEnforcing) {
-    Policy::InstalledDomain ssh = DomainOf(rules);
+    Policy::InstalledDomain ssh = Numbered(rules);
     ssh.id = static_cast<unsigned int>(domain);
     ssh.level = level;
     module->Publish(PlanModule({ssh}, CAP_LAST_CAP), 2);
