@@ -16,7 +16,10 @@ class Running : public RunningModule {
   explicit Running(Module found) : module(std::move(found)) {}
 
   void Publish(const Policy::InstalledPolicy& policy, std::uint64_t generation) override {
-    module.Publish(PlanModule(policy.domains, LastCapability()), generation);
+    // What was mounted since, and what was made since.
+    module.LearnLabels();
+    module.WriteLabels();
+    module.Publish(PlanModule(policy.domains, LastCapability(), policy.objects), generation);
   }
   std::uint64_t Generation() const override { return module.Generation(); }
   bool IsRefusing() const override { return module.IsRefusing(); }
