@@ -8,6 +8,7 @@
 #include <linux/capability.h>
 
 #include "enforce/domain_of.h"
+#include "host/enforce/module/path_hash.h"
 
 namespace EnforceTest {
 namespace {

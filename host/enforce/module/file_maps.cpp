@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "host/enforce/module/hash_map.h"
+#include "host/enforce/module/path_hash.h"
 
 namespace Enforce {
 namespace {

@@ -27,7 +27,4 @@ std::vector<RuleFate> FileFates(const Policy::InstalledDomain& domain);
 // The rules for people: a line for each label and for each path.
 std::string Dump(const ModuleFileRules& rules);
 
-// The hash of an absolute path without "." and "..", as the module makes it.
-__u64 HashOf(const std::string& path, const ModuleHashing& how);
-
 }  // namespace Enforce
