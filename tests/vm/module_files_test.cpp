@@ -264,12 +264,11 @@ TEST_F(ModuleFilesTest, KeepTheNamesOfAll) {
       return ErrorOf(mount("/etc", At("plain").c_str(), nullptr, MS_BIND, nullptr));
     });
   });
-  // A tree that is mounted nowhere has no names.
+  // A tree that is mounted nowhere would have no names.
   ExpectRefused([] {
     const auto tree = static_cast<int>(
         syscall(SYS_open_tree, AT_FDCWD, At("plain").c_str(), 1 /* OPEN_TREE_CLONE */));
-    if (tree < 0) return 99;
-    const int error = ErrorOf(openat(tree, "e", O_RDONLY));
+    const int error = ErrorOf(tree);
     close(tree);
     return error;
   });

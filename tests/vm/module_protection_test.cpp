@@ -285,6 +285,7 @@ TEST_F(ModuleProtectionTest, KeepsOtherProcesses) {
                                                                              << CAP_PERFMON;
   module->Publish(Granting(kAll & ~kReading), 3);
   static char secret[] = "secret";
+  const FileDescriptor opened(open("/dev/null", O_RDONLY | O_CLOEXEC));
   const Worker victim([] { return 0; });
   const pid_t other = victim.Process();
   const std::string own = "/proc/" + std::to_string(other);
@@ -305,9 +306,9 @@ TEST_F(ModuleProtectionTest, KeepsOtherProcesses) {
        }},
       {"trace", [other] { return ErrorOf(ptrace(PTRACE_SEIZE, other, 0, 0)); }},
       {"descriptor",
-       [other] {
+       [other, &opened] {
          const FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, other, 0)));
-         return Descriptor(syscall(SYS_pidfd_getfd, process.Number(), 0, 0));
+         return Descriptor(syscall(SYS_pidfd_getfd, process.Number(), opened.Number(), 0));
        }},
       {"limit",
        [other] {

@@ -12,6 +12,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <csignal>
 #include <memory>
 #include <random>
@@ -169,6 +170,10 @@ TEST_F(ModuleSwapTest, OpensNothingWhenPublishersAreKilled) {
   constexpr std::uint64_t kTimes = 300;
   std::mt19937 chance(1);
   std::uint64_t completed = 0;
+  const auto began = std::chrono::steady_clock::now();
+  module->Publish(plans[0], 2);
+  const auto needed = std::chrono::duration_cast<std::chrono::microseconds>(
+      std::chrono::steady_clock::now() - began);
   for (std::uint64_t generation = 3; generation < 3 + kTimes; ++generation) {
     const bool isOdd = generation % 2 != 0;
     const pid_t publisher = fork();
@@ -176,7 +181,7 @@ TEST_F(ModuleSwapTest, OpensNothingWhenPublishersAreKilled) {
       Module::FindRunning()->Publish(plans[isOdd ? 1 : 0], generation);
       _exit(0);
     }
-    usleep(static_cast<useconds_t>(chance() % 8000));
+    usleep(static_cast<useconds_t>(chance()) % static_cast<useconds_t>(3 * needed.count() + 1));
     kill(publisher, SIGKILL);
     ResultOf(publisher);
     if (module->Generation() == generation) {

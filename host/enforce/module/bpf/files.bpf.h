@@ -55,8 +55,12 @@ static __always_inline bool is_asked(struct Asker* asker) {
   return asker->level != kLevelDisabled;
 }
 
+// Namespaces may be mounted, but are reached by their processes.
+#define NSFS_MAGIC 0x6e736673
+
 static __always_inline bool is_mounted(struct dentry* entry) {
-  return !(entry->d_sb->s_flags & SB_NOUSER);
+  struct super_block* file_system = entry->d_sb;
+  return !(file_system->s_flags & SB_NOUSER) && file_system->s_magic != NSFS_MAGIC;
 }
 
 static __always_inline struct ModuleLabelRules* rules_for(struct Asker* asker, __u32 label) {
