@@ -19,18 +19,18 @@ std::string NewerName(int number) {
   return call == calls.end() ? std::string() : std::string(call->name);
 }
 
-std::string ReadName(int number) {
-  char* const known = seccomp_syscall_resolve_num_arch(SCMP_ARCH_NATIVE, number);
+std::string ReadName(std::uint32_t architecture, int number) {
+  char* const known = seccomp_syscall_resolve_num_arch(architecture, number);
   if (known == nullptr) return NewerName(number);
   std::string name = known;
   std::free(known);
   return name;
 }
 
-std::vector<SystemCall> ReadAll() {
+std::vector<SystemCall> ReadAll(std::uint32_t architecture) {
   std::vector<SystemCall> calls;
   for (int number = 0; number <= kLastNumber; ++number) {
-    std::string name = ReadName(number);
+    std::string name = ReadName(architecture, number);
     if (!name.empty()) calls.push_back({number, std::move(name)});
   }
   return calls;
@@ -46,7 +46,13 @@ std::vector<const SystemCall*> SortByName(std::span<const SystemCall> calls) {
 }  // namespace
 
 std::span<const SystemCall> SystemCalls() {
-  static const std::vector<SystemCall> calls = ReadAll();
+  static const std::vector<SystemCall> calls = ReadAll(SCMP_ARCH_NATIVE);
+  return calls;
+}
+
+std::span<const SystemCall> SystemCallsOf32Bits() {
+  const bool isArm = seccomp_arch_native() == SCMP_ARCH_AARCH64;
+  static const std::vector<SystemCall> calls = ReadAll(isArm ? SCMP_ARCH_ARM : SCMP_ARCH_X86);
   return calls;
 }
 

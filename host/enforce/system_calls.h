@@ -17,6 +17,9 @@ struct SystemCall {
 // Every known one, in ascending order of their numbers. It lives as long as the program.
 std::span<const SystemCall> SystemCalls();
 
+// Those that programs of 32 bits have on this machine, likewise.
+std::span<const SystemCall> SystemCallsOf32Bits();
+
 // The number of the system call with this name; nothing when this architecture has none.
 std::optional<int> NumberOf(std::string_view name);
 

@@ -13,11 +13,13 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "braxo/lib/exception.h"
 #include "enforce/domain_of.h"
 #include "host/enforce/module/module.h"
+#include "host/enforce/system_calls.h"
 
 // The running module, and processes whose acts it judges.
 namespace EnforceTest {
@@ -113,11 +115,20 @@ inline bool KernelRunsPrograms() {
 // What keeps nobody from files.
 inline constexpr const char* kAllFiles = "-r / rwx";
 
-// kDomain, with these rules.
+// With every system call granted besides, of which a domain without rules for them has none.
+inline Policy::InstalledDomain WithCalls(Policy::InstalledDomain domain) {
+  for (const auto calls : {Enforce::SystemCalls(), Enforce::SystemCallsOf32Bits()}) {
+    for (const Enforce::SystemCall& call : calls)
+      domain.rules.push_back(RuleOf("-s " + call.name + " grant"));
+  }
+  return domain;
+}
+
+// kDomain, with these rules and every system call.
 inline Policy::InstalledDomain NumberedStrictly(const std::vector<std::string>& rules) {
   Policy::InstalledDomain domain = DomainOf(rules);
   domain.id = kDomain;
-  return domain;
+  return WithCalls(std::move(domain));
 }
 
 // It may use all files besides.
@@ -142,12 +153,12 @@ class ModuleTest : public testing::Test {
     module = Module::Start();
   }
 
-  // kDomain may use these capabilities and kOther all. No check keeps anybody from anything, and
-  // all files may be used.
+  // kDomain may use these capabilities and kOther all. Nothing else keeps anybody from anything.
   static ModulePlan Granting(std::uint64_t capabilities, Level level = Level::kEnforcing) {
-    Policy::InstalledDomain domain = Numbered({});
+    static const Policy::InstalledDomain open = Numbered({});
+    Policy::InstalledDomain domain = open;
     domain.level = level;
-    Policy::InstalledDomain other = Numbered({});
+    Policy::InstalledDomain other = open;
     other.id = kOther;
     ModulePlan plan = PlanModule({domain, other}, CAP_LAST_CAP);
     plan[0].rules.capabilities = capabilities;

@@ -182,7 +182,7 @@ Policy::InstalledDomain SomeDomain(unsigned int id) {
   Policy::InstalledDomain domain = DomainOf(rules);
   domain.id = id;
   domain.level = chance() % 5 == 0 ? Level::kPermissive : Level::kEnforcing;
-  return domain;
+  return WithCalls(std::move(domain));
 }
 
 bool IsAllowed(const Try& one, const Policy::InstalledDomain& domain) {

@@ -33,8 +33,12 @@ enum {
   kCheckConnectPort,
   kCheckUser,
   kCheckGroup,
+  kCheckSignal,
   kModuleChecks
 };
+
+// Another check, whose value is a mask.
+enum { kCheckFlags = 64 };
 
 enum { kMostModuleRanges = 32 };
 
@@ -42,6 +46,14 @@ enum { kBytesOfEvents = 1 << 20 };
 
 // What follows an event that is about a file: its path, which ends in a zero.
 enum { kBytesOfShortPath = 256, kBytesOfPath = 4096 };
+
+enum { kMostSignals = 64 };
+
+// System calls, as bits by their numbers. What is beyond is granted to nobody.
+enum { kMostCalls = 512, kCallsInWord = 64, kWordsOfCalls = kMostCalls / kCallsInWord };
+
+// Whose numbers they are.
+enum { kCallsOfMachine, kCallsOf32Bits, kCallTables };
 
 // Both ends included.
 struct ModuleRange {
@@ -58,6 +70,9 @@ struct ModuleCheck {
 struct ModuleRules {
   __u64 capabilities;  // those that are granted, by Linux's numbers as bits
   struct ModuleCheck checks[kModuleChecks];
+  __u64 cloneFlags;    // those that pass
+  __u64 ownedSignals;  // those that a descriptor may send to its owner, 1 as the lowest bit
+  __u64 calls[kCallTables][kWordsOfCalls];
   __u32 hasPaths;  // whether any rule is about a path
 };
 
@@ -158,7 +173,7 @@ enum {
   kActUseFile,        // detail: bits of kUse..., all that was asked for at once
   kActMakeFile,       // detail: kMake...
   kActMakeSocket,     // detail: kSocket..., of a unix socket that has a path
-  kActCall,           // value: the number of the system call, of this machine's own architecture
+  kActCall,           // detail: whose numbers; value: the number of the system call
   kActEnter,          // value: the domain; the label and the path are the program's
   kActPassPorts,      // detail: the type of a socket whose ports nobody sees; value: its family
   kModuleActs,

@@ -119,12 +119,22 @@ void RequireNotLockedDown() {
   }
 }
 
+// Those that are only loaded where it has are marked so in their section.
+void LoadWhatTheKernelHasHooksFor(bpf_object& programs) {
+  bpf_program* program = nullptr;
+  while ((program = bpf_object__next_program(&programs, program)) != nullptr) {
+    const std::string hook = bpf_program__section_name(program);
+    const bool isLoaded = bpf_program__autoload(program);
+    bpf_program__set_autoload(program,
+                              isLoaded || HasHook(hook.substr(hook.find('/') + 1).c_str()));
+  }
+}
+
 Programs LoadAndAttach() {
   libbpf_set_print(nullptr);
   Programs programs(module_programs__open());
   Require(programs != nullptr, "cannot read the programs");
-  bpf_program__set_autoload(programs->progs.use_ioctl_compat, HasHook("file_ioctl_compat"));
-  bpf_program__set_autoload(programs->progs.truncate_file, HasHook("file_truncate"));
+  LoadWhatTheKernelHasHooksFor(*programs->obj);
   Require(module_programs__load(programs.get()) == 0, "cannot load the programs");
   Require(module_programs__attach(programs.get()) == 0, "cannot attach the programs");
   return programs;

@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "braxo/misc/strcat.h"
+#include "host/enforce/module/module_calls.h"
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/plan/value_set.h"
@@ -26,7 +27,7 @@ constexpr std::uint64_t kOfEverybody = std::numeric_limits<std::uint64_t>::max()
 // By their places in the map.
 constexpr std::array<std::string_view, kModuleChecks> kChecks = {
     "socket_family", "socket_type",  "prctl_option", "ioctl_request",
-    "bind_port",     "connect_port", "set_uid",      "set_gid"};
+    "bind_port",     "connect_port", "set_uid",      "set_gid", "kill_signal"};
 
 CapabilityPlan CapabilitiesOf(const InstalledDomain& domain, unsigned int last) {
   return PlanCapabilities(domain, kOfEverybody, last);
@@ -61,6 +62,7 @@ ModuleRules RulesOf(const InstalledDomain& domain, unsigned int last) {
   rules.hasPaths = Policy::RulesOf(domain, Policy::RuleKind::kFilePath).empty() ? 0 : 1;
   for (std::size_t check = 0; check < kChecks.size(); ++check)
     rules.checks[check] = CheckOf(PassingIn(domain, kChecks[check]));
+  PlanCallsOfModule(domain, rules);
   return rules;
 }
 
@@ -145,10 +147,12 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
     fates[fate.place] = fate;
   }
   for (const RuleFate& fate : FileFates(domain)) fates[fate.place] = fate;
+  for (const RuleFate& fate : CallFatesByModule(domain)) fates[fate.place] = fate;
   return fates;
 }
 
 std::string_view NameOfCheck(unsigned int check) {
+  if (check == kCheckFlags) return Policy::kMaskCheck;
   return check < kChecks.size() ? kChecks[check] : std::string_view();
 }
 
@@ -162,6 +166,7 @@ std::string Dump(const ModulePlan& plan) {
       if (!IsOpen(values)) text += StrCat("  ", kChecks[check], ":", TextOf(values), "\n");
     }
     text += Dump(domain.files);
+    text += DumpCalls(domain.rules);
   }
   return text;
 }

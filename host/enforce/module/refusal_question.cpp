@@ -1,7 +1,7 @@
 #include "host/enforce/module/refusal_question.h"
 
+#include <algorithm>
 #include <array>
-#include <limits>
 #include <sstream>
 
 #include "host/enforce/module/module_plan.h"
@@ -83,9 +83,13 @@ Questions AskCapability(const ModuleEvent& event) {
   return event.value < names.size() ? Ask(RuleKind::kCapability, names[event.value]) : Questions();
 }
 
+// The name that the number has where it was asked by.
 Questions AskCall(const ModuleEvent& event) {
-  if (event.value > std::numeric_limits<int>::max()) return {};
-  return Ask(RuleKind::kSyscall, NameOf(static_cast<int>(event.value)));
+  const auto calls = event.detail == kCallsOf32Bits ? SystemCallsOf32Bits() : SystemCalls();
+  const auto call = std::ranges::find_if(calls, [&event](const SystemCall& each) {
+    return static_cast<std::uint64_t>(each.number) == event.value;
+  });
+  return call == calls.end() ? Questions() : Ask(RuleKind::kSyscall, call->name);
 }
 
 // Requests and flags are known by their bits.

@@ -17,6 +17,24 @@ static __always_inline bool is_about_mounts(__u32 call) {
          || call == 467; // open_tree_attr
 }
 
+// What takes a capability comes to no other hook, as a rule. New namespaces are among it.
+static __always_inline int judge_privileged_call(__u32 domain, __u64 word,
+                                                 struct ModuleRules* granted) {
+  int result = judge_call(domain, word, granted);
+  if (result) return result;
+  struct Call call = current_call();
+  return is_unshare(call) ? judge_flags(domain, word, granted, call.argument) : 0;
+}
+
+// A user namespace takes none.
+SEC("lsm/userns_create")
+int BPF_PROG(make_user_namespace, const struct cred* cred) {
+  struct ModuleTask* task = current_task();
+  if (!task) return 0;
+  __u64 word = word_of(task->domain);
+  return judge_privileged_call(task->domain, word, rules_of(word));
+}
+
 SEC("lsm/capable")
 int BPF_PROG(use_capability, const struct cred* cred, struct user_namespace* space, int capability,
              unsigned int options) {
@@ -29,7 +47,7 @@ int BPF_PROG(use_capability, const struct cred* cred, struct user_namespace* spa
   __u64 word = word_of(task->domain);
   struct ModuleRules* granted = rules_of(word);
   if (granted && level_of(word) != kLevelAbsent && granted->capabilities >> (capability & 63) & 1)
-    return 0;
+    return options & CAP_OPT_NOAUDIT ? 0 : judge_privileged_call(task->domain, word, granted);
   if (options & CAP_OPT_NOAUDIT) return is_enforced(level_of(word)) ? -EPERM : 0;
   return refuse(task->domain, level_of(word), act(kActUseCapability, 0, capability));
 }

@@ -17,7 +17,12 @@ struct nsproxy {
   struct mnt_namespace* mnt_ns;
 };
 
+struct thread_info {
+  __u32 status;
+};
+
 struct task_struct {
+  struct thread_info thread_info;
   struct task_struct* group_leader;
   struct task_struct* real_parent;
   const struct cred* cred;
@@ -134,13 +139,19 @@ struct msghdr {
   int msg_namelen;
 };
 
+#if defined(__TARGET_ARCH_x86)
 struct pt_regs {
-#if defined(__TARGET_ARCH_arm64)
-  __s32 syscallno;
-#else
+  unsigned long bx;
+  unsigned long di;
   unsigned long orig_ax;
-#endif
 };
+#elif defined(__TARGET_ARCH_arm64)
+struct pt_regs {
+  unsigned long pstate;
+  unsigned long orig_x0;
+  int syscallno;
+};
+#endif
 
 struct key_type {
   const char* name;
@@ -165,6 +176,7 @@ struct renamedata {
 
 #pragma clang attribute pop
 
+struct kernel_siginfo;
 struct linux_binprm;
 struct sockaddr;
 

@@ -1,8 +1,11 @@
 // The programs that the kernel runs at its hooks, by what they are about.
 #include "refusal.bpf.h"
 
-#include "capabilities.bpf.h"
+// What the others use.
+#include "calls.bpf.h"
 #include "checks.bpf.h"
+
+#include "capabilities.bpf.h"
 #include "files.bpf.h"
 #include "identities.bpf.h"
 #include "labels.bpf.h"

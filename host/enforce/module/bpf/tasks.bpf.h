@@ -2,11 +2,20 @@
 
 #define CLONE_THREAD 0x00010000
 
+// The signal of a child is not among the flags any more.
+static __always_inline int check_clone(__u32 domain, __u64 flags) {
+  __u64 word = word_of(domain);
+  struct ModuleRules* granted = rules_of(word);
+  int result = judge_call(domain, word, granted);
+  return result ? result : judge_flags(domain, word, granted, flags);
+}
+
 SEC("lsm/task_alloc")
 int BPF_PROG(inherit_domain, struct task_struct* task, unsigned long clone_flags) {
-  if (clone_flags & CLONE_THREAD) return 0;
   struct ModuleTask* parent = current_task();
   if (!parent) return 0;
+  int result = check_clone(parent->domain, clone_flags);
+  if (result || clone_flags & CLONE_THREAD) return result;
   struct ModuleTask child = *parent;
   bool is_placed = bpf_task_storage_get(&tasks, task, &child, BPF_LOCAL_STORAGE_GET_F_CREATE);
   return is_placed ? 0 : -ENOMEM;
