@@ -159,11 +159,11 @@ TEST(FatesByModule, KeepsCapabilitiesFilesAndSomeChecks) {
 TEST(FatesByModule, TellsWhatItDoesNotKeepInOrder) {
   EXPECT_THAT(
       Told(FatesByModule(DomainOf({"-s read revoke", "-c cap_chown grant", "-r /srv r",
-                                   "-a object read revoke", "-p set_uid 9 grant"}),
+                                   "-a object read revoke", "-u object stream grant"}),
                          kLast)),
       ElementsAre("notExpressible: -s read revoke (not refused, as not each use of it comes to a "
                   "hook)",
-                  "notExpressible: -p set_uid 9 grant (the module does not keep such rules)"));
+                  "notExpressible: -u object stream grant (the module does not keep such rules)"));
 }
 
 TEST(FatesByModule, TellsSocketsThatGoPastPorts) {

@@ -153,6 +153,7 @@ std::string TextOf(const ModuleLabelRules& rules) {
     if (rules.newLabels[kind] != 0)
       text += StrCat(", ", kFileKinds[kind].word, " as ", rules.newLabels[kind]);
   }
+  if (rules.next != 0) text += StrCat(", to ", rules.next - 1);
   return text;
 }
 

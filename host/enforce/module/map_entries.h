@@ -112,6 +112,7 @@ struct ModuleLabelRules {
   __u32 granted;
   __u32 refused;
   __u32 newLabels[kLabelledKinds];  // 0: that of the directory
+  __u32 next;                       // the domain that programs lead to, one higher; 0: none
 };
 
 // The hash of a path, which nobody can tell beforehand.
@@ -161,6 +162,7 @@ enum { kEpochShift = 24 };
 
 struct ModuleTask {
   __u32 domain;
+  __u32 next;  // that it is about to enter, one higher; 0: none
 };
 
 // What rules are about, and what no rule grants. Of files the event has the label, and the path

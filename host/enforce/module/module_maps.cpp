@@ -109,7 +109,7 @@ void ModuleMaps::WriteLevel(unsigned int domain, unsigned int level) {
 void ModuleMaps::Place(pid_t process, unsigned int domain) const {
   const FileDescriptor pidfd(syscall(SYS_pidfd_open, process, 0));
   const int number = pidfd.Number();
-  const ModuleTask task = {domain};
+  const ModuleTask task = {domain, 0};
   if (!pidfd.IsOpen() || bpf_map_update_elem(tasks.Number(), &number, &task, BPF_ANY) != 0)
     ThrowModuleError(StrCat("cannot place process ", process));
 }

@@ -9,6 +9,7 @@
 
 #include "braxo/misc/strcat.h"
 #include "host/enforce/module/module_calls.h"
+#include "host/enforce/module/transition_plan.h"
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/plan/value_set.h"
@@ -26,8 +27,8 @@ constexpr std::uint64_t kOfEverybody = std::numeric_limits<std::uint64_t>::max()
 
 // By their places in the map.
 constexpr std::array<std::string_view, kModuleChecks> kChecks = {
-    "socket_family", "socket_type",  "prctl_option", "ioctl_request",
-    "bind_port",     "connect_port", "set_uid",      "set_gid", "kill_signal"};
+    "socket_family", "socket_type", "prctl_option", "ioctl_request", "bind_port",
+    "connect_port",  "set_uid",     "set_gid",      "kill_signal"};
 
 CapabilityPlan CapabilitiesOf(const InstalledDomain& domain, unsigned int last) {
   return PlanCapabilities(domain, kOfEverybody, last);
@@ -127,10 +128,13 @@ bool IsOpen(const ModuleCheck& check) {
 
 ModulePlan PlanModule(const std::vector<InstalledDomain>& domains, unsigned int lastCapability,
                       const LabelNumbers& labels) {
+  DomainNumbers numbers;
+  for (const InstalledDomain& domain : domains) numbers[domain.name] = domain.id;
   ModulePlan plan;
   for (const InstalledDomain& domain : domains) {
     plan.push_back(
         {domain.id, domain.level, RulesOf(domain, lastCapability), PlanFiles(domain, labels)});
+    PlanTransitions(domain, labels, numbers, plan.back().files);
   }
   return plan;
 }
@@ -148,6 +152,7 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
   }
   for (const RuleFate& fate : FileFates(domain)) fates[fate.place] = fate;
   for (const RuleFate& fate : CallFatesByModule(domain)) fates[fate.place] = fate;
+  for (const RuleFate& fate : TransitionFates(domain)) fates[fate.place] = fate;
   return fates;
 }
 

@@ -42,16 +42,29 @@ struct Asker {
   bool has_paths;
 };
 
-// False for who may do everything.
-static __always_inline bool is_asked(struct Asker* asker) {
-  struct ModuleTask* task = current_task();
-  if (!task) return false;
-  __u64 word = word_of(task->domain);
-  asker->domain = task->domain;
+static __always_inline void ask_for(struct Asker* asker, __u32 domain) {
+  __u64 word = word_of(domain);
+  asker->domain = domain;
   asker->level = level_of(word);
   asker->entry = word >> kEntryShift;
   struct ModuleRules* granted = rules_of(word);
   asker->has_paths = granted && granted->hasPaths;
+}
+
+// False for who may do everything.
+static __always_inline bool is_asked(struct Asker* asker) {
+  struct ModuleTask* task = current_task();
+  if (!task) return false;
+  ask_for(asker, task->domain);
+  return asker->level != kLevelDisabled;
+}
+
+// The interpreter of a program is executed by the domain that this leads to.
+static __always_inline bool is_asked_to_open(struct Asker* asker, struct file* file) {
+  if (!(file->f_flags & FMODE_EXEC_FLAG)) return is_asked(asker);
+  struct ModuleTask* own = bpf_task_storage_get(&tasks, bpf_get_current_task_btf(), 0, 0);
+  if (!own || !own->next) return is_asked(asker);
+  ask_for(asker, own->next - 1);
   return asker->level != kLevelDisabled;
 }
 
@@ -261,7 +274,7 @@ SEC("lsm/file_open")
 int BPF_PROG(open_file, struct file* file) {
   struct Asker asker = {};
   struct dentry* entry = file->f_path.dentry;
-  if (!is_asked(&asker) || !is_mounted(entry)) return 0;
+  if (!is_asked_to_open(&asker, file) || !is_mounted(entry)) return 0;
   // What lies below all file systems would be changed.
   if (is_written_device(file))
     return refuse_path(asker.domain, asker.level, act(kActReachModule, 0, 0), &file->f_path);

@@ -71,6 +71,7 @@ struct dentry {
 };
 
 struct vfsmount {
+  int mnt_flags;
   struct dentry* mnt_root;
 };
 
@@ -174,10 +175,17 @@ struct renamedata {
   struct dentry* new_dentry;
 };
 
+struct linux_binprm {
+  struct file* file;
+  int unsafe;
+  const char* filename;
+  const char* interp;
+  char buf[2];
+};
+
 #pragma clang attribute pop
 
 struct kernel_siginfo;
-struct linux_binprm;
 struct sockaddr;
 
 #endif

@@ -6,6 +6,7 @@
 #include "checks.bpf.h"
 
 #include "capabilities.bpf.h"
+#include "execution.bpf.h"
 #include "files.bpf.h"
 #include "identities.bpf.h"
 #include "labels.bpf.h"

@@ -16,22 +16,7 @@ int BPF_PROG(inherit_domain, struct task_struct* task, unsigned long clone_flags
   if (!parent) return 0;
   int result = check_clone(parent->domain, clone_flags);
   if (result || clone_flags & CLONE_THREAD) return result;
-  struct ModuleTask child = *parent;
+  struct ModuleTask child = {parent->domain, 0};
   bool is_placed = bpf_task_storage_get(&tasks, task, &child, BPF_LOCAL_STORAGE_GET_F_CREATE);
   return is_placed ? 0 : -ENOMEM;
-}
-
-// Whichever thread executes a program is the first one then, and what was known of the former is
-// gone.
-SEC("lsm/bprm_creds_for_exec")
-int BPF_PROG(keep_domain, struct linux_binprm* program) {
-  struct task_struct* thread = bpf_get_current_task_btf();
-  struct ModuleTask* process = task_of(thread);
-  if (!process) return 0;
-  struct ModuleTask same = *process;
-  struct ModuleTask* own =
-      bpf_task_storage_get(&tasks, thread, &same, BPF_LOCAL_STORAGE_GET_F_CREATE);
-  if (!own) return -ENOMEM;
-  own->domain = same.domain;
-  return 0;
 }
