@@ -90,7 +90,7 @@ std::vector<std::string> RulesOfPolicy(bool isOdd) {
 ModulePlan PlanOf(bool isOdd) {
   std::vector<Policy::InstalledDomain> domains;
   for (unsigned int id = kFirst; id < kFirst + kNumber; ++id) {
-    domains.push_back(DomainOf(RulesOfPolicy(isOdd)));
+    domains.push_back(WithCalls(DomainOf(RulesOfPolicy(isOdd))));
     domains.back().id = id;
   }
   return PlanModule(domains, CAP_LAST_CAP);
