@@ -127,7 +127,7 @@ class Planner {
 
 bool IsAboutFiles(const Rule& rule) {
   return rule.kind == RuleKind::kObjectAccess || rule.kind == RuleKind::kFileCreation ||
-         rule.kind == RuleKind::kFilePath;
+         rule.kind == RuleKind::kFilePath || rule.kind == RuleKind::kUnixSocketCreation;
 }
 
 bool IsLabelling(const Rule& rule) {

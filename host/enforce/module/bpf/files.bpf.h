@@ -2,6 +2,7 @@
 #ifndef FILES_BPF_H
 #define FILES_BPF_H
 
+#include "bound_sockets.bpf.h"
 #include "labels.bpf.h"
 #include "paths.bpf.h"
 
@@ -142,8 +143,12 @@ static __always_inline int may_use(struct file* file, __u32 wanted) {
 
 // ---- Making files
 
-// Of which type a socket is, its file does not tell.
-enum { kMakeSomeSocket = kMakeBlockDevice + 1 };
+// Behind the kinds of files those of sockets, in their order, and one of which nobody knows: the file
+// does not tell.
+enum {
+  kMakeFirstSocket = kMakeBlockDevice + 1,
+  kMakeSomeSocket = kMakeFirstSocket + kSocketSeqpacket + 1,
+};
 
 static __always_inline __u32 kind_of(__u32 mode) {
   switch (mode & S_IFMT) {
@@ -166,7 +171,10 @@ static __always_inline __u32 kind_of(__u32 mode) {
 // Nothing for that of the directory.
 static __always_inline __u32 new_label(struct Asker* asker, __u32 directory_label, __u32 kind) {
   struct ModuleLabelRules* rules = rules_for(asker, directory_label);
-  return rules && kind < kLabelledKinds ? rules->newLabels[kind] : 0;
+  __u64 index = kind;
+  // What is compared and what is used are the same for the verifier then.
+  asm volatile("" : "+r"(index));
+  return rules && index < kLabelledKinds ? rules->newLabels[index] : 0;
 }
 
 // Whether the asker may make an entry of this kind in the directory. What it is to be labelled is
@@ -176,13 +184,14 @@ static __always_inline int judge_making(struct Asker* asker, struct vfsmount* mo
                                         __u32* label) {
   __u32 above = label_of_directory(directory);
   __u32 rights = rights_of(asker, above, said_of(asker, mount, entry));
-  bool is_socket = kind == kMakeSomeSocket;
-  __u32 wanted = is_socket ? kMayMakeSocket : 1U << (kMakeShift + (kind & 7));
+  bool is_some = kind == kMakeSomeSocket;
+  __u32 wanted = is_some ? kMayMakeSocket : 1U << (kMakeShift + (kind & 15));
+  __u32 socket = is_some ? kSocketStream : kind - kMakeFirstSocket;
   *label = new_label(asker, above, kind);
   if (!(wanted & ~rights)) return 0;
   return refuse(asker->domain, asker->level,
-                is_socket ? act_on_file(kActMakeSocket, kSocketStream, above)
-                          : act_on_file(kActMakeFile, kind, above));
+                kind >= kMakeFirstSocket ? act_on_file(kActMakeSocket, socket, above)
+                                         : act_on_file(kActMakeFile, kind, above));
 }
 
 // Room for one more label is found before the file is made.
@@ -198,8 +207,11 @@ static __noinline int make(struct vfsmount* mount, struct dentry* directory, str
                            __u32 mode) {
   struct Asker asker = {};
   if (!is_asked(&asker)) return 0;
+  __u32 kind = kind_of(mode);
+  __u32 bound = kind == kMakeSomeSocket ? take_binding() : 0;
+  if (bound) kind = kMakeFirstSocket + bound - 1;
   struct ModuleMaking making = {(__u64)entry, entry->d_name.hash, 0};
-  int result = judge_making(&asker, mount, directory, entry, kind_of(mode), &making.label);
+  int result = judge_making(&asker, mount, directory, entry, kind, &making.label);
   if (result) return result;
   struct task_struct* thread = bpf_get_current_task_btf();
   struct ModuleMaking* former = bpf_task_storage_get(&makings, thread, 0, 0);

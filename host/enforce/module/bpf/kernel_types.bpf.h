@@ -183,6 +183,13 @@ struct linux_binprm {
   char buf[2];
 };
 
+struct unix_address;
+
+struct unix_sock {
+  struct unix_address* addr;
+  struct path path;
+};
+
 #pragma clang attribute pop
 
 struct kernel_siginfo;

@@ -14,6 +14,7 @@
 #include "self_protection.bpf.h"
 #include "sockets.bpf.h"
 #include "tasks.bpf.h"
+#include "unix_sockets.bpf.h"
 
 // What the helpers take.
 char taken_license[] SEC("license") = "Dual MIT/GPL";

@@ -135,11 +135,12 @@ static long look_up_step(__u32 index, struct PathSearch* search) {
   return how && (kind == kStepName || kind == kStepMount) ? kGoOn : kEnd;
 }
 
-// Of a path from the root of the mount namespace on; 0 where it is without a name.
-__noinline __u64 hash_of_path(__u64 mount, __u64 entry) {
+// Of a path from the root of the mount namespace on; 0 where it is without a name, or in another
+// namespace, unless it may be in any.
+__noinline __u64 hash_of_path(__u64 mount, __u64 entry, __u64 is_in_any) {
   struct mount* mounted = mount_of(mount);
   struct PathSearch search = {.at = {mounted, (struct dentry*)entry, 0}, .weight = 1};
-  if (BPF_CORE_READ(mounted, mnt_ns) != current_namespace()) return 0;
+  if (!is_in_any && BPF_CORE_READ(mounted, mnt_ns) != current_namespace()) return 0;
   bpf_loop(MOST_STEPS, hash_step, &search, 0);
   return search.is_named ? search.key.hash : 0;
 }
@@ -178,7 +179,7 @@ static __noinline __u64 hash_of_directory(struct PathQuestion* question, struct 
   __u64 check = known ? *(volatile __u64*)&known->check : 0;
   __u64 multiplier = question->how->multiplier;
   if (found && question->tag && mix(question->tag, found, multiplier) == check) return found;
-  found = hash_of_path(number_of(question->mount), number_of(directory));
+  found = hash_of_path(number_of(question->mount), number_of(directory), 0);
   if (known && question->tag) {
     *(volatile __u64*)&known->hash = found;
     *(volatile __u64*)&known->check = mix(question->tag, found, multiplier);
@@ -220,7 +221,7 @@ static __noinline __u32 path_bits(struct vfsmount* mount, struct dentry* entry, 
   bool is_itself = inode && is_directory(inode);
   struct dentry* directory = is_itself ? entry : entry->d_parent;
   if (!is_itself && entry == mount->mnt_root) {
-    __u64 hash = hash_of_path(number_of(mount), number_of(entry));
+    __u64 hash = hash_of_path(number_of(mount), number_of(entry), 0);
     return find_path(number_of(mount), number_of(entry), rules_entry, hash);
   }
   inode = directory->d_inode;
@@ -232,6 +233,13 @@ static __noinline __u32 path_bits(struct vfsmount* mount, struct dentry* entry, 
   __u32 found = find_directory(&question, directory, known);
   if (is_itself || !(found & kPathIsAboveRule)) return found;
   return find_entry(&question, entry, known, found);
+}
+
+// The same of a file that is there, in whichever mount namespace.
+static __always_inline __u32 path_bits_anywhere(struct vfsmount* mount, struct dentry* entry,
+                                                __u32 rules_entry) {
+  __u64 hash = hash_of_path(number_of(mount), number_of(entry), 1);
+  return find_path(number_of(mount), number_of(entry), rules_entry, hash);
 }
 
 #endif
