@@ -142,6 +142,7 @@ TEST(QuestionsOf, AsksNothingOfWhatNoRuleGrants) {
   const ModuleEvent event = Event(Enforce::kActReachModule, 0, 0);
   EXPECT_TRUE(IsOfNoRule(event));
   EXPECT_TRUE(IsOfNoRule(Event(Enforce::kActPassPorts, 1, 45)));
+  EXPECT_TRUE(IsOfNoRule(Event(Enforce::kActReachSocket, 0, 0)));
   EXPECT_FALSE(IsOfNoRule(Event(Enforce::kActCall, 0, 0)));
   EXPECT_THAT(QuestionsOf(event, "/etc/key", {.label = "sshKey"}), IsEmpty());
   EXPECT_THAT(QuestionsOf(Event(Enforce::kModuleActs, 0, 0), "/etc/key", {}), IsEmpty());

@@ -114,7 +114,7 @@ Questions AskEntry(const EventNames& names) {
 }  // namespace
 
 bool IsOfNoRule(const ModuleEvent& event) {
-  return event.act == kActReachModule || event.act == kActPassPorts;
+  return event.act == kActReachModule || event.act == kActPassPorts || event.act == kActReachSocket;
 }
 
 Questions QuestionsOf(const ModuleEvent& event, const std::string& path, const EventNames& names) {
