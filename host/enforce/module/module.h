@@ -35,8 +35,8 @@ struct UnlabelledMount {
 class Module {
  public:
   // Loads and starts the programs, which refuse nothing until something is published. Nothing is
-  // left of it when it throws, as it does where programs would not be run, where the kernel is locked
-  // down so far that it takes none, and where kModuleOff says so.
+  // left of it when it throws, as it does where programs would not be run, where the kernel is
+  // locked down so far that it takes none, and where kModuleOff says so.
   static Module Start();
 
   // The one that runs; nothing where none does.
