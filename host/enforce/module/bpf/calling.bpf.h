@@ -10,8 +10,7 @@
 #define X32_SYSCALL_BIT 0x40000000
 
 static __always_inline __u32 number_of_call(void) {
-  struct pt_regs* registers =
-      (struct pt_regs*)bpf_task_pt_regs(bpf_get_current_task_btf());
+  struct pt_regs* registers = (struct pt_regs*)bpf_task_pt_regs(bpf_get_current_task_btf());
 #if defined(__TARGET_ARCH_arm64)
   return registers->syscallno;
 #else

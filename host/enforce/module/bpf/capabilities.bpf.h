@@ -6,15 +6,15 @@
 
 #define CAP_SYS_ADMIN 21
 
-// Calls that make or change a mount of nobody's yet, which no hook is at but that this capability is
-// asked for.
+// Calls that make or change a mount of nobody's yet, which no hook is at but that this capability
+// is asked for.
 static __always_inline bool is_about_mounts(__u32 call) {
-  return call == 428     // open_tree
-         || call == 430  // fsopen
-         || call == 432  // fsmount
-         || call == 433  // fspick
-         || call == 442  // mount_setattr
-         || call == 467; // open_tree_attr
+  return call == 428      // open_tree
+         || call == 430   // fsopen
+         || call == 432   // fsmount
+         || call == 433   // fspick
+         || call == 442   // mount_setattr
+         || call == 467;  // open_tree_attr
 }
 
 // What takes a capability comes to no other hook, as a rule. New namespaces are among it.

@@ -143,8 +143,8 @@ static __always_inline int may_use(struct file* file, __u32 wanted) {
 
 // ---- Making files
 
-// Behind the kinds of files those of sockets, in their order, and one of which nobody knows: the file
-// does not tell.
+// Behind the kinds of files those of sockets, in their order, and one of which nobody knows: the
+// file does not tell.
 enum {
   kMakeFirstSocket = kMakeBlockDevice + 1,
   kMakeSomeSocket = kMakeFirstSocket + kSocketSeqpacket + 1,

@@ -23,8 +23,7 @@ int BPF_PROG(keep_domain_of_socket, struct socket* socket, int family, int type,
   struct sock* sock = socket->sk;
   if (!task || !sock) return 0;
   __u32 domain = task->domain;
-  bool is_kept =
-      bpf_sk_storage_get(&socket_domains, sock, &domain, BPF_LOCAL_STORAGE_GET_F_CREATE);
+  bool is_kept = bpf_sk_storage_get(&socket_domains, sock, &domain, BPF_LOCAL_STORAGE_GET_F_CREATE);
   return is_kept ? 0 : -ENOMEM;
 }
 
