@@ -245,9 +245,21 @@ std::size_t NumberOfRules(const std::vector<Policy::InstalledDomain>& domains) {
 
 // What the measured works take, and a little that they do not.
 const std::vector<std::string> kRules = {
-    "-c cap_chown grant",       "-p socket_family 1 2 grant", "-p socket_family 10 grant",
-    "-p socket_type 1 2 grant", "-p prctl_option 3 4 grant",  "-p prctl_option 15 16 grant",
-    "-a label1000 read grant",  "-a label1000 execute grant", "-a label1000 write grant",
+    "-c cap_chown grant",
+    "-p socket_family 1 2 grant",
+    "-p socket_family 10 grant",
+    "-p socket_type 1 2 grant",
+    "-p prctl_option 3 4 grant",
+    "-p prctl_option 15 16 grant",
+    "-a label1000 read grant",
+    "-a label1000 execute grant",
+    "-a label1000 write grant",
+    "-s @start grant",
+    "-s @file grant",
+    "-s @io grant",
+    "-s @network grant",
+    "-s @process grant",
+    "-s @attributes grant",
 };
 
 // ---- The table
