@@ -5,11 +5,13 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
+#include "host/linux/common/write_all.h"
 
 using Braxo::Misc::StrCat;
 
@@ -130,6 +132,17 @@ struct stat RequirePrivateFile(const std::string& path, const std::string& purpo
   const Descriptor opened(open(directory.c_str(), kLookAt));
   RequireDirectory(opened, directory, use);
   return RequireFile(opened, path, use);
+}
+
+void ReplacePrivateFile(const std::string& path, const std::string& text) {
+  const std::string fresh = StrCat(path, ".new");
+  unlink(fresh.c_str());
+  constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  const Descriptor file(open(fresh.c_str(), kFlags, S_IRUSR | S_IWUSR));
+  if (!file.IsOpen() || !WriteAll(file.Number(), text) ||
+      rename(fresh.c_str(), path.c_str()) != 0) {
+    ThrowErrno("Unable to write ", path);
+  }
 }
 
 }  // namespace LinuxHost

@@ -16,6 +16,10 @@ struct stat PreparePrivateFile(const std::string& path, const std::string& purpo
 // The same for a file that is only read: makes nothing, and throws also when there is no such file.
 struct stat RequirePrivateFile(const std::string& path, const std::string& purpose);
 
+// Puts a file with this text (mode 0600) in place of `path`, which others see whole: the old or the
+// new. Nobody else may make files in its directory. Throws HostError, leaving the old one.
+void ReplacePrivateFile(const std::string& path, const std::string& text);
+
 // Throws HostError unless `path` is absolute and does not end in a slash.
 void RequireFilePath(const std::string& path, const std::string& purpose);
 

@@ -1,25 +1,21 @@
 #include "host/linux/kernel/module_publication.h"
 
-#include <fcntl.h>
 #include <sys/random.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <charconv>
 #include <cstdint>
-#include <cstdio>
 #include <fstream>
 #include <memory>
 #include <string>
 
 #include "braxo/misc/strcat.h"
-#include "host/linux/common/descriptor.h"
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/module_library.h"
+#include "host/linux/common/private_file.h"
 #include "host/linux/common/used_paths.h"
-#include "host/linux/common/write_all.h"
 #include "host/linux/services/system_log.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/module_place.h"
@@ -53,16 +49,6 @@ std::uint64_t PublishedGeneration() {
   return file >> generation ? generation : kNothingPublished;
 }
 
-void WriteFile(const std::string& path, const std::string& content) {
-  const std::string made = path + ".new";
-  constexpr int kFlags = O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC;
-  const Descriptor file(open(made.c_str(), kFlags, S_IRUSR | S_IWUSR));
-  if (!file.IsOpen() || !WriteAll(file.Number(), content) ||
-      rename(made.c_str(), path.c_str()) != 0) {
-    ThrowErrno("Unable to write ", path);
-  }
-}
-
 void Remove(const std::string& path) {
   if (unlink(path.c_str()) != 0 && errno != ENOENT) ThrowErrno("Unable to remove ", path);
 }
@@ -79,7 +65,7 @@ void Publish(RunningModule& running) {
   const Transaction others(state.Database());
   const std::uint64_t generation = NewGeneration();
   running.Publish(ReadInstalled(), generation);
-  WriteFile(PublishedMarkOf(StatePath()), StrCat(generation, "\n"));
+  ReplacePrivateFile(PublishedMarkOf(StatePath()), StrCat(generation, "\n"));
 }
 
 // Whoever has committed can be told nothing else: its own work is done.
@@ -112,7 +98,7 @@ bool IsPublishedTo(const RunningModule& running) {
 
 void BeginPublishing(RunningModule& running) {
   Remove(PublishedMarkOf(StatePath()));
-  WriteFile(ModuleMarkOf(StatePath()), "");
+  ReplacePrivateFile(ModuleMarkOf(StatePath()), "");
   Publish(running);
 }
 

@@ -5,31 +5,17 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 
 #include "braxo/misc/strcat.h"
 #include "host/linux/common/descriptor.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/private_file.h"
 #include "host/linux/common/used_paths.h"
-#include "host/linux/common/write_all.h"
 
 namespace LinuxHost {
 namespace {
 
 constexpr char kPurpose[] = "latest refusals";
-
-// Nobody else makes files in this directory.
-void Replace(const std::string& path, const std::string& text) {
-  const std::string fresh = Braxo::Misc::StrCat(path, ".new");
-  unlink(fresh.c_str());
-  constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  const Descriptor file(open(fresh.c_str(), kFlags, S_IRUSR | S_IWUSR));
-  if (!file.IsOpen() || !WriteAll(file.Number(), text) ||
-      rename(fresh.c_str(), path.c_str()) != 0) {
-    ThrowErrno("Unable to write ", path);
-  }
-}
 
 }  // namespace
 
@@ -41,7 +27,7 @@ std::string LatestRefusalsFile() {
 void WriteLatestRefusals(const std::string& text) {
   const std::string path = LatestRefusalsFile();
   PreparePrivateFile(path, kPurpose);
-  Replace(path, text);
+  ReplacePrivateFile(path, text);
 }
 
 std::optional<std::string> ReadLatestRefusals() {
