@@ -1,6 +1,7 @@
 #include "host/enforce/module/transition_plan.h"
 
-#include <algorithm>
+#include <map>
+#include <string_view>
 
 #include "braxo/misc/strcat.h"
 #include "policy/decision.h"
@@ -17,32 +18,22 @@ bool LeadsOut(const Rule& rule, const InstalledDomain& domain) {
   return rule.Grants() && rule.words[2] == "exec" && rule.words[1] != domain.name;
 }
 
-// Of those that lead elsewhere by this label the first one, which all others give way to.
-const Rule* FirstBy(const std::string& label, const InstalledDomain& domain) {
-  const auto rules = RulesOf(domain, RuleKind::kDomainTransition);
-  const auto first = std::ranges::find_if(
-      rules, [&](const Rule* rule) { return rule->words[0] == label && LeadsOut(*rule, domain); });
-  return first == rules.end() ? nullptr : *first;
-}
-
-RuleFate FateOf(const Rule& rule, const InstalledDomain& domain) {
-  RuleFate fate{.rule = rule, .place = PlaceOf(rule, domain.rules)};
-  if (rule.Grants() && rule.words[2] != "exec")
-    Narrow(fate, "only services of this host enter a domain this way");
-  if (!LeadsOut(rule, domain)) return fate;
-  const Rule* const first = FirstBy(rule.words[0], domain);
-  if (first->words[1] != rule.words[1])
-    Narrow(fate, StrCat("what is labelled ", rule.words[0], " enters ", first->words[1]));
-  return fate;
+// By label, of the rules that lead elsewhere the first one, which all others give way to.
+std::map<std::string_view, const Rule*> FirstByLabel(const InstalledDomain& domain) {
+  std::map<std::string_view, const Rule*> first;
+  for (const Rule* const rule : RulesOf(domain, RuleKind::kDomainTransition)) {
+    if (LeadsOut(*rule, domain)) first.emplace(rule->words[0], rule);
+  }
+  return first;
 }
 
 }  // namespace
 
 void PlanTransitions(const InstalledDomain& domain, const LabelNumbers& labels,
                      const DomainNumbers& domains, ModuleFileRules& files) {
-  for (const Rule* const rule : RulesOf(domain, RuleKind::kDomainTransition)) {
-    const auto label = labels.find(rule->words[0]);
-    if (label == labels.end() || rule != FirstBy(rule->words[0], domain)) continue;
+  for (const auto& [name, rule] : FirstByLabel(domain)) {
+    const auto label = labels.find(std::string(name));
+    if (label == labels.end()) continue;
     const auto target = domains.find(rule->words[1]);
     const unsigned int next = target == domains.end() ? kModuleDomains + 1 : target->second;
     files.labels[label->second].next = next + 1;
@@ -50,9 +41,17 @@ void PlanTransitions(const InstalledDomain& domain, const LabelNumbers& labels,
 }
 
 std::vector<RuleFate> TransitionFates(const InstalledDomain& domain) {
+  const std::map<std::string_view, const Rule*> first = FirstByLabel(domain);
   std::vector<RuleFate> fates;
-  for (const Rule& rule : domain.rules) {
-    if (rule.kind == RuleKind::kDomainTransition) fates.push_back(FateOf(rule, domain));
+  for (const Rule* const rule : RulesOf(domain, RuleKind::kDomainTransition)) {
+    RuleFate fate{.rule = *rule, .place = PlaceOf(*rule, domain.rules)};
+    if (rule->Grants() && rule->words[2] != "exec")
+      Narrow(fate, "only services of this host enter a domain this way");
+    const auto chosen = first.find(rule->words[0]);
+    if (LeadsOut(*rule, domain) && chosen->second->words[1] != rule->words[1])
+      Narrow(fate,
+             StrCat("what is labelled ", rule->words[0], " enters ", chosen->second->words[1]));
+    fates.push_back(fate);
   }
   return fates;
 }
