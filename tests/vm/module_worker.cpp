@@ -3,12 +3,10 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdlib>
 #include <iostream>
 #include <string>
 
-#include "braxo/lib/exception.h"
-#include "host/enforce/module/module.h"
+#include "vm/enter_domain.h"
 
 namespace {
 
@@ -17,18 +15,12 @@ const char* UseCapability() {
   return errno == EPERM ? "refused" : "failed otherwise";
 }
 
-void Enter(unsigned int domain) {
-  auto module = Enforce::Module::FindRunning();
-  if (!module) throw Braxo::Lib::BraxoException("the module does not run");
-  module->Place(getpid(), domain);
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {
   if (argc != 2) return 2;
   try {
-    Enter(static_cast<unsigned int>(std::strtoul(argv[1], nullptr, 10)));
+    EnforceTest::EnterDomain(argv[1]);
   } catch (const Braxo::Lib::BraxoException& failure) {
     std::cerr << failure.what() << std::endl;
     return 1;
