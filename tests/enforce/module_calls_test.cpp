@@ -73,6 +73,8 @@ TEST(ModuleCalls, TellWhatIsNotRefused) {
                   {"-s read grant", "-s read revoke", "-s openat revoke", "-s @file revoke"}))),
               ElementsAre("notExpressible: -s read revoke (not refused, as not each use of it "
                           "comes to a hook)",
+                          "notExpressible: -s openat revoke (not refused, as not each use of it "
+                          "comes to a hook)",
                           "notExpressible: -s @file revoke (access: not refused, as not each use "
                           "of it comes to a hook)"));
 }

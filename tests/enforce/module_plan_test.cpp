@@ -132,7 +132,7 @@ TEST(PlanModule, HasPathsAndWhatIsAboveThem) {
 }
 
 TEST(PlanModule, HashesPathsByTheirNames) {
-  const Enforce::ModuleHashing how = {3, 0x9e3779b97f4a7c15, 0};
+  const Enforce::ModuleHashing how = {3, 0x9e3779b97f4a7c15, 0, 0};
   EXPECT_EQ(Enforce::HashOf("/", how), 3U);
   EXPECT_NE(Enforce::HashOf("/ab", how), Enforce::HashOf("/a/b", how));
   EXPECT_NE(Enforce::HashOf("/a/b", how), Enforce::HashOf("/b/a", how));

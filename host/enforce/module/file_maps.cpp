@@ -96,6 +96,7 @@ void WriteFileRules(const ModuleMaps& maps, const ModulePlan& plan) {
   }
   labels.Write(maps.labelRules, "cannot write rules about labels");
   paths.Write(maps.paths, "cannot write rules about paths");
+  // What was decided by the rules that were here before these holds no longer.
   maps.BeginEpoch();
 }
 

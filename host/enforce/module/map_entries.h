@@ -61,7 +61,7 @@ struct ModuleRange {
   __u32 last;
 };
 
-// The values that pass.
+// The values that pass, in their order. The last range is there as often as there is room.
 struct ModuleCheck {
   __u32 count;
   struct ModuleRange ranges[kMostModuleRanges];
@@ -128,7 +128,6 @@ enum {
   kPathRead = 1 << 2,
   kPathHasRule = 1 << 3,
   kPathIsAboveRule = 1 << 4,  // some rule is about what is beneath
-  kPathBits = 5,
 };
 
 // By which paths are hashed: the multiplier is odd, and the other one its inverse.
@@ -136,17 +135,7 @@ struct ModuleHashing {
   __u64 basis;
   __u64 multiplier;
   __u64 inverse;
-};
-
-enum { kPathsOfDirectory = 4 };
-
-// What was found out about a directory, for as long as nothing was moved or labelled since.
-struct ModuleDirectory {
-  __u64 label;  // with the epoch that it is of, see kEpochShift
-  // What rules say of it, in the lowest kPathBits, and by what they have been found, hashed.
-  __u64 paths[kPathsOfDirectory];
-  __u64 hash;   // of its path
-  __u64 check;  // of the former and of what it has been found by
+  __u64 epoch;  // grows whenever what is known of files may be no longer so
 };
 
 // The label that the file gets which a thread is about to make.
@@ -156,8 +145,8 @@ struct ModuleMaking {
   __u32 label;  // 0: none of its own
 };
 
-// Of a label and the epoch that it is of, in 64 bits, which change at once, this is the latter.
-// Labels with numbers beyond are looked for each time.
+// What was found out about a directory: its label, and above it the epoch that it is of. Labels
+// with numbers beyond are looked for each time.
 enum { kEpochShift = 24 };
 
 struct ModuleTask {

@@ -51,7 +51,6 @@ constexpr std::array kMaps = {
     NamedMap{"events", &ModuleMaps::events},
     NamedMap{"labels", &ModuleMaps::labels},
     NamedMap{"devices", &ModuleMaps::devices},
-    NamedMap{"epoch", &ModuleMaps::epoch},
     NamedMap{"hashing", &ModuleMaps::hashing},
     NamedMap{"paths", &ModuleMaps::paths},
     NamedMap{"label_rules", &ModuleMaps::labelRules},

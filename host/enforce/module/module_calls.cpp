@@ -26,14 +26,13 @@ namespace {
 using std::string_view_literals::operator""sv;
 
 // The calls of which each use comes to a hook, by what is asked there. What makes a descriptor.
-constexpr std::array kMakeDescriptors = {
-    "accept"sv,        "accept4"sv,        "creat"sv,          "epoll_create"sv,
-    "epoll_create1"sv, "eventfd"sv,        "eventfd2"sv,       "fanotify_init"sv,
-    "inotify_init"sv,  "inotify_init1"sv,  "io_uring_setup"sv, "landlock_create_ruleset"sv,
-    "memfd_create"sv,  "mq_open"sv,        "open"sv,           "open_by_handle_at"sv,
-    "open_tree"sv,     "openat"sv,         "openat2"sv,        "perf_event_open"sv,
-    "pidfd_open"sv,    "pipe"sv,           "pipe2"sv,          "socket"sv,
-    "socketpair"sv,    "timerfd_create"sv, "userfaultfd"sv};
+constexpr std::array kMakeDescriptors = {"accept"sv,          "accept4"sv, "io_uring_setup"sv,
+                                         "perf_event_open"sv, "socket"sv,  "socketpair"sv,
+                                         "userfaultfd"sv};
+// What makes, moves or removes an entry of a directory.
+constexpr std::array kEntries = {"link"sv,    "linkat"sv,    "mkdir"sv,    "mkdirat"sv,   "mknod"sv,
+                                 "mknodat"sv, "rename"sv,    "renameat"sv, "renameat2"sv, "rmdir"sv,
+                                 "symlink"sv, "symlinkat"sv, "unlink"sv,   "unlinkat"sv};
 // What reads the status of a file or changes it.
 constexpr std::array kStatus = {"chmod"sv,      "chown"sv,     "fchmod"sv,   "fchmodat"sv,
                                 "fchmodat2"sv,  "fchown"sv,    "fchownat"sv, "fstat"sv,
@@ -60,10 +59,12 @@ constexpr std::array kPrivileged = {
     "mount"sv,         "mount_setattr"sv, "move_mount"sv,    "pivot_root"sv,      "reboot"sv,
     "setdomainname"sv, "setgroups"sv,     "sethostname"sv,   "setns"sv,           "settimeofday"sv,
     "swapoff"sv,       "swapon"sv,        "umount2"sv,       "vhangup"sv};
-constexpr std::array kAtHooks = {
-    std::span<const std::string_view>(kMakeDescriptors), std::span<const std::string_view>(kStatus),
-    std::span<const std::string_view>(kProcesses), std::span<const std::string_view>(kChecked),
-    std::span<const std::string_view>(kPrivileged)};
+constexpr std::array kAtHooks = {std::span<const std::string_view>(kMakeDescriptors),
+                                 std::span<const std::string_view>(kEntries),
+                                 std::span<const std::string_view>(kStatus),
+                                 std::span<const std::string_view>(kProcesses),
+                                 std::span<const std::string_view>(kChecked),
+                                 std::span<const std::string_view>(kPrivileged)};
 
 constexpr const char* kReachesNoHook = "not refused, as not each use of it comes to a hook";
 constexpr const char* kRing = "refused, as what a ring does is no system call";

@@ -29,10 +29,11 @@ std::uint64_t Load(std::uint64_t& word) {
   return std::atomic_ref(word).load(std::memory_order_acquire);
 }
 
-std::uint64_t* Map(const FileDescriptor& map, std::size_t size, const char* failure) {
+template <class Value>
+Value* Map(const FileDescriptor& map, std::size_t size, const char* failure) {
   void* const memory = mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_SHARED, map.Number(), 0);
   Require(memory != MAP_FAILED, failure);
-  return static_cast<std::uint64_t*>(memory);
+  return static_cast<Value*>(memory);
 }
 
 }  // namespace
@@ -72,15 +73,15 @@ ModuleRefusals SumOf(const FileDescriptor& refusals, unsigned int domain) {
 
 ModuleMaps::~ModuleMaps() {
   if (words != nullptr) munmap(words, kBytesOfWords);
-  if (now != nullptr) munmap(now, sizeof(*now));
+  if (hashed != nullptr) munmap(hashed, sizeof(*hashed));
 }
 
 void ModuleMaps::MapWords() {
-  words = Map(domains, kBytesOfWords, "cannot map the levels of domains");
-  now = Map(epoch, sizeof(*now), "cannot map the epoch");
+  words = Map<std::uint64_t>(domains, kBytesOfWords, "cannot map the levels of domains");
+  hashed = Map<ModuleHashing>(hashing, sizeof(*hashed), "cannot map the epoch");
 }
 
-void ModuleMaps::BeginEpoch() const { std::atomic_ref(*now).fetch_add(1); }
+void ModuleMaps::BeginEpoch() const { std::atomic_ref(hashed->epoch).fetch_add(1); }
 
 __u32 ModuleMaps::EntryOf(unsigned int domain) const {
   return static_cast<__u32>(Load(words[domain]) >> kEntryShift);

@@ -20,22 +20,21 @@ struct ModuleMaps {
   FileDescriptor events;
   FileDescriptor labels;
   FileDescriptor devices;
-  FileDescriptor epoch;
   FileDescriptor hashing;
   FileDescriptor paths;
   FileDescriptor labelRules;
-  std::uint64_t* words = nullptr;  // of the domains, as the programs see them
-  std::uint64_t* now = nullptr;    // the epoch, likewise
+  std::uint64_t* words = nullptr;   // of the domains, as the programs see them
+  ModuleHashing* hashed = nullptr;  // what is in `hashing`, likewise
 
   ModuleMaps() = default;
   ModuleMaps(const ModuleMaps&) = delete;
   ModuleMaps& operator=(const ModuleMaps&) = delete;
   ~ModuleMaps();
 
-  // Makes `words` what is in `domains`, and `now` what is in `epoch`.
+  // Makes `words` what is in `domains`, and `hashed` what is in `hashing`.
   void MapWords();
 
-  // From here on nothing counts that programs have found out before about directories.
+  // From here on nothing counts that programs have found out before about files.
   void BeginEpoch() const;
 
   // Of a domain's two entries the one that its rules are in, and the other one.

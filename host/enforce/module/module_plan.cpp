@@ -2,6 +2,7 @@
 
 #include <sys/socket.h>
 
+#include <algorithm>
 #include <array>
 #include <limits>
 #include <span>
@@ -52,8 +53,10 @@ bool HasRoom(const ValueSet& passing) { return passing.Ranges().size() <= kMostM
 // What there is no room for does not pass.
 ModuleCheck CheckOf(const ValueSet& passing) {
   ModuleCheck check = {};
-  if (!HasRoom(passing)) return check;
+  if (!HasRoom(passing) || passing.IsEmpty()) return check;
   for (const auto& [first, last] : passing.Ranges()) check.ranges[check.count++] = {first, last};
+  const std::span ranges(check.ranges);
+  std::ranges::fill(ranges.subspan(check.count), ranges[check.count - 1]);
   return check;
 }
 

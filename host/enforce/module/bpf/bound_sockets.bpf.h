@@ -1,4 +1,5 @@
-// What kind of socket a thread is about to give a path.
+// What is known of unix sockets from when they are given a name: by whom, and to a thread which is
+// about to make the file of one, of what kind that is.
 #ifndef BOUND_SOCKETS_BPF_H
 #define BOUND_SOCKETS_BPF_H
 
@@ -15,17 +16,35 @@ struct {
   __type(value, __u32);
 } bindings SEC(".maps");
 
+// The domains that have given them a name; the first one stays.
+struct {
+  __uint(type, BPF_MAP_TYPE_SK_STORAGE);
+  __uint(map_flags, BPF_F_NO_PREALLOC);
+  __type(key, int);
+  __type(value, __u32);
+} namers SEC(".maps");
+
 static __always_inline __u32 kind_of_socket(int type) {
   if (type == SOCK_STREAM) return kSocketStream;
   return type == SOCK_SEQPACKET ? kSocketSeqpacket : kSocketDatagram;
 }
 
-static __always_inline bool note_binding(int type) {
+static __always_inline bool note_namer(struct sock* sock, __u32 domain) {
+  return bpf_sk_storage_get(&namers, sock, &domain, BPF_LOCAL_STORAGE_GET_F_CREATE);
+}
+
+static __always_inline bool note_kind(int type) {
   struct task_struct* thread = bpf_get_current_task_btf();
   __u32 noted = kind_of_socket(type) + 1;
   __u32* kept = bpf_task_storage_get(&bindings, thread, &noted, BPF_LOCAL_STORAGE_GET_F_CREATE);
   if (kept) *kept = noted;
   return kept;
+}
+
+static __always_inline int note_unix_binding(struct socket* socket, struct sock* sock) {
+  struct ModuleTask* task = current_task();
+  if (!task) return 0;
+  return note_namer(sock, task->domain) && note_kind(socket->type) ? 0 : -ENOMEM;
 }
 
 // 0 where no socket is bound, as the file of one can be made for itself.

@@ -15,28 +15,41 @@
 #define FIOSETOWN 0x8901
 #define SIOCSPGRP 0x8902
 
+// The last range that begins at the value or before is the only one that can have it. It is looked
+// for without branches, as the kernel would look through what follows each of them.
 static __always_inline bool passes(struct ModuleCheck* check, __u32 value) {
-  for (__u32 index = 0; index < kMostModuleRanges; index++) {
-    if (index >= check->count) return false;
-    if (value >= check->ranges[index].first && value <= check->ranges[index].last) return true;
+  __u64 at = 0;
+#pragma clang loop unroll(full)
+  for (__u64 step = kMostModuleRanges / 2; step; step /= 2) {
+    __u64 first = check->ranges[(at + step) % kMostModuleRanges].first;
+    __u64 is_beyond = (__s64)(value - first) >> 63;
+    barrier_var(is_beyond);
+    at += step & ~is_beyond;
   }
-  return false;
+  struct ModuleRange* range = &check->ranges[at % kMostModuleRanges];
+  return check->count && value >= range->first && value <= range->last;
 }
 
-// Of a domain that there is not, no value passes.
-static __always_inline bool has_passed(__u64 word, int check, __u32 value) {
-  struct ModuleRules* granted = rules_of(word);
-  return granted && level_of(word) != kLevelAbsent && passes(&granted->checks[check], value);
+static __always_inline int judge_value(__u32 domain, __u32 level, struct ModuleRules* granted,
+                                       __u32 check, __u32 value) {
+  __u64 index = check;
+  // What is compared and what is used are the same for the verifier then.
+  asm volatile("" : "+r"(index));
+  if (granted && index < kModuleChecks && passes(&granted->checks[index], value)) return 0;
+  return refuse(domain, level, act(kActPassValue, check, value));
 }
 
-static __always_inline int check_value(int check, __u32 value) {
+__noinline int judge_call_and_value(__u32 check, __u32 value) {
   struct ModuleTask* task = current_task();
   if (!task) return 0;
   __u64 word = word_of(task->domain);
-  int result = judge_call(task->domain, word, rules_of(word));
-  if (result) return result;
-  if (has_passed(word, check, value)) return 0;
-  return refuse(task->domain, level_of(word), act(kActPassValue, check, value));
+  struct ModuleRules* granted = rules_of(word);
+  int result = judge_call(task->domain, level_of(word), granted);
+  return result ? result : judge_value(task->domain, level_of(word), granted, check, value);
+}
+
+static __always_inline int check_value(__u32 check, __u32 value) {
+  return judge_call_and_value(check, value) ? -EPERM : 0;
 }
 
 // What a descriptor that is ready sends to its owner. All that the kernel takes for a signal is
@@ -46,8 +59,7 @@ static __always_inline int check_owned(__u64 signal) {
   if (!task || signal > kMostSignals) return 0;
   __u64 word = word_of(task->domain);
   struct ModuleRules* granted = rules_of(word);
-  bool is_there = granted && level_of(word) != kLevelAbsent;
-  if (is_there && granted->ownedSignals >> ((signal - 1) & 63) & 1) return 0;
+  if (granted && granted->ownedSignals >> ((signal - 1) & 63) & 1) return 0;
   return refuse(task->domain, level_of(word), act(kActPassValue, kCheckSignal, signal));
 }
 
@@ -89,9 +101,11 @@ int BPF_PROG(use_ioctl, struct file* file, unsigned int request, unsigned long a
   struct ModuleTask* task = current_task();
   if (!task) return 0;
   __u64 word = word_of(task->domain);
-  int result = judge_call(task->domain, word, rules_of(word));
+  struct ModuleRules* granted = rules_of(word);
+  int result = judge_call(task->domain, level_of(word), granted);
   if (result) return result;
-  if (has_passed(word, kCheckIoctl, request)) return is_about_owner(request) ? check_owner() : 0;
+  if (granted && passes(&granted->checks[kCheckIoctl], request))
+    return is_about_owner(request) ? check_owner() : 0;
   return refuse_path(task->domain, level_of(word), act(kActPassValue, kCheckIoctl, request),
                      &file->f_path);
 }

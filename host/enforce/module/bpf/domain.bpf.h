@@ -57,8 +57,9 @@ static __always_inline __u64 word_of(__u32 domain) {
 
 static __always_inline __u32 level_of(__u64 word) { return (__u32)word; }
 
-// What has no rules has all zeroes.
+// Null of a domain that there is not.
 static __always_inline struct ModuleRules* rules_of(__u64 word) {
+  if (level_of(word) == kLevelAbsent) return 0;
   __u32 entry = word >> kEntryShift;
   return bpf_map_lookup_elem(&rules, &entry);
 }

@@ -41,7 +41,7 @@ static __always_inline bool is_controlled(struct linux_binprm* program) {
 
 // 0 where the program leads nowhere, else the domain, one higher.
 static __always_inline __u32 domain_behind(struct Asker* asker, __u32 label) {
-  struct ModuleLabelRules* rules = rules_for(asker, label);
+  struct ModuleLabelRules* rules = rules_for(asker->entry, label);
   return rules ? rules->next : 0;
 }
 
@@ -54,7 +54,8 @@ static __always_inline int refuse_entry(struct Asker* asker, struct file* file, 
 // What has no place in any file system no rule is about.
 static __always_inline int judge_program(struct Asker* asker, struct file* file) {
   if (asker->level == kLevelDisabled) return 0;
-  if (is_mounted(file->f_path.dentry)) return judge_open_file(asker, file, kUseExecute);
+  __u32 rights = 0;
+  if (is_mounted(file->f_path.dentry)) return judge_open_file(asker, file, kUseExecute, &rights);
   return refuse(asker->domain, asker->level, act_on_file(kActUseFile, kUseExecute, kLabelUnknown));
 }
 
@@ -68,7 +69,7 @@ int BPF_PROG(choose_domain, struct linux_binprm* program) {
   struct file* file = program->file;
   int result = judge_program(&asker, file);
   if (result) return result;
-  __u32 label = label_of(file->f_path.dentry);
+  __u32 label = label_of(number_of(file->f_path.dentry));
   __u32 next = domain_behind(&asker, label);
   if (!next) return 0;
   if (level_of(word_of(next - 1)) == kLevelAbsent || is_controlled(program))
@@ -110,7 +111,7 @@ int BPF_PROG(check_script, struct linux_binprm* program) {
   struct file* file = program->file;
   __u32 next = own->next;
   own->next = 0;
-  return refuse_entry(&asker, file, label_of(file->f_path.dentry), next);
+  return refuse_entry(&asker, file, label_of(number_of(file->f_path.dentry)), next);
 }
 
 // From here on nothing of the former program is left, and this one cannot fail anymore.

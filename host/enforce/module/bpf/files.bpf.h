@@ -3,8 +3,11 @@
 #define FILES_BPF_H
 
 #include "bound_sockets.bpf.h"
+#include "decisions.bpf.h"
+#include "kernel_helpers.bpf.h"
 #include "labels.bpf.h"
 #include "paths.bpf.h"
+#include "pins.bpf.h"
 
 #define S_IFSOCK 0140000
 #define S_IFLNK 0120000
@@ -35,58 +38,29 @@ struct {
   __type(value, struct ModuleMaking);
 } makings SEC(".maps");
 
-// Who asks, and by which rules.
-struct Asker {
-  __u32 domain;
-  __u32 level;
-  __u32 entry;
-  bool has_paths;
-};
-
-static __always_inline void ask_for(struct Asker* asker, __u32 domain) {
-  __u64 word = word_of(domain);
-  asker->domain = domain;
-  asker->level = level_of(word);
-  asker->entry = word >> kEntryShift;
-  struct ModuleRules* granted = rules_of(word);
-  asker->has_paths = granted && granted->hasPaths;
-}
-
-// False for who may do everything.
-static __always_inline bool is_asked(struct Asker* asker) {
-  struct ModuleTask* task = current_task();
-  if (!task) return false;
-  ask_for(asker, task->domain);
-  return asker->level != kLevelDisabled;
-}
-
-// The interpreter of a program is executed by the domain that this leads to.
-static __always_inline bool is_asked_to_open(struct Asker* asker, struct file* file) {
-  if (!(file->f_flags & FMODE_EXEC_FLAG)) return is_asked(asker);
+// The domain that the interpreter of a program is executed by: the one that this leads to.
+static __always_inline __u32 domain_to_execute(struct ModuleTask* task) {
   struct ModuleTask* own = bpf_task_storage_get(&tasks, bpf_get_current_task_btf(), 0, 0);
-  if (!own || !own->next) return is_asked(asker);
-  ask_for(asker, own->next - 1);
-  return asker->level != kLevelDisabled;
+  return own && own->next ? own->next - 1 : task->domain;
 }
 
 // Namespaces may be mounted, but are reached by their processes.
 #define NSFS_MAGIC 0x6e736673
 
 static __always_inline bool is_mounted(struct dentry* entry) {
-  struct super_block* file_system = entry->d_sb;
-  return !(file_system->s_flags & SB_NOUSER) && file_system->s_magic != NSFS_MAGIC;
+  return !(BPF_CORE_READ(entry, d_sb, s_flags) & SB_NOUSER) &&
+         BPF_CORE_READ(entry, d_sb, s_magic) != NSFS_MAGIC;
 }
 
-static __always_inline struct ModuleLabelRules* rules_for(struct Asker* asker, __u32 label) {
-  struct ModuleLabelKey key = {asker->entry, label};
+static __always_inline struct ModuleLabelRules* rules_for(__u32 rules_entry, __u32 label) {
+  struct ModuleLabelKey key = {rules_entry, label};
   return bpf_map_lookup_elem(&label_rules, &key);
 }
 
-// The rights that the rules of the asker give to a file at this place, were its label this one; to
+// The rights that the rules of the entry give to a file at this place, were its label this one; to
 // a directory also what may be made in it.
-static __always_inline __u32 rights_of(struct Asker* asker, __u32 label, __u32 said) {
-  if (asker->level == kLevelAbsent) return 0;
-  struct ModuleLabelRules* rules = rules_for(asker, label);
+static __always_inline __u32 rights_of(__u32 rules_entry, __u32 label, __u32 said) {
+  struct ModuleLabelRules* rules = rules_for(rules_entry, label);
   __u32 granted = rules ? rules->granted : 0;
   __u32 refused = rules ? rules->refused : 0;
   if (said & kPathHasRule) {
@@ -99,46 +73,57 @@ static __always_inline __u32 rights_of(struct Asker* asker, __u32 label, __u32 s
   return granted & ~refused;
 }
 
-static __always_inline __u32 said_of(struct Asker* asker, struct vfsmount* mount,
-                                     struct dentry* entry) {
-  return asker->has_paths ? path_bits(mount, entry, asker->entry) : 0;
+static __always_inline __u32 said_of(struct Asker* asker, __u64 mount, __u64 entry) {
+  return has_paths(asker) ? path_bits(mount, entry, asker->entry) : 0;
 }
 
-// Of what is wanted that which the asker may not do with a file that is there.
-static __always_inline __u32 lacking(struct Asker* asker, struct vfsmount* mount,
-                                     struct dentry* entry, __u32 wanted, __u32* label) {
-  *label = label_of(entry);
-  return wanted & ~rights_of(asker, *label, said_of(asker, mount, entry));
+// Of a file that is there: its rights in the lower half, its label in the upper one.
+static __always_inline __u64 rights_at(__u64 mount, __u64 entry, __u32 rules_entry,
+                                       __u32 is_by_path) {
+  __u32 label = label_of(entry);
+  __u32 said = is_by_path ? path_bits(mount, entry, rules_entry) : 0;
+  return (__u64)label << 32 | rights_of(rules_entry, label, said);
 }
 
-static __always_inline int judge_file(struct Asker* asker, struct vfsmount* mount,
-                                      struct dentry* entry, __u32 wanted) {
-  __u32 label = kLabelUnknown;
-  if (!lacking(asker, mount, entry, wanted, &label)) return 0;
-  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, wanted, label));
+static __always_inline __u64 rights_for(struct Asker* asker, __u64 mount, __u64 entry) {
+  return rights_at(mount, entry, asker->entry, has_paths(asker));
+}
+
+static __always_inline int judge_file(struct Asker* asker, __u64 mount, __u64 entry, __u32 wanted) {
+  __u64 found = rights_for(asker, mount, entry);
+  if (!(wanted & ~(__u32)found)) return 0;
+  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, wanted, found >> 32));
 }
 
 // The same in hooks that may ask for the path.
-static __always_inline int judge_open_file(struct Asker* asker, struct file* file, __u32 wanted) {
+static __always_inline int judge_open_file(struct Asker* asker, struct file* file, __u32 wanted,
+                                           __u32* rights) {
   struct path* path = &file->f_path;
-  __u32 label = kLabelUnknown;
-  if (!wanted || !lacking(asker, path->mnt, path->dentry, wanted, &label)) return 0;
-  return refuse_path(asker->domain, asker->level, act_on_file(kActUseFile, wanted, label), path);
+  __u64 found = rights_for(asker, number_of(path->mnt), number_of(path->dentry));
+  *rights = found;
+  if (!(wanted & ~(__u32)found)) return 0;
+  return refuse_path(asker->domain, asker->level, act_on_file(kActUseFile, wanted, found >> 32),
+                     path);
 }
 
 // Whether the current process may do something with a file that is there, by its label and by its
 // path: `wanted` is of the kUse... of map_entries.h. Files that lie nowhere are not asked about.
-static __noinline int may_file(struct vfsmount* mount, struct dentry* entry, __u32 wanted) {
+__noinline int judge_use(__u64 mount, __u64 entry, __u32 wanted) {
   struct Asker asker = {};
-  if (!wanted || !is_asked(&asker) || !is_mounted(entry)) return 0;
+  if (!is_asked(&asker) || !is_mounted((struct dentry*)entry)) return 0;
   return judge_file(&asker, mount, entry, wanted);
+}
+
+static __always_inline int may_file(struct vfsmount* mount, struct dentry* entry, __u32 wanted) {
+  return judge_use(number_of(mount), number_of(entry), wanted) ? -EPERM : 0;
 }
 
 // The same in hooks that may ask for the path.
 static __always_inline int may_use(struct file* file, __u32 wanted) {
   struct Asker asker = {};
+  __u32 rights = 0;
   if (!wanted || !is_asked(&asker) || !is_mounted(file->f_path.dentry)) return 0;
-  return judge_open_file(&asker, file, wanted);
+  return judge_open_file(&asker, file, wanted, &rights);
 }
 
 // ---- Making files
@@ -170,28 +155,30 @@ static __always_inline __u32 kind_of(__u32 mode) {
 
 // Nothing for that of the directory.
 static __always_inline __u32 new_label(struct Asker* asker, __u32 directory_label, __u32 kind) {
-  struct ModuleLabelRules* rules = rules_for(asker, directory_label);
+  struct ModuleLabelRules* rules = rules_for(asker->entry, directory_label);
   __u64 index = kind;
   // What is compared and what is used are the same for the verifier then.
   asm volatile("" : "+r"(index));
   return rules && index < kLabelledKinds ? rules->newLabels[index] : 0;
 }
 
-// Whether the asker may make an entry of this kind in the directory. What it is to be labelled is
-// kept for when there is something to label.
-static __always_inline int judge_making(struct Asker* asker, struct vfsmount* mount,
-                                        struct dentry* directory, struct dentry* entry, __u32 kind,
-                                        __u32* label) {
-  __u32 above = label_of_directory(directory);
-  __u32 rights = rights_of(asker, above, said_of(asker, mount, entry));
+static __always_inline struct ModuleAct making_of(__u32 kind, __u32 above) {
+  if (kind < kMakeFirstSocket) return act_on_file(kActMakeFile, kind, above);
   bool is_some = kind == kMakeSomeSocket;
-  __u32 wanted = is_some ? kMayMakeSocket : 1U << (kMakeShift + (kind & 15));
-  __u32 socket = is_some ? kSocketStream : kind - kMakeFirstSocket;
-  *label = new_label(asker, above, kind);
-  if (!(wanted & ~rights)) return 0;
-  return refuse(asker->domain, asker->level,
-                kind >= kMakeFirstSocket ? act_on_file(kActMakeSocket, socket, above)
-                                         : act_on_file(kActMakeFile, kind, above));
+  return act_on_file(kActMakeSocket, is_some ? kSocketStream : kind - kMakeFirstSocket, above);
+}
+
+// Whether the current process may make an entry of this kind in the directory: above the result,
+// which is not 0 where it may not, the label that the entry is to have.
+__noinline __u64 judge_making(__u64 mount, __u64 directory, __u64 entry, __u32 kind) {
+  struct Asker asker = {};
+  if (!is_asked(&asker)) return 0;
+  __u32 above = label_of_directory(directory);
+  __u32 rights = rights_of(asker.entry, above, said_of(&asker, mount, entry));
+  __u32 wanted = kind == kMakeSomeSocket ? kMayMakeSocket : 1U << (kMakeShift + (kind & 15));
+  __u64 label = new_label(&asker, above, kind);
+  bool is_refused = wanted & ~rights && refuse(asker.domain, asker.level, making_of(kind, above));
+  return label << 32 | is_refused;
 }
 
 // Room for one more label is found before the file is made.
@@ -203,25 +190,32 @@ static __always_inline bool has_room(void) {
   return true;
 }
 
-static __noinline int make(struct vfsmount* mount, struct dentry* directory, struct dentry* entry,
-                           __u32 mode) {
-  struct Asker asker = {};
-  if (!is_asked(&asker)) return 0;
-  __u32 kind = kind_of(mode);
-  __u32 bound = kind == kMakeSomeSocket ? take_binding() : 0;
-  if (bound) kind = kMakeFirstSocket + bound - 1;
-  struct ModuleMaking making = {(__u64)entry, entry->d_name.hash, 0};
-  int result = judge_making(&asker, mount, directory, entry, kind, &making.label);
-  if (result) return result;
+// What it is to be labelled is kept for when there is something to label.
+static __always_inline int keep_label(__u64 entry, __u64 name, __u32 label) {
+  struct ModuleMaking making = {entry, name, label};
   struct task_struct* thread = bpf_get_current_task_btf();
   struct ModuleMaking* former = bpf_task_storage_get(&makings, thread, 0, 0);
   if (former) former->label = 0;
-  if (!making.label) return 0;
+  if (!label) return 0;
   if (!has_room()) return -ENOSPC;
   former = bpf_task_storage_get(&makings, thread, &making, BPF_LOCAL_STORAGE_GET_F_CREATE);
   if (!former) return -ENOMEM;
   *former = making;
   return 0;
+}
+
+static __always_inline int make(const struct path* parent, struct dentry* entry, __u32 mode) {
+  if (!current_task()) return 0;
+  __u64 place = number_of(entry);
+  __u64 mount = number_of(parent->mnt);
+  __u64 directory = number_of(parent->dentry);
+  __u64 name = entry->d_name.hash;
+  int result = check_call();
+  if (result) return result;
+  __u32 kind = kind_of(mode);
+  __u32 bound = kind == kMakeSomeSocket ? take_binding() : 0;
+  __u64 judged = judge_making(mount, directory, place, bound ? kMakeFirstSocket + bound - 1 : kind);
+  return (__u32)judged ? -EPERM : keep_label(place, name, judged >> 32);
 }
 
 // Of what is new nobody knows anything yet.
@@ -236,7 +230,7 @@ SEC("lsm/d_instantiate")
 int BPF_PROG(label_new_file, struct dentry* entry, struct inode* inode) {
   struct ModuleMaking* making = bpf_task_storage_get(&makings, bpf_get_current_task_btf(), 0, 0);
   if (!making || !making->label || !inode) return 0;
-  if (making->entry == (__u64)entry && making->name == entry->d_name.hash)
+  if (making->entry == number_of(entry) && making->name == entry->d_name.hash)
     give_label(inode, making->label);
   making->label = 0;
   return 0;
@@ -244,17 +238,17 @@ int BPF_PROG(label_new_file, struct dentry* entry, struct inode* inode) {
 
 SEC("lsm/path_mknod")
 int BPF_PROG(make_file, const struct path* directory, struct dentry* entry, unsigned short mode) {
-  return make(directory->mnt, directory->dentry, entry, mode);
+  return make(directory, entry, mode);
 }
 
 SEC("lsm/path_mkdir")
 int BPF_PROG(make_directory, const struct path* directory, struct dentry* entry) {
-  return make(directory->mnt, directory->dentry, entry, S_IFDIR);
+  return make(directory, entry, S_IFDIR);
 }
 
 SEC("lsm/path_symlink")
 int BPF_PROG(make_link, const struct path* directory, struct dentry* entry) {
-  return make(directory->mnt, directory->dentry, entry, S_IFLNK);
+  return make(directory, entry, S_IFLNK);
 }
 
 // ---- Using files
@@ -263,38 +257,72 @@ static __always_inline __u32 wanted_of(struct file* file) {
   __u32 flags = file->f_flags;
   __u32 mode = file->f_mode;
   if (flags & FMODE_EXEC_FLAG) return kUseExecute;
-  if (is_directory(file->f_inode)) return mode & FMODE_READ ? kUseList : 0;
+  if ((file->f_inode->i_mode & S_IFMT) == S_IFDIR) return mode & FMODE_READ ? kUseList : 0;
   return (mode & FMODE_READ ? kUseRead : 0) | (mode & FMODE_WRITE ? kUseWrite : 0);
 }
 
-static __always_inline bool is_written_device(struct file* file) {
-  return (file->f_inode->i_mode & S_IFMT) == S_IFBLK && file->f_mode & FMODE_WRITE;
+// What lies below all file systems would be changed, or what the kernel executes by itself.
+static __always_inline bool is_to_write_past(struct file* file) {
+  if (!(file->f_mode & FMODE_WRITE)) return false;
+  struct inode* inode = file->f_inode;
+  return (inode->i_mode & S_IFMT) == S_IFBLK || names_helper(number_of(file), inode->i_sb->s_magic);
 }
 
 // A file that has no name yet: whoever opens it makes it.
-static __always_inline int make_nameless(struct Asker* asker, struct file* file) {
+static __always_inline int make_nameless(struct file* file) {
   struct dentry* entry = file->f_path.dentry;
-  __u32 label = 0;
-  int result = judge_making(asker, file->f_path.mnt, entry->d_parent, entry, kMakeRegular, &label);
-  if (result || !label) return result;
+  __u64 judged = judge_making(number_of(file->f_path.mnt), number_of(entry->d_parent),
+                              number_of(entry), kMakeRegular);
+  if ((__u32)judged) return -EPERM;
+  __u32 label = judged >> 32;
+  if (!label) return 0;
   if (!has_room()) return -ENOSPC;
   give_label(file->f_inode, label);
   return 0;
 }
 
+// Whether that is what the domain was allowed before. Of what it depends on, the tag is kept.
+static __always_inline bool may_open_again(struct task_struct* thread, __u32 domain,
+                                           struct file* file, __u64* tag) {
+  struct ModuleHashing* how = how_to_hash();
+  if (!how) return false;
+  __u64 now = epoch_of(how);
+  __u64 word = word_of(domain);
+  if (level_of(word) == kLevelDisabled) return true;
+  struct ModuleRules* granted = rules_of(word);
+  if (!granted || !is_call_granted(granted, call_of(thread)) || is_to_write_past(file))
+    return false;
+  *tag = tag_of_decision(&file->f_path, word >> kEntryShift, granted->hasPaths, now, how);
+  return was_granted(*tag, wanted_of(file));
+}
+
+static __always_inline int judge_opening(struct Asker* asker, struct file* file, __u64 tag) {
+  if (is_to_write_past(file))
+    return refuse_path(asker->domain, asker->level, act(kActReachModule, 0, 0), &file->f_path);
+  if (!is_mounted(file->f_path.dentry)) return 0;
+  int result = file->f_flags & O_TMPFILE_FLAG ? make_nameless(file) : 0;
+  __u32 wanted = wanted_of(file);
+  if (result || !wanted) return result;
+  __u32 rights = 0;
+  result = judge_open_file(asker, file, wanted, &rights);
+  remember_rights(tag, rights);
+  return result;
+}
+
 SEC("lsm/file_open")
 int BPF_PROG(open_file, struct file* file) {
+  struct task_struct* thread = bpf_get_current_task_btf();
+  struct ModuleTask* task = task_of(thread);
+  if (!task) return 0;
+  bool is_to_execute = file->f_flags & FMODE_EXEC_FLAG;
+  __u64 tag = 0;
+  if (!is_to_execute && may_open_again(thread, task->domain, file, &tag)) return 0;
   struct Asker asker = {};
-  struct dentry* entry = file->f_path.dentry;
-  if (!is_asked_to_open(&asker, file) || !is_mounted(entry)) return 0;
-  // What lies below all file systems would be changed.
-  if (is_written_device(file))
-    return refuse_path(asker.domain, asker.level, act(kActReachModule, 0, 0), &file->f_path);
-  if (file->f_flags & O_TMPFILE_FLAG) {
-    int result = make_nameless(&asker, file);
-    if (result) return result;
-  }
-  return judge_open_file(&asker, file, wanted_of(file));
+  ask_for(&asker, is_to_execute ? domain_to_execute(task) : task->domain);
+  if (asker.level == kLevelDisabled) return 0;
+  // By which call a domain is executed in is asked of the one that is left.
+  int result = asker.domain == task->domain ? judge_call_of(&asker) : 0;
+  return result ? result : judge_opening(&asker, file, tag);
 }
 
 SEC("lsm/file_receive")
@@ -329,28 +357,39 @@ int BPF_PROG(truncate_file, struct file* file) {
 
 SEC("lsm/path_unlink")
 int BPF_PROG(remove_file, const struct path* directory, struct dentry* entry) {
-  return may_file(directory->mnt, entry, kUseRemove);
+  if (!current_task()) return 0;
+  int result = check_call();
+  if (!result) result = protect_pins(entry);
+  return result ? result : may_file(directory->mnt, entry, kUseRemove);
 }
 
 SEC("lsm/path_rmdir")
 int BPF_PROG(remove_directory, const struct path* directory, struct dentry* entry) {
-  return may_file(directory->mnt, entry, kUseRemove);
+  if (!current_task()) return 0;
+  int result = check_call();
+  if (!result) result = protect_pins(entry);
+  return result ? result : may_file(directory->mnt, entry, kUseRemove);
 }
+
+// A file, and the place that it is to have.
+struct Move {
+  __u64 mount;
+  __u64 entry;
+  __u64 directory;  // of the place
+  __u64 place;
+};
 
 // Whoever gives a file a second place is allowed no more with it there than where it is, nor with
 // what is beneath it.
-static __always_inline int judge_place(struct Asker* asker, struct vfsmount* mount,
-                                       struct dentry* entry, struct dentry* directory,
-                                       struct dentry* place) {
-  struct inode* inode = entry->d_inode;
-  if (!inode) return 0;
-  __u32 label = label_of(entry);
+static __always_inline int judge_place(struct Asker* asker, struct Move* move,
+                                       struct inode* inode) {
+  __u32 label = label_of(move->entry);
   __u32* own = own_label(inode);
-  __u32 inherited = label_of_directory(directory);
+  __u32 inherited = label_of_directory(move->directory);
   __u32 later = own && inherited != kLabelUnknown ? label_in(*own) : inherited;
-  __u32 said = said_of(asker, mount, entry);
-  __u32 said_later = said_of(asker, mount, place);
-  __u32 gained = rights_of(asker, later, said_later) & ~rights_of(asker, label, said);
+  __u32 said = said_of(asker, move->mount, move->entry);
+  __u32 said_later = said_of(asker, move->mount, move->place);
+  __u32 gained = rights_of(asker->entry, later, said_later) & ~rights_of(asker->entry, label, said);
   if (!is_directory(inode)) {
     gained &= kAllUses;
   } else if ((said | said_later) & kPathIsAboveRule) {
@@ -362,53 +401,43 @@ static __always_inline int judge_place(struct Asker* asker, struct vfsmount* mou
 }
 
 // Makes an entry of a file that there is. It keeps the label that it has.
-static __always_inline int judge_entry(struct Asker* asker, struct vfsmount* mount,
-                                       struct dentry* entry, struct dentry* directory,
-                                       struct dentry* place) {
-  struct inode* inode = entry->d_inode;
-  if (!inode) return 0;
-  __u32 ignored = 0;
-  int result = judge_making(asker, mount, directory, place, kind_of(inode->i_mode), &ignored);
-  return result ? result : judge_place(asker, mount, entry, directory, place);
+__noinline int judge_entry(__u64 mount, __u64 entry, __u64 directory, __u64 place) {
+  struct inode* inode = BPF_CORE_READ((struct dentry*)entry, d_inode);
+  struct Asker asker = {};
+  if (!inode || !is_asked(&asker)) return 0;
+  struct Move move = {mount, entry, directory, place};
+  __u64 judged = judge_making(mount, directory, place, kind_of(BPF_CORE_READ(inode, i_mode)));
+  return (__u32)judged ? -EPERM : judge_place(&asker, &move, inode);
+}
+
+static __always_inline int may_enter(__u64 mount, __u64 entry, __u64 directory, __u64 place) {
+  return judge_entry(mount, entry, directory, place) ? -EPERM : 0;
 }
 
 SEC("lsm/path_link")
 int BPF_PROG(link_file, struct dentry* entry, const struct path* directory, struct dentry* place) {
-  struct Asker asker = {};
-  if (!is_asked(&asker)) return 0;
-  return judge_entry(&asker, directory->mnt, entry, directory->dentry, place);
+  if (!current_task()) return 0;
+  int result = check_call();
+  return result ? result
+                : may_enter(number_of(directory->mnt), number_of(entry),
+                            number_of(directory->dentry), number_of(place));
 }
 
 SEC("lsm/path_rename")
 int BPF_PROG(move_file, const struct path* directory, struct dentry* entry,
              const struct path* new_directory, struct dentry* place, unsigned int flags) {
-  struct Asker asker = {};
-  if (!is_asked(&asker)) return 0;
-  struct vfsmount* mount = directory->mnt;
-  int result = judge_file(&asker, mount, entry, kUseRemove);
+  if (!current_task()) return 0;
+  int result = check_call();
+  if (!result) result = protect_pins(entry);
+  if (!result) result = may_file(directory->mnt, entry, kUseRemove);
+  if (!result && place->d_inode) result = may_file(directory->mnt, place, kUseRemove);
   if (result) return result;
-  if (place->d_inode) result = judge_file(&asker, mount, place, kUseRemove);
-  if (result) return result;
-  result = judge_entry(&asker, mount, entry, new_directory->dentry, place);
+  __u64 mount = number_of(directory->mnt);
+  __u64 from = number_of(entry);
+  __u64 to = number_of(place);
+  result = may_enter(mount, from, number_of(new_directory->dentry), to);
   if (result || !(flags & RENAME_EXCHANGE)) return result;
-  return judge_entry(&asker, mount, place, directory->dentry, entry);
+  return may_enter(mount, to, number_of(directory->dentry), from);
 }
-
-// ---- What would change the names of all
-
-static __always_inline int keep_names(void) {
-  struct Asker asker = {};
-  if (!is_asked(&asker) || !asker.has_paths) return 0;
-  return refuse(asker.domain, asker.level, act(kActReachModule, 0, 0));
-}
-
-SEC("lsm/sb_mount")
-int BPF_PROG(keep_names_from_mount, const char* device) { return keep_names(); }
-
-SEC("lsm/move_mount")
-int BPF_PROG(keep_names_from_move, const struct path* from) { return keep_names(); }
-
-SEC("lsm/sb_pivotroot")
-int BPF_PROG(keep_names_from_pivot, const struct path* from) { return keep_names(); }
 
 #endif

@@ -63,7 +63,17 @@ struct qstr {
   const unsigned char* name;
 };
 
+// Grows with each change of what it is about.
+struct seqcount {
+  __u32 sequence;
+};
+
+struct seqcount_spinlock {
+  struct seqcount seqcount;
+};
+
 struct dentry {
+  struct seqcount_spinlock d_seq;
   struct dentry* d_parent;
   struct qstr d_name;
   struct inode* d_inode;

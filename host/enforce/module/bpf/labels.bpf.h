@@ -3,8 +3,6 @@
 #ifndef LABELS_BPF_H
 #define LABELS_BPF_H
 
-#include <bpf/bpf_core_read.h>
-
 #include "refusal.bpf.h"
 
 #define CAP_SYS_ADMIN 21
@@ -39,29 +37,35 @@ struct {
 struct {
   __uint(type, BPF_MAP_TYPE_LRU_HASH);
   __type(key, struct ModuleFile);
-  __type(value, struct ModuleDirectory);
+  __type(value, __u64);
   __uint(max_entries, kMostKnownDirectories);
 } directories SEC(".maps");
 
-// Grows whenever what is known of directories may be no longer so.
 struct {
   __uint(type, BPF_MAP_TYPE_ARRAY);
   __uint(map_flags, BPF_F_MMAPABLE);
   __type(key, __u32);
-  __type(value, __u64);
+  __type(value, struct ModuleHashing);
   __uint(max_entries, 1);
-} epoch SEC(".maps");
+} hashing SEC(".maps");
+
+static __always_inline struct ModuleHashing* how_to_hash(void) {
+  __u32 only = 0;
+  return bpf_map_lookup_elem(&hashing, &only);
+}
+
+static __always_inline __u64 epoch_of(struct ModuleHashing* how) {
+  return *(volatile __u64*)&how->epoch;
+}
 
 static __always_inline __u64 current_epoch(void) {
-  __u32 only = 0;
-  __u64* now = bpf_map_lookup_elem(&epoch, &only);
-  return now ? *(volatile __u64*)now : 0;
+  struct ModuleHashing* how = how_to_hash();
+  return how ? epoch_of(how) : 0;
 }
 
 static __always_inline void begin_epoch(void) {
-  __u32 only = 0;
-  __u64* now = bpf_map_lookup_elem(&epoch, &only);
-  if (now) __sync_fetch_and_add(now, 1);
+  struct ModuleHashing* how = how_to_hash();
+  if (how) __sync_fetch_and_add(&how->epoch, 1);
 }
 
 // For functions that take no pointers.
@@ -72,11 +76,14 @@ static __always_inline __u64 number_of(const void* pointer) {
 }
 
 static __always_inline bool is_directory(struct inode* inode) {
-  return (inode->i_mode & S_IFMT) == S_IFDIR;
+  return (BPF_CORE_READ(inode, i_mode) & S_IFMT) == S_IFDIR;
 }
 
+// What follows reads the kernel by its addresses, not by typed pointers: newer verifiers search all
+// types of the kernel for each pointer that is followed.
 static __always_inline struct ModuleFile key_of(struct inode* inode) {
-  struct ModuleFile key = {inode->i_ino, inode->i_sb->s_dev, inode->i_generation};
+  struct ModuleFile key = {BPF_CORE_READ(inode, i_ino), BPF_CORE_READ(inode, i_sb, s_dev),
+                           BPF_CORE_READ(inode, i_generation)};
   return key;
 }
 
@@ -86,10 +93,6 @@ static __always_inline __u32 label_in(__u32 carried) { return carried & ~kLabelI
 static __always_inline __u32* own_label(struct inode* inode) {
   struct ModuleFile key = key_of(inode);
   return bpf_map_lookup_elem(&labels, &key);
-}
-
-static __always_inline bool is_known(struct ModuleDirectory* directory, __u64 now) {
-  return directory && directory->label >> kEpochShift == now;
 }
 
 // The way from a directory up to one that carries a label.
@@ -129,36 +132,33 @@ __noinline __u32 find_label(__u64 directory) {
   return search.label;
 }
 
-static __always_inline struct ModuleDirectory* remember(struct ModuleFile* key) {
-  struct ModuleDirectory nothing = {};
-  bpf_map_update_elem(&directories, key, &nothing, BPF_NOEXIST);
-  return bpf_map_lookup_elem(&directories, key);
-}
-
-static __noinline __u32 label_of_directory(struct dentry* directory) {
-  struct inode* inode = directory->d_inode;
+__noinline __u32 label_of_directory(__u64 number) {
+  struct dentry* directory = (struct dentry*)number;
+  struct inode* inode = BPF_CORE_READ(directory, d_inode);
   if (!inode) return kLabelUnknown;
   // Read first: what changes while the label is looked for begins another one.
   __u64 now = current_epoch();
   struct ModuleFile key = key_of(inode);
-  struct ModuleDirectory* known = bpf_map_lookup_elem(&directories, &key);
-  if (is_known(known, now)) return known->label & ((1 << kEpochShift) - 1);
-  __u32 label = find_label(number_of(directory));
+  __u64* known = bpf_map_lookup_elem(&directories, &key);
+  if (known && *(volatile __u64*)known >> kEpochShift == now)
+    return *(volatile __u64*)known & ((1 << kEpochShift) - 1);
+  __u32 label = find_label(number);
   if (label >> kEpochShift) return label;
-  if (!known) known = remember(&key);
-  if (known) *(volatile __u64*)&known->label = now << kEpochShift | label;
+  __u64 found = now << kEpochShift | label;
+  bpf_map_update_elem(&directories, &key, &found, BPF_ANY);
   return label;
 }
 
 // Of a file that is there. kLabelUnknown where it cannot be told.
-static __always_inline __u32 label_of(struct dentry* entry) {
-  struct inode* inode = entry->d_inode;
+__noinline __u32 label_of(__u64 number) {
+  struct dentry* entry = (struct dentry*)number;
+  struct inode* inode = BPF_CORE_READ(entry, d_inode);
   if (!inode) return kLabelUnknown;
-  if (is_directory(inode)) return label_of_directory(entry);
-  struct dentry* directory = entry->d_parent;
+  if (is_directory(inode)) return label_of_directory(number);
+  struct dentry* directory = BPF_CORE_READ(entry, d_parent);
   // As that of its directory, were it one.
   if (directory == entry) return kLabelUnknown;
-  __u32 inherited = label_of_directory(directory);
+  __u32 inherited = label_of_directory((__u64)directory);
   if (inherited == kLabelUnknown) return kLabelUnknown;
   __u32* own = own_label(inode);
   return own ? label_in(*own) : inherited;
@@ -173,10 +173,6 @@ static __always_inline bool is_label(const char* name) {
   const __u64* expected = (const __u64*)label;
   const __u64* words = (const __u64*)given;
   return words[0] == expected[0] && words[1] == expected[1] && words[2] == expected[2];
-}
-
-static __always_inline void begin_epoch_for(struct inode* inode) {
-  if (is_directory(inode)) begin_epoch();
 }
 
 // Which argument of a hook points to the value of an attribute. Older kernels let no program read
@@ -211,7 +207,9 @@ int BPF_PROG(begin_label, void* space, struct dentry* entry, const char* name) {
   if (result || own_label(inode)) return result;
   struct ModuleFile key = key_of(inode);
   __u32 unknown = kLabelUnknown;
-  return bpf_map_update_elem(&labels, &key, &unknown, BPF_ANY) ? -ENOSPC : 0;
+  if (bpf_map_update_elem(&labels, &key, &unknown, BPF_ANY)) return -ENOSPC;
+  begin_epoch();
+  return 0;
 }
 
 SEC("lsm/inode_post_setxattr")
@@ -227,7 +225,7 @@ int BPF_PROG(change_label, struct dentry* entry, const char* name, const void* v
     struct ModuleFile key = key_of(inode);
     bpf_map_update_elem(&labels, &key, &label, BPF_ANY);
   }
-  begin_epoch_for(inode);
+  begin_epoch();
   return 0;
 }
 
@@ -236,7 +234,7 @@ static __always_inline void forget_unknown(struct inode* inode) {
   if (!own || *own != kLabelUnknown) return;
   struct ModuleFile key = key_of(inode);
   bpf_map_delete_elem(&labels, &key);
-  begin_epoch_for(inode);
+  begin_epoch();
 }
 
 SEC("lsm/inode_removexattr")
@@ -248,7 +246,7 @@ int BPF_PROG(begin_unlabel, void* space, struct dentry* entry, const char* name)
   __u32* own = own_label(inode);
   if (!own) return 0;
   *(volatile __u32*)own = kLabelUnknown;
-  begin_epoch_for(inode);
+  begin_epoch();
   return 0;
 }
 
@@ -278,7 +276,7 @@ int BPF_PROG(learn_label, void* space, struct dentry* entry, const char* name, v
     struct ModuleFile key = key_of(inode);
     bpf_map_update_elem(&labels, &key, &label, BPF_NOEXIST);
   }
-  begin_epoch_for(inode);
+  begin_epoch();
   return 0;
 }
 

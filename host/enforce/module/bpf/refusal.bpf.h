@@ -2,6 +2,8 @@
 #ifndef REFUSAL_BPF_H
 #define REFUSAL_BPF_H
 
+#include <bpf/bpf_core_read.h>
+
 #include "domain.bpf.h"
 
 struct {
@@ -47,12 +49,12 @@ static __always_inline struct ModuleAct act_on_file(__u32 kind, __u32 detail, __
 
 static __always_inline void describe(struct ModuleEvent* event, __u32 domain, __u32 level,
                                      struct ModuleAct asked) {
-  struct task_struct* process = bpf_get_current_task_btf()->group_leader;
+  struct task_struct* thread = bpf_get_current_task_btf();
   event->time = bpf_ktime_get_boot_ns();
-  event->started = process->start_boottime;
+  event->started = BPF_CORE_READ(thread, group_leader, start_boottime);
   event->value = asked.value;
-  event->process = process->tgid;
-  event->parent = process->real_parent->tgid;
+  event->process = bpf_get_current_pid_tgid() >> 32;
+  event->parent = BPF_CORE_READ(thread, real_parent, tgid);
   event->user = (__u32)bpf_get_current_uid_gid();
   event->domain = domain;
   event->act = asked.kind;
@@ -119,9 +121,21 @@ static __always_inline int count(__u32 domain, __u32 level, bool is_told) {
   return is_enforced(level) ? -EPERM : 0;
 }
 
+// Takes numbers of which each holds two: the kernel looks through such functions once for all that
+// call them, which is most of what it takes to start the module.
+__noinline int refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value, __u32 label) {
+  __u32 domain = domain_and_level >> 32;
+  __u32 level = domain_and_level;
+  struct ModuleAct asked = {kind_and_detail >> 32, kind_and_detail, value, label};
+  return count(domain, level, tell(domain, level, asked));
+}
+
 static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct asked) {
   if (level == kLevelDisabled) return 0;
-  return count(domain, level, tell(domain, level, asked));
+  return refuse_act((__u64)domain << 32 | level, (__u64)asked.kind << 32 | asked.detail,
+                    asked.value, asked.label)
+             ? -EPERM
+             : 0;
 }
 
 // The same for a file, in those hooks that may ask for its path: those that the kernel lets sleep.

@@ -3,6 +3,7 @@
 #define SELF_PROTECTION_BPF_H
 
 #include "identities.bpf.h"
+#include "kernel_helpers.bpf.h"
 
 SEC("lsm/bpf")
 int BPF_PROG(protect_maps, int command, union bpf_attr* attributes, unsigned int size) {
@@ -31,38 +32,6 @@ SEC("lsm/sb_pivotroot")
 int BPF_PROG(protect_from_new_root, const struct path* from, const struct path* to) {
   return refuse_in_any_domain();
 }
-
-// ---- The file system of programs and maps
-
-#define BPF_FS_MAGIC 0xcafe4a11
-
-static __always_inline int protect_pins(struct inode* inode) {
-  return inode->i_sb->s_magic == BPF_FS_MAGIC ? refuse_in_any_domain() : 0;
-}
-
-SEC("lsm/inode_unlink")
-int BPF_PROG(protect_pins_from_unlink, struct inode* directory, struct dentry* entry) {
-  return protect_pins(directory);
-}
-
-SEC("lsm/inode_rename")
-int BPF_PROG(protect_pins_from_rename, struct inode* directory, struct dentry* entry,
-             struct inode* to, struct dentry* as) {
-  return protect_pins(directory);
-}
-
-static __always_inline int protect_pinned(const struct path* path) {
-  struct inode* inode = path->dentry->d_inode;
-  return inode ? protect_pins(inode) : 0;
-}
-
-SEC("lsm/path_chmod")
-int BPF_PROG(protect_pins_from_mode, const struct path* path, unsigned short mode) {
-  return protect_pinned(path);
-}
-
-SEC("lsm/path_chown")
-int BPF_PROG(protect_pins_from_owner, const struct path* path) { return protect_pinned(path); }
 
 // ---- Other processes
 
@@ -127,31 +96,6 @@ SEC("lsm/perf_event_open")
 int BPF_PROG(protect_from_counters, void* attributes, int type) { return refuse_in_any_domain(); }
 
 // ---- What the kernel executes by itself, in no domain
-
-#define FMODE_WRITE 2
-#define PROC_SUPER_MAGIC 0x9fa0
-#define CGROUP_SUPER_MAGIC 0x27e0eb
-
-#define LONGEST_NAME 24
-
-static __always_inline bool names_helper(unsigned long system, struct dentry* entry) {
-  char name[LONGEST_NAME] = {};
-  bpf_probe_read_kernel_str(name, sizeof(name), entry->d_name.name);
-  if (system == CGROUP_SUPER_MAGIC) return !bpf_strncmp(name, sizeof(name), "release_agent");
-  return !bpf_strncmp(name, sizeof(name), "core_pattern") ||
-         !bpf_strncmp(name, sizeof(name), "modprobe") ||
-         !bpf_strncmp(name, sizeof(name), "poweroff_cmd") ||
-         !bpf_strncmp(name, sizeof(name), "hotplug");
-}
-
-SEC("lsm/file_open")
-int BPF_PROG(protect_helpers, struct file* file) {
-  if (!(file->f_mode & FMODE_WRITE)) return 0;
-  unsigned long system = file->f_inode->i_sb->s_magic;
-  if (system != PROC_SUPER_MAGIC && system != CGROUP_SUPER_MAGIC) return 0;
-  if (!current_task() || !names_helper(system, file->f_path.dentry)) return 0;
-  return refuse_in_any_domain();
-}
 
 // To have a key made the kernel executes a program.
 SEC("lsm/key_alloc")

@@ -4,6 +4,7 @@
 
 #include <bpf/bpf_endian.h>
 
+#include "bound_sockets.bpf.h"
 #include "checks.bpf.h"
 
 // Families of sockets whose addresses have a port, at the same place in all of them.
@@ -23,11 +24,11 @@
 #define FIRST_NEWER_FAMILY 46
 
 #define AF_UNSPEC 0
+#define AF_UNIX 1
 #define SOCK_RAW 3
 #define SOCK_SEQPACKET 5
 #define IPPROTO_SCTP 132
 
-#define OFFSET_OF_PORT 2
 #define LAST_PORT 65535
 
 static __always_inline bool has_ports(struct socket* socket) {
@@ -61,46 +62,60 @@ static __always_inline bool is_open_to_ports(struct ModuleCheck* check) {
   return check->count == 1 && check->ranges[0].first == 0 && check->ranges[0].last >= LAST_PORT;
 }
 
-static __always_inline int protect_ports(int family, int type) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  __u64 word = word_of(task->domain);
-  struct ModuleRules* granted = rules_of(word);
+static __always_inline int protect_ports(__u32 domain, __u32 level, struct ModuleRules* granted,
+                                         int family, int type) {
   if (granted && is_open_to_ports(&granted->checks[kCheckBindPort]) &&
       is_open_to_ports(&granted->checks[kCheckConnectPort]))
     return 0;
-  return refuse(task->domain, level_of(word), act(kActPassPorts, type, family));
+  return refuse(domain, level, act(kActPassPorts, type, family));
+}
+
+// What addresses with a port begin with.
+struct PortAddress {
+  __u16 family;
+  __be16 port;
+};
+
+// False where there is none.
+static __always_inline bool read_port(struct PortAddress* read, const void* address, int length) {
+  return length >= (int)sizeof(*read) && !bpf_probe_read_kernel(read, sizeof(*read), address);
 }
 
 static __always_inline int check_port(int check, const void* address, int length) {
-  __be16 port = 0;
-  if (length < OFFSET_OF_PORT + (int)sizeof(port)) return 0;
-  bpf_probe_read_kernel(&port, sizeof(port), address + OFFSET_OF_PORT);
-  return check_value(check, bpf_ntohs(port));
+  struct PortAddress read = {};
+  if (!current_task() || !read_port(&read, address, length)) return 0;
+  return check_value(check, bpf_ntohs(read.port));
 }
 
 SEC("lsm/socket_create")
 int BPF_PROG(make_socket, int family, int type, int protocol, int is_of_kernel) {
-  if (is_of_kernel) return 0;
-  int result = check_value(kCheckFamily, family);
-  if (!result) result = check_value(kCheckType, type);
+  struct ModuleTask* task = current_task();
+  if (!task || is_of_kernel) return 0;
+  __u32 domain = task->domain;
+  __u64 word = word_of(domain);
+  __u32 level = level_of(word);
+  struct ModuleRules* granted = rules_of(word);
+  int result = judge_call(domain, level, granted);
+  if (!result) result = judge_value(domain, level, granted, kCheckFamily, family);
+  if (!result) result = judge_value(domain, level, granted, kCheckType, type);
   if (result || !goes_past_ports(family, type, protocol)) return result;
-  return protect_ports(family, type);
+  return protect_ports(domain, level, granted, family, type);
 }
 
 // The family of the address does not count: the kernel takes some without one.
 SEC("lsm/socket_bind")
 int BPF_PROG(bind_socket, struct socket* socket, struct sockaddr* address, int length) {
+  struct sock* sock = socket->sk;
+  if (sock && sock->__sk_common.skc_family == AF_UNIX) return note_unix_binding(socket, sock);
   return has_ports(socket) ? check_port(kCheckBindPort, address, length) : 0;
 }
 
 // To connect to an address without a family ends a connection.
 SEC("lsm/socket_connect")
 int BPF_PROG(connect_socket, struct socket* socket, struct sockaddr* address, int length) {
-  if (!has_ports(socket)) return 0;
-  __u16 family = AF_UNSPEC;
-  bpf_probe_read_kernel(&family, sizeof(family), address);
-  return family == AF_UNSPEC ? 0 : check_port(kCheckConnectPort, address, length);
+  struct PortAddress read = {};
+  if (!current_task() || !has_ports(socket) || !read_port(&read, address, length)) return 0;
+  return read.family == AF_UNSPEC ? 0 : check_value(kCheckConnectPort, bpf_ntohs(read.port));
 }
 
 // Datagrams, and what TCP sends while it connects.

@@ -6,8 +6,8 @@
 static __always_inline int check_clone(__u32 domain, __u64 flags) {
   __u64 word = word_of(domain);
   struct ModuleRules* granted = rules_of(word);
-  int result = judge_call(domain, word, granted);
-  return result ? result : judge_flags(domain, word, granted, flags);
+  int result = judge_call(domain, level_of(word), granted);
+  return result ? result : judge_flags(domain, level_of(word), granted, flags);
 }
 
 SEC("lsm/task_alloc")

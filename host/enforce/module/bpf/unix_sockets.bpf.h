@@ -5,45 +5,37 @@
 #include "bound_sockets.bpf.h"
 #include "files.bpf.h"
 
-#define AF_UNIX 1
-
-// In which domain they were made.
-struct {
-  __uint(type, BPF_MAP_TYPE_SK_STORAGE);
-  __uint(map_flags, BPF_F_NO_PREALLOC);
-  __type(key, int);
-  __type(value, __u32);
-} socket_domains SEC(".maps");
-
-SEC("lsm/socket_post_create")
-int BPF_PROG(keep_domain_of_socket, struct socket* socket, int family, int type, int protocol,
-             int is_of_kernel) {
-  if (family != AF_UNIX || is_of_kernel) return 0;
-  struct ModuleTask* task = current_task();
+// One that is to be told who its peers are is given a name by the kernel when it is used.
+SEC("lsm/socket_setsockopt")
+int BPF_PROG(choose_option, struct socket* socket) {
   struct sock* sock = socket->sk;
-  if (!task || !sock) return 0;
-  __u32 domain = task->domain;
-  bool is_kept = bpf_sk_storage_get(&socket_domains, sock, &domain, BPF_LOCAL_STORAGE_GET_F_CREATE);
-  return is_kept ? 0 : -ENOMEM;
+  struct ModuleTask* task = current_task();
+  if (!task || !sock || sock->__sk_common.skc_family != AF_UNIX) return 0;
+  return note_namer(sock, task->domain) ? 0 : -ENOMEM;
 }
 
-SEC("lsm/socket_bind")
-int BPF_PROG(bind_unix_socket, struct socket* socket) {
-  struct sock* sock = socket->sk;
-  if (!sock || sock->__sk_common.skc_family != AF_UNIX || !current_task()) return 0;
-  return note_binding(socket->type) ? 0 : -ENOMEM;
+static __always_inline int judge_reaching(struct Asker* asker, struct vfsmount* mount,
+                                          struct dentry* entry, __u64 tag) {
+  __u32 said = 0;
+  if (has_paths(asker)) said = path_bits_anywhere(number_of(mount), number_of(entry), asker->entry);
+  __u32 label = label_of(number_of(entry));
+  __u32 rights = rights_of(asker->entry, label, said);
+  remember_rights(tag, rights);
+  if (rights & kUseWrite) return 0;
+  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, kUseWrite, label));
 }
 
 // By its file, as whoever writes to that. It has the name that whoever bound it knows it by, which
 // may be in a mount namespace of its own.
-static __noinline int reach_file(struct vfsmount* mount, struct dentry* entry) {
+static __always_inline int reach_file(struct vfsmount* mount, struct dentry* entry) {
+  struct ModuleHashing* how = how_to_hash();
+  __u64 now = current_epoch();
   struct Asker asker = {};
   if (!is_asked(&asker)) return 0;
-  __u32 said = 0;
-  if (asker.has_paths) said = path_bits_anywhere(mount, entry, asker.entry);
-  __u32 label = label_of(entry);
-  if (rights_of(&asker, label, said) & kUseWrite) return 0;
-  return refuse(asker.domain, asker.level, act_on_file(kActUseFile, kUseWrite, label));
+  __u64 tag = 0;
+  if (how && asker.granted && !has_paths(&asker))
+    tag = tag_of_file(entry, asker.entry, now, how) & ~(__u64)kAllUses;
+  return was_granted(tag, kUseWrite) ? 0 : judge_reaching(&asker, mount, entry, tag);
 }
 
 // By its name alone, which no rule is about: within the domain.
@@ -51,8 +43,8 @@ static __always_inline int reach_name(struct sock* other) {
   struct ModuleTask* task = current_task();
   if (!task) return 0;
   __u64 word = word_of(task->domain);
-  __u32* domain = bpf_sk_storage_get(&socket_domains, other, 0, 0);
-  if (domain && *domain == task->domain && level_of(word) != kLevelAbsent) return 0;
+  __u32* namer = bpf_sk_storage_get(&namers, other, 0, 0);
+  if (namer && *namer == task->domain && level_of(word) != kLevelAbsent) return 0;
   return refuse(task->domain, level_of(word), act(kActReachSocket, 0, 0));
 }
 
