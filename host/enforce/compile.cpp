@@ -7,12 +7,15 @@
 #include <string_view>
 #include <utility>
 
+#include "braxo/misc/strcat.h"
 #include "host/enforce/kernel.h"
 #include "host/enforce/plan/call_plan.h"
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/dump.h"
 #include "host/enforce/plan/net_plan.h"
 #include "policy/call_set.h"
+
+using Braxo::Misc::StrCat;
 
 namespace Enforce {
 namespace {
@@ -121,6 +124,13 @@ Truncation TruncationOf(const PathPlan& paths, const InstalledDomain& domain,
   return Truncation::kByFilter;
 }
 
+void TakeCalls(CallPlan& calls, Plan* plan) {
+  plan->filter = std::move(calls.program);
+  plan->secret = calls.secret;
+  plan->mayEnd = calls.mayEnd;
+  plan->mayMap = calls.mayMap;
+}
+
 struct Parts {
   PathPlan paths;
   Truncation truncation;
@@ -224,17 +234,62 @@ CompiledPlan Join(const InstalledDomain& domain, const Surroundings& surrounding
   TakePorts(parts.net, &plan);
   plan.isScoped = IsScoped(features);
   plan.capabilities = parts.capabilities.kept;
-  plan.filter = std::move(parts.calls.program);
-  plan.secret = parts.calls.secret;
-  plan.mayEnd = parts.calls.mayEnd;
-  plan.mayMap = parts.calls.mayMap;
+  TakeCalls(parts.calls, &plan);
   return compiled;
+}
+
+// ---- Beside the module
+
+// A filter stays with whoever goes on in another domain.
+constexpr char kFilterStays[] = "what the filter of this domain refuses is refused there, too";
+
+// Of calls the filter refuses all, and of their arguments more than the module.
+void JoinFates(const InstalledDomain& domain, const std::vector<RuleFate>& ofFilter,
+               std::vector<RuleFate>* fates) {
+  for (const RuleFate& fate : ofFilter) {
+    RuleFate& known = (*fates)[fate.place];
+    if (fate.rule.kind == RuleKind::kSyscall) {
+      known = fate;
+    } else if (!fate.how.empty()) {
+      Narrow(known, fate.how);
+    }
+  }
+  for (RuleFate& fate : *fates) {
+    if (LeadsElsewhere(fate.rule, domain.name)) Narrow(fate, kFilterStays);
+  }
+}
+
+CompiledPlan JoinBesideModule(const InstalledDomain& domain, CallPlan calls,
+                              std::vector<RuleFate> fates, const Features& features) {
+  CompiledPlan compiled;
+  compiled.plan.domain = domain.name;
+  compiled.plan.domainId = domain.id;
+  compiled.plan.level = domain.level;
+  compiled.fates = std::move(fates);
+  if (!features.seccomp) {
+    compiled.gaps.emplace_back(kWithoutSeccomp);
+    return compiled;
+  }
+  JoinFates(domain, calls.fates, &compiled.fates);
+  TakeCalls(calls, &compiled.plan);
+  return compiled;
+}
+
+std::string LinesOfCoverage(const CompiledPlan& compiled) {
+  std::string text;
+  for (const std::string& line : CoverageOf(compiled)) text += line + "\n";
+  return text;
 }
 
 }  // namespace
 
 CompiledPlan Compile(const InstalledDomain& domain, const Surroundings& surroundings) {
   return Join(domain, surroundings, PlanParts(domain, surroundings));
+}
+
+CompiledPlan CompileBesideModule(const InstalledDomain& domain, std::vector<RuleFate> fates,
+                                 const Features& features) {
+  return JoinBesideModule(domain, PlanCallsBesideModule(domain), std::move(fates), features);
 }
 
 std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates) {
@@ -257,11 +312,18 @@ std::vector<std::string> CoverageOf(const CompiledPlan& compiled) {
 
 std::string Explain(const InstalledDomain& domain, const Surroundings& surroundings) {
   Parts parts = PlanParts(domain, surroundings);
-  std::string text =
+  const std::string text =
       Dump(parts.paths) + Dump(parts.net) + Dump(parts.capabilities) + Dump(parts.calls);
-  const CompiledPlan compiled = Join(domain, surroundings, std::move(parts));
-  for (const std::string& line : CoverageOf(compiled)) text += line + "\n";
-  return text;
+  return text + LinesOfCoverage(Join(domain, surroundings, std::move(parts)));
+}
+
+std::string ExplainBesideModule(const InstalledDomain& domain, std::vector<RuleFate> fates,
+                                const Features& features) {
+  CallPlan calls = PlanCallsBesideModule(domain);
+  const std::string text = StrCat(
+      "the module keeps the rules, and a filter all those about system calls\n", Dump(calls));
+  return text +
+         LinesOfCoverage(JoinBesideModule(domain, std::move(calls), std::move(fates), features));
 }
 
 }  // namespace Enforce

@@ -31,6 +31,11 @@ struct CompiledPlan {
 // then. Throws BraxoException for a rule whose words are no range.
 CompiledPlan Compile(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
 
+// The plan for a domain that the module keeps, which `fates` tell of all its rules: nothing but a
+// filter of system calls, of which not all come to the module.
+CompiledPlan CompileBesideModule(const Policy::InstalledDomain& domain, std::vector<RuleFate> fates,
+                                 const Features& features);
+
 // The rules of a domain that cannot be kept to.
 std::vector<RuleFate> NotExpressible(const std::vector<RuleFate>& fates);
 
@@ -43,5 +48,7 @@ std::vector<std::string> CoverageOf(const CompiledPlan& compiled);
 
 // The same plan for people: what the kernel is told, and then CoverageOf().
 std::string Explain(const Policy::InstalledDomain& domain, const Surroundings& surroundings);
+std::string ExplainBesideModule(const Policy::InstalledDomain& domain, std::vector<RuleFate> fates,
+                                const Features& features);
 
 }  // namespace Enforce

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <fcntl.h>
+#include <linux/bpf.h>
 #include <linux/capability.h>
 #include <linux/filter.h>
 #include <linux/openat2.h>
@@ -79,6 +80,23 @@ inline bool KnowsAnswer(std::uint32_t answer) {
 inline int SetFilter(sock_filter* instructions, std::size_t count) {
   const sock_fprog program = {static_cast<unsigned short>(count), instructions};
   return static_cast<int>(syscall(SYS_seccomp, SECCOMP_SET_MODE_FILTER, 0, &program));
+}
+
+// ---- The module
+
+// Asks for this process, which has one thread, to be in the domain from the next program on that it
+// executes. `map` is the descriptor of Module::EnteringMap().
+inline int EnterWithNextProgram(int map, unsigned int domain) {
+  const int process = static_cast<int>(syscall(SYS_pidfd_open, getpid(), 0));
+  if (process < 0) return -1;
+  const std::uint32_t next = domain + 1;
+  bpf_attr change = {};
+  change.map_fd = static_cast<std::uint32_t>(map);
+  change.key = reinterpret_cast<std::uintptr_t>(&process);
+  change.value = reinterpret_cast<std::uintptr_t>(&next);
+  const long result = syscall(SYS_bpf, BPF_MAP_UPDATE_ELEM, &change, sizeof(change));
+  close(process);
+  return static_cast<int>(result);
 }
 
 // ---- Capabilities, by their numbers as bits

@@ -125,6 +125,14 @@ refuses() {
   refuses "descriptor 77 of --keep-fd is not open"
   launch --plan "$plan" --program 77 -- true
   refuses "descriptor 77 of --program is not open"
+  launch --plan "$plan" --module 77 -- true
+  refuses "descriptor 77 of --module is not open"
+  launch --plan "$plan" --module 0 --keep-fd 0 -- true
+  refuses "--module takes no --keep-fd$usage"
+  launch --module 0 -- true
+  refuses "no plan is named$usage"
+  launch --ask --module 0 -- true
+  refuses "--ask takes no other option$usage"
 }
 
 @test "a name commands no terminal" {

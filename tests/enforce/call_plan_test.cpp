@@ -621,5 +621,42 @@ TEST(PlanCalls, TellsTheCallsWhereTooManyValuesAreRevoked) {
                   "than a filter has room for)"));
 }
 
+// ---- Beside the module
+
+TEST(PlanCallsBesideModule, RefusesCallsAndLeavesTheirArgumentsToTheModule) {
+  const CallPlan plan = Enforce::PlanCallsBesideModule(
+      DomainOf({"-s @start grant", "-s socket grant", "-s connect grant", "-s setgroups grant",
+                "-s setuid grant", "-s clone grant", "-s listen grant", "-s read revoke",
+                "-p socket_family 2 grant", "-p set_uid 7 grant", "-p set_gid 7 grant",
+                "-p bind_port 80 grant", "-p clone_flags 0 grant"}));
+  EXPECT_EQ(Ask(plan, "read"), "EPERM");
+  EXPECT_EQ(Ask(plan, "fsync"), "EPERM");
+  EXPECT_EQ(Ask(plan, "socket", {AF_UNIX, SOCK_DGRAM, 0}), "allowed");
+  EXPECT_EQ(Ask(plan, "setuid", {8}), "allowed");
+  EXPECT_EQ(Ask(plan, "setgroups"), "allowed");
+  EXPECT_EQ(Ask(plan, "clone", {CLONE_NEWUSER}), "allowed");
+  EXPECT_EQ(Ask(plan, "listen"), "allowed");
+  EXPECT_THAT(Told(plan.fates), IsEmpty());
+  EXPECT_EQ(plan.fates.size(), 12U);
+}
+
+TEST(PlanCallsBesideModule, LeavesClone3ToWhoIsGrantedIt) {
+  const auto answerTo = [](const std::vector<std::string>& lines) {
+    return Ask(Enforce::PlanCallsBesideModule(DomainOf(lines)), "clone3");
+  };
+  EXPECT_EQ(answerTo({"-s clone3 grant"}), "allowed");
+  EXPECT_EQ(answerTo({"-s clone grant"}), "ENOSYS");
+  EXPECT_EQ(answerTo({"-s clone3 grant", "-s @process revoke"}), "ENOSYS");
+}
+
+TEST(PlanCallsBesideModule, RefusesWhatReachesPastTheRules) {
+  const CallPlan plan = Enforce::PlanCallsBesideModule(
+      DomainOf({"-s ioctl grant", "-s io_uring_setup grant", "-p ioctl_request 0 0xffff grant"}));
+  EXPECT_EQ(Ask(plan, "ioctl", {0, TIOCSTI}), "EPERM");
+  EXPECT_EQ(Ask(plan, "ioctl", {0, 0x12345678}), "allowed");
+  EXPECT_EQ(Ask(plan, "io_uring_setup"), "EPERM");
+  EXPECT_EQ(Told(plan.fates).size(), 2U);
+}
+
 }  // namespace
 }  // namespace EnforceTest

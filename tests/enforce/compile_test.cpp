@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "domain_of.h"
+#include "host/enforce/module/module_plan.h"
 
 namespace EnforceTest {
 namespace {
@@ -292,6 +293,69 @@ TEST(Compile, ShowsPeopleWhatBecomesOfAllRules) {
   for (const std::string& line : CoverageOf(compiled)) shown += line + "\n";
   EXPECT_EQ(shown, lines);
   EXPECT_THAT(Explain(domain, surroundings), EndsWith("\nrefused: all others\n" + lines));
+}
+
+// ---- Beside the module
+
+CompiledPlan CompileBesideModule(const std::vector<std::string>& lines,
+                                 const Features& features = NewKernel()) {
+  const auto domain = DomainOf(lines);
+  return Enforce::CompileBesideModule(domain, Enforce::FatesByModule(domain, 40), features);
+}
+
+TEST(CompileBesideModule, PlansNothingButAFilter) {
+  const CompiledPlan compiled = CompileBesideModule(kOneOfEachKind);
+  EXPECT_EQ(compiled.plan.handledFiles, 0U);
+  EXPECT_THAT(compiled.plan.paths, IsEmpty());
+  EXPECT_FALSE(compiled.plan.bindsChecked || compiled.plan.connectsChecked);
+  EXPECT_FALSE(compiled.plan.isScoped || compiled.plan.keepsBroker);
+  EXPECT_FALSE(compiled.plan.filter.empty());
+  EXPECT_TRUE(KeepsAllRules(compiled));
+}
+
+TEST(CompileBesideModule, TellsOfEachRuleInOrder) {
+  const CompiledPlan compiled = CompileBesideModule(kOneOfEachKind);
+  ASSERT_EQ(compiled.fates.size(), kOneOfEachKind.size());
+  for (std::size_t index = 0; index < kOneOfEachKind.size(); ++index) {
+    EXPECT_EQ(compiled.fates[index].rule.Text(), kOneOfEachKind[index]);
+  }
+  EXPECT_THAT(Told(compiled.fates),
+              ElementsAre("narrowed: -d gate otherDom exec grant (what the filter of this domain "
+                          "refuses is refused there, too)"));
+}
+
+// The module alone refuses the first one by halves.
+TEST(CompileBesideModule, RefusesCallsThatComeToNoHook) {
+  const std::vector<std::string> lines = {"-s fsync revoke", "-s ioctl grant"};
+  EXPECT_EQ(Enforce::FatesByModule(DomainOf(lines), 40)[0].fate, Fate::kNotExpressible);
+  EXPECT_THAT(CoverageOf(CompileBesideModule(lines)),
+              ElementsAre("enforced: -s fsync revoke",
+                          "narrowed: -s ioctl grant (ioctl: TIOCSTI is refused unless granted by "
+                          "itself; ioctl: TIOCLINUX is refused unless granted by itself; ioctl: "
+                          "FS_IOC_SETFLAGS is refused unless granted by itself; ioctl: "
+                          "FS_IOC_FSSETXATTR is refused unless granted by itself)"));
+}
+
+TEST(CompileBesideModule, LeavesTheModulesFatesWhereNothingIsFiltered) {
+  Features features = NewKernel();
+  features.seccomp = false;
+  const CompiledPlan compiled =
+      CompileBesideModule({"-s fsync revoke", "-c cap_kill grant"}, features);
+  EXPECT_FALSE(KeepsAllRules(compiled));
+  EXPECT_THAT(compiled.gaps, SizeIs(1));
+  EXPECT_EQ(compiled.fates[0].fate, Fate::kNotExpressible);
+  EXPECT_EQ(compiled.fates[1].fate, Fate::kEnforced);
+}
+
+TEST(CompileBesideModule, ShowsPeopleWhoKeepsTheRules) {
+  const auto domain = DomainOf({"-s kill grant"});
+  EXPECT_EQ(Enforce::ExplainBesideModule(domain, Enforce::FatesByModule(domain, 40), NewKernel()),
+            "the module keeps the rules, and a filter all those about system calls\n"
+            "answered as unknown: clone3\n"
+            "allowed: kill\n"
+            "refused but to enter: execve execveat exit_group write\n"
+            "refused: all others\n"
+            "enforced: -s kill grant\n");
 }
 
 // Every path is a directory with too many entries to list.

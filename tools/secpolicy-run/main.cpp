@@ -10,6 +10,13 @@
 namespace SecPolicyRun {
 namespace {
 
+[[noreturn]] void Ask(const Options& options) {
+  if (Enforce::IsKernelAsked()) {
+    Enforce::AskKernel(Enforce::FindProgram(options.command, environ));
+  }
+  Enforce::AskBroker(Enforce::FindProgram(options.command, environ, Enforce::Executed::kOutside));
+}
+
 [[noreturn]] void Run(char** arguments) {
   // All that the caller says would count as if somebody with these rights had said it.
   if (getauxval(AT_SECURE) != 0) {
@@ -18,13 +25,12 @@ namespace {
         "u-s,g-s)");
   }
   const Options options = ReadOptions(arguments);
-  if (options.asks) {
-    Enforce::AskBroker(Enforce::FindProgram(options.command, environ, Enforce::Executed::kOutside));
-  }
+  if (options.asks) Ask(options);
   Enforce::Plan plan = Enforce::ReadPlan(options.plan);
   const Enforce::Program program =
       options.program ? Enforce::ProgramOf(*options.program, options.command, environ)
                       : Enforce::FindProgram(options.command, environ);
+  if (options.module) Enforce::EnterInModule(std::move(plan), program, *options.module);
   Enforce::Enter(std::move(plan), program, options.keptDescriptors);
 }
 

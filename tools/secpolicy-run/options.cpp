@@ -16,6 +16,7 @@ using Enforce::Refuse;
 
 constexpr std::string_view kHelp =
     "Usage: secpolicy-run --plan PLAN [--program FD] [--keep-fd FD]... -- COMMAND [ARGUMENT...]\n"
+    "       secpolicy-run --plan PLAN --module FD [--program FD] -- COMMAND [ARGUMENT...]\n"
     "       secpolicy-run --ask -- COMMAND [ARGUMENT...]\n"
     "Starts a command, confined to what a plan lets its domain do. 'secpolicy run' makes the plan\n"
     "and starts this program.\n"
@@ -23,6 +24,9 @@ constexpr std::string_view kHelp =
     "  --plan PLAN     the plan: a file, or the number of a descriptor\n"
     "  --program FD    execute what this descriptor stands for; COMMAND is only its name\n"
     "  --keep-fd FD    leave this descriptor open, beside the first three\n"
+    "  --module FD     the domain is kept by the module, of which this is a map: enter it there, "
+    "and\n"
+    "                  only filter system calls\n"
     "  --ask           from within a domain: let its broker start the command in the domain that "
     "the\n"
     "                  label of its file leads to\n"
@@ -81,6 +85,8 @@ void Take(const std::string& option, Words& words, Options* options) {
     options->plan = words.TakeValueOf(option);
   } else if (option == "--program") {
     options->program = words.TakeDescriptorOf(option);
+  } else if (option == "--module") {
+    options->module = words.TakeDescriptorOf(option);
   } else if (option == "--keep-fd") {
     options->keptDescriptors.push_back(words.TakeDescriptorOf(option));
   } else {
@@ -99,9 +105,12 @@ Options ReadOptions(char** arguments) {
     isAtCommand = word == "--";
     if (!isAtCommand) Take(word, words, &options);
   }
-  const bool isToEnter =
-      !options.plan.empty() || options.program || !options.keptDescriptors.empty();
+  const bool isToEnter = !options.plan.empty() || options.program ||
+                         !options.keptDescriptors.empty() || options.module;
   if (options.asks && isToEnter) RefuseUsage("--ask takes no other option");
+  if (options.module && !options.keptDescriptors.empty()) {
+    RefuseUsage("--module takes no --keep-fd");
+  }
   if (!options.asks && options.plan.empty()) RefuseUsage("no plan is named");
   if (words.IsAtEnd()) RefuseUsage("no command is named");
   options.command = words.Rest();

@@ -11,7 +11,8 @@ struct Options {
   std::string plan;
   std::optional<int> program;  // its descriptor
   std::vector<int> keptDescriptors;
-  char** command = nullptr;  // with at least one word
+  std::optional<int> module;  // that keeps the domain, by its descriptor
+  char** command = nullptr;   // with at least one word
 };
 
 // Reads the command line. Prints what --help and --version ask for and ends the process; refuses

@@ -9,6 +9,7 @@
 #include "command_line.h"
 #include "ending.h"
 #include "enforce/domain_plan.h"
+#include "enforce/kept_domain.h"
 #include "module/module_status.h"
 #include "query/ask.h"
 #include "query/named.h"
@@ -72,7 +73,9 @@ ExitCode ShowFeatures(const std::string& format) {
 ExitCode ShowFates(const std::string& word, const std::string& format) {
   SecPolicy::TeskAccessInterfaceImpl access;
   const Policy::InstalledDomain domain = RequireInstalledDomain(word, access);
-  const Enforce::CompiledPlan compiled = PlanOf(domain, access);
+  const Keeper keeper = FindKeeper();
+  TellWhyNot("features", keeper, domain.name);
+  const Enforce::CompiledPlan compiled = PlanOf(domain, keeper, access);
   if (format == "json") {
     std::cout << Json{{"schema", "secpolicy.features/1"},
                       {"features", ToJson(Enforce::ProbeFeatures())},
@@ -83,6 +86,10 @@ ExitCode ShowFates(const std::string& word, const std::string& format) {
   } else {
     for (const std::string& line : LinesOf(compiled)) std::cout << Visible(line) << '\n';
   }
+  if (keeper.module != nullptr)
+    Summarize("features", "the module keeps " + domain.name +
+                              " for every process in it, and 'run' and " +
+                              "'exec' filter system calls besides");
   if (domain.rules.empty())
     Summarize("features", domain.name + " has no rules, so it is granted nothing");
   return KeepsAllRules(compiled) ? kWell : kFailed;

@@ -4,8 +4,8 @@
 #include <vector>
 
 #include "command_line.h"
-#include "enforce/domain_plan.h"
 #include "enforce/entry.h"
+#include "enforce/kept_domain.h"
 #include "query/ask.h"
 #include "query/named.h"
 #include "query/question.h"
@@ -23,7 +23,10 @@ struct Options {
 
 ExitCode Explain(const std::string& domain) {
   SecPolicy::TeskAccessInterfaceImpl access;
-  std::cout << ExplanationOf(RequireInstalledDomain(domain, access), access);
+  const Policy::InstalledDomain installed = RequireInstalledDomain(domain, access);
+  const Keeper keeper = FindKeeper();
+  TellWhyNot("run", keeper, installed.name);
+  std::cout << ExplanationOf(installed, keeper, access);
   return kWell;
 }
 
@@ -56,7 +59,8 @@ const Verb kRun = {
     "users enter by the plans that root's boot and load have left for them. A domain never\n"
     "gives rights that its user does not have. In a domain that is permissive nothing is refused,\n"
     "and what its rules would refuse is told once, on standard error and in the log; one that is\n"
-    "disabled is only recorded.\n"
+    "disabled is only recorded. Where the kernel keeps the domain ('secpolicy module'), root's\n"
+    "CMD is in it as every other process there, and only its system calls are filtered besides.\n"
     "What this kernel cannot refuse is told with file and line before anything starts, and\n"
     "nothing is started then; --best-effort starts it all the same.\n"
     "\n"

@@ -14,6 +14,10 @@ namespace Enforce {
 // Tells a confined program the number of the descriptor that its broker listens at.
 inline constexpr char kBrokerVariable[] = "SECPOLICY_BROKER";
 
+// In place of that number, where the module keeps the domain: whoever executes a program goes where
+// its label leads.
+inline constexpr std::string_view kKernelAsBroker = "kernel";
+
 // Asks for a program to be started.
 struct EntryRequest {
   std::vector<std::string> command;      // its name, and its arguments

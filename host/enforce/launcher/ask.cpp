@@ -9,6 +9,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <string_view>
 
 #include "host/enforce/broker/message.h"
 #include "host/enforce/launcher/number.h"
@@ -112,6 +113,16 @@ EntryAnswer AwaitAnswer(int answers) {
 }
 
 }  // namespace
+
+bool IsKernelAsked() {
+  const char* const broker = std::getenv(kBrokerVariable);
+  return broker != nullptr && std::string_view(broker) == kKernelAsBroker;
+}
+
+void AskKernel(const Program& program) {
+  Start(program, 0);
+  RefuseForErrno("cannot execute " + program.path);
+}
 
 void AskBroker(const Program& program) {
   const int broker = BrokerOfEnvironment();

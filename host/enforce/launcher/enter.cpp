@@ -63,6 +63,15 @@ std::uint64_t FilterCalls(Plan* plan) {
   return secret;
 }
 
+// What is asked for counts from the program on, so that nothing of this process is judged by the
+// rules of the domain.
+void AskModule(int module, const Plan& plan) {
+  if (Kernel::EnterWithNextProgram(module, plan.domainId) != 0) {
+    RefuseForErrno("cannot ask the module for the domain " + plan.domain);
+  }
+  close(module);
+}
+
 }  // namespace
 
 void Enter(Plan plan, const Program& program, std::vector<int> keptDescriptors) {
@@ -83,6 +92,22 @@ void Enter(Plan plan, const Program& program, std::vector<int> keptDescriptors) 
   KeepCapabilities(kept);
   Restrict(ruleset);
   const std::uint64_t secret = FilterCalls(&plan);
+  Start(program, secret);
+  RefuseForErrno(std::move(refusal), secret);
+}
+
+void EnterInModule(Plan plan, const Program& program, int module) {
+  const bool isFiltered = plan.level == Policy::Level::kEnforcing;
+  if (isFiltered) {
+    RequireStartable(plan, program);
+    std::vector<int> kept = {module};
+    if (program.descriptor >= 0) kept.push_back(program.descriptor);
+    CloseAllBut(std::move(kept));
+  }
+  AskModule(module, plan);
+  std::string refusal =
+      PrepareRefusal("cannot execute " + program.path + " in the domain " + plan.domain);
+  const std::uint64_t secret = isFiltered ? FilterCalls(&plan) : 0;
   Start(program, secret);
   RefuseForErrno(std::move(refusal), secret);
 }

@@ -24,6 +24,7 @@ class Running : public RunningModule {
   std::uint64_t Generation() const override { return module.Generation(); }
   bool IsRefusing() const override { return module.IsRefusing(); }
   void Place(pid_t process, unsigned int domain) override { module.Place(process, domain); }
+  int EnteringMap() const override { return module.EnteringMap(); }
   std::optional<unsigned int> DomainOf(pid_t process) const override {
     return module.DomainOf(process);
   }

@@ -25,6 +25,7 @@ class RunningModule {
   virtual std::uint64_t Generation() const = 0;
   virtual bool IsRefusing() const = 0;
   virtual void Place(pid_t process, unsigned int domain) = 0;
+  virtual int EnteringMap() const = 0;
   virtual std::optional<unsigned int> DomainOf(pid_t process) const = 0;
   virtual ModuleRefusals RefusalsIn(unsigned int domain) const = 0;
 };

@@ -154,6 +154,10 @@ struct ModuleTask {
   __u32 next;  // that it is about to enter, one higher; 0: none
 };
 
+struct ModuleEntering {
+  __u32 next;  // the domain of the next program that the process executes, one higher; 0: as ever
+};
+
 // What rules are about, and what no rule grants. Of files the event has the label, and the path
 // where the hook knows it; of those that are made, the label of the directory and the path of the
 // entry.

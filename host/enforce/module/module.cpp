@@ -46,6 +46,7 @@ constexpr std::array kMaps = {
     NamedMap{"domains", &ModuleMaps::domains},
     NamedMap{"rules", &ModuleMaps::rules},
     NamedMap{"tasks", &ModuleMaps::tasks},
+    NamedMap{"entering", &ModuleMaps::entering},
     NamedMap{"refusals", &ModuleMaps::refusals},
     NamedMap{"generation", &ModuleMaps::generation},
     NamedMap{"events", &ModuleMaps::events},
@@ -279,6 +280,8 @@ void Module::Place(pid_t process, unsigned int domain) {
   RequireDomain(domain);
   maps->Place(process, domain);
 }
+
+int Module::EnteringMap() const { return maps->entering.Number(); }
 
 std::optional<unsigned int> Module::DomainOf(pid_t process) const {
   const FileDescriptor pidfd(syscall(SYS_pidfd_open, process, 0));

@@ -65,6 +65,11 @@ class Module {
   // Puts a process into a domain, with all its threads. Children that it has stay where they are.
   void Place(pid_t process, unsigned int domain);
 
+  // The descriptor of the map by which a process with one thread goes into a domain with the next
+  // program that it executes, see EnterWithNextProgram() of kernel.h; for as long as this object
+  // lives.
+  int EnteringMap() const;
+
   // The domain that the process is in; nothing when it is in none.
   std::optional<unsigned int> DomainOf(pid_t process) const;
 

@@ -15,6 +15,7 @@ struct ModuleMaps {
   FileDescriptor domains;
   FileDescriptor rules;
   FileDescriptor tasks;
+  FileDescriptor entering;
   FileDescriptor refusals;
   FileDescriptor generation;
   FileDescriptor events;

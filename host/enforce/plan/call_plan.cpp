@@ -163,28 +163,37 @@ struct Check {
   ValueSet passing;
 };
 
+// What keeps the rules that no filter can.
+enum class Other { kLandlock, kModule };
+
 class CallPlanner {
  public:
-  // Refuses all values of the checks `tooLong`.
-  CallPlanner(const Policy::InstalledDomain& installed, Truncation truncated,
-              const std::set<std::string>& tooLong)
-      : domain(installed), truncation(truncated) {
+  CallPlanner(const Policy::InstalledDomain& installed, Truncation truncated, Other keeper)
+      : domain(installed), truncation(truncated), other(keeper) {
     for (const Rule& rule : domain.rules) {
       if (rule.kind == RuleKind::kSyscall) callRules.push_back(&rule);
     }
     GrantCalls();
     for (const auto& checked : kCheckedArguments) ReadCheck(checked.check);
-    for (const std::string& check : tooLong) RefuseAllValues(check);
+  }
+
+  void RefuseAllValues(const std::string& name) {
+    Check& check = checks.at(name);
+    for (const auto& checked : kCheckedArguments) {
+      if (checked.check != name) continue;
+      TellOfLoss(check, checked.call, check.passing,
+                 StrCat("refused, as ", name, " has more values than a filter has room for"));
+    }
+    check.passing = ValueSet();
   }
 
   CallPlan Plan() {
     CloseDangerousValues();
-    CloseNamedSockets();
-    CloseLimits();
-    CloseClone();
-    CloseSignalsByDescriptors();
-    CloseGroups();
-    ClosePorts();
+    if (other == Other::kModule) {
+      LetUseClone();
+    } else {
+      CloseWhatPassesLandlock();
+    }
     CloseRings();
     if (truncation == Truncation::kByFilter) CloseTruncation();
     for (const auto& checked : kCheckedArguments) DemandValues(checked);
@@ -264,7 +273,8 @@ class CallPlanner {
   void ReadCheck(const char* name) {
     if (checks.contains(name)) return;
     const std::vector<const Rule*> rules = RulesOfCheck(domain.rules, name);
-    checks[name] = {rules, PassingValues(rules)};
+    const bool isKeptElsewhere = other == Other::kModule;
+    checks[name] = {rules, isKeptElsewhere ? PassingValues({}) : PassingValues(rules)};
   }
 
   // Refuses values of a check that pass by its rules.
@@ -284,16 +294,6 @@ class CallPlanner {
       const bool hasLost = rule->Grants() && !PassingValues({&rule, 1}).Within(lost).IsEmpty();
       if (hasLost) remarks.Add(*rule, reason);
     }
-  }
-
-  void RefuseAllValues(const std::string& name) {
-    Check& check = checks.at(name);
-    for (const auto& checked : kCheckedArguments) {
-      if (checked.check != name) continue;
-      TellOfLoss(check, checked.call, check.passing,
-                 StrCat("refused, as ", name, " has more values than a filter has room for"));
-    }
-    check.passing = ValueSet();
   }
 
   bool IsGrantedByItself(const std::string& check, std::uint32_t value) const {
@@ -319,6 +319,15 @@ class CallPlanner {
       if (IsGrantedByItself(check, value)) continue;
       TakeValues(check, call, Single(value), StrCat(name, " is refused unless granted by itself"));
     }
+  }
+
+  void CloseWhatPassesLandlock() {
+    CloseNamedSockets();
+    CloseLimits();
+    CloseClone();
+    CloseSignalsByDescriptors();
+    CloseGroups();
+    ClosePorts();
   }
 
   // No rule of the kernel is about who connects to a unix socket that has a name.
@@ -367,6 +376,11 @@ class CallPlanner {
     DemandFlags("clone", allowed | kChildSignal);
     DemandFlags("unshare", allowed & kUnshareFlags);
     Demand("unshare", {{.argument = 0, .half = Half::kUpper, .values = {{0, 0}}}});
+  }
+
+  // Where clone3 is not there, programs do without.
+  void LetUseClone() {
+    if (FindGranted("clone3") == nullptr) AnswersCall("clone3", Answer::kUnknown);
   }
 
   std::uint32_t AllowedFlags() {
@@ -507,6 +521,7 @@ class CallPlanner {
 
   const Policy::InstalledDomain& domain;
   const Truncation truncation;
+  const Other other;
   std::vector<const Rule*> callRules;
   std::map<int, CallVerdict> verdicts;
   std::map<std::string, Check> checks;
@@ -515,10 +530,15 @@ class CallPlanner {
 
 }  // namespace
 
+CallPlan PlanCallsBesideModule(const Policy::InstalledDomain& domain) {
+  return CallPlanner(domain, Truncation::kByLandlock, Other::kModule).Plan();
+}
+
 CallPlan PlanCalls(const Policy::InstalledDomain& domain, Truncation truncation) {
   std::set<std::string> tooLong;
   for (;;) {
-    CallPlanner planner(domain, truncation, tooLong);
+    CallPlanner planner(domain, truncation, Other::kLandlock);
+    for (const std::string& check : tooLong) planner.RefuseAllValues(check);
     CallPlan plan = planner.Plan();
     if (plan.program.size() <= kMostInstructions) return plan;
     tooLong.insert(planner.LongestCheck());

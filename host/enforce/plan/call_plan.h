@@ -46,6 +46,11 @@ enum class Truncation {
 CallPlan PlanCalls(const Policy::InstalledDomain& domain,
                    Truncation truncation = Truncation::kByLandlock);
 
+// The same beside the module, which keeps the checks as they are at any time: the arguments of
+// calls are filtered for what types into terminals and the like alone, and clone3 passes where it
+// is granted.
+CallPlan PlanCallsBesideModule(const Policy::InstalledDomain& domain);
+
 // True where a rule grants the call by its name, and not only as one of a set.
 bool IsCallNamed(const Policy::InstalledDomain& domain, std::string_view call);
 

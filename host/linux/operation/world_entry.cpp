@@ -35,18 +35,26 @@ std::vector<WorldRecord> OwnRecords() {
   return records;
 }
 
+std::optional<Policy::Level> LevelOf(const World& world, HostState& state) {
+  if (!world.isKept) return Policy::FindLevel(world.level);
+  const Domain* const domain = state.Domains().Find(world.domainId);
+  return domain == nullptr ? std::nullopt : Policy::FindLevel(domain->level);
+}
+
 }  // namespace
 
 void EnterWorld(unsigned int id, Policy::Level level) {
-  HostState::Current().Worlds().Place(getpid(), id, TextOf(level));
+  HostState::Current().Worlds().Record(getpid(), id, TextOf(level));
 }
 
+void EnterKeptWorld(unsigned int id) { HostState::Current().Worlds().Record(getpid(), id); }
+
 std::vector<PlacedWorld> ListWorlds(HostState& state) {
+  state.Refresh();
   std::vector<PlacedWorld> worlds;
   for (const World& world : state.Worlds().All()) {
-    worlds.push_back({world.id, world.domainId, Policy::FindLevel(world.level)});
+    worlds.push_back({world.id, world.domainId, LevelOf(world, state)});
   }
-  state.Refresh();
   for (const WorldRecord& record : ReadWorldRecords()) {
     if (std::ranges::count(worlds, record.id, &PlacedWorld::id) != 0) continue;
     const Domain* const domain = state.Domains().Find(record.domain);

@@ -14,6 +14,9 @@ class HostState;
 // be written.
 void EnterWorld(unsigned int id, Policy::Level level);
 
+// The same where the module keeps the domain, as soon as it has this process there, and its level.
+void EnterKeptWorld(unsigned int id);
+
 // A living process that was placed in a domain, or of which its user has recorded that it was.
 struct PlacedWorld {
   int id = 0;
@@ -22,7 +25,7 @@ struct PlacedWorld {
 };
 
 // All of them, in ascending order of their identifiers. Of a process that was placed no record
-// counts.
+// counts. One that the module has in a domain is there, at the level of the domain.
 std::vector<PlacedWorld> ListWorlds(HostState& state);
 
 // The processes that the module has in the domain `id`, in ascending order.

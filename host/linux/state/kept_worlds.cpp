@@ -22,11 +22,6 @@ using Enforce::RunningModule;
 // over all processes.
 constexpr std::chrono::milliseconds kRecent{100};
 
-// Null where none keeps the state with this mark.
-std::unique_ptr<RunningModule> FindModule(const std::string& mark) {
-  return access(mark.c_str(), F_OK) == 0 ? ModuleLibrary().find() : nullptr;
-}
-
 // 0 for a name that is none of a process.
 int ProcessOf(const std::string& name) {
   int process = 0;
@@ -48,9 +43,13 @@ std::optional<unsigned int> DomainIn(const RunningModule& module, int process) {
 
 KeptWorlds::KeptWorlds(const std::string& state) : mark(ModuleMarkOf(state)) {}
 
+std::unique_ptr<RunningModule> KeptWorlds::FindKeeper() const {
+  return access(mark.c_str(), F_OK) == 0 ? ModuleLibrary().find() : nullptr;
+}
+
 std::map<int, unsigned int> KeptWorlds::Read() const {
   std::map<int, unsigned int> found;
-  const auto module = FindModule(mark);
+  const auto module = FindKeeper();
   if (module == nullptr) return found;
   std::error_code error;
   for (const auto& entry : std::filesystem::directory_iterator("/proc", error)) {
@@ -72,7 +71,7 @@ const std::map<int, unsigned int>& KeptWorlds::ReadRecent() {
 }
 
 std::optional<unsigned int> KeptWorlds::FindDomainOf(int process) const {
-  const auto module = FindModule(mark);
+  const auto module = FindKeeper();
   return module == nullptr ? std::nullopt : DomainIn(*module, process);
 }
 

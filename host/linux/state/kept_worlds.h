@@ -2,8 +2,13 @@
 
 #include <chrono>
 #include <map>
+#include <memory>
 #include <optional>
 #include <string>
+
+namespace Enforce {
+class RunningModule;
+}
 
 namespace LinuxHost {
 
@@ -13,6 +18,9 @@ namespace LinuxHost {
 class KeptWorlds {
  public:
   explicit KeptWorlds(const std::string& state);
+
+  // The module that keeps the state; null where none does.
+  std::unique_ptr<Enforce::RunningModule> FindKeeper() const;
 
   // The domains of all that are in one, by their processes.
   std::map<int, unsigned int> Read() const;

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "braxo/misc/strcat.h"
+#include "host/enforce/module/entry_point.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/common/process.h"
 #include "host/linux/state/domain.h"
@@ -28,7 +29,7 @@ void WorldTable::RequireAlive(int world) {
   if (!IsAlive(world)) throw HostError(ESRCH, StrCat("no world has the identifier ", world));
 }
 
-void WorldTable::Place(int world, unsigned int domainId, const std::string& level) {
+void WorldTable::Record(int world, unsigned int domainId, const std::string& level) {
   RequireAlive(world);
   // No plan depends on it.
   const UntoldCommits untold(store);
@@ -36,6 +37,14 @@ void WorldTable::Place(int world, unsigned int domainId, const std::string& leve
       store.Run("INSERT OR REPLACE INTO world SELECT ?1, ?2, id, ?4 FROM domain WHERE id = ?3",
                 world, StartOf(world), domainId, level);
   if (placed == 0) throw HostError(ENOENT, StrCat("unknown domain ", domainId));
+}
+
+// The record comes first: who is in the domain by then may not be able to write it any more, and no
+// other domain gets the number meanwhile.
+void WorldTable::Place(int world, unsigned int domainId) {
+  const auto module = kept.FindKeeper();
+  Record(world, domainId);
+  if (module != nullptr) module->Place(world, domainId);
 }
 
 std::optional<unsigned int> WorldTable::FindDomainOf(int world) {
@@ -52,13 +61,18 @@ unsigned int WorldTable::DomainOf(int world) {
 
 std::vector<World> WorldTable::All() {
   std::vector<World> worlds;
+  const std::map<int, unsigned int> those = kept.Read();
   Rows rows = store.Select("SELECT id, started, domain_id, level FROM world ORDER BY id");
   while (rows.Next()) {
     const auto id = static_cast<int>(rows.Integer(0));
     if (!IsStill(id, rows.Integer(1))) continue;
-    worlds.push_back({.id = id,
-                      .domainId = static_cast<unsigned int>(rows.Integer(2)),
-                      .level = std::string(rows.Text(3))});
+    const auto found = those.find(id);
+    const bool isKept = found != those.end();
+    worlds.push_back(
+        {.id = id,
+         .domainId = isKept ? found->second : static_cast<unsigned int>(rows.Integer(2)),
+         .level = std::string(rows.Text(3)),
+         .isKept = isKept});
   }
   return worlds;
 }

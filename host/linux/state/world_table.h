@@ -13,7 +13,8 @@ namespace LinuxHost {
 struct World {
   int id = 0;
   unsigned int domainId = 0;
-  std::string level;  // that confines it; empty when none does
+  std::string level;    // that confines it; empty when none does, or the module
+  bool isKept = false;  // by the module, in this domain
 };
 
 // The worlds, which are processes, and the domains that they were placed in. A world runs in the
@@ -26,10 +27,14 @@ class WorldTable {
   // Throws with ESRCH when no such process lives.
   static void RequireAlive(int world);
 
-  // Places a living world in a domain, for the rest of its life or until it is placed again.
-  // `level` is the word of the level that it is confined by from now on; empty where nobody
-  // confines it.
-  void Place(int world, unsigned int domainId, const std::string& level = {});
+  // Records that a living world is in a domain, for the rest of its life or until it is placed
+  // elsewhere. `level` is the word of the level that it is confined by from now on; empty where
+  // nobody confines it, or the module.
+  void Record(int world, unsigned int domainId, const std::string& level = {});
+
+  // The same without a level, and puts it there in the kernel as well where the module keeps the
+  // state: with all its threads, and without the children that it has.
+  void Place(int world, unsigned int domainId);
 
   // Those that live and were placed, in ascending order of their identifiers.
   std::vector<World> All();

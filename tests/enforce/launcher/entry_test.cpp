@@ -485,5 +485,37 @@ TEST_P(Entry, LoadsNothingOfItsCaller) {
   EXPECT_THAT(RunLauncher(launch).errors, StrEq("loaded\n"));
 }
 
+// ---- Beside the module
+
+TEST_P(Entry, StartsNothingThatTheModuleIsNotAskedFor) {
+  Enforce::Plan plan = PlanOfNothing();
+  plan.domain = "keptDom";
+  const OpenDescriptor none(open("/dev/null", O_RDWR | O_CLOEXEC));
+  for (const Policy::Level level : {Policy::Level::kEnforcing, Policy::Level::kDisabled}) {
+    plan.level = level;
+    const Outcome outcome = RunLauncher({user,
+                                         {"--plan", WritePlan(tree, plan), "--module", none.Text()},
+                                         {ProbePath(), "read=@/open/file"},
+                                         {},
+                                         {none.Number()}});
+    EXPECT_EQ(WEXITSTATUS(outcome.status), 126);
+    EXPECT_THAT(outcome.output, StrEq(""));
+    EXPECT_THAT(
+        outcome.errors,
+        testing::StartsWith("secpolicy-run: cannot ask the module for the domain keptDom: "));
+  }
+}
+
+TEST_P(Entry, AsksTheKernelByExecutingTheProgram) {
+  const auto asks = [&](const std::string& broker) {
+    return RunLauncher({user,
+                        {"--ask"},
+                        {ProbePath(), "variable=SECPOLICY_BROKER"},
+                        {"SECPOLICY_BROKER=" + broker}});
+  };
+  EXPECT_THAT(asks("kernel").output, StrEq("variable=SECPOLICY_BROKER ok\n"));
+  EXPECT_EQ(WEXITSTATUS(asks("kernels").status), 126);
+}
+
 }  // namespace
 }  // namespace EnforceTest

@@ -58,7 +58,7 @@ TEST_F(ModulePublication, WhatWasUndoneIsNoCommit) {
 
 TEST_F(ModulePublication, AProcessThatIsPlacedChangesNoPolicy) {
   Keep();
-  state.Worlds().Place(getpid(), domain);
+  state.Worlds().Record(getpid(), domain);
   EXPECT_TRUE(IsPublished());
   EXPECT_FALSE(StateBase::TakeCommitForModule());
 }

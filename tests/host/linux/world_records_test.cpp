@@ -262,5 +262,15 @@ TEST_F(RecordsBesideTheState, CountForNothingThatTheSuperuserDecides) {
   EXPECT_EQ(LinuxHost::DomainOfCaller(), domain);
 }
 
+TEST_F(RecordsBesideTheState, TellNoLevelWhereTheModuleKeepsIt) {
+  LinuxHost::EnterWorld(other, Policy::Level::kEnforcing);
+  LinuxHost::EnterKeptWorld(domain);
+  EXPECT_EQ(LinuxHost::DomainOfCaller(), domain);
+  const auto listed = LinuxHost::ListWorlds(state);
+  ASSERT_EQ(listed.size(), 1U);
+  EXPECT_EQ(listed[0].domainId, domain);
+  EXPECT_FALSE(listed[0].level);
+}
+
 }  // namespace
 }  // namespace LinuxHostTest

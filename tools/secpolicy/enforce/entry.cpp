@@ -14,6 +14,7 @@
 #include "host/linux/operation/state_use.h"
 #include "host/linux/operation/world_entry.h"
 #include "host/linux/operation/world_records.h"
+#include "kept_domain.h"
 #include "launcher.h"
 #include "observe/permissive.h"
 #include "observe/watch.h"
@@ -51,14 +52,20 @@ std::optional<std::string> ProgramOf(const Entry& entry) {
 ExitCode EnterAsInstalled(const std::string& verb, const Entry& entry,
                           SecPolicy::TeskAccessInterfaceImpl& access, const EntryOptions& options) {
   const Policy::InstalledDomain domain = RequireInstalledDomain(entry.domain, access);
-  const Enforce::CompiledPlan compiled = PlanOf(domain, access);
+  const Keeper keeper = FindKeeper();
+  TellWhyNot(verb, keeper, domain.name);
+  const Enforce::CompiledPlan compiled = PlanOf(domain, keeper, access);
   if (!MaySurrender(verb, compiled, options)) return kNotConfined;
   const auto program = ProgramOf(entry);
   if (program && KeepsAllRules(compiled)) RequireExecutable(*program, domain, access);
   // This process does not end as others do: a new label index was a commit.
   LinuxHost::PublishCommitted();
-  LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
   std::cerr << std::flush;
+  if (keeper.module != nullptr) {
+    LinuxHost::EnterKeptWorld(compiled.plan.domainId);
+    StartKept(compiled.plan, entry, keeper.module->EnteringMap());
+  }
+  LinuxHost::EnterWorld(compiled.plan.domainId, compiled.plan.level);
   if (compiled.plan.level == Policy::Level::kPermissive) {
     return RunPermissive(verb, entry, domain, access);
   }

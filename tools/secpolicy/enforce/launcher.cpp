@@ -71,10 +71,35 @@ void HandOnCapabilities() {
       "installed: install secpolicy again");
 }
 
-// The descriptor `number` stays open when another program is executed.
-void HandOn(int number, const char* option, std::vector<std::string>* words) {
-  if (fcntl(number, F_SETFD, 0) != 0) ThrowErrno("cannot hand on a descriptor");
-  words->insert(words->end(), {option, std::to_string(number)});
+// What the launcher is told of by an option.
+struct HandedOn {
+  const char* option = nullptr;
+  int descriptor = -1;  // none where it is not open
+};
+
+// Stays open when another program is executed.
+void HandOn(const HandedOn& handed, std::vector<std::string>* words) {
+  if (handed.descriptor < 0) return;
+  if (fcntl(handed.descriptor, F_SETFD, 0) != 0) ThrowErrno("cannot hand on a descriptor");
+  words->insert(words->end(), {handed.option, std::to_string(handed.descriptor)});
+}
+
+std::vector<std::string> EnvironmentWithBroker(const Entry& entry, const std::string& broker) {
+  std::vector<std::string> variables = EnvironmentOf(entry);
+  variables.push_back(std::string(Enforce::kBrokerVariable) + "=" + broker);
+  return variables;
+}
+
+[[noreturn]] void Start(const Enforce::Plan& plan, const Entry& entry, const HandedOn& other,
+                        std::vector<std::string> variables) {
+  const Descriptor file = SealedFile(Enforce::Serialize(plan));
+  std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};
+  HandOn({"--program", entry.program.Number()}, &words);
+  HandOn(other, &words);
+  words.emplace_back("--");
+  words.insert(words.end(), entry.command.begin(), entry.command.end());
+  execveat(launcher, "", PointersTo(words).data(), PointersTo(variables).data(), AT_EMPTY_PATH);
+  ThrowErrno("cannot start secpolicy-run");
 }
 
 // A descriptor leads past what is put over its path.
@@ -110,19 +135,15 @@ void StartConfined(const Enforce::Plan& plan, const Entry& entry,
   if (launcher < 0) ThrowNoLauncher();
   RefuseMaskedProgram(plan, entry);
   if (geteuid() != 0) HandOnCapabilities();
-  const Descriptor file = SealedFile(Enforce::Serialize(plan));
-  std::vector<std::string> words = {kName, "--plan", std::to_string(file.Number())};
-  std::vector<std::string> variables = EnvironmentOf(entry);
-  if (entry.program.IsOpen()) HandOn(entry.program.Number(), "--program", &words);
-  if (broker.IsOpen()) {
-    const int number = MoveAway(broker.Number());
-    HandOn(number, "--keep-fd", &words);
-    variables.push_back(std::string(Enforce::kBrokerVariable) + "=" + std::to_string(number));
-  }
-  words.emplace_back("--");
-  words.insert(words.end(), entry.command.begin(), entry.command.end());
-  execveat(launcher, "", PointersTo(words).data(), PointersTo(variables).data(), AT_EMPTY_PATH);
-  ThrowErrno("cannot start secpolicy-run");
+  if (!broker.IsOpen()) Start(plan, entry, {}, EnvironmentOf(entry));
+  const int number = MoveAway(broker.Number());
+  Start(plan, entry, {"--keep-fd", number}, EnvironmentWithBroker(entry, std::to_string(number)));
+}
+
+void StartKept(const Enforce::Plan& plan, const Entry& entry, int module) {
+  if (launcher < 0) ThrowNoLauncher();
+  Start(plan, entry, {"--module", module},
+        EnvironmentWithBroker(entry, std::string(Enforce::kKernelAsBroker)));
 }
 
 bool HasBroker() { return std::getenv(Enforce::kBrokerVariable) != nullptr; }

@@ -18,6 +18,10 @@ void OpenLauncher();
 [[noreturn]] void StartConfined(const Enforce::Plan& plan, const Entry& entry,
                                 const Enforce::FileDescriptor& broker);
 
+// The same in a domain that the module keeps: only system calls are filtered, where the plan has a
+// level for that. `module` is the descriptor of its map for who enters.
+[[noreturn]] void StartKept(const Enforce::Plan& plan, const Entry& entry, int module);
+
 // True where this process is confined and has a broker to ask.
 bool HasBroker();
 

@@ -3,6 +3,7 @@
 #ifndef EXECUTION_BPF_H
 #define EXECUTION_BPF_H
 
+#include "entering.bpf.h"
 #include "files.bpf.h"
 
 #define MNT_NOSUID 0x01
@@ -61,6 +62,7 @@ static __always_inline int judge_program(struct Asker* asker, struct file* file)
 
 SEC("lsm/bprm_creds_for_exec")
 int BPF_PROG(choose_domain, struct linux_binprm* program) {
+  if (loses_entry()) return -EPERM;
   bool is_placed = false;
   struct ModuleTask* own = own_task(&is_placed);
   if (!own) return is_placed ? -ENOMEM : 0;
@@ -117,6 +119,7 @@ int BPF_PROG(check_script, struct linux_binprm* program) {
 // From here on nothing of the former program is left, and this one cannot fail anymore.
 SEC("lsm/bprm_committed_creds")
 int BPF_PROG(enter_domain, struct linux_binprm* program) {
+  if (enter_as_asked()) return 0;
   struct ModuleTask* own = bpf_task_storage_get(&tasks, bpf_get_current_task_btf(), 0, 0);
   if (!own || !own->next) return 0;
   own->domain = own->next - 1;
