@@ -1,14 +1,31 @@
-// module_worker DOMAIN: a process in the domain with this number. For each line that it reads it
-// uses a capability, and writes "may" or "refused".
+// module_worker [--by-host] DOMAIN: a process in the domain with this number, where the module puts
+// it, or the host for who calls its kernel. For each line that it reads it uses a capability, and
+// writes "may" or "refused".
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
+#include <cstring>
 #include <iostream>
 #include <string>
 
+#include "secpolicyhost/values.h"
 #include "vm/enter_domain.h"
+#include "zorvan/kernel.h"
 
 namespace {
+
+void EnterByHost(const char* number) {
+  const auto process = static_cast<std::uint64_t>(getpid());
+  const auto result = Zorvan::Kernel::Call(LinuxHost::kCallPlaceWorld,
+                                           {process, std::strtoul(number, nullptr, 10)});
+  if (result.status != 0) throw Braxo::Lib::BraxoException(std::strerror(-result.error));
+}
+
+void Enter(int argc, char** argv) {
+  if (argc == 2) return EnforceTest::EnterDomain(argv[1]);
+  EnterByHost(argv[2]);
+}
 
 const char* UseCapability() {
   if (chroot("/") == 0) return "may";
@@ -18,9 +35,10 @@ const char* UseCapability() {
 }  // namespace
 
 int main(int argc, char** argv) {
-  if (argc != 2) return 2;
+  const bool isByHost = argc == 3 && argv[1] == std::string("--by-host");
+  if (argc != 2 && !isByHost) return 2;
   try {
-    EnforceTest::EnterDomain(argv[1]);
+    Enter(argc, argv);
   } catch (const Braxo::Lib::BraxoException& failure) {
     std::cerr << failure.what() << std::endl;
     return 1;

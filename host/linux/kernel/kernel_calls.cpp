@@ -12,12 +12,14 @@
 #include <string>
 #include <vector>
 
+#include "braxo/lib/exception.h"
 #include "host/linux/common/errno_guard.h"
 #include "host/linux/common/host_error.h"
 #include "host/linux/kernel/module_publication.h"
 #include "host/linux/kernel/user_memory.h"
 #include "host/linux/state/host_state.h"
 #include "secpolicyhost/mode_param.h"
+#include "secpolicyhost/values.h"
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"
 
@@ -201,6 +203,13 @@ std::uint32_t DomainOfWorld(HostState& state, Args args) {
   return 0;
 }
 
+std::uint32_t PlaceWorld(HostState& state, Args args) {
+  // Who places itself may not be able to tell the module of its domain afterwards.
+  PublishCommitted();
+  state.Worlds().Place(Signed(args[0]), Unsigned(args[1]));
+  return 0;
+}
+
 std::uint32_t DomainName(HostState& state, Args args) {
   state.Refresh();
   const std::string& name = state.Domains().Get(Unsigned(args[0])).name;
@@ -229,6 +238,7 @@ enum CallNumber : std::uint32_t {
   kDomainName = 0x4066,
   kRePointFilePolicies = 0x4067,
   kRemoveParameterCheck = 0x413e,
+  kPlaceWorld = kCallPlaceWorld,
 };
 
 // One numbered call: what it answers is its status; it throws HostError for an error.
@@ -238,7 +248,7 @@ struct NumberedCall {
   std::uint32_t (*run)(HostState& state, Args args);
 };
 
-constexpr std::array<NumberedCall, 14> kCalls = {{
+constexpr std::array<NumberedCall, 15> kCalls = {{
     {kCreateDomain, 3, CreateDomain},                  // name, default rules, &id
     {kDestroyDomain, 1, DestroyDomain},                // id
     {kUpdateFilePolicy, 3, UpdateFilePolicy},          // domain, path, permission
@@ -253,6 +263,7 @@ constexpr std::array<NumberedCall, 14> kCalls = {{
     {kDomainName, 3, DomainName},                        // domain, name, capacity
     {kRePointFilePolicies, 2, RePointFilePolicies},      // old path, new path
     {kRemoveParameterCheck, 3, RemoveParameterCheck},    // domain, check, &range
+    {kPlaceWorld, 2, PlaceWorld},                        // world, domain
 }};
 
 CallResult Run(std::uint32_t number, Args args) {
@@ -276,6 +287,9 @@ CallResult Call(std::uint32_t number, std::initializer_list<std::uint64_t> args)
     return LinuxHost::Run(number, args);
   } catch (const LinuxHost::HostError& error) {
     return {LinuxHost::kFailure, -error.Code()};
+  } catch (const Braxo::Lib::BraxoException&) {
+    // Of the module, which who is in an enforcing domain may not ask, for one.
+    return {LinuxHost::kFailure, -EIO};
   } catch (const std::bad_alloc&) {
     return {LinuxHost::kFailure, -ENOMEM};
   }

@@ -18,6 +18,7 @@
 #include "host/linux/state/rule_table.h"
 #include "host/linux/state/world_table.h"
 #include "secpolicyhost/mode_param.h"
+#include "secpolicyhost/values.h"
 #include "state_directory.h"
 #include "teskctl/security.h"
 #include "zorvan/kernel.h"
@@ -218,6 +219,19 @@ TEST_F(KernelCalls, TellTheDomainOfAWorld) {
   ChildProcess world([] {});
   world.Wait();
   EXPECT_EQ(ErrorOf(kDomainOfWorld, {Widened(world.Id()), Address(&id)}), ESRCH);
+}
+
+TEST_F(KernelCalls, PlaceLivingWorldsInDomains) {
+  const std::uint32_t place = LinuxHost::kCallPlaceWorld;
+  EXPECT_EQ(ErrorOf(place, {Widened(getpid()), domain}), 0);
+  EXPECT_EQ(HostState::Current().Worlds().DomainOf(getpid()), domain);
+  EXPECT_EQ(ErrorOf(place, {Widened(getpid()), 77}), ENOENT);
+  EXPECT_EQ(ErrorOf(place, {Widened(-1), 0}), ESRCH);
+  EXPECT_EQ(ErrorOf(place, {Widened(getpid()), 1ULL << 32U}), EINVAL);
+  EXPECT_EQ(ErrorOf(place, {Widened(getpid())}), EINVAL);
+  EXPECT_EQ(HostState::Current().Worlds().DomainOf(getpid()), domain);
+  EXPECT_EQ(ErrorOf(place, {Widened(getpid()), 0}), 0);
+  EXPECT_EQ(HostState::Current().Worlds().DomainOf(getpid()), 0U);
 }
 
 TEST_F(KernelCalls, ListLeakedDomainsUpToTheCapacity) {

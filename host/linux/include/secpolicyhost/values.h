@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstdint>
+
 #include "teskctl/security.h"
 
 /// What the numbers of the runtime interface mean on this host. Policy files write the words
@@ -49,5 +51,11 @@ inline constexpr unsigned int kPermitRead = 0x1;
 inline constexpr unsigned int kPermitWrite = 0x2;
 inline constexpr unsigned int kPermitExecute = 0x10;
 /// @}
+
+/// A kernel call (zorvan/kernel.h) of this host's own: places the living world of its first
+/// argument in the domain of the second, for the rest of its life or until it is placed elsewhere.
+/// Where the module keeps the policy that counts in the kernel at once, for all its threads;
+/// elsewhere it is recorded, and confines nobody.
+inline constexpr std::uint32_t kCallPlaceWorld = 0x5000;
 
 }  // namespace LinuxHost
