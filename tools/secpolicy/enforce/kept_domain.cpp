@@ -12,6 +12,7 @@
 #include "host/linux/common/module_library.h"
 #include "host/linux/kernel/module_publication.h"
 #include "host/linux/operation/contention.h"
+#include "module/module_status.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -40,7 +41,7 @@ std::vector<Enforce::RuleFate> FatesOf(const Policy::InstalledDomain& domain) {
 }  // namespace
 
 Keeper FindKeeper() {
-  if (geteuid() != 0 || !LinuxHost::IsStateOfModule()) return {};
+  if (geteuid() != 0 || !IsOfMachine() || !LinuxHost::IsStateOfModule()) return {};
   if (!MayFilter()) return {nullptr, "this process lacks cap_sys_admin"};
   LinuxHost::PublishCommitted();
   auto module = LinuxHost::ModuleLibrary().find();
