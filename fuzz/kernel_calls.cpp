@@ -23,6 +23,7 @@
 
 #include "host/linux/state/host_state.h"
 #include "secpolicyhost/mode_param.h"
+#include "secpolicyhost/values.h"
 #include "support/caller_memory.h"
 #include "support/message_of.h"
 #include "support/reference_reader.h"
@@ -65,6 +66,7 @@ constexpr Signature kSignatures[] = {
     {kGetDomainName, "ncn", 2, 1},
     {0x4067, "rr"},
     {0x413e, "nnr"},
+    {LinuxHost::kCallPlaceWorld, "nn"},
 };
 
 const Signature* Find(std::uint32_t number) {
