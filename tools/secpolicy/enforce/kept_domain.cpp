@@ -49,6 +49,7 @@ Keeper FindKeeper() {
   if (!IsPublishedSoon(*module)) {
     return {nullptr, "the module keeps another policy than is installed"};
   }
+  if (!module->IsRefusing()) return {nullptr, "the kernel does not run the module's programs"};
   return {std::move(module), ""};
 }
 
