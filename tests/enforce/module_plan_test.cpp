@@ -168,6 +168,35 @@ TEST(FatesByModule, TellsWhatItDoesNotKeepInOrder) {
                   "hook)"));
 }
 
+TEST(PlanModule, LetsWhoNamesItTypeIntoTerminals) {
+  const auto checksOf = [](const std::string& rule) {
+    return PlanModule({DomainOf({rule})}, kLast)[0].rules.checks[Enforce::kCheckIoctl];
+  };
+  const auto open = checksOf("-c cap_chown grant");
+  ASSERT_EQ(open.count, 3U);
+  EXPECT_EQ(open.ranges[0].last, 0x5411U);
+  EXPECT_EQ(open.ranges[1].first, 0x5413U);
+  EXPECT_EQ(open.ranges[1].last, 0x541bU);
+  EXPECT_EQ(open.ranges[2].first, 0x541dU);
+  EXPECT_EQ(checksOf("-p ioctl_request 0x5412 grant").count, 1U);
+  EXPECT_EQ(checksOf("-p ioctl_request 0x5412 0x5413 grant").ranges[0].first, 0x5413U);
+}
+
+TEST(FatesByModule, TellsWhoGrantsToTypeIntoTerminals) {
+  const std::string both =
+      " (TIOCSTI is refused unless granted by itself; TIOCLINUX is refused unless granted by "
+      "itself)";
+  EXPECT_THAT(Told(FatesByModule(DomainOf({"-s ioctl grant", "-s close grant"}), kLast)),
+              ElementsAre("narrowed: -s ioctl grant" + both));
+  EXPECT_THAT(Told(FatesByModule(DomainOf({"-s ioctl grant", "-p ioctl_request 7 grant"}), kLast)),
+              IsEmpty());
+  EXPECT_THAT(Told(FatesByModule(DomainOf({"-s ioctl grant", "-p ioctl_request 0x5412 grant",
+                                           "-p ioctl_request 0x5400 0x5420 grant"}),
+                                 kLast)),
+              ElementsAre("narrowed: -p ioctl_request 0x5400 0x5420 grant (TIOCLINUX is refused "
+                          "unless granted by itself)"));
+}
+
 TEST(FatesByModule, TellsSocketsThatGoPastPorts) {
   const std::vector<std::string> grants = {
       "-p socket_family 2 10 grant", "-p socket_family 17 grant", "-p socket_family 21 revoke",

@@ -1,5 +1,6 @@
 #include "host/enforce/module/module_plan.h"
 
+#include <sys/ioctl.h>
 #include <sys/socket.h>
 
 #include <algorithm>
@@ -14,6 +15,7 @@
 #include "host/enforce/plan/capability_plan.h"
 #include "host/enforce/plan/port_check.h"
 #include "host/enforce/plan/value_set.h"
+#include "policy/call_set.h"
 #include "policy/capability.h"
 #include "policy/decision.h"
 
@@ -44,8 +46,24 @@ std::string NamesOf(std::uint64_t capabilities) {
   return names.empty() ? " none" : names;
 }
 
+// What types into a terminal acts as whoever reads there. A range that happens to hold it does not
+// grant it.
+struct TypingRequest {
+  std::uint32_t value;
+  const char* name;
+};
+constexpr TypingRequest kTyping[] = {{TIOCSTI, "TIOCSTI"}, {TIOCLINUX, "TIOCLINUX"}};
+
+ValueSet Single(std::uint32_t value) { return ValueSet({{value, value}}); }
+
 ValueSet PassingIn(const InstalledDomain& domain, std::string_view check) {
-  return PassingValues(RulesOfCheck(domain.rules, check));
+  const auto rules = RulesOfCheck(domain.rules, check);
+  ValueSet passing = PassingValues(rules);
+  if (check != kChecks[kCheckIoctl]) return passing;
+  for (const auto& [value, name] : kTyping) {
+    if (!IsGrantedByItself(rules, value)) passing = passing.Without(Single(value));
+  }
+  return passing;
 }
 
 bool HasRoom(const ValueSet& passing) { return passing.Ranges().size() <= kMostModuleRanges; }
@@ -81,6 +99,29 @@ void TellFates(const InstalledDomain& domain, std::string_view check,
                           " ranges of values"));
     }
     fates[fate.place] = fate;
+  }
+}
+
+// Whether the rule grants the request; where none grants any, all pass, and so to who grants the
+// call.
+bool GrantsRequest(const Policy::Rule& rule, std::uint32_t value, bool isOpen) {
+  if (!rule.Grants()) return false;
+  if (rule.kind == Policy::RuleKind::kSyscall)
+    return isOpen && Policy::SpeaksOfCall(rule.words[0], "ioctl");
+  const Policy::Rule* const one = &rule;
+  return rule.kind == Policy::RuleKind::kParameterCheck && rule.words[0] == kChecks[kCheckIoctl] &&
+         PassingValues({&one, 1}).Has(value);
+}
+
+void TellTyping(const InstalledDomain& domain, std::vector<RuleFate>& fates) {
+  const auto rules = RulesOfCheck(domain.rules, kChecks[kCheckIoctl]);
+  const bool isOpen = std::ranges::none_of(rules, &Policy::Rule::Grants);
+  for (const auto& [value, name] : kTyping) {
+    if (IsGrantedByItself(rules, value) || !PassingValues(rules).Has(value)) continue;
+    for (RuleFate& fate : fates) {
+      if (GrantsRequest(fate.rule, value, isOpen))
+        Narrow(fate, StrCat(name, " is refused unless granted by itself"));
+    }
   }
 }
 
@@ -122,9 +163,9 @@ std::string TextOf(const ModuleCheck& check) {
   return text.empty() ? " none" : text;
 }
 
-bool IsOpen(const ModuleCheck& check) {
-  return check.count == 1 && check.ranges[0].first == 0 &&
-         check.ranges[0].last == std::numeric_limits<std::uint32_t>::max();
+// As where no rule is about it.
+bool IsOpen(const ModuleCheck& values, std::string_view check) {
+  return TextOf(values) == TextOf(CheckOf(PassingIn({}, check)));
 }
 
 }  // namespace
@@ -156,6 +197,7 @@ std::vector<RuleFate> FatesByModule(const InstalledDomain& domain, unsigned int 
   for (const RuleFate& fate : FileFates(domain)) fates[fate.place] = fate;
   for (const RuleFate& fate : CallFatesByModule(domain)) fates[fate.place] = fate;
   for (const RuleFate& fate : TransitionFates(domain)) fates[fate.place] = fate;
+  TellTyping(domain, fates);
   return fates;
 }
 
@@ -171,7 +213,8 @@ std::string Dump(const ModulePlan& plan) {
                    NamesOf(domain.rules.capabilities), "\n");
     for (std::size_t check = 0; check < kChecks.size(); ++check) {
       const ModuleCheck& values = domain.rules.checks[check];
-      if (!IsOpen(values)) text += StrCat("  ", kChecks[check], ":", TextOf(values), "\n");
+      if (!IsOpen(values, kChecks[check]))
+        text += StrCat("  ", kChecks[check], ":", TextOf(values), "\n");
     }
     text += Dump(domain.files);
     text += DumpCalls(domain.rules);

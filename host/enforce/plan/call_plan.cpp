@@ -297,10 +297,7 @@ class CallPlanner {
   }
 
   bool IsGrantedByItself(const std::string& check, std::uint32_t value) const {
-    return std::ranges::any_of(checks.at(check).rules, [&](const Rule* rule) {
-      return rule->Grants() && PassingValues({&rule, 1}).Count() == 1 &&
-             PassingValues({&rule, 1}).Has(value);
-    });
+    return Enforce::IsGrantedByItself(checks.at(check).rules, value);
   }
 
   void DemandValues(const CheckedArgument& checked) {

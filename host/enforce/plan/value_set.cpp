@@ -90,6 +90,13 @@ ValueSet PassingValues(std::span<const Policy::Rule* const> rules) {
   return allowed.Without(ValueSet(std::move(revoked)));
 }
 
+bool IsGrantedByItself(std::span<const Policy::Rule* const> rules, std::uint32_t value) {
+  return std::ranges::any_of(rules, [value](const Policy::Rule* const& rule) {
+    const ValueSet passing = PassingValues({&rule, 1});
+    return rule->Grants() && passing.Count() == 1 && passing.Has(value);
+  });
+}
+
 std::vector<const Policy::Rule*> RulesOfCheck(std::span<const Policy::Rule> rules,
                                               std::string_view check) {
   std::vector<const Policy::Rule*> found;

@@ -48,6 +48,9 @@ class ValueSet {
 // since the kernel never sees them. Throws BraxoException for words that are no range.
 ValueSet PassingValues(std::span<const Policy::Rule* const> rules);
 
+// Whether one of the rules grants just this value, as a range that happens to hold it does not.
+bool IsGrantedByItself(std::span<const Policy::Rule* const> rules, std::uint32_t value);
+
 // The rules of a domain about the check, in their order.
 std::vector<const Policy::Rule*> RulesOfCheck(std::span<const Policy::Rule> rules,
                                               std::string_view check);
