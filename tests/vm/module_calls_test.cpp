@@ -9,6 +9,7 @@
 #include <linux/sched.h>
 #include <linux/sockios.h>
 #include <sched.h>
+#include <sys/inotify.h>
 #include <sys/ioctl.h>
 #include <sys/mman.h>
 #include <sys/mount.h>
@@ -79,6 +80,7 @@ std::map<std::string, Arguments> Attempts() {
       {"ftruncate", {file, 0}},
       {"futimesat", {AT_FDCWD, path, 0}},
       {"init_module", {0, 0, empty}},
+      {"inotify_add_watch", {inotify_init1(IN_CLOEXEC), path, IN_MODIFY}},
       {"ioctl", {file, FIONREAD, buffer}},
       {"kill", {self, 0}},
       {"lchown", {path, -1, -1}},

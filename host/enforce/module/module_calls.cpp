@@ -51,7 +51,7 @@ constexpr std::array kProcesses = {"clone"sv,
                                    "tgkill"sv,
                                    "tkill"sv,
                                    "vfork"sv};
-constexpr std::array kChecked = {"fcntl"sv, "ioctl"sv, "prctl"sv};
+constexpr std::array kChecked = {"fcntl"sv, "inotify_add_watch"sv, "ioctl"sv, "prctl"sv};
 // What takes a capability before anything else.
 constexpr std::array kPrivileged = {
     "acct"sv,          "chroot"sv,        "delete_module"sv, "finit_module"sv,    "fsmount"sv,

@@ -44,12 +44,15 @@ static __always_inline __u32 domain_to_execute(struct ModuleTask* task) {
   return own && own->next ? own->next - 1 : task->domain;
 }
 
-// Namespaces may be mounted, but are reached by their processes.
+// Namespaces and queues of messages may be mounted, but are reached by their processes and by names
+// that are no paths.
 #define NSFS_MAGIC 0x6e736673
+#define MQUEUE_MAGIC 0x19800202
 
 static __always_inline bool is_mounted(struct dentry* entry) {
-  return !(BPF_CORE_READ(entry, d_sb, s_flags) & SB_NOUSER) &&
-         BPF_CORE_READ(entry, d_sb, s_magic) != NSFS_MAGIC;
+  __u64 magic = BPF_CORE_READ(entry, d_sb, s_magic);
+  return !(BPF_CORE_READ(entry, d_sb, s_flags) & SB_NOUSER) && magic != NSFS_MAGIC &&
+         magic != MQUEUE_MAGIC;
 }
 
 static __always_inline struct ModuleLabelRules* rules_for(__u32 rules_entry, __u32 label) {
@@ -351,6 +354,20 @@ int BPF_PROG(truncate_path, const struct path* path) {
 SEC("?lsm/file_truncate")
 int BPF_PROG(truncate_file, struct file* file) {
   return may_file(file->f_path.mnt, file->f_path.dentry, kUseTruncate);
+}
+
+// Whoever watches a directory is told the names in it, and of a file what becomes of it; of a whole
+// mount or file system, all of that.
+SEC("lsm/path_notify")
+int BPF_PROG(watch_path, const struct path* path, __u64 mask, unsigned int is_of_more) {
+  if (!current_task()) return 0;
+  int result = check_call();
+  if (result) return result;
+  struct vfsmount* mount = path->mnt;
+  __u64 watched = is_of_more ? number_of(mount->mnt_root) : number_of(path->dentry);
+  struct inode* inode = BPF_CORE_READ((struct dentry*)watched, d_inode);
+  __u32 wanted = inode && is_directory(inode) ? kUseList : kUseRead;
+  return judge_use(number_of(mount), watched, wanted) ? -EPERM : 0;
 }
 
 // ---- Removing and moving them
