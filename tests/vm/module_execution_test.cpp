@@ -70,6 +70,11 @@ void ExecuteWithoutNewPrivileges(const std::string& path) {
   Execute(path);
 }
 
+void ExecuteAsUser(const std::string& path) {
+  if (BecomeUser() != 0) _exit(99);
+  Execute(path);
+}
+
 void ExecuteInUserNamespace(const std::string& path) {
   if (unshare(CLONE_NEWUSER) != 0) _exit(99);
   Execute(path);
@@ -274,6 +279,18 @@ TEST_F(ModuleExecutionTest, WidensAndNarrowsWhatAProcessMayDo) {
                  }),
               inside);
   }
+}
+
+// Labels are not read with the rights of who executes.
+TEST_F(ModuleExecutionTest, EntersByAProgramThatMayNotBeRead) {
+  ModulePlan plan = PlanModule(Domains({{"one", {"-d tool two exec grant"}}, {"two", {}}}),
+                               CAP_LAST_CAP, kLabels);
+  plan[0].rules.capabilities = kAll;
+  module->Publish(plan, 2);
+  for (const char* const label : {"tool", "toy"})
+    fs::permissions(ProgramOf(label), fs::perms(0711), fs::perm_options::replace);
+  ExpectToEnter(ProgramOf("tool"), ExecuteAsUser);
+  ExpectToStay(ProgramOf("toy"), ExecuteAsUser);
 }
 
 TEST_F(ModuleExecutionTest, EntersFromAnyThreadAndByDescriptors) {

@@ -2,8 +2,11 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <grp.h>
 #include <gtest/gtest.h>
 #include <linux/capability.h>
+#include <sched.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -52,6 +55,35 @@ inline int InChild(const Act& act) {
   if (child == 0) _exit(act());
   return ResultOf(child);
 }
+
+// ---- Who tries it
+
+inline constexpr unsigned int kUser = 65534;
+
+// An ordinary user, whose processes may look at each other.
+inline int BecomeUser() {
+  if (setgroups(0, nullptr) != 0 || setresgid(kUser, kUser, kUser) != 0) return errno;
+  if (setresuid(kUser, kUser, kUser) != 0) return errno;
+  return ErrorOf(prctl(PR_SET_DUMPABLE, 1, 0, 0, 0));
+}
+
+inline bool WriteTo(const char* path, const std::string& text) {
+  std::ofstream file(path);
+  return static_cast<bool>(file << text << std::flush);
+}
+
+// Root of a user namespace of its own, with all capabilities there, and nobody outside.
+inline int BecomeRootOfNamespace() {
+  if (const int error = BecomeUser()) return error;
+  if (unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0) return errno;
+  const std::string map = "0 " + std::to_string(kUser) + " 1";
+  const bool isMapped = WriteTo("/proc/self/uid_map", map) &&
+                        WriteTo("/proc/self/setgroups", "deny") &&
+                        WriteTo("/proc/self/gid_map", map);
+  return isMapped ? 0 : EINVAL;
+}
+
+// ----
 
 // A process that does something when it is told, any number of times.
 class Worker {
@@ -169,6 +201,15 @@ class ModuleTest : public testing::Test {
   // What comes of an act in a domain.
   int In(unsigned int domain, const Act& act) {
     const Worker worker(act);
+    module->Place(worker.Process(), domain);
+    return worker.Do();
+  }
+
+  // What comes of an act of who has made ready for it outside of the domain.
+  int InAfter(unsigned int domain, const Act& prepare, const Act& act) {
+    bool isReady = false;
+    const Worker worker([&] { return std::exchange(isReady, true) ? act() : prepare(); });
+    EXPECT_EQ(worker.Do(), 0);
     module->Place(worker.Process(), domain);
     return worker.Do();
   }

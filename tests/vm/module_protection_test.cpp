@@ -31,7 +31,6 @@ namespace {
 
 using Enforce::FileDescriptor;
 
-constexpr uid_t kUser = 65534;
 // Newer than the headers of all machines that this is built on.
 constexpr long kOpenTreeAttributes = 467;
 
@@ -41,11 +40,6 @@ int AsDone(int error, int expected) { return error == expected ? 0 : error; }
 int OpenFor(const std::string& path, int flags) {
   const FileDescriptor file(open(path.c_str(), flags | O_CLOEXEC));
   return file.IsOpen() ? 0 : errno;
-}
-
-int Write(const char* path, const std::string& text) {
-  const FileDescriptor file(open(path, O_WRONLY | O_CLOEXEC));
-  return ErrorOf(write(file.Number(), text.data(), text.size()));
 }
 
 int BindOver(const char* what, const char* where) {
@@ -58,14 +52,6 @@ int HaveOwnMounts() {
   return ErrorOf(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr));
 }
 
-// Root of a user namespace of its own, with all capabilities there, and nobody outside.
-int BecomeRootOfNamespace() {
-  if (setresgid(kUser, kUser, kUser) != 0 || setresuid(kUser, kUser, kUser) != 0) return errno;
-  if (prctl(PR_SET_DUMPABLE, 1, 0, 0, 0) != 0) return errno;
-  if (unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0) return errno;
-  return Write("/proc/self/uid_map", "0 65534 1");
-}
-
 class ModuleProtectionTest : public ModuleTest {
  protected:
   void SetUp() override {
@@ -74,18 +60,9 @@ class ModuleProtectionTest : public ModuleTest {
     module->Publish(Granting(kAll), 2);
   }
 
-  // What comes of an act of who has made ready for it outside of the domain.
-  int InAfter(const Act& prepare, const Act& doIt) {
-    bool isReady = false;
-    const Worker worker([&] { return std::exchange(isReady, true) ? doIt() : prepare(); });
-    EXPECT_EQ(worker.Do(), 0);
-    module->Place(worker.Process(), kDomain);
-    return worker.Do();
-  }
-
   void ExpectRefusedAfter(const Act& prepare, const Act& doIt, const std::string& what) {
     SCOPED_TRACE(what);
-    EXPECT_EQ(InAfter(prepare, doIt), EPERM);
+    EXPECT_EQ(InAfter(kDomain, prepare, doIt), EPERM);
     EXPECT_EQ(InChild([&] { return prepare() == 0 ? doIt() : 1000; }), 0);
   }
 };
@@ -245,7 +222,7 @@ TEST_F(ModuleProtectionTest, KeepsWhatControlGroupsExecute) {
   };
   ExpectRefusedAfter(
       prepare, [] { return OpenFor("/mnt/over/release_agent", O_WRONLY); }, "release_agent");
-  EXPECT_EQ(InAfter(prepare, [] { return OpenFor("/mnt/over/tasks", O_WRONLY); }), 0);
+  EXPECT_EQ(InAfter(kDomain, prepare, [] { return OpenFor("/mnt/over/tasks", O_WRONLY); }), 0);
 }
 
 TEST_F(ModuleProtectionTest, HasNobodyMakeKeys) {
