@@ -147,12 +147,22 @@ inline bool KernelRunsPrograms() {
 // What keeps nobody from files.
 inline constexpr const char* kAllFiles = "-r / rwx";
 
+// A rule for each system call.
+inline const std::vector<Policy::Rule>& AllCalls() {
+  static const std::vector<Policy::Rule> all = [] {
+    std::vector<Policy::Rule> rules;
+    for (const auto calls : {Enforce::SystemCalls(), Enforce::SystemCallsOf32Bits()}) {
+      for (const Enforce::SystemCall& call : calls)
+        rules.push_back(RuleOf("-s " + call.name + " grant"));
+    }
+    return rules;
+  }();
+  return all;
+}
+
 // With every system call granted besides, of which a domain without rules for them has none.
 inline Policy::InstalledDomain WithCalls(Policy::InstalledDomain domain) {
-  for (const auto calls : {Enforce::SystemCalls(), Enforce::SystemCallsOf32Bits()}) {
-    for (const Enforce::SystemCall& call : calls)
-      domain.rules.push_back(RuleOf("-s " + call.name + " grant"));
-  }
+  domain.rules.insert(domain.rules.end(), AllCalls().begin(), AllCalls().end());
   return domain;
 }
 
@@ -177,7 +187,6 @@ class ModuleTest : public testing::Test {
     if (!module) module = Module::Start();
     module->Publish(Granting(kChroot), 1);
   }
-  static void TearDownTestSuite() { Module::Stop(); }
 
   // To load it takes most of the time, so it is done by tests of what it takes with it.
   void Restart() {

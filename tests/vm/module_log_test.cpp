@@ -70,7 +70,6 @@ class ModuleLogTest : public ModuleTest {
   static void TearDownTestSuite() {
     unsetenv("SECPOLICY_HOST_STATE");
     std::filesystem::remove_all(kRoot);
-    ModuleTest::TearDownTestSuite();
   }
 
   void Publish(const std::vector<std::string>& rules, Level level = Level::kEnforcing) {

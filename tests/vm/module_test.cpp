@@ -32,6 +32,15 @@
 namespace EnforceTest {
 namespace {
 
+// To start it takes long, so it runs until all tests have.
+class RunningModule : public testing::Environment {
+  void TearDown() override {
+    if (Module::FindRunning()) Module::Stop();
+  }
+};
+
+const auto* const runningModule = testing::AddGlobalTestEnvironment(new RunningModule);
+
 // ---- Capabilities and levels
 
 TEST_F(ModuleTest, RefusesACapabilityThatIsNotGranted) {
