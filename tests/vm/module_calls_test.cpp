@@ -258,18 +258,6 @@ TEST_F(ModuleTest, KnowsCallsOf32BitsByTheirOwnNumbers) {
   ExpectRefused(StatOf32Bits);
 }
 
-#if defined(__x86_64__)
-
-TEST_F(ModuleTest, GrantsNoCallOfX32) {
-  constexpr long kOfX32 = 0x4000'0000;
-  const auto callOfX32 = [] { return ErrorOf(syscall(SYS_eventfd2 | kOfX32, 0, 0)); };
-  if (InChild(callOfX32) == ENOSYS) GTEST_SKIP() << "this kernel has no x32";
-  module->Publish(Open(), 2);
-  ExpectRefused(callOfX32);
-}
-
-#endif
-
 TEST_F(ModuleTest, RefusesCallsInNoDomainThatThereIs) {
   module->Publish({}, 2);
   ExpectRefused([] { return Call(SYS_socket, {AF_UNIX, SOCK_STREAM, 0}); });
