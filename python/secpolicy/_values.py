@@ -141,7 +141,7 @@ class Plan:
     rules_removed: tuple[DomainRule, ...]
     rules_changed: tuple[RuleChange, ...]
     rules_staying: tuple[DomainRule, ...]
-    """Those that no file has any more and that stay."""
+    """Those that the load found in no file and that stay; behind an error it finds nothing."""
     labels: tuple[LabelChange, ...]
     """The files that would get another label."""
 

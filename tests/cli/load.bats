@@ -126,7 +126,7 @@ load helper
 $policy/early/domains: 1 error
 'secpolicy --root $root check /etc/zorvan/secpolicy' shows the lines, and what may be meant
 installed now: "[0-9]+" domains, "[0-9]+" rules, "[0-9]+" objects
-secpolicy: load-early: failed (1 problem above); nothing was removed: 1 domain and "[0-9]+" rules that no file has"$ ]]
+secpolicy: load-early: failed (1 problem above); nothing was removed: 1 domain and "[0-9]+" rules found in no file"$ ]]
 }
 
 @test "two loads at once both end well" {
@@ -324,9 +324,50 @@ END
   echo "-s no_such_call grant" >>"$policy/domains/appDom"
   secpolicy load
   exits 1
-  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 problem above); nothing was removed: 1 rule that no file has"
+  ends_with "secpolicy: load: There were some problems encountered in setting the policy (1 problem above); nothing was removed: 1 rule found in no file"
+  secpolicy load --keep
+  exits 1
+  [[ $stderr == *"(1 problem above); nothing was removed: 1 rule found in no file" ]]
   secpolicy why sshDom call listen
   exits 0
+}
+
+# The file has them, behind the line that ends its reading.
+@test "rules behind an error are not said to be in no file" {
+  boot
+  sed -i '1i -s no_such_call grant' "$policy/domains/sshDom"
+  secpolicy load
+  exits 1
+  [[ $stderr =~ "; nothing was removed: "[0-9]+" rules found in no file"$ ]]
+  secpolicy load --plan
+  exits 1
+  [[ $output =~ ^"rules that stay installed although found in no file ("[0-9]+"):" ]]
+  secpolicy status
+  [[ $output =~ "left over    "[0-9]+" rules" ]]
+}
+
+@test "a load that fails names domains without rules, too, that it has not removed" {
+  boot
+  touch "$policy/domains/newDom"
+  secpolicy load
+  rm "$policy/domains/newDom"
+  echo "-s no_such_call grant" >>"$policy/domains/appDom"
+  secpolicy load
+  exits 1
+  [[ $stderr == *"(1 problem above); nothing was removed: 1 domain found in no file" ]]
+}
+
+@test "a load that is stopped leaves what was installed" {
+  boot
+  secpolicy display
+  local before=$output
+  rm "$policy/domains/ioFilterDom"
+  sed -i '/ioFilterDom/d' "$policy/domains/"*Dom
+  echo "-s ptrace grant" >>"$policy/domains/appDom"
+  secpolicy load
+  exits 3
+  secpolicy display
+  [[ $output == "$before" ]]
 }
 
 @test "a full load leaves the early policy, and an early load the full one" {

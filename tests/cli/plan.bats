@@ -82,7 +82,7 @@ END
   sed -i '/cap_sys_chroot/d' "$policy/domains/sshDom"
   plan --keep
   exits 0
-  [[ $output == "rules that stay installed although no file has them (1):
+  [[ $output == "rules that stay installed although found in no file (1):
   sshDom: -c cap_sys_chroot grant" ]]
   [[ $stderr == "secpolicy: load: nothing would change" ]]
 }

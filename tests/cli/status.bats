@@ -168,14 +168,14 @@ rules_of() {
   secpolicy load --keep
   secpolicy status
   exits 0
-  shows "in no file   2 rules"
-  shows "in no file   domain newDom"
+  shows "left over    2 rules"
+  shows "left over    domain newDom"
   secpolicy status --format json
   fits_schema status
   jq -e '.inNoFile == {domains: ["newDom"], rules: 2}' <<<"$output"
   secpolicy load
   secpolicy status
-  [[ $output != *"in no file"* ]]
+  [[ $output != *"left over"* ]]
   secpolicy status --format json
   jq -e '.latestLoad.removed == {domains: 1, rules: 2}' <<<"$output"
 }

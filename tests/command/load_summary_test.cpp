@@ -10,6 +10,7 @@ using LinuxHost::LoadEnding;
 using LinuxHost::LoadRemainder;
 using SecPolicyCli::DescribeProblems;
 using SecPolicyCli::DescribeRemainder;
+using SecPolicyCli::DescribeUnremoved;
 
 struct Problems {
   std::map<std::string, std::size_t> problems;
@@ -56,10 +57,22 @@ TEST(DescribeRemainder, TellsWhatWasRemovedAndWhatStays) {
       {{both, rules}, false, ", 2 domains and 1 rule removed that no file has"},
       {{nothing, both}, true, ", 2 domains and 1 rule kept that no file has"},
       {{nothing, domain}, true, ", 1 domain kept that no file has"},
-      {{nothing, both}, false, "; nothing was removed: 2 domains and 1 rule that no file has"},
       {{nothing, domain}, false, ""},
   };
   for (const auto& [ending, keep, text] : table) EXPECT_EQ(DescribeRemainder(ending, keep), text);
+}
+
+TEST(DescribeUnremoved, TellsWhatAFailedLoadHasNotFound) {
+  const LoadRemainder nothing;
+  const LoadRemainder rules{.rules = 2, .domains = {}};
+  const LoadRemainder domain{.rules = 0, .domains = {"a"}};
+  const LoadRemainder both{.rules = 1, .domains = {"a", "b"}};
+  EXPECT_EQ(DescribeUnremoved({nothing, nothing}), "");
+  EXPECT_EQ(DescribeUnremoved({nothing, both}),
+            "; nothing was removed: 2 domains and 1 rule found in no file");
+  EXPECT_EQ(DescribeUnremoved({nothing, domain}),
+            "; nothing was removed: 1 domain found in no file");
+  EXPECT_EQ(DescribeUnremoved({rules, domain}), ", 2 rules removed that no file has");
 }
 
 }  // namespace

@@ -146,10 +146,10 @@ void WriteText(const HostStatus& status) {
               std::string(width - number.size(), ' ') + number + " " + form.name);
   }
   if (status.rulesWithoutLine > 0) {
-    WriteLine("in no file", CountOf(status.rulesWithoutLine, "rule"));
+    WriteLine("left over", CountOf(status.rulesWithoutLine, "rule"));
   }
   for (const std::string& domain : status.domainsWithoutFile) {
-    WriteLine("in no file", "domain " + domain);
+    WriteLine("left over", "domain " + domain);
   }
   if (status.module) {
     WriteLine("kernel", Describe(status.module->kernel));

@@ -19,7 +19,7 @@ Policy::InstalledPolicy ReadState(const std::string& path) {
   return ReadInstalledPolicy(access);
 }
 
-// What no file has any more, and the load has left.
+// What the load has found in no file, and left.
 void FindStaying(const Policy::InstalledPolicy& after, LoadPlan& plan) {
   for (const Policy::InstalledDomain& domain : after.domains) {
     if (domain.isGone) plan.stayingDomains.push_back(domain.name);

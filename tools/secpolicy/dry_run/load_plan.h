@@ -28,7 +28,7 @@ struct LoadPlan {
   Policy::Difference difference;
   std::vector<FileLabelChange> labels;
 
-  // What no file has any more, and the load leaves: it is to keep it, or has errors, or worlds run.
+  // What the load found in no file, and leaves: it is to keep it, or has errors, or worlds run.
   std::vector<std::string> stayingDomains;
   std::vector<DomainRule> stayingRules;
 

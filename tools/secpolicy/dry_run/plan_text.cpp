@@ -52,7 +52,7 @@ void WritePlanText(const LoadPlan& plan, std::size_t maxLabels, std::ostream& ou
   WriteSection("files to label anew", labels, maxLabels, output);
   WriteSection("domains that stay installed although no file defines them", plan.stayingDomains,
                output);
-  WriteSection("rules that stay installed although no file has them", stayingRules, output);
+  WriteSection("rules that stay installed although found in no file", stayingRules, output);
 }
 
 }  // namespace SecPolicyCli

@@ -349,7 +349,7 @@ class LoadRun {
       if (!request.dryRun) {
         Attempt([] { std::cerr << "installed now: " + CountInstalled() << std::endl; });
       }
-      summary += DescribeRemainder(ending, request.keep);
+      summary += DescribeUnremoved(ending);
     } else if (hasBegun) {
       summary += "; nothing was installed";
     }

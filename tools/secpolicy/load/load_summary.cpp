@@ -22,6 +22,10 @@ std::string Count(const LinuxHost::LoadRemainder& remainder) {
   return text + (text.empty() ? "" : " and ") + CountOf(remainder.rules, "rule");
 }
 
+std::string DescribeRemoved(const LinuxHost::LoadRemainder& removed) {
+  return ", " + Count(removed) + " removed that no file has";
+}
+
 }  // namespace
 
 std::string DescribeProblems(const std::map<std::string, std::size_t>& problems,
@@ -73,13 +77,17 @@ std::string DescribeDone(const std::string& verb) {
 }
 
 std::string DescribeRemainder(const LinuxHost::LoadEnding& ending, bool keep) {
-  if (!ending.removed.IsEmpty()) return ", " + Count(ending.removed) + " removed that no file has";
+  if (!ending.removed.IsEmpty()) return DescribeRemoved(ending.removed);
   // Domains in which worlds run are told before.
-  if (keep && !ending.staying.IsEmpty()) {
-    return ", " + Count(ending.staying) + " kept that no file has";
-  }
-  if (ending.staying.rules == 0) return "";
-  return "; nothing was removed: " + Count(ending.staying) + " that no file has";
+  if (!keep || ending.staying.IsEmpty()) return "";
+  return ", " + Count(ending.staying) + " kept that no file has";
+}
+
+std::string DescribeUnremoved(const LinuxHost::LoadEnding& ending) {
+  // What fails when all is committed is a label.
+  if (!ending.removed.IsEmpty()) return DescribeRemoved(ending.removed);
+  if (ending.staying.IsEmpty()) return "";
+  return "; nothing was removed: " + Count(ending.staying) + " found in no file";
 }
 
 }  // namespace SecPolicyCli

@@ -30,8 +30,12 @@ std::string CountInstalled();
 // standard error: what is done is done.
 std::string DescribeDone(const std::string& verb);
 
-// What the summary goes on with: what was removed since no file has it, and what was not. Nothing
-// where every rule and domain is in a file.
+// What the summary of a load that ended well goes on with: what was removed since no file has it,
+// or kept. Nothing where every rule and domain is in a file.
 std::string DescribeRemainder(const LinuxHost::LoadEnding& ending, bool keep);
+
+// The same of a load that failed. It does not see what stands behind an error, so files may have
+// what it has found in none.
+std::string DescribeUnremoved(const LinuxHost::LoadEnding& ending);
 
 }  // namespace SecPolicyCli

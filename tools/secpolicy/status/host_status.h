@@ -32,7 +32,7 @@ struct HostStatus {
   std::map<Policy::RuleKind, std::size_t> rulesByKind;
   std::size_t ruleCount = 0;
   std::vector<std::string>
-      domainsWithoutFile;  // what loads have installed and no file has any more
+      domainsWithoutFile;  // what loads have installed and the latest has found in no file
   std::size_t rulesWithoutLine = 0;
   std::vector<LinuxHost::PlacedWorld> worlds;
   std::optional<ModuleStatus> module;  // of the machine itself alone

@@ -32,7 +32,7 @@ function overviewPage() {
 
 const domainFacts = (domain) => h("p", { class: "lede" }, levelMark(domain.level),
   ` Number ${domain.id}, ${countOf(domain.count, "rule")}`,
-  domain.atRunTime && ", made at run time", domain.gone && ", no longer in any file", ". ",
+  domain.atRunTime && ", made at run time", domain.gone && ", defined by no file", ". ",
   h("a", { href: addressOf("ask", domain.name) }, "Ask what it may do"), " · ",
   h("a", { href: addressOf("transitions", "domain", domain.name) }, "See its transitions"));
 

@@ -104,7 +104,7 @@ function ruleLine(rule) {
 
 function placeLine(rule) {
   if (placeOf(rule) === "") return h("span", { class: "quiet" }, "no policy file");
-  return h("span", { class: "place" }, breakable(placeOf(rule)), goneRules.has(rule) && " (no longer in it)");
+  return h("span", { class: "place" }, breakable(placeOf(rule)), goneRules.has(rule) && " (not found in it by the latest load)");
 }
 
 const RULE_COLUMNS = {
