@@ -416,3 +416,18 @@ END
     [[ $output == "$before" || $output == "$after" ]]
   done
 }
+
+# What lies beside the state comes and goes with each load.
+@test "a load labels the files of the host, too" {
+  boot
+  echo "/run/* hostConfig" >"$policy/fileLabels/run"
+  local option
+  for option in "" "" --all-or-nothing; do
+    # shellcheck disable=SC2086
+    secpolicy load $option
+    exits 0
+    is_done load
+  done
+  secpolicy label get /run/secpolicy/host.db
+  answers 0 "/run/secpolicy/host.db: hostConfig"
+}

@@ -22,6 +22,7 @@
 #include <string_view>
 
 #include "host/linux/common/errno_guard.h"
+#include "host/linux/common/used_paths.h"
 #include "host/linux/files/inherited_label.h"
 #include "host/linux/operation/file_label.h"
 
@@ -93,6 +94,12 @@ int CheckAnywhere(const std::string& path, const char* name, std::uint32_t id, L
   if (purpose == LabelNotes::kDryRun) return CheckQuietly(path);
   const int error = TryInVain(path, name, value->data(), value->size());
   return error == 0 || error == EEXIST || error == ENODATA || error == EINVAL ? 0 : Fail(error);
+}
+
+// What lies beside the state, and below.
+bool IsOfHost(const std::string& directory) {
+  const std::string& state = StatePath();
+  return (directory + "/").starts_with(state.substr(0, state.rfind('/') + 1));
 }
 
 }  // namespace
@@ -260,6 +267,8 @@ std::vector<LabelFailure> NotedLabels::Apply() const {
       ForEach([&](const DirectoryPlace& directory, const char* name, std::uint32_t id) {
         if (ReplaceLabel(name, id) == 0) return;
         const int error = errno;
+        // The load itself takes away what tells others of the policy before.
+        if (error == ENOENT && IsOfHost(directory.path)) return;
         failures.push_back({JoinPath(directory.path, name), error});
       });
   failures.insert(failures.end(), std::make_move_iterator(unreachable.begin()),

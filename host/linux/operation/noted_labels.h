@@ -55,8 +55,8 @@ class NotedLabels : public AttributeStandIn {
   // Gives the files their labels, in the order in which that was asked for; of several for an entry
   // of a directory only the last one, and that only where the file does not carry it. Returns those
   // that could not be given theirs: one that has gone meanwhile, or was replaced by a link, is
-  // among them, as are all in a directory that was replaced. Changes the working directory while it
-  // runs.
+  // among them, as are all in a directory that was replaced, but not what has gone of the host's
+  // own files beside the state. Changes the working directory while it runs.
   std::vector<LabelFailure> Apply() const;
 
   // Hands these labels to `visit`, in that order, with the directory of the file as the working
