@@ -14,6 +14,20 @@ namespace LinuxHost {
 
 using Braxo::Misc::StrCat;
 
+namespace {
+
+StateCopy Copy(const std::string& used, CopyOf what, const std::string& to) {
+  const int flags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;
+  if (faccessat(AT_FDCWD, used.c_str(), R_OK, flags) != 0) {
+    if (errno == ENOENT || errno == ENOTDIR) return StateCopy::kMissing;
+    if (errno == EACCES) return StateCopy::kForbidden;
+  }
+  CopyDatabase(used, what, to);
+  return StateCopy::kMade;
+}
+
+}  // namespace
+
 void OwnProcess() { KeepNoMemoryAccount(); }
 
 HostState& CurrentState() { return HostState::Current(); }
@@ -28,15 +42,10 @@ bool IsStateForbidden() {
   return faccessat(AT_FDCWD, StatePath().c_str(), R_OK | W_OK, kFlags) != 0 && errno == EACCES;
 }
 
-StateCopy CopyUsedState(const std::string& to) {
-  const std::string& used = StatePath();
-  const int flags = AT_EACCESS | AT_SYMLINK_NOFOLLOW;
-  if (faccessat(AT_FDCWD, used.c_str(), R_OK, flags) != 0) {
-    if (errno == ENOENT || errno == ENOTDIR) return StateCopy::kMissing;
-    if (errno == EACCES) return StateCopy::kForbidden;
-  }
-  CopyDatabase(used, CopyOf::kState, to);
-  return StateCopy::kMade;
+StateCopy CopyUsedState(const std::string& to) { return Copy(StatePath(), CopyOf::kState, to); }
+
+StateCopy CopyUsedSettings(const std::string& to) {
+  return Copy(SettingsPath(), CopyOf::kSettings, to);
 }
 
 UsedCopy::UsedCopy(const std::string& path, const std::string& shownAs) : used(path, shownAs) {

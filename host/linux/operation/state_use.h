@@ -24,13 +24,16 @@ bool IsStateMissing();
 // True when there may be a state that this user may not use.
 bool IsStateForbidden();
 
-// What became of a copy of the state: only what is missing, or not this user's to read, is left
-// out.
+// What became of a copy of the state or the settings: only what is missing, or not this user's to
+// read, is left out.
 enum class StateCopy { kMade, kMissing, kForbidden };
 
 // Copies the state that this process works with to the new file `to`. Throws HostError for one that
 // cannot be trusted or is damaged; leaves no file unless the copy was made.
 StateCopy CopyUsedState(const std::string& to);
+
+// The same of the wanted settings.
+StateCopy CopyUsedSettings(const std::string& to);
 
 // As long as it lives, this process works with the state at `path`, which is its own and which
 // messages call `shownAs`, and surely with no other: throws HostError when that cannot be used, or

@@ -10,6 +10,7 @@
 #include "kitlibs/file.h"
 #include "policy_dir.h"
 #include "refusal.h"
+#include "scratch/scratch_state.h"
 #include "secpolicy/policy_root.h"
 
 namespace SecPolicyCli {
@@ -41,6 +42,11 @@ std::optional<Subject> FindSubject(const std::string& path) {
   return Subject{.dir = *dir, .file = file};
 }
 
+// A load reads them first.
+void RequireUsableSettings(const ScratchState& scratch) {
+  if (scratch.IsCopy()) LinuxHost::CopyUsedSettings(scratch.DirectoryPath() + "/settings.db");
+}
+
 }  // namespace
 
 CheckReport CheckPolicy(const CheckRequest& request) {
@@ -55,6 +61,7 @@ CheckReport CheckPolicy(const CheckRequest& request) {
     throw NoSuchPolicy("name the file that standard input holds the content of.");
   }
   CheckRun run(request.fresh, request.unwanted);
+  RequireUsableSettings(run.scratch);
   if (request.content != nullptr) TakeContent(run, subject->file, *request.content);
   LinuxHost::PolicyTransaction load(LinuxHost::CurrentState());
   BeginLoadOf(load, subject->dir);
