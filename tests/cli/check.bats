@@ -539,6 +539,18 @@ END
   [[ $stderr == "secpolicy: check: 2000 errors, 0 warnings" ]]
 }
 
+@test "many thousands of domain files take seconds" {
+  local count=20000
+  [[ -z ${SECPOLICY_LONG_TESTS-} ]] || count=100000
+  seq -f "$policy/domains/a%.0f" "$count" | xargs touch
+  run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" check
+  exits 1
+  [[ $output == *": error: cannot create domain 'a"*"': all 511 domains are in use [bad-name]"* ]]
+  run --separate-stderr timeout 60 "$SECPOLICY" --root "$root" load
+  exits 1
+  [[ $stderr == *"all 511 domains are in use"* ]]
+}
+
 @test "a hint is the nearest word, the first of several, and none for what is far" {
   add objects/base webSite webSiteOld abcdefghijklmnopqrstuvwxyz
   add domains/appDom "-a wbeSite read grant" "-a WEBSITES read grant" "-a webSideOlt read grant" \
@@ -612,6 +624,27 @@ END
   exits 1
   [[ $stderr == "secpolicy: check: Unable to copy the host state /run/secpolicy/host.db: file is not a database" ]]
   [[ $(cat "$state") == garbage ]]
+}
+
+@test "settings that others may have written, or that are damaged, end a check as they end a load" {
+  secpolicy settings enforcement appDom permissive
+  local settings=$root/var/lib/secpolicy/config.db
+  chmod 666 "$settings"
+  secpolicy check
+  exits 1
+  [[ $stderr == "secpolicy: check: Refusing the configuration: other users may write /var/lib/secpolicy/config.db. Take that right from them (chmod go-w), and make it anew" ]]
+  secpolicy check --fresh
+  exits 0
+  chmod 600 "$settings"
+  echo garbage >"$settings"
+  secpolicy check
+  exits 1
+  [[ $stderr == "secpolicy: check: Unable to copy the configuration /var/lib/secpolicy/config.db: file is not a database" ]]
+  secpolicy load
+  exits 1
+  rm "$settings"
+  secpolicy check
+  exits 0
 }
 
 @test "a directory that is not there" {

@@ -431,3 +431,24 @@ END
   secpolicy label get /run/secpolicy/host.db
   answers 0 "/run/secpolicy/host.db: hostConfig"
 }
+
+@test "domains that are to go have their slots until the end of a load" {
+  boot
+  local number
+  for number in {1..300}; do touch "$policy/domains/old$number"; done
+  secpolicy load
+  exits 0
+  rm "$policy/domains/"old*
+  for number in {1..300}; do touch "$policy/domains/new$number"; done
+  secpolicy load
+  exits 1
+  [[ $stderr == *"all 511 domains are in use"*"; nothing was removed: 300 domains and "*" rules found in no file" ]]
+  mkdir "$root/aside"
+  mv "$policy/domains/"new* "$root/aside"
+  secpolicy load
+  exits 0
+  mv "$root/aside/"* "$policy/domains"
+  secpolicy load
+  exits 0
+  is_done load
+}
