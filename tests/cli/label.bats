@@ -64,7 +64,7 @@ on_a_terminal() {
   secpolicy label get /etc/new /no/such /opt
   exits 1
   [[ $output == "/opt: unlabeled" ]]
-  [[ $stderr == "Error: /etc/new: has no label; 'secpolicy --root $root boot' gives every file its first one
+  [[ $stderr == "Error: /etc/new: has no label; 'secpolicy --root $root boot' gives every file of the root's file system its first one
 Error: /no/such: No such file or directory
 secpolicy: label get: failed (2 errors above)" ]]
 }
@@ -156,7 +156,7 @@ secpolicy: label get: failed (2 errors above)" ]]
   touch "$root/etc/new"
   secpolicy label set sshKey /etc/new /no/such /opt
   exits 1
-  [[ $stderr == "Error: Unable to set file label (sshKey) for file /etc/new: No data available: it has no label; 'secpolicy --root $root boot' gives every file its first one
+  [[ $stderr == "Error: Unable to set file label (sshKey) for file /etc/new: No data available: it has no label; 'secpolicy --root $root boot' gives every file of the root's file system its first one
 Error: Unable to set file label (sshKey) for file /no/such: No such file or directory
 secpolicy: label set: failed (2 errors above)" ]]
   [[ $(the_label /opt) == sshKey ]]
@@ -217,7 +217,7 @@ secpolicy: label verify: failed (1 error above)" ]]
   touch "$root/etc/new"
   secpolicy label verify /etc/new
   exits 1
-  ends_with "secpolicy: label verify: 1 of 1 file differs from the policy. 'secpolicy --root $root boot' gives every file its first label"
+  ends_with "secpolicy: label verify: 1 of 1 file differs from the policy. 'secpolicy --root $root boot' gives every file of the root's file system its first label"
 }
 
 @test "verify, relabel and load agree on trees, later lines, hard links and links" {
@@ -313,8 +313,8 @@ END
   says "Error: $labels/monitor:$((last - 3)) : /etc/services.conf: Not a directory"
   says "Error: $labels/monitor:$((last - 2)) : : No such file or directory"
   says "Error: $labels/monitor:$((last - 1)) : Invalid label (appDom) for file /etc"
-  says "Error: /opt/monitor/bin: has no label; 'secpolicy --root $root boot' gives every file its first one"
-  says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy --root $root boot' gives every file its first one"
+  says "Error: /opt/monitor/bin: has no label; 'secpolicy --root $root boot' gives every file of the root's file system its first one"
+  says "Error: /opt/monitor/bin/a-new-one: has no label; 'secpolicy --root $root boot' gives every file of the root's file system its first one"
   ends_with "secpolicy: label relabel: failed (8 errors above)"
   [[ $(the_label /opt/monitor/bin/agent) == monitorProgram ]]
 }
@@ -534,4 +534,15 @@ index() { stat --format='%d:%i' "$root/run/secpolicy/labels.index"; }
   [[ $(the_label /etc/services.conf) == sshKey ]]
   secpolicy label set 4000 /etc/services.conf
   wrong_usage "label set" "label set: there is no object label '4000'. 'secpolicy --root $root words objects' lists all labels"
+}
+
+@test "no boot labels another file system that is mounted below a labelled tree" {
+  boot
+  mkdir "$root/etc/mounted"
+  run --separate-stderr unshare --mount bash -c 'mount -t tmpfs mounted "$1/etc/mounted" || exit 77
+    touch "$1/etc/mounted/file"; "$SECPOLICY" --root "$1" boot; "$SECPOLICY" --root "$1" label get /etc/mounted/file' - "$root"
+  [[ $status -ne 77 && $stderr != *"unshare failed"* ]] || skip "no mounts here"
+  exits 1
+  says "Error: /etc/zorvan/secpolicy/fileLabels/base:$(grep -n '^/etc/\*' "$policy/fileLabels/base" | cut -d: -f1) : Unable to set file label (hostConfig) for file /etc/mounted: No data available"
+  says "Error: /etc/mounted/file: has no label; 'secpolicy --root $root boot' gives every file of the root's file system its first one"
 }

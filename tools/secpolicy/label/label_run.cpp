@@ -47,7 +47,8 @@ std::string LabelRun::NameOf(std::uint32_t id) {
 
 std::string WhyNoLabel(int error) {
   if (error != ENODATA) return std::strerror(error);
-  return "has no label; " + Call("boot") + " gives every file its first one";
+  return "has no label; " + Call("boot") +
+         " gives every file of the root's file system its first one";
 }
 
 }  // namespace SecPolicyCli

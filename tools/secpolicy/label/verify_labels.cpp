@@ -54,7 +54,7 @@ std::string VerifyLabels(LabelRun& run, const std::string& dir,
         StrCat(tally.different, " of ", CountOf(tally.files, "file"),
                tally.different == 1 ? " differs" : " differ", " from the policy. ",
                tally.different == tally.withoutLabel
-                   ? Call("boot") + " gives every file its first label"
+                   ? Call("boot") + " gives every file of the root's file system its first label"
                    : Call("label relabel") + " gives the policy's labels again"));
   }
   if (tally.files == 0) return "done (the policy names no file there)";
