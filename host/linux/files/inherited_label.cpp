@@ -72,6 +72,18 @@ int OpenContent(const Entry& entry) {
                 O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
 }
 
+// /proc leads to what must not be opened, too, where there is one.
+int SetByProc(const Entry& entry, const char* name, const void* value, std::size_t size) {
+  constexpr int kFlags = O_PATH | O_NOFOLLOW | O_CLOEXEC;
+  const Descriptor held(openat(entry.directory.Number(), entry.name.c_str(), kFlags));
+  struct stat status {};
+  if (!held.IsOpen() || fstat(held.Number(), &status) != 0) return -1;
+  if (S_ISLNK(status.st_mode)) return Fail(ENODATA);
+  const std::string path = "/proc/self/fd/" + std::to_string(held.Number());
+  const int result = setxattr(path.c_str(), name, value, size, 0);
+  return result != 0 && errno == ENOENT ? Fail(ENODATA) : result;
+}
+
 ssize_t GetFrom(const Entry& entry, const char* name, void* value, std::size_t size) {
   const XattrArguments arguments = {.value = reinterpret_cast<std::uintptr_t>(value),
                                     .size = static_cast<std::uint32_t>(size),
@@ -91,7 +103,8 @@ int SetOn(const Entry& entry, const char* name, const void* value, std::size_t s
                               AT_SYMLINK_NOFOLLOW, name, &arguments, sizeof arguments);
   if (result >= 0 || !IsCallMissing()) return static_cast<int>(result);
   const Descriptor file(OpenContent(entry));
-  return file.IsOpen() ? fsetxattr(file.Number(), name, value, size, 0) : -1;
+  if (file.IsOpen()) return fsetxattr(file.Number(), name, value, size, 0);
+  return errno == ENODATA ? SetByProc(entry, name, value, size) : -1;
 }
 
 // The entry that `path` names without a link at its end. A path that ends in a directory by another

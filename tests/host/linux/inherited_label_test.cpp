@@ -280,5 +280,16 @@ TEST_F(InheritedLabel, IsThatOfPipesToo) {
             "7 as it should");
 }
 
+TEST_F(InheritedLabel, OfAPipeIsReplacedByWayOfProcOnAKernelThatTakesNoEntries) {
+  const auto replace = [](bool hasProc) -> std::string {
+    mkfifo("tree/pipe", 0600);
+    if (!hasProc && !MountInPrivate("none", "/proc", "tmpfs", 0)) return "(no mounts here)";
+    if (!RefuseEntryCalls(ENOSYS)) return "no way";
+    return Words({Give("tree/pipe", 9), Label("tree/pipe")});
+  };
+  EXPECT_EQ(Run([&] { return replace(false); }), geteuid() == 0 ? "ENODATA 7" : "(no mounts here)");
+  EXPECT_EQ(Run([&] { return replace(true); }), geteuid() == 0 ? "0 9" : "EPERM 7");
+}
+
 }  // namespace
 }  // namespace LinuxHostTest
