@@ -155,6 +155,22 @@ load_broken() {
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 
+@test "a plain load that is killed while it gives labels has not ended well" {
+  break_labels die settings
+  run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load /new
+  exits 137
+  secpolicy display
+  [[ $output == *newDom* ]]
+  secpolicy status
+  exits 1
+  shows "             Not all files have their labels: the load still gives them, or was killed"
+  ends_with "secpolicy: status: the latest load did not end well. 'secpolicy --root $root check' shows every problem of the files"
+  secpolicy load /new
+  is_done load
+  secpolicy status
+  exits 0
+}
+
 @test "a label that is no identifier is put back too" {
   python3 - "$root/etc/services.conf" <<'END'
 import os, sys

@@ -49,6 +49,8 @@ class NotedLabels : public AttributeStandIn {
   // given any label, and none is noted.
   explicit NotedLabels(LabelNotes purpose, const std::string& passedOver = "");
 
+  bool IsEmpty() const { return notes.empty(); }
+
   // The files that would have been labelled by now, in ascending order of their paths.
   std::vector<LabelChange> Changes() const;
 

@@ -17,14 +17,26 @@ namespace {
 
 void Record(const RecordedLoad& load, const std::string& directory,
             const LinuxHost::LoadRemainder& removed) {
-  LinuxHost::RecordLoad(LinuxHost::CurrentState(), {.verb = load.verb,
-                                                    .directory = directory,
-                                                    .time = std::time(nullptr),
-                                                    .ending = load.ending,
-                                                    .errorCount = load.errors.size(),
-                                                    .errors = load.errors,
-                                                    .removedRules = removed.rules,
-                                                    .removedDomains = removed.domains.size()});
+  LinuxHost::LoadRecord record{.verb = load.verb,
+                               .directory = directory,
+                               .time = std::time(nullptr),
+                               .ending = load.ending,
+                               .errors = load.errors,
+                               .removedRules = removed.rules,
+                               .removedDomains = removed.domains.size()};
+  if (load.labelsFollow) {
+    record.ending = "failed";
+    record.errors.emplace_back(
+        "Not all files have their labels: the load still gives them, or was killed");
+  }
+  record.errorCount = record.errors.size();
+  LinuxHost::RecordLoad(LinuxHost::CurrentState(), record);
+}
+
+void TellUnrecorded(const RecordedLoad& load, const std::exception& failure) {
+  if (load.ending != "done") return;
+  Summarize(load.verb, std::string("this load cannot be recorded for the verbs that explain it: ") +
+                           failure.what());
 }
 
 // The partner domains of any other directory are those of the host's own.
@@ -51,10 +63,18 @@ void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
     Record(load, directory, ending.removed);
     LinuxHost::RecordOrigins(LinuxHost::CurrentState(), listener.Rules(), listener.Labels());
   } catch (const std::exception& failure) {
-    if (load.ending != "done") return;
-    Summarize(load.verb,
-              std::string("this load cannot be recorded for the verbs that explain it: ") +
-                  failure.what());
+    TellUnrecorded(load, failure);
+  }
+}
+
+void RecordLabelled(const RecordedLoad& load, const LinuxHost::LoadEnding& ending) {
+  try {
+    const auto latest = LinuxHost::LatestLoad(LinuxHost::CurrentState());
+    const bool isThis = latest && latest->verb == load.verb && latest->ending == "failed" &&
+                        latest->errorCount == load.errors.size() + 1;
+    if (isThis) Record(load, CanonicalName(load.policyDir), ending.removed);
+  } catch (const std::exception& failure) {
+    TellUnrecorded(load, failure);
   }
 }
 

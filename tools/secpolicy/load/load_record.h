@@ -14,6 +14,9 @@ struct RecordedLoad {
   std::string policyDir;
   std::string ending;
   std::vector<std::string> errors;
+
+  // Files get their labels next: until that is recorded, this is a load that died meanwhile.
+  bool labelsFollow = false;
 };
 
 // The directory under a name that means the same from everywhere and does not vary with the way it
@@ -26,6 +29,10 @@ std::string CanonicalName(const std::string& dir);
 // either; nothing is thrown.
 void RecordLoad(const RecordedLoad& load, const LinuxHost::LoadEnding& ending,
                 const LoadListener& listener);
+
+// Keeps that the labels, which were to follow, are given, unless another load was recorded since.
+// What fails is said as by RecordLoad.
+void RecordLabelled(const RecordedLoad& load, const LinuxHost::LoadEnding& ending);
 
 // Keeps, for `status`, that the full policy in `dir` is what is installed, all of it or not.
 // Nothing is thrown: what cannot be kept is not claimed.

@@ -151,8 +151,10 @@ class LoadRun {
     } else if (request.allOrNothing && labels) {
       InstallAllOrNothing(*labels);
     } else {
-      Commit();
-      if (labels) GiveLabels(*labels);
+      RecordedLoad record = Ending();
+      record.labelsFollow = labels && !labels->IsEmpty();
+      Commit(record);
+      if (record.labelsFollow) GiveLabels(*labels);
     }
     listener.timing.EndPhase("file labels");
   }
@@ -187,15 +189,15 @@ class LoadRun {
   // A file without its label is an error of a load that was well until then.
   void GiveLabels(const NotedLabels& labels) {
     const std::vector<LinuxHost::LabelFailure> failures = labels.Apply();
-    if (failures.empty()) return;
+    if (failures.empty()) return RecordLabelled(Ending(), ending);
     ReportUnlabelled(failures);
     RecordInstalled();
     RecordLoad(Ending(), ending, listener);
   }
 
-  void Commit() {
+  void Commit(const RecordedLoad& record) {
     RecordInstalled();
-    RecordLoad(Ending(), ending, listener);
+    RecordLoad(record, ending, listener);
     transaction->Commit();
     isInstalled = true;
   }
@@ -214,7 +216,7 @@ class LoadRun {
     try {
       journal.Keep(labels);
       ReportUnlabelled(labels.Apply());
-      if (WentWell()) return Commit();
+      if (WentWell()) return Commit(Ending());
     } catch (const std::exception&) {
       ReportPutBack(journal.PutBack());
       throw;
