@@ -147,6 +147,9 @@ load_broken() {
   [[ -e $root/run/secpolicy/labels.undo ]]
   secpolicy display
   [[ $output != *newDom* ]]
+  secpolicy status
+  exits 1
+  ends_with "secpolicy: status: a load still gives labels to files, or was killed meanwhile. 'secpolicy --root $root load' puts them back first"
   echo "-x" >>"$policy/domains/appDom"
   load_whole
   exits 1

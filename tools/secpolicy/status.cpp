@@ -234,12 +234,18 @@ ExitCode EndWith(const HostStatus& status, bool isBooted) {
   if (status.IsModuleBroken()) {
     text = "the kernel does not keep what is installed. " + Call("module status") + " says why";
   }
+  if (status.isLabelling) {
+    text = "a load still gives labels to files, or was killed meanwhile. " + Call("load") +
+           " puts them back first";
+  }
   if (problems) {
     text =
         "the latest load did not end well. " + Call("check") + " shows every problem of the files";
   }
   Summarize("status", text);
-  return problems || !status.IsLoaded() || status.IsModuleBroken() ? kFailed : kWell;
+  const bool isWell =
+      status.IsLoaded() && !status.IsModuleBroken() && !status.isLabelling && !problems;
+  return isWell ? kWell : kFailed;
 }
 
 struct Options {

@@ -242,6 +242,10 @@ LabelsPutBack LabelJournal::PutBack() const {
   return undoing.Done();
 }
 
+bool LabelJournal::IsThere(const std::string& statePath) {
+  return access(JournalBeside(statePath).c_str(), F_OK) == 0;
+}
+
 void LabelJournal::DiscardLeftOver(const std::string& statePath) {
   unlink(JournalBeside(statePath).c_str());
 }

@@ -43,6 +43,9 @@ class LabelJournal {
   // Nothing when there is none, or its process lives. Throws as the constructor.
   static std::optional<LabelsPutBack> PutBackLeftOver(const std::string& statePath);
 
+  // Whether one lies beside the state at `statePath`, of a process that lives or has died.
+  static bool IsThere(const std::string& statePath);
+
   // Removes what a process that died has left, and puts nothing back: the state that its labels are
   // of has gone, and all files are about to be labelled anew.
   static void DiscardLeftOver(const std::string& statePath);

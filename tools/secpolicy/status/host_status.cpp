@@ -2,6 +2,7 @@
 
 #include <exception>
 
+#include "host/linux/operation/label_journal.h"
 #include "host/linux/operation/state_use.h"
 #include "secpolicy/policy_root.h"
 
@@ -30,6 +31,7 @@ HostStatus ReadStatus() {
   status.policy = ReadInstalledPolicy(access);
   status.tardisks = ReadTardisks(access);
   status.load = LinuxHost::LatestLoad(LinuxHost::CurrentState());
+  status.isLabelling = LinuxHost::LabelJournal::IsThere(LinuxHost::StatePath());
   status.bundle = ReadBundleStatus();
   if (IsOfMachine()) status.module = ReadModuleStatus();
   status.worlds = LinuxHost::ListWorlds(LinuxHost::CurrentState());

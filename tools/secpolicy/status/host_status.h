@@ -36,6 +36,7 @@ struct HostStatus {
   std::size_t rulesWithoutLine = 0;
   std::vector<LinuxHost::PlacedWorld> worlds;
   std::optional<ModuleStatus> module;  // of the machine itself alone
+  bool isLabelling = false;  // a load --all-or-nothing gives labels, or was killed meanwhile
 
   // Beside the one that is built in, there are domains only when something was loaded.
   bool IsLoaded() const { return policy.domains.size() > 1; }
