@@ -156,12 +156,14 @@ std::string MetricsOf(const HostStatus& status) {
   gauges.push_back(Count("secpolicy_tardisks", "Tardisks of the host.", status.tardisks.size()));
   gauges.push_back(WorldGauge(status));
   if (status.module) std::ranges::move(ModuleGauges(*status.module), std::back_inserter(gauges));
-  gauges.push_back(Count("secpolicy_rules_without_file",
-                         "Rules that a load has installed, the latest has found in no file, and that stay.",
-                         status.rulesWithoutLine));
-  gauges.push_back(Count("secpolicy_domains_without_file",
-                         "Domains that a load has installed, the latest has found in no file, and that stay.",
-                         status.domainsWithoutFile.size()));
+  gauges.push_back(
+      Count("secpolicy_rules_without_file",
+            "Rules that a load has installed, the latest has found in no file, and that stay.",
+            status.rulesWithoutLine));
+  gauges.push_back(
+      Count("secpolicy_domains_without_file",
+            "Domains that a load has installed, the latest has found in no file, and that stay.",
+            status.domainsWithoutFile.size()));
   return TextOf(gauges);
 }
 
