@@ -96,7 +96,7 @@ std::string ActOf(const ModuleEvent& event) {
       return "use a socket whose ports nobody sees (family " + std::to_string(event.value) +
              ", type " + std::to_string(event.detail) + ")";
     case Enforce::kActReachSocket:
-      return "reach a unix socket without a path that was made in another domain";
+      return "reach a unix socket without a path that was named in another domain";
     case Enforce::kActUseFile:
     case Enforce::kActMakeFile:
     case Enforce::kActMakeSocket:

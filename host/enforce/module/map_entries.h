@@ -171,7 +171,7 @@ enum {
   kActCall,           // detail: whose numbers; value: the number of the system call
   kActEnter,          // value: the domain; the label and the path are the program's
   kActPassPorts,      // detail: the type of a socket whose ports nobody sees; value: its family
-  kActReachSocket,    // a unix socket without a path that was made in another domain
+  kActReachSocket,    // a unix socket without a path that was named in another domain
   kModuleActs,
 };
 
