@@ -43,18 +43,12 @@ struct NamedMap {
   FileDescriptor ModuleMaps::*map;
 };
 constexpr std::array kMaps = {
-    NamedMap{"domains", &ModuleMaps::domains},
-    NamedMap{"rules", &ModuleMaps::rules},
-    NamedMap{"tasks", &ModuleMaps::tasks},
-    NamedMap{"entering", &ModuleMaps::entering},
-    NamedMap{"refusals", &ModuleMaps::refusals},
-    NamedMap{"generation", &ModuleMaps::generation},
-    NamedMap{"events", &ModuleMaps::events},
-    NamedMap{"labels", &ModuleMaps::labels},
-    NamedMap{"devices", &ModuleMaps::devices},
-    NamedMap{"hashing", &ModuleMaps::hashing},
-    NamedMap{"paths", &ModuleMaps::paths},
-    NamedMap{"label_rules", &ModuleMaps::labelRules},
+    NamedMap{"domains", &ModuleMaps::domains},   NamedMap{"rules", &ModuleMaps::rules},
+    NamedMap{"tasks", &ModuleMaps::tasks},       NamedMap{"entering", &ModuleMaps::entering},
+    NamedMap{"refusals", &ModuleMaps::refusals}, NamedMap{"generation", &ModuleMaps::generation},
+    NamedMap{"events", &ModuleMaps::events},     NamedMap{"labels", &ModuleMaps::labels},
+    NamedMap{"devices", &ModuleMaps::devices},   NamedMap{"hashing", &ModuleMaps::hashing},
+    NamedMap{"paths", &ModuleMaps::paths},       NamedMap{"label_rules", &ModuleMaps::labelRules},
 };
 
 struct Destroy {
