@@ -44,7 +44,8 @@ static __always_inline __u64 tag_of_file(struct dentry* entry, __u32 rules_entry
   __u64 generation = directory->i_generation;
   // Another file system that lies where this one does begins another epoch.
   __u32 system = (char*)inode->i_sb - (char*)how;
-  __u64 tag = mix(how->basis + now, directory->i_ino, how->multiplier);
+  __u64 tag = mix(how->basis, now, how->multiplier);
+  tag = mix(tag, directory->i_ino, how->multiplier);
   tag = mix(tag, inode->i_ino, how->multiplier);
   tag = mix(tag, generation << 32 | inode->i_generation, how->multiplier);
   return mix(tag, (__u64)system << 32 | rules_entry, how->multiplier);
