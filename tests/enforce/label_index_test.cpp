@@ -18,6 +18,7 @@
 #include <random>
 #include <set>
 
+#include "host/enforce/checksum.h"
 #include "support/message_of.h"
 #include "support/temporary_directory.h"
 
@@ -297,6 +298,37 @@ TEST_F(LabelIndexFile, IsRefusedWhenItIsSomethingElse) {
   EXPECT_EQ(Refusal(), "The label index " + file +
                            " has version 2, this program works with version 1. Run \"secpolicy "
                            "load\", which makes a new one");
+}
+
+TEST_F(LabelIndexFile, BeginsAsThoseOfEarlierVersionsDo) {
+  index.Write(file);
+  EXPECT_TRUE(Content().starts_with("ZorvLab\n"));
+}
+
+// With the checksum of what it is, it would be taken for another index.
+TEST_F(LabelIndexFile, IsRefusedWhenAPlaceSharesMoreThanThereIs) {
+  constexpr std::size_t kFirstPlace = 40;
+  LabelIndex(kRoot, {{"/", 2, true}}).Write(file);
+  const auto change = [&](std::size_t byte) {
+    std::string content = Content();
+    ++content[byte];
+    content.resize(content.size() - sizeof(std::uint64_t));
+    const std::uint64_t sum = Enforce::Checksum(content);
+    SetContent(content.append(reinterpret_cast<const char*>(&sum), sizeof sum));
+  };
+  change(kFirstPlace + 2);
+  EXPECT_EQ(LabelIndex::Read(file).LabelOf("/"), 3U);
+  change(kFirstPlace);
+  EXPECT_EQ(Refusal(), Damaged("a place is wrong"));
+}
+
+// The kernel tells more bytes of its own files than there are to be read.
+TEST_F(LabelIndexFile, IsRefusedWhenItBecomesShorterWhileItIsRead) {
+  const std::string shorter = "/sys/kernel/uevent_seqnum";
+  if (!std::filesystem::is_regular_file(shorter)) GTEST_SKIP() << "there is no such file here";
+  EXPECT_EQ(MessageOf([&] { LabelIndex::Read(shorter); }),
+            "The label index " + shorter +
+                " is damaged (it is cut off). Run \"secpolicy load\", which makes a new one");
 }
 
 TEST_F(LabelIndexFile, IsRefusedWhenItIsNoRegularFile) {

@@ -10,6 +10,7 @@
 #include <sched.h>
 #include <signal.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
@@ -321,6 +322,22 @@ TEST_F(AskedTest, TellsCapabilitiesByTheArguments) {
     for (const auto& each : taking) EXPECT_EQ(CapabilitiesOf(number, each), capability) << number;
     for (const auto& each : free) EXPECT_EQ(CapabilitiesOf(number, each), "") << number;
   }
+}
+
+TEST_F(AskedTest, TellsLimitsThatAreRaised) {
+  rlimit limit = {};
+  ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &limit), 0);
+  const auto taken = [&] {
+    const auto address = reinterpret_cast<std::uintptr_t>(&limit);
+    const std::string oneself = CapabilitiesOf(SYS_prlimit64, {0, RLIMIT_NOFILE, address});
+    EXPECT_EQ(CapabilitiesOf(SYS_setrlimit, {RLIMIT_NOFILE, address}), oneself);
+    return oneself;
+  };
+  EXPECT_EQ(taken(), "");
+  ++limit.rlim_max;
+  EXPECT_EQ(taken(), "cap_sys_resource");
+  limit.rlim_max = 0;
+  EXPECT_EQ(taken(), "");
 }
 
 TEST_F(AskedTest, TakesALoaderFromAProgramOnly) {
