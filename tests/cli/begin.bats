@@ -55,6 +55,17 @@ setup() {
   [[ ! -e $root/tardisks && ! -e $root/etc ]]
 }
 
+# words_of PATHS: those of the comments in the files, but for what paths have in them.
+words_of() { grep -rhoE '#.*' "$@" | sed 's, "\?/[^ ]*,,g' | grep -oE '[[:alpha:]]+' | sort -fu; }
+
+@test "the comments of new files are made of the words of the documents" {
+  secpolicy init
+  secpolicy new domain webDom
+  [[ $(words_of "$policy" | wc -l) -gt 100 ]]
+  run grep -vixFf <(grep -rIhoE '[[:alpha:]]+' "$SOURCE"/{README.md,docs,packaging}; echo webDom) <(words_of "$policy")
+  exits 1
+}
+
 @test "init where nothing can be written says so" {
   [[ $EUID -eq 0 ]] || skip "only root can give the rights of another user"
   chmod 755 "$root" "$BATS_TEST_TMPDIR" "$(dirname "$BATS_TEST_TMPDIR")" "$BATS_RUN_TMPDIR"

@@ -60,6 +60,18 @@ is_damaged() {
   is_done boot
 }
 
+@test "a boot that moves a state aside keeps nothing of a load that was going on" {
+  ((EUID == 0)) || skip "only the superuser keeps the labels of a load that did not end"
+  echo "what files carried" >"$root/run/secpolicy/labels.undo"
+  damage "DROP TABLE rule"
+  secpolicy boot
+  exits 0
+  ends_done boot
+  [[ ! -e $root/run/secpolicy/labels.undo ]]
+  secpolicy load
+  exits 0
+}
+
 @test "what an older version has left is refused, and a boot moves on to this one's labels" {
   ((EUID == 0)) || skip "only the superuser writes attributes of the system"
   local program=$root/usr/sbin/sshd

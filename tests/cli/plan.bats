@@ -72,6 +72,8 @@ END
   plan
   exits 0
   answers 0 "domains to remove (1):" "  newDom" "rules to remove (1):" "  newDom: -s read grant"
+  plan --format json
+  jq -e '.domains == {create: [], remove: ["newDom"], stay: []}' <<<"$output"
   secpolicy load /new
   [[ $stderr == *", 1 domain and 1 rule removed that no file has" ]]
   plan

@@ -124,6 +124,11 @@ grant_app() {
   secpolicy run appDom -- /true
   exits 126
   [[ $stderr == "secpolicy-run: /true cannot start in the domain appDom, as its loader "*" needs mmap, which the domain may not call; '-s @start grant' grants it where no rule revokes it" ]]
+  printf '#!/true\n' >"$root/script"
+  chmod +x "$root/script"
+  secpolicy run appDom -- /script
+  exits 126
+  [[ $stderr == "secpolicy-run: /script cannot start in the domain appDom, as its loader "*" needs mmap, "* ]]
   # What is linked statically starts without.
   secpolicy run appDom -- /bin/sh -c 'echo started'
   answers 0 started

@@ -149,6 +149,17 @@ def test_renames_a_label_everywhere(client, web, policy):
     assert "webProgram" not in everything
 
 
+def test_the_edits_of_a_closed_file_are_of_no_version(client, web, policy):
+    host = policy / "domains/hostDom"
+    client.open(web)
+    client.close(web)
+    client.open(host)
+    changes = client.at("rename", host, 1, 5, newName="webd")["documentChanges"]
+    versions = {each["textDocument"]["uri"]: each["textDocument"]["version"] for each in changes}
+    assert versions[web.as_uri()] is None
+    assert versions[host.as_uri()] == client.version
+
+
 def test_renames_a_domain_with_its_file(client, policy, web):
     host = policy / "domains/hostDom"
     client.open(host)
