@@ -27,7 +27,6 @@ WatchedEnd RunWatched(const std::string& verb, const std::vector<std::string>& c
   if (!Enforce::ProbeFeatures().notifies) {
     throw Braxo::Lib::BraxoException("this kernel has no filters that ask a supervisor");
   }
-  std::cout << std::flush;
   supervision.procDirectory = proc;
   const Enforce::SupervisedEnd end = Enforce::Supervise(command, supervision);
   if (end.startError == 0) return {true, static_cast<ExitCode>(end.exitStatus)};
