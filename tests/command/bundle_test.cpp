@@ -2,12 +2,16 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
 #include "bundle/archive.h"
 #include "bundle/manifest.h"
+#include "bundle/policy_exchange.h"
 #include "bundle/policy_tree.h"
+#include "support/message_of.h"
+#include "support/temporary_directory.h"
 
 namespace SecPolicyCli {
 namespace {
@@ -70,6 +74,15 @@ TEST(BundleManifest, HasDaysThatThereAre) {
        {"", "2026-02-30", "2026-13-01", "2026-11-21x", "1960-01-01", "7"}) {
     EXPECT_EQ(ReadUtcTime(text), std::nullopt) << text;
   }
+}
+
+TEST(BundledPolicy, IsWrittenIntoNothingThatIsThere) {
+  const SecPolicyTest::TemporaryDirectory parent;
+  const std::string there = parent / "policy";
+  std::filesystem::create_directory(there);
+  EXPECT_EQ(SecPolicyTest::MessageOf([&] { WritePolicyTree(there, kEntries); }),
+            "cannot write " + there + ": File exists");
+  EXPECT_TRUE(std::filesystem::is_empty(there));
 }
 
 TEST(BundledPolicy, HasNamesThatALoadReads) {

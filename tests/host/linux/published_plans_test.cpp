@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
 #include <fstream>
 #include <map>
@@ -205,6 +206,23 @@ TEST_F(PublishedPlans, AreNoLinksAndWrittenByTheirOwnerAlone) {
   fs::remove(file);
   fs::create_directory(file);
   EXPECT_EQ(MessageOf([] { ReadPublishedPlan("a"); }), Refusal("it is no regular file"));
+}
+
+TEST_F(PublishedPlans, MayBeEmpty) {
+  ASSERT_TRUE(Publish({{"a", ""}}));
+  errno = ENOENT;
+  EXPECT_EQ(ReadPublishedPlan("a"), "");
+}
+
+TEST_F(PublishedPlans, ThatCannotBeWrittenAreTold) {
+  ASSERT_TRUE(Publish({{"a", "plan"}}));
+  fs::remove(PlanFileOf("a"));
+  fs::create_directory(PlanFileOf("a"));
+  EXPECT_EQ(MessageOf([] {
+              Publish({{"a", "plan"}});
+            }),
+            "Unable to write " + directory.Path() + "/plans/a: Is a directory");
+  EXPECT_FALSE(ArePlansPublished());
 }
 
 TEST_F(PublishedPlans, AreNotThoseOfAnotherUser) {
