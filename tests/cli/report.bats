@@ -19,6 +19,32 @@ data_of() { sed -n 's|^<script type="application/json" id="data">\(.*\)</script>
   [[ $(data_of "$root/first.html" | jq '[.domains[].count] | add') == 159 ]]
 }
 
+@test "what the data names is what the script reads" {
+  boot
+  printf -- '-s ptrace grant\n' >>"$policy/domains/sshDom"
+  secpolicy report /etc/zorvan/secpolicy --against installed -o /page.html
+  secpolicy report -o /installed.html
+  exits 0
+  local names name
+  # Of tables of words the names are words of rules.
+  names=$(for page in page installed; do data_of "$root/$page.html"; done | jq -sr 'del(.[].words) | [.. | objects | keys[]] | unique[]')
+  [[ $names == *strings* ]]
+  for name in $names; do
+    grep -qw "$name" "$SOURCE"/tools/secpolicy/report/page/*.js || { echo "nothing reads $name" && false; }
+  done
+}
+
+@test "labels and checks have their columns" {
+  boot
+  secpolicy report -o /page.html
+  local labels checks
+  labels=$(data_of "$root/page.html" | jq -c '.strings as $s | .labels[] | [$s[.[0]], .[1], $s[.[2]], $s[.[3]], .[4]]')
+  [[ $labels == *'["/usr/bin",1,"hostProgram","/etc/zorvan/secpolicy/fileLabels/base",5]'* ]]
+  checks=$(data_of "$root/page.html" | jq -c '.strings as $s | .domains[] | select($s[.name] == "sshDom").checks[] |
+    [$s[.[0]], (.[1][] | .[:4])]')
+  [[ $checks == '["bind_port",["0","0",1,0],["1","21",0,0],["22","22",1,0],["23","18446744073709551615",0,0]]' ]]
+}
+
 @test "only its own script and style may run" {
   boot
   secpolicy report -o /page.html

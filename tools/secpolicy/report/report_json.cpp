@@ -249,7 +249,6 @@ Json ToJson(const InstalledDomain& domain, const DomainAnswers& answers, Strings
           {"id", domain.id},
           {"level", TextOf(domain.level)},
           {"refuses", anything.refuses},
-          {"hasRole", domain.HasRole()},
           {"atRunTime", domain.IsCreatedAtRunTime()},
           {"gone", domain.isGone},
           {"count", domain.rules.size()},
