@@ -1,5 +1,6 @@
 #include "host/enforce/real_file_tree.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <seccomp.h>
@@ -72,6 +73,20 @@ TEST(RealFileTree, ListsWhatADirectoryHoldsAndNotItself) {
 }
 
 // As if nothing were there, plans would name no path at all.
+TEST(RealFileTree, LeavesNothingOpen) {
+  const SecPolicyTest::TemporaryDirectory directory;
+  const auto lowest = [] {
+    const int file = open("/dev/null", O_RDONLY | O_CLOEXEC);
+    close(file);
+    return file;
+  };
+  const int before = lowest();
+  Enforce::RealFileTree tree;
+  tree.List(directory.Path(), 2);
+  tree.KindOf(directory.Path());
+  EXPECT_EQ(lowest(), before);
+}
+
 TEST(RealFileTree, DoesNotTakeWhatItMayNotLookForAsMissing) {
   EXPECT_EXIT(LookWithoutAnyCall(), testing::ExitedWithCode(0),
               "^Unable to look for /: Function not implemented$");

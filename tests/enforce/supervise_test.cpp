@@ -253,6 +253,20 @@ TEST_F(AskedTest, TellsFilesByTheArgumentsThatNameThem) {
 #endif
 }
 
+TEST_F(AskedTest, TellsLinksThatAreNotFollowed) {
+  const std::string file = Within("file");
+  const std::string link = Within("link");
+  std::ofstream(file).put('x');
+  std::filesystem::create_symlink(file, link);
+  const auto readOf = [&](std::uint64_t flags) {
+    return AskedOf(SYS_openat, {static_cast<std::uint64_t>(AT_FDCWD), AddressOf(link), flags});
+  };
+  EXPECT_EQ(readOf(O_RDONLY), Only("read " + file));
+  EXPECT_EQ(readOf(O_RDONLY | O_CREAT), Only("read " + file));
+  EXPECT_EQ(readOf(O_RDONLY | O_NOFOLLOW), Only("read " + link));
+  EXPECT_EQ(readOf(O_RDONLY | O_CREAT | O_EXCL), Only("read " + link));
+}
+
 TEST_F(AskedTest, TellsCapabilitiesByTheCall) {
   const std::map<std::string, std::vector<int>> expected = {
       {"cap_ipc_lock", {SYS_mlockall}},
