@@ -268,6 +268,17 @@ TEST(Compile, KeepsABrokerForWhoIsLedElsewhereAndMayAsk) {
   EXPECT_FALSE(Compile(domain, surroundings).plan.keepsBroker);
 }
 
+TEST(Compile, TellsWaysOutThatCannotBeAskedForFromWithin) {
+  const auto told = [](const std::vector<std::string>& lines) {
+    return CompileOn(NewKernel(), lines).fates.front().how;
+  };
+  const std::string way = "-d program otherDom exec grant";
+  EXPECT_EQ(told({way, "-s pipe2 grant", "-s sendmsg grant"}), "only by \"secpolicy exec\"");
+  EXPECT_EQ(told({way, "-s pipe2 grant"}),
+            "only by \"secpolicy exec\" from outside of the domain, as asking from within takes "
+            "-s pipe2 and sendmsg");
+}
+
 TEST(Compile, TellsWhatAKernelWithoutFiltersCannotRefuse) {
   Features features = NewKernel();
   features.seccomp = false;
