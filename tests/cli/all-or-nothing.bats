@@ -158,6 +158,15 @@ load_broken() {
   everything | diff "$BATS_TEST_TMPDIR/before" -
 }
 
+@test "a label that cannot be taken back of a load that was killed is told" {
+  break_labels die settings
+  load_broken
+  exits 137
+  break_labels fail services.conf
+  load_broken
+  says "Error: Unable to put the label back of /etc/services.conf: Input/output error"
+}
+
 @test "a plain load that is killed while it gives labels has not ended well" {
   break_labels die settings
   run --separate-stderr "${breakage[@]}" "$SECPOLICY" --root "$root" load /new
