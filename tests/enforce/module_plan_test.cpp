@@ -9,6 +9,7 @@
 
 #include "enforce/domain_of.h"
 #include "host/enforce/module/path_hash.h"
+#include "host/enforce/module/transition_plan.h"
 
 namespace EnforceTest {
 namespace {
@@ -224,6 +225,19 @@ TEST(FatesByModule, TellsOfLabelsThatAreWrittenLater) {
 TEST(FatesByModule, TellsWhatAKernelDoesNotKnow) {
   EXPECT_THAT(Told(FatesByModule(DomainOf({"-c cap_bpf grant"}), CAP_AUDIT_READ)),
               ElementsAre("narrowed: -c cap_bpf grant (this kernel has no cap_bpf)"));
+}
+
+TEST(PlanTransitions, LeadWhereTheFirstRuleOfALabelLeads) {
+  Enforce::ModuleFileRules files;
+  Enforce::PlanTransitions(
+      DomainOf({"-d program otherDom exec grant", "-d program thirdDom exec grant",
+                "-d lost missingDom exec grant", "-d same testDom exec grant",
+                "-d revoked otherDom exec revoke", "-d unknown otherDom exec grant"}),
+      {{"program", 7}, {"lost", 8}, {"same", 9}, {"revoked", 10}},
+      {{"otherDom", 3}, {"thirdDom", 4}, {"testDom", 5}}, files);
+  ASSERT_THAT(files.labels, testing::UnorderedElementsAre(testing::Key(7), testing::Key(8)));
+  EXPECT_EQ(files.labels[7].next, 3U + 1);
+  EXPECT_GT(files.labels[8].next, unsigned{Enforce::kModuleDomains} + 1);
 }
 
 }  // namespace
