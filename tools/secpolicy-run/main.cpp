@@ -30,8 +30,11 @@ namespace {
   const Enforce::Program program =
       options.program ? Enforce::ProgramOf(*options.program, options.command, environ)
                       : Enforce::FindProgram(options.command, environ);
-  if (options.module) Enforce::EnterInModule(std::move(plan), program, *options.module);
-  Enforce::Enter(std::move(plan), program, options.keptDescriptors);
+  if (options.module) {
+    Enforce::EnterInModule(std::move(plan), program, *options.module);
+  } else {
+    Enforce::Enter(std::move(plan), program, options.keptDescriptors);
+  }
 }
 
 }  // namespace

@@ -264,6 +264,7 @@ SupervisedEnd Supervise(const std::vector<std::string>& command, const Supervisi
   const std::string path = FindProgram(command.front());
   std::vector<std::string> words = command;
   std::vector<char*> arguments;
+  arguments.reserve(words.size() + 1);
   for (std::string& word : words) arguments.push_back(word.data());
   arguments.push_back(nullptr);
   int ends[2] = {};
