@@ -101,6 +101,7 @@ def test_search_by_keys(page, host):
 def test_search_that_is_cleared_leads_back(page):
     page.go("domain", "sshDom")
     page.press("/")
+    page.wait_for("document.activeElement === query")
     page.type("vm")
     page.wait_for("document.querySelector('h1').innerText === 'Search: vm'")
     page.run("query.value = ''; query.dispatchEvent(new Event('input'))")
