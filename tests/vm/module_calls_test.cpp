@@ -276,17 +276,6 @@ TEST_F(ModuleTest, LetsCallsPassInAPermissiveDomain) {
 
 // ---- Flags of new processes
 
-// 0 or the error of a clone that ends at once; one of the kernel's own, for flags that go together
-// only in other ways, is as good as none.
-int Clone(std::uint64_t flags) {
-  clone_args arguments = {};
-  arguments.flags = flags;
-  arguments.exit_signal = SIGCHLD;
-  const long child = syscall(SYS_clone3, &arguments, sizeof(arguments));
-  if (child == 0) _exit(0);
-  return child < 0 ? errno : ResultOf(static_cast<pid_t>(child));
-}
-
 TEST_F(ModuleTest, PassesFlagsAsTheDecisionDoes) {
   constexpr std::uint64_t kTried[] = {0,
                                       CLONE_FS,

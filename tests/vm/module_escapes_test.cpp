@@ -22,14 +22,12 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/uio.h>
-#include <sys/un.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
 #include <atomic>
 #include <cerrno>
 #include <csignal>
-#include <cstddef>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -41,6 +39,7 @@
 
 #include "host/enforce/supervise/file_descriptor.h"
 #include "vm/module_fixture.h"
+#include "vm/unix_sockets.h"
 
 namespace EnforceTest {
 namespace {
@@ -586,42 +585,19 @@ TEST_P(ModuleEscapesOfAll, PortsByFastOpenInThreeWays) {
   Grants("connect", [&] { return connectLater(4001); });
 }
 
-// With a zero in front it is a name that is no path.
 int BindOrReach(int type, const std::string& name, bool binds) {
-  const FileDescriptor made(socket(AF_UNIX, type | SOCK_CLOEXEC, 0));
-  sockaddr_un address = {};
-  address.sun_family = AF_UNIX;
-  memcpy(address.sun_path, name.data(), name.size());
-  const auto size = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
-  const auto* const where = reinterpret_cast<const sockaddr*>(&address);
-  if (binds) return ErrorOf(bind(made.Number(), where, size));
-  if (type == SOCK_DGRAM) return ErrorOf(sendto(made.Number(), "x", 1, MSG_DONTWAIT, where, size));
-  return ErrorOf(connect(made.Number(), where, size));
+  if (binds) return BindUnix(OpenUnix(type), name);
+  return type == SOCK_DGRAM ? SendUnix(name) : ConnectUnix(type, name);
 }
-
-FileDescriptor Serve(int type, const std::string& name) {
-  FileDescriptor made(socket(AF_UNIX, type | SOCK_CLOEXEC, 0));
-  sockaddr_un address = {};
-  address.sun_family = AF_UNIX;
-  memcpy(address.sun_path, name.data(), name.size());
-  const auto size = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
-  EXPECT_EQ(bind(made.Number(), reinterpret_cast<const sockaddr*>(&address), size), 0) << name;
-  if (type != SOCK_DGRAM) {
-    EXPECT_EQ(listen(made.Number(), 20), 0);
-  }
-  return made;
-}
-
-constexpr int kSocketTypes[] = {SOCK_STREAM, SOCK_DGRAM, SOCK_SEQPACKET};
 
 TEST_P(ModuleEscapesOfAll, UnixSocketsOfOthers) {
   Publish({About("public", "rw")}, {About("", "rw")});
   const std::string name("\0secpolicy-escape", 17);
-  for (const int type : kSocketTypes) {
+  for (const int type : kUnixTypes) {
     const std::string end = "/socket" + std::to_string(type);
-    const FileDescriptor hidden = Serve(type, At("secret") + end);
-    const FileDescriptor shown = Serve(type, At("public") + end);
-    const FileDescriptor named = Serve(type, name);
+    const FileDescriptor hidden = ServeUnix(type, At("secret") + end);
+    const FileDescriptor shown = ServeUnix(type, At("public") + end);
+    const FileDescriptor named = ServeUnix(type, name);
     Refuses("by a path", [&] { return BindOrReach(type, At("secret") + end, false); });
     Grants("by a path", [&] { return BindOrReach(type, At("public") + end, false); });
     RefusesInside("by a name", [&] { return BindOrReach(type, name, false); });
@@ -630,7 +606,7 @@ TEST_P(ModuleEscapesOfAll, UnixSocketsOfOthers) {
 
 TEST_P(ModuleEscapesOfAll, UnixSocketsElsewhereOrOfAnotherKind) {
   Publish({"-u public stream grant"}, {About("", "rw")});
-  for (const int type : kSocketTypes) {
+  for (const int type : kUnixTypes) {
     const std::string end = "/made" + std::to_string(type);
     Refuses("elsewhere", [&] { return BindOrReach(type, At("secret") + end, true); });
     if (type != SOCK_STREAM)
@@ -670,14 +646,7 @@ TEST_P(ModuleEscapesOfAll, NewNamespaces) {
     if (child == 0) _exit(0);
     return child < 0 ? errno : ResultOf(static_cast<pid_t>(child));
   });
-  Refuses("clone3", [] {
-    clone_args arguments = {};
-    arguments.flags = CLONE_NEWUSER;
-    arguments.exit_signal = SIGCHLD;
-    const long child = syscall(SYS_clone3, &arguments, sizeof(arguments));
-    if (child == 0) _exit(0);
-    return child < 0 ? errno : ResultOf(static_cast<pid_t>(child));
-  });
+  Refuses("clone3", [] { return Clone(CLONE_NEWUSER); });
 }
 
 TEST_P(ModuleEscapesOfAll, SignalsToOthers) {

@@ -5,8 +5,10 @@
 #include <grp.h>
 #include <gtest/gtest.h>
 #include <linux/capability.h>
+#include <linux/sched.h>
 #include <sched.h>
 #include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -48,6 +50,16 @@ inline int ResultOf(pid_t child) {
   int status = 0;
   waitpid(child, &status, 0);
   return WIFEXITED(status) ? WEXITSTATUS(status) : 1000 + WTERMSIG(status);
+}
+
+// 0 or the error of a clone that ends at once.
+inline int Clone(std::uint64_t flags) {
+  clone_args arguments = {};
+  arguments.flags = flags;
+  arguments.exit_signal = SIGCHLD;
+  const long child = syscall(SYS_clone3, &arguments, sizeof(arguments));
+  if (child == 0) _exit(0);
+  return child < 0 ? errno : ResultOf(static_cast<pid_t>(child));
 }
 
 inline int InChild(const Act& act) {

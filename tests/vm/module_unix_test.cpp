@@ -4,11 +4,9 @@
 #include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include <cstddef>
 #include <cstring>
 #include <filesystem>
 #include <string>
@@ -16,6 +14,7 @@
 
 #include "host/enforce/supervise/file_descriptor.h"
 #include "vm/module_fixture.h"
+#include "vm/unix_sockets.h"
 
 namespace EnforceTest {
 namespace {
@@ -25,56 +24,13 @@ using Enforce::FileDescriptor;
 
 const Enforce::LabelNumbers kLabels = {{"red", 100}, {"blue", 101}};
 const std::string kTree = "/tmp/sockets";
-constexpr int kTypes[] = {SOCK_STREAM, SOCK_DGRAM, SOCK_SEQPACKET};
-
-// With a zero in front it is a name that is no path.
-struct Name {
-  sockaddr_un address = {};
-  socklen_t size = 0;
-
-  explicit Name(const std::string& name) {
-    address.sun_family = AF_UNIX;
-    memcpy(address.sun_path, name.data(), name.size());
-    size = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
-  }
-  const sockaddr* Get() const { return reinterpret_cast<const sockaddr*>(&address); }
-};
 
 const std::string kNameAlone("\0secpolicy-test", 15);
 
-FileDescriptor Open(int type) { return FileDescriptor(socket(AF_UNIX, type | SOCK_CLOEXEC, 0)); }
-
-int Bind(const FileDescriptor& made, const std::string& name) {
-  const Name asked(name);
-  return ErrorOf(bind(made.Number(), asked.Get(), asked.size));
-}
-
-// A socket that others can reach.
-FileDescriptor Serve(int type, const std::string& name) {
-  FileDescriptor made = Open(type);
-  EXPECT_EQ(Bind(made, name), 0) << name;
-  if (type != SOCK_DGRAM) {
-    EXPECT_EQ(listen(made.Number(), 50), 0);
-  }
-  return made;
-}
-
 int BindOnce(int type, const std::string& name) {
-  const int error = Bind(Open(type), name);
+  const int error = BindUnix(OpenUnix(type), name);
   if (error == 0) unlink(name.c_str());
   return error;
-}
-
-int Connect(int type, const std::string& name) {
-  const FileDescriptor made = Open(type);
-  const Name asked(name);
-  return ErrorOf(connect(made.Number(), asked.Get(), asked.size));
-}
-
-int Send(const std::string& name) {
-  const FileDescriptor made = Open(SOCK_DGRAM);
-  const Name asked(name);
-  return ErrorOf(sendto(made.Number(), "x", 1, MSG_DONTWAIT, asked.Get(), asked.size));
 }
 
 class ModuleUnixTest : public ModuleTest {
@@ -114,7 +70,7 @@ TEST_F(ModuleUnixTest, GivesPathsToSocketsOfGrantedKindsAlone) {
       {"stream", SOCK_STREAM}, {"dgram", SOCK_DGRAM}, {"seqpacket", SOCK_SEQPACKET}};
   for (const auto& [word, granted] : kinds) {
     Grant({std::string("-u red ") + word + " grant"});
-    for (const int type : kTypes) {
+    for (const int type : kUnixTypes) {
       SCOPED_TRACE(std::string(word) + " " + std::to_string(type));
       const Act inRed = [type] { return BindOnce(type, kTree + "/red/made"); };
       if (type == granted) {
@@ -136,7 +92,7 @@ TEST_F(ModuleUnixTest, GivesPathsToSocketsOfGrantedKindsAlone) {
 
 TEST_F(ModuleUnixTest, GivesPathsByRulesForThem) {
   Grant({"-r /tmp/sockets/plain w", "-r /tmp/sockets/red r", "-u red stream grant"});
-  for (const int type : kTypes) {
+  for (const int type : kUnixTypes) {
     ExpectGranted([type] { return BindOnce(type, kTree + "/plain/made"); });
     ExpectRefused([type] { return BindOnce(type, kTree + "/red/made"); });
   }
@@ -144,47 +100,47 @@ TEST_F(ModuleUnixTest, GivesPathsByRulesForThem) {
 }
 
 TEST_F(ModuleUnixTest, ReachesSocketsWhoseFilesItMayWrite) {
-  for (const int type : kTypes) {
+  for (const int type : kUnixTypes) {
     SCOPED_TRACE(type);
     for (const char* const name : {"red", "blue", "plain"}) fs::remove(kTree + "/" + name + "/s");
-    const FileDescriptor red = Serve(type, kTree + "/red/s");
-    const FileDescriptor blue = Serve(type, kTree + "/blue/s");
-    const FileDescriptor plain = Serve(type, kTree + "/plain/s");
+    const FileDescriptor red = ServeUnix(type, kTree + "/red/s");
+    const FileDescriptor blue = ServeUnix(type, kTree + "/blue/s");
+    const FileDescriptor plain = ServeUnix(type, kTree + "/plain/s");
     Grant({"-a red write grant", "-a blue read grant"});
-    ExpectGranted([type] { return Connect(type, kTree + "/red/s"); });
-    ExpectRefused([type] { return Connect(type, kTree + "/blue/s"); });
+    ExpectGranted([type] { return ConnectUnix(type, kTree + "/red/s"); });
+    ExpectRefused([type] { return ConnectUnix(type, kTree + "/blue/s"); });
     Grant({"-r /tmp/sockets/plain w", "-r /tmp/sockets/red r", "-a red write grant"});
-    ExpectGranted([type] { return Connect(type, kTree + "/plain/s"); });
-    ExpectRefused([type] { return Connect(type, kTree + "/red/s"); });
+    ExpectGranted([type] { return ConnectUnix(type, kTree + "/plain/s"); });
+    ExpectRefused([type] { return ConnectUnix(type, kTree + "/red/s"); });
   }
 }
 
 TEST_F(ModuleUnixTest, SendsToSocketsWhoseFilesItMayWrite) {
-  const FileDescriptor red = Serve(SOCK_DGRAM, kTree + "/red/s");
-  const FileDescriptor blue = Serve(SOCK_DGRAM, kTree + "/blue/s");
+  const FileDescriptor red = ServeUnix(SOCK_DGRAM, kTree + "/red/s");
+  const FileDescriptor blue = ServeUnix(SOCK_DGRAM, kTree + "/blue/s");
   Grant({"-a red write grant"});
-  ExpectGranted([] { return Send(kTree + "/red/s"); });
-  ExpectRefused([] { return Send(kTree + "/blue/s"); });
+  ExpectGranted([] { return SendUnix(kTree + "/red/s"); });
+  ExpectRefused([] { return SendUnix(kTree + "/blue/s"); });
 }
 
 TEST_F(ModuleUnixTest, ReachesNamesAloneWithinTheDomain) {
   Grant({});
-  for (const int type : kTypes) {
+  for (const int type : kUnixTypes) {
     SCOPED_TRACE(type);
-    const FileDescriptor outside = Serve(type, kNameAlone);
-    ExpectRefused([type] { return Connect(type, kNameAlone); });
-    if (type == SOCK_DGRAM) ExpectRefused([] { return Send(kNameAlone); });
+    const FileDescriptor outside = ServeUnix(type, kNameAlone);
+    ExpectRefused([type] { return ConnectUnix(type, kNameAlone); });
+    if (type == SOCK_DGRAM) ExpectRefused([] { return SendUnix(kNameAlone); });
     ExpectGranted([type] {
       const std::string own("\0secpolicy-own", 14);
-      const FileDescriptor inside = Serve(type, own);
-      return Connect(type, own);
+      const FileDescriptor inside = ServeUnix(type, own);
+      return ConnectUnix(type, own);
     });
   }
 }
 
 TEST_F(ModuleUnixTest, SendsByPairs) {
   Grant({});
-  for (const int type : kTypes) {
+  for (const int type : kUnixTypes) {
     int pair[2];
     ASSERT_EQ(socketpair(AF_UNIX, type | SOCK_CLOEXEC, 0, pair), 0);
     const FileDescriptor one(pair[0]);
