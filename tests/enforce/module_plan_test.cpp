@@ -169,6 +169,15 @@ TEST(FatesByModule, TellsWhatItDoesNotKeepInOrder) {
                   "hook)"));
 }
 
+TEST(PlanModule, TellsSmallValuesAsBits) {
+  const auto plan =
+      PlanModule({DomainOf({"-p socket_family 1 3 grant", "-p socket_family 63 64 grant"})}, kLast);
+  const auto& family = plan[0].rules.checks[Enforce::kCheckFamily];
+  EXPECT_EQ(family.small, 1ULL << 63 | 0b1110U);
+  EXPECT_EQ(family.count, 2U);
+  EXPECT_EQ(plan[0].rules.checks[Enforce::kCheckUser].small, ~0ULL);
+}
+
 TEST(PlanModule, LetsWhoNamesItTypeIntoTerminals) {
   const auto checksOf = [](const std::string& rule) {
     return PlanModule({DomainOf({rule})}, kLast)[0].rules.checks[Enforce::kCheckIoctl];

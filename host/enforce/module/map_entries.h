@@ -19,9 +19,9 @@ enum {
 // The levels of a domain. One that there is not refuses what an enforcing one without rules does.
 enum { kLevelAbsent, kLevelEnforcing, kLevelPermissive, kLevelDisabled };
 
-// A domain in 64 bits, which change at once: its level in the lower half, and in the upper one in
-// which of its two entries its rules are.
-enum { kEntryShift = 32, kEntriesOfDomain = 2 };
+// A domain in 64 bits, which change at once: its level in the lowest ones, then whether any of its
+// rules is about a path, and in the upper half in which of its two entries its rules are.
+enum { kLevelMask = 0xff, kDomainHasPaths = 1 << 8, kEntryShift = 32, kEntriesOfDomain = 2 };
 
 // The parameter checks that are kept.
 enum {
@@ -40,7 +40,7 @@ enum {
 // Another check, whose value is a mask.
 enum { kCheckFlags = 64 };
 
-enum { kMostModuleRanges = 32 };
+enum { kMostModuleRanges = 32, kSmallValues = 64 };
 
 enum { kBytesOfEvents = 1 << 20 };
 
@@ -63,8 +63,9 @@ struct ModuleRange {
 
 // The values that pass, in their order. The last range is there as often as there is room.
 struct ModuleCheck {
-  __u32 count;
+  __u64 small;  // of those below kSmallValues the same as bits, which is found sooner
   struct ModuleRange ranges[kMostModuleRanges];
+  __u32 count;
 };
 
 struct ModuleRules {

@@ -16,6 +16,8 @@
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <string>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -26,6 +28,7 @@
 #include "host/enforce/module/label_learning.h"
 #include "host/enforce/module/label_writing.h"
 #include "host/enforce/module/module_maps.h"
+#include "host/enforce/module/program_loading.h"
 #include "module_programs.skel.h"
 
 using Braxo::Lib::BraxoException;
@@ -82,8 +85,6 @@ void RequireFileSystem() {
   }
 }
 
-bool HasHook(const char* name) { return libbpf_find_vmlinux_btf_id(name, BPF_LSM_MAC) > 0; }
-
 // The first line of a file; empty where there is none.
 std::string LineOf(const char* path) {
   std::ifstream file(path);
@@ -113,25 +114,21 @@ void RequireNotLockedDown() {
   }
 }
 
-// Those that are only loaded where it has are marked so in their section.
-void LoadWhatTheKernelHasHooksFor(bpf_object& programs) {
-  bpf_program* program = nullptr;
-  while ((program = bpf_object__next_program(&programs, program)) != nullptr) {
-    const std::string hook = bpf_program__section_name(program);
-    const bool isLoaded = bpf_program__autoload(program);
-    bpf_program__set_autoload(program,
-                              isLoaded || HasHook(hook.substr(hook.find('/') + 1).c_str()));
-  }
-}
+// The programs, and what holds functions in them that they share.
+struct Running {
+  Programs programs;
+  std::unordered_map<std::string, FileDescriptor> links;
+};
 
-Programs LoadAndAttach() {
+Running LoadAndAttach() {
   libbpf_set_print(nullptr);
-  Programs programs(module_programs__open());
-  Require(programs != nullptr, "cannot read the programs");
-  LoadWhatTheKernelHasHooksFor(*programs->obj);
-  Require(module_programs__load(programs.get()) == 0, "cannot load the programs");
-  Require(module_programs__attach(programs.get()) == 0, "cannot attach the programs");
-  return programs;
+  ProgramLoading loading;
+  Running running = {.programs = Programs(module_programs__open()), .links = {}};
+  Require(running.programs != nullptr, "cannot read the programs");
+  loading.Load(*running.programs->skeleton);
+  running.links = loading.Share();
+  Require(module_programs__attach(running.programs.get()) == 0, "cannot attach the programs");
+  return running;
 }
 
 std::unique_ptr<ModuleMaps> MapsOf(module_programs& programs) {
@@ -157,12 +154,17 @@ void RequireRefusal(ModuleMaps& maps) {
   }
 }
 
-void Pin(module_programs& programs) {
+void Pin(const Running& running) {
+  const module_programs& programs = *running.programs;
   Require(mkdir(kNewPins, 0700) == 0, kNewPins);
   for (const auto& [name, map] : kMaps) {
     const std::string path = StrCat(kNewPins, "/", name);
     Require(bpf_obj_pin(bpf_object__find_map_fd_by_name(programs.obj, name), path.c_str()) == 0,
             path.c_str());
+  }
+  for (const auto& [name, link] : running.links) {
+    const std::string path = StrCat(kNewPins, "/", name);
+    Require(bpf_obj_pin(link.Number(), path.c_str()) == 0, path.c_str());
   }
   const bpf_object_skeleton& skeleton = *programs.skeleton;
   for (int index = 0; index < skeleton.prog_cnt; ++index) {
@@ -200,12 +202,12 @@ Module Module::Start() {
   RequireFileSystem();
   if (std::filesystem::exists(kModulePins)) throw BraxoException("the module: it runs already");
   Remove(kNewPins);
-  const Programs programs = LoadAndAttach();
-  std::unique_ptr<ModuleMaps> maps = MapsOf(*programs);
+  const Running running = LoadAndAttach();
+  std::unique_ptr<ModuleMaps> maps = MapsOf(*running.programs);
   ChooseHashing(*maps);
   RequireRefusal(*maps);
   try {
-    Pin(*programs);
+    Pin(running);
   } catch (const BraxoException&) {
     Remove(kNewPins);
     throw;

@@ -21,8 +21,8 @@ namespace {
 
 constexpr std::size_t kBytesOfWords = kDomainEntries * sizeof(std::uint64_t);
 
-void Store(std::uint64_t& word, std::uint64_t entry, unsigned int level) {
-  std::atomic_ref(word).store(entry << kEntryShift | level, std::memory_order_release);
+void Store(std::uint64_t& word, std::uint64_t value) {
+  std::atomic_ref(word).store(value, std::memory_order_release);
 }
 
 std::uint64_t Load(std::uint64_t& word) {
@@ -93,18 +93,20 @@ __u32 ModuleMaps::NextEntryOf(unsigned int domain) const {
 }
 
 unsigned int ModuleMaps::LevelOf(unsigned int domain) const {
-  return static_cast<__u32>(Load(words[domain]));
+  return static_cast<unsigned int>(Load(words[domain]) & kLevelMask);
 }
 
 void ModuleMaps::Write(unsigned int domain, const ModuleRules& newRules, unsigned int level) {
   const __u32 unused = NextEntryOf(domain);
   Require(bpf_map_update_elem(rules.Number(), &unused, &newRules, BPF_ANY) == 0,
           "cannot write rules");
-  Store(words[domain], unused, level);
+  const std::uint64_t hasPaths = newRules.hasPaths != 0 ? kDomainHasPaths : 0;
+  Store(words[domain], static_cast<std::uint64_t>(unused) << kEntryShift | hasPaths | level);
 }
 
 void ModuleMaps::WriteLevel(unsigned int domain, unsigned int level) {
-  Store(words[domain], EntryOf(domain), level);
+  const std::uint64_t others = Load(words[domain]) & ~std::uint64_t{kLevelMask};
+  Store(words[domain], others | level);
 }
 
 void ModuleMaps::Place(pid_t process, unsigned int domain) const {

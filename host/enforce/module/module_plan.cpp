@@ -75,6 +75,8 @@ ModuleCheck CheckOf(const ValueSet& passing) {
   for (const auto& [first, last] : passing.Ranges()) check.ranges[check.count++] = {first, last};
   const std::span ranges(check.ranges);
   std::ranges::fill(ranges.subspan(check.count), ranges[check.count - 1]);
+  for (unsigned int value = 0; value < kSmallValues; ++value)
+    check.small |= std::uint64_t{passing.Has(value)} << value;
   return check;
 }
 

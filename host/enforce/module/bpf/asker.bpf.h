@@ -1,41 +1,45 @@
-// Who asks for something that rules about labels and paths speak of, and by which rules.
+// Who asks for something that rules speak of, and by which rules.
 #ifndef ASKER_BPF_H
 #define ASKER_BPF_H
 
-#include "calls.bpf.h"
+#include "refusal.bpf.h"
 
 // Rules that grant nothing: those of a domain that there is not.
 #define NO_ENTRY (~0U)
 
 struct Asker {
   __u32 domain;
-  __u32 level;
-  __u32 entry;
-  struct ModuleRules* granted;
+  __u64 word;  // of the domain
 };
 
 static __always_inline void ask_for(struct Asker* asker, __u32 domain) {
-  __u64 word = word_of(domain);
   asker->domain = domain;
-  asker->level = level_of(word);
-  asker->granted = rules_of(word);
-  asker->entry = asker->granted ? word >> kEntryShift : NO_ENTRY;
+  asker->word = word_of(domain);
+}
+
+static __always_inline bool is_free(struct Asker* asker) {
+  return level_of(asker->word) == kLevelDisabled;
 }
 
 // False for who may do everything.
 static __always_inline bool is_asked(struct Asker* asker) {
-  struct ModuleTask* task = current_task();
-  if (!task) return false;
-  ask_for(asker, task->domain);
-  return asker->level != kLevelDisabled;
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return false;
+  ask_for(asker, domain);
+  return !is_free(asker);
 }
 
-static __always_inline bool has_paths(struct Asker* asker) {
-  return asker->granted && asker->granted->hasPaths;
+static __always_inline __u32 entry_of(__u64 word) {
+  return level_of(word) == kLevelAbsent ? NO_ENTRY : word >> kEntryShift;
 }
 
-static __always_inline int judge_call_of(struct Asker* asker) {
-  return judge_call(asker->domain, asker->level, asker->granted);
+static __always_inline int refuse_asker(struct Asker* asker, struct ModuleAct asked) {
+  return refuse(asker->domain, level_of(asker->word), asked);
+}
+
+static __always_inline int refuse_asker_path(struct Asker* asker, struct ModuleAct asked,
+                                             struct path* path) {
+  return refuse_path(asker->domain, level_of(asker->word), &asked, path);
 }
 
 #endif

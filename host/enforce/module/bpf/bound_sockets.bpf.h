@@ -42,9 +42,9 @@ static __always_inline bool note_kind(int type) {
 }
 
 static __always_inline int note_unix_binding(struct socket* socket, struct sock* sock) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  return note_namer(sock, task->domain) && note_kind(socket->type) ? 0 : -ENOMEM;
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  return note_namer(sock, domain) && note_kind(socket->type) ? 0 : -ENOMEM;
 }
 
 // 0 where no socket is bound, as the file of one can be made for itself.

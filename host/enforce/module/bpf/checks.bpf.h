@@ -2,7 +2,7 @@
 #ifndef CHECKS_BPF_H
 #define CHECKS_BPF_H
 
-#include "refusal.bpf.h"
+#include "calls.bpf.h"
 
 // Whoever asks for no change of its own is told so by this hook, and the kernel goes on.
 #define NOT_HANDLED (-ENOSYS)
@@ -19,6 +19,7 @@
 // for without branches, as the kernel would look through what follows each of them.
 static __always_inline bool passes(struct ModuleCheck* check, __u32 value) {
   __u64 at = 0;
+  if (value < kSmallValues) return check->small >> value & 1;
 #pragma clang loop unroll(full)
   for (__u64 step = kMostModuleRanges / 2; step; step /= 2) {
     __u64 first = check->ranges[(at + step) % kMostModuleRanges].first;
@@ -30,22 +31,26 @@ static __always_inline bool passes(struct ModuleCheck* check, __u32 value) {
   return check->count && value >= range->first && value <= range->last;
 }
 
-static __always_inline int judge_value(__u32 domain, __u32 level, struct ModuleRules* granted,
+static __always_inline int judge_value(struct Asker* asker, struct ModuleRules* granted,
                                        __u32 check, __u32 value) {
   __u64 index = check;
   // What is compared and what is used are the same for the verifier then.
   asm volatile("" : "+r"(index));
   if (granted && index < kModuleChecks && passes(&granted->checks[index], value)) return 0;
-  return refuse(domain, level, act(kActPassValue, check, value));
+  return refuse_asker(asker, act(kActPassValue, check, value));
+}
+
+static __always_inline int check_value_in(__u32 domain, __u32 check, __u32 value) {
+  struct Asker asker = {};
+  ask_for(&asker, domain);
+  struct ModuleRules* granted = rules_of(asker.word);
+  int result = judge_call(&asker, granted);
+  return result ? result : judge_value(&asker, granted, check, value);
 }
 
 __noinline int judge_call_and_value(__u32 check, __u32 value) {
   struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  __u64 word = word_of(task->domain);
-  struct ModuleRules* granted = rules_of(word);
-  int result = judge_call(task->domain, level_of(word), granted);
-  return result ? result : judge_value(task->domain, level_of(word), granted, check, value);
+  return task ? check_value_in(task->domain, check, value) : 0;
 }
 
 static __always_inline int check_value(__u32 check, __u32 value) {
@@ -54,18 +59,18 @@ static __always_inline int check_value(__u32 check, __u32 value) {
 
 // What a descriptor that is ready sends to its owner. All that the kernel takes for a signal is
 // asked.
-static __always_inline int check_owned(__u64 signal) {
-  struct ModuleTask* task = current_task();
-  if (!task || signal > kMostSignals) return 0;
-  __u64 word = word_of(task->domain);
-  struct ModuleRules* granted = rules_of(word);
+__noinline int judge_owned(__u64 signal) {
+  struct Asker asker = {};
+  if (signal > kMostSignals || !is_asked(&asker)) return 0;
+  struct ModuleRules* granted = rules_of(asker.word);
   if (granted && granted->ownedSignals >> ((signal - 1) & 63) & 1) return 0;
-  return refuse(task->domain, level_of(word), act(kActPassValue, kCheckSignal, signal));
+  return refuse_asker(&asker, act(kActPassValue, kCheckSignal, signal));
 }
 
+static __always_inline int check_owned(__u64 signal) { return judge_owned(signal) ? -EPERM : 0; }
+
 static __always_inline int check_owner(void) {
-  int result = check_owned(SIGIO);
-  return result ? result : check_owned(SIGURG);
+  return judge_owned(SIGIO) || judge_owned(SIGURG) ? -EPERM : 0;
 }
 
 // Of who asks in the name of another the current process knows nothing. Newer verifiers take that
@@ -98,16 +103,14 @@ static __always_inline bool is_about_owner(__u32 request) {
 
 SEC("lsm/file_ioctl")
 int BPF_PROG(use_ioctl, struct file* file, unsigned int request, unsigned long argument) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  __u64 word = word_of(task->domain);
-  struct ModuleRules* granted = rules_of(word);
-  int result = judge_call(task->domain, level_of(word), granted);
+  struct Asker asker = {};
+  if (!is_asked(&asker)) return 0;
+  struct ModuleRules* granted = rules_of(asker.word);
+  int result = judge_call(&asker, granted);
   if (result) return result;
   if (granted && passes(&granted->checks[kCheckIoctl], request))
     return is_about_owner(request) ? check_owner() : 0;
-  return refuse_path(task->domain, level_of(word), act(kActPassValue, kCheckIoctl, request),
-                     &file->f_path);
+  return refuse_asker_path(&asker, act(kActPassValue, kCheckIoctl, request), &file->f_path);
 }
 
 // Calls of programs for 32 bits, which older kernels hand to the other hook.

@@ -51,11 +51,10 @@ static __always_inline __u64 tag_of_file(struct dentry* entry, __u32 rules_entry
   return mix(tag, (__u64)system << 32 | rules_entry, how->multiplier);
 }
 
-static __always_inline __u64 tag_of_decision(const struct path* path, __u32 rules_entry,
-                                             bool is_by_path, __u64 now,
+static __always_inline __u64 tag_of_decision(const struct path* path, __u64 word, __u64 now,
                                              struct ModuleHashing* how) {
-  __u64 tag = tag_of_file(path->dentry, rules_entry, now, how);
-  if (tag && is_by_path) tag = tag_of_name(tag, path, how);
+  __u64 tag = tag_of_file(path->dentry, word >> kEntryShift, now, how);
+  if (tag && has_paths(word)) tag = tag_of_name(tag, path, how);
   return tag & ~(__u64)kAllUses;
 }
 

@@ -11,6 +11,9 @@
 
 #include "host/enforce/module/map_entries.h"
 
+// That of a process that is in none.
+enum { kNoDomain = 1U << 31 };
+
 struct {
   __uint(type, BPF_MAP_TYPE_ARRAY);
   __uint(map_flags, BPF_F_MMAPABLE);
@@ -50,12 +53,21 @@ static __always_inline struct ModuleTask* current_task(void) {
   return task_of(bpf_get_current_task_btf());
 }
 
+// That of the current process. The kernel looks through such functions once for all that call them
+// in a program, which is most of what it takes to start the module.
+__noinline __u32 current_domain(void) {
+  struct ModuleTask* task = current_task();
+  return task ? task->domain : kNoDomain;
+}
+
 static __always_inline __u64 word_of(__u32 domain) {
   __u64* word = bpf_map_lookup_elem(&domains, &domain);
   return word ? *(volatile __u64*)word : kLevelAbsent;
 }
 
-static __always_inline __u32 level_of(__u64 word) { return (__u32)word; }
+static __always_inline __u32 level_of(__u64 word) { return word & kLevelMask; }
+
+static __always_inline bool has_paths(__u64 word) { return word & kDomainHasPaths; }
 
 // Null of a domain that there is not.
 static __always_inline struct ModuleRules* rules_of(__u64 word) {

@@ -35,29 +35,28 @@ static __always_inline struct ModuleTask* own_task(bool* is_placed) {
 // Whoever traces a process, shares what it sees of the file system or has chosen that for it would
 // have the next domain do what he wants; and what may get no more privileges gets none.
 static __always_inline bool is_controlled(struct linux_binprm* program) {
-  struct vfsmount* mount = program->file->f_path.mnt;
-  const struct cred* credentials = bpf_get_current_task_btf()->cred;
-  return program->unsafe || mount->mnt_flags & MNT_NOSUID || credentials->user_ns->level;
+  struct task_struct* thread = bpf_get_current_task_btf();
+  return program->unsafe || BPF_CORE_READ(program, file, f_path.mnt, mnt_flags) & MNT_NOSUID ||
+         BPF_CORE_READ(thread, cred, user_ns, level);
 }
 
 // 0 where the program leads nowhere, else the domain, one higher.
 static __always_inline __u32 domain_behind(struct Asker* asker, __u32 label) {
-  struct ModuleLabelRules* rules = rules_for(asker->entry, label);
+  struct ModuleLabelRules* rules = rules_for(entry_of(asker->word), label);
   return rules ? rules->next : 0;
 }
 
-static __always_inline int refuse_entry(struct Asker* asker, struct file* file, __u32 label,
-                                        __u32 next) {
+static __always_inline struct ModuleAct entry_into(__u32 next, __u32 label) {
   struct ModuleAct asked = {kActEnter, 0, next - 1, label};
-  return refuse_path(asker->domain, asker->level, asked, &file->f_path);
+  return asked;
 }
 
-// What has no place in any file system no rule is about.
-static __always_inline int judge_program(struct Asker* asker, struct file* file) {
-  if (asker->level == kLevelDisabled) return 0;
-  __u32 rights = 0;
-  if (is_mounted(file->f_path.dentry)) return judge_open_file(asker, file, kUseExecute, &rights);
-  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, kUseExecute, kLabelUnknown));
+// By label and path. What has no place in any file system no rule is about.
+static __always_inline bool is_executable(struct Asker* asker, struct file* file) {
+  if (is_free(asker)) return true;
+  __u64 entry = entry_of_file(file);
+  if (!is_mounted((struct dentry*)entry)) return false;
+  return rights_for(mount_of_file(file), entry, asker->word) & kUseExecute;
 }
 
 SEC("lsm/bprm_creds_for_exec")
@@ -69,13 +68,16 @@ int BPF_PROG(choose_domain, struct linux_binprm* program) {
   struct Asker asker = {};
   ask_for(&asker, own->domain);
   struct file* file = program->file;
-  int result = judge_program(&asker, file);
-  if (result) return result;
-  __u32 label = label_of(number_of(file->f_path.dentry));
+  __u32 label = label_of(entry_of_file(file));
+  if (!is_executable(&asker, file)) {
+    struct ModuleAct asked = act_on_file(kActUseFile, kUseExecute, label);
+    int result = refuse_asker_path(&asker, asked, &file->f_path);
+    if (result) return result;
+  }
   __u32 next = domain_behind(&asker, label);
   if (!next) return 0;
   if (level_of(word_of(next - 1)) == kLevelAbsent || is_controlled(program))
-    return refuse_entry(&asker, file, label, next);
+    return refuse_asker_path(&asker, entry_into(next, label), &file->f_path);
   own->next = next;
   return bpf_bprm_opts_set(program, BPF_F_BPRM_SECUREEXEC) ? -EPERM : 0;
 }
@@ -113,7 +115,8 @@ int BPF_PROG(check_script, struct linux_binprm* program) {
   struct file* file = program->file;
   __u32 next = own->next;
   own->next = 0;
-  return refuse_entry(&asker, file, label_of(number_of(file->f_path.dentry)), next);
+  struct ModuleAct asked = entry_into(next, label_of(entry_of_file(file)));
+  return refuse_asker_path(&asker, asked, &file->f_path);
 }
 
 // From here on nothing of the former program is left, and this one cannot fail anymore.

@@ -76,37 +76,31 @@ static __always_inline __u32 rights_of(__u32 rules_entry, __u32 label, __u32 sai
   return granted & ~refused;
 }
 
-static __always_inline __u32 said_of(struct Asker* asker, __u64 mount, __u64 entry) {
-  return has_paths(asker) ? path_bits(mount, entry, asker->entry) : 0;
+static __always_inline __u32 said_of(__u64 word, __u64 mount, __u64 entry) {
+  return has_paths(word) ? path_bits(mount, entry, entry_of(word)) : 0;
 }
 
-// Of a file that is there: its rights in the lower half, its label in the upper one.
-static __always_inline __u64 rights_at(__u64 mount, __u64 entry, __u32 rules_entry,
-                                       __u32 is_by_path) {
+// What rules of the domain with this word give to a file that is there: its rights in the lower
+// half, its label in the upper one.
+__noinline __u64 rights_for(__u64 mount, __u64 entry, __u64 word) {
   __u32 label = label_of(entry);
-  __u32 said = is_by_path ? path_bits(mount, entry, rules_entry) : 0;
-  return (__u64)label << 32 | rights_of(rules_entry, label, said);
+  return (__u64)label << 32 | rights_of(entry_of(word), label, said_of(word, mount, entry));
 }
 
-static __always_inline __u64 rights_for(struct Asker* asker, __u64 mount, __u64 entry) {
-  return rights_at(mount, entry, asker->entry, has_paths(asker));
+static __always_inline __u64 mount_of_path(const struct path* path) {
+  return (__u64)BPF_CORE_READ(path, mnt);
 }
 
-static __always_inline int judge_file(struct Asker* asker, __u64 mount, __u64 entry, __u32 wanted) {
-  __u64 found = rights_for(asker, mount, entry);
-  if (!(wanted & ~(__u32)found)) return 0;
-  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, wanted, found >> 32));
+static __always_inline __u64 entry_of_path(const struct path* path) {
+  return (__u64)BPF_CORE_READ(path, dentry);
 }
 
-// The same in hooks that may ask for the path.
-static __always_inline int judge_open_file(struct Asker* asker, struct file* file, __u32 wanted,
-                                           __u32* rights) {
-  struct path* path = &file->f_path;
-  __u64 found = rights_for(asker, number_of(path->mnt), number_of(path->dentry));
-  *rights = found;
-  if (!(wanted & ~(__u32)found)) return 0;
-  return refuse_path(asker->domain, asker->level, act_on_file(kActUseFile, wanted, found >> 32),
-                     path);
+static __always_inline __u64 mount_of_file(struct file* file) {
+  return (__u64)BPF_CORE_READ(file, f_path.mnt);
+}
+
+static __always_inline __u64 entry_of_file(struct file* file) {
+  return (__u64)BPF_CORE_READ(file, f_path.dentry);
 }
 
 // Whether the current process may do something with a file that is there, by its label and by its
@@ -114,19 +108,23 @@ static __always_inline int judge_open_file(struct Asker* asker, struct file* fil
 __noinline int judge_use(__u64 mount, __u64 entry, __u32 wanted) {
   struct Asker asker = {};
   if (!is_asked(&asker) || !is_mounted((struct dentry*)entry)) return 0;
-  return judge_file(&asker, mount, entry, wanted);
+  __u64 found = rights_for(mount, entry, asker.word);
+  if (!(wanted & ~(__u32)found)) return 0;
+  return refuse_asker(&asker, act_on_file(kActUseFile, wanted, found >> 32));
 }
 
-static __always_inline int may_file(struct vfsmount* mount, struct dentry* entry, __u32 wanted) {
-  return judge_use(number_of(mount), number_of(entry), wanted) ? -EPERM : 0;
+static __always_inline int may_file(__u64 mount, __u64 entry, __u32 wanted) {
+  return judge_use(mount, entry, wanted) ? -EPERM : 0;
 }
 
 // The same in hooks that may ask for the path.
 static __always_inline int may_use(struct file* file, __u32 wanted) {
   struct Asker asker = {};
-  __u32 rights = 0;
-  if (!wanted || !is_asked(&asker) || !is_mounted(file->f_path.dentry)) return 0;
-  return judge_open_file(&asker, file, wanted, &rights);
+  __u64 entry = entry_of_file(file);
+  if (!wanted || !is_asked(&asker) || !is_mounted((struct dentry*)entry)) return 0;
+  __u64 found = rights_for(mount_of_file(file), entry, asker.word);
+  if (!(wanted & ~(__u32)found)) return 0;
+  return refuse_asker_path(&asker, act_on_file(kActUseFile, wanted, found >> 32), &file->f_path);
 }
 
 // ---- Making files
@@ -158,7 +156,7 @@ static __always_inline __u32 kind_of(__u32 mode) {
 
 // Nothing for that of the directory.
 static __always_inline __u32 new_label(struct Asker* asker, __u32 directory_label, __u32 kind) {
-  struct ModuleLabelRules* rules = rules_for(asker->entry, directory_label);
+  struct ModuleLabelRules* rules = rules_for(entry_of(asker->word), directory_label);
   __u64 index = kind;
   // What is compared and what is used are the same for the verifier then.
   asm volatile("" : "+r"(index));
@@ -176,11 +174,11 @@ static __always_inline struct ModuleAct making_of(__u32 kind, __u32 above) {
 __noinline __u64 judge_making(__u64 mount, __u64 directory, __u64 entry, __u32 kind) {
   struct Asker asker = {};
   if (!is_asked(&asker)) return 0;
-  __u32 above = label_of_directory(directory);
-  __u32 rights = rights_of(asker.entry, above, said_of(&asker, mount, entry));
+  __u32 above = label_of(directory);
+  __u32 rights = rights_of(entry_of(asker.word), above, said_of(asker.word, mount, entry));
   __u32 wanted = kind == kMakeSomeSocket ? kMayMakeSocket : 1U << (kMakeShift + (kind & 15));
   __u64 label = new_label(&asker, above, kind);
-  bool is_refused = wanted & ~rights && refuse(asker.domain, asker.level, making_of(kind, above));
+  bool is_refused = wanted & ~rights && refuse_asker(&asker, making_of(kind, above));
   return label << 32 | is_refused;
 }
 
@@ -208,16 +206,16 @@ static __always_inline int keep_label(__u64 entry, __u64 name, __u32 label) {
 }
 
 static __always_inline int make(const struct path* parent, struct dentry* entry, __u32 mode) {
-  if (!current_task()) return 0;
-  __u64 place = number_of(entry);
-  __u64 mount = number_of(parent->mnt);
-  __u64 directory = number_of(parent->dentry);
-  __u64 name = entry->d_name.hash;
-  int result = check_call();
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  int result = check_call_in(domain);
   if (result) return result;
+  __u64 place = number_of(entry);
+  __u64 name = entry->d_name.hash;
   __u32 kind = kind_of(mode);
   __u32 bound = kind == kMakeSomeSocket ? take_binding() : 0;
-  __u64 judged = judge_making(mount, directory, place, bound ? kMakeFirstSocket + bound - 1 : kind);
+  __u64 judged = judge_making(mount_of_path(parent), entry_of_path(parent), place,
+                              bound ? kMakeFirstSocket + bound - 1 : kind);
   return (__u32)judged ? -EPERM : keep_label(place, name, judged >> 32);
 }
 
@@ -271,19 +269,6 @@ static __always_inline bool is_to_write_past(struct file* file) {
   return (inode->i_mode & S_IFMT) == S_IFBLK || names_helper(number_of(file), inode->i_sb->s_magic);
 }
 
-// A file that has no name yet: whoever opens it makes it.
-static __always_inline int make_nameless(struct file* file) {
-  struct dentry* entry = file->f_path.dentry;
-  __u64 judged = judge_making(number_of(file->f_path.mnt), number_of(entry->d_parent),
-                              number_of(entry), kMakeRegular);
-  if ((__u32)judged) return -EPERM;
-  __u32 label = judged >> 32;
-  if (!label) return 0;
-  if (!has_room()) return -ENOSPC;
-  give_label(file->f_inode, label);
-  return 0;
-}
-
 // Whether that is what the domain was allowed before. Of what it depends on, the tag is kept.
 static __always_inline bool may_open_again(struct task_struct* thread, __u32 domain,
                                            struct file* file, __u64* tag) {
@@ -295,21 +280,43 @@ static __always_inline bool may_open_again(struct task_struct* thread, __u32 dom
   struct ModuleRules* granted = rules_of(word);
   if (!granted || !is_call_granted(granted, call_of(thread)) || is_to_write_past(file))
     return false;
-  *tag = tag_of_decision(&file->f_path, word >> kEntryShift, granted->hasPaths, now, how);
+  *tag = tag_of_decision(&file->f_path, word, now, how);
   return was_granted(*tag, wanted_of(file));
 }
 
-static __always_inline int judge_opening(struct Asker* asker, struct file* file, __u64 tag) {
-  if (is_to_write_past(file))
-    return refuse_path(asker->domain, asker->level, act(kActReachModule, 0, 0), &file->f_path);
-  if (!is_mounted(file->f_path.dentry)) return 0;
-  int result = file->f_flags & O_TMPFILE_FLAG ? make_nameless(file) : 0;
-  __u32 wanted = wanted_of(file);
-  if (result || !wanted) return result;
-  __u32 rights = 0;
-  result = judge_open_file(asker, file, wanted, &rights);
-  remember_rights(tag, rights);
-  return result;
+// A file that has no name yet: whoever opens it makes it.
+static __always_inline int make_nameless(struct file* file) {
+  struct dentry* entry = (struct dentry*)entry_of_file(file);
+  __u64 judged = judge_making(mount_of_file(file), (__u64)BPF_CORE_READ(entry, d_parent),
+                              (__u64)entry, kMakeRegular);
+  if ((__u32)judged) return -EPERM;
+  __u32 label = judged >> 32;
+  if (!label) return 0;
+  if (!has_room()) return -ENOSPC;
+  give_label(BPF_CORE_READ(file, f_inode), label);
+  return 0;
+}
+
+// What of all that is wanted the domain with this word may not do with a file that somebody opens:
+// 0 where it may; above that the label. The rights are kept by the tag.
+__noinline __u64 judge_opening(__u64 number, __u64 word, __u64 tag, __u32 wanted) {
+  struct file* file = (struct file*)number;
+  __u64 entry = entry_of_file(file);
+  if (!wanted || !is_mounted((struct dentry*)entry)) return 0;
+  __u64 found = rights_for(mount_of_file(file), entry, word);
+  remember_rights(tag, found);
+  return wanted & ~found ? found >> 32 << 32 | wanted : 0;
+}
+
+static __always_inline int open_anew(struct Asker* asker, struct file* file, __u64 tag) {
+  struct ModuleAct asked = act(kActReachModule, 0, 0);
+  if (!is_to_write_past(file)) {
+    int result = file->f_flags & O_TMPFILE_FLAG ? make_nameless(file) : 0;
+    __u64 judged = result ? 0 : judge_opening(number_of(file), asker->word, tag, wanted_of(file));
+    if (!judged) return result;
+    asked = act_on_file(kActUseFile, judged, judged >> 32);
+  }
+  return refuse_asker_path(asker, asked, &file->f_path);
 }
 
 SEC("lsm/file_open")
@@ -322,10 +329,10 @@ int BPF_PROG(open_file, struct file* file) {
   if (!is_to_execute && may_open_again(thread, task->domain, file, &tag)) return 0;
   struct Asker asker = {};
   ask_for(&asker, is_to_execute ? domain_to_execute(task) : task->domain);
-  if (asker.level == kLevelDisabled) return 0;
+  if (is_free(&asker)) return 0;
   // By which call a domain is executed in is asked of the one that is left.
-  int result = asker.domain == task->domain ? judge_call_of(&asker) : 0;
-  return result ? result : judge_opening(&asker, file, tag);
+  int result = asker.domain == task->domain ? judge_call(&asker, rules_of(asker.word)) : 0;
+  return result ? result : open_anew(&asker, file, tag);
 }
 
 SEC("lsm/file_receive")
@@ -340,52 +347,56 @@ int BPF_PROG(map_file, struct file* file, unsigned long asked, unsigned long pro
 SEC("lsm/file_mprotect")
 int BPF_PROG(protect_mapping, struct vm_area_struct* area, unsigned long asked,
              unsigned long protection) {
-  struct file* file = area->vm_file;
-  if (!file || !(protection & PROT_EXEC)) return 0;
-  return may_file(file->f_path.mnt, file->f_path.dentry, kUseExecute);
+  if (!(protection & PROT_EXEC)) return 0;
+  struct file* file = BPF_CORE_READ(area, vm_file);
+  return file ? may_file(mount_of_file(file), entry_of_file(file), kUseExecute) : 0;
 }
 
 SEC("lsm/path_truncate")
 int BPF_PROG(truncate_path, const struct path* path) {
-  return may_file(path->mnt, path->dentry, kUseTruncate);
+  return may_file(mount_of_path(path), entry_of_path(path), kUseTruncate);
 }
 
 // Of open files, which older kernels ask the other hook about.
 SEC("?lsm/file_truncate")
 int BPF_PROG(truncate_file, struct file* file) {
-  return may_file(file->f_path.mnt, file->f_path.dentry, kUseTruncate);
+  return may_file(mount_of_file(file), entry_of_file(file), kUseTruncate);
 }
 
 // Whoever watches a directory is told the names in it, and of a file what becomes of it; of a whole
 // mount or file system, all of that.
 SEC("lsm/path_notify")
 int BPF_PROG(watch_path, const struct path* path, __u64 mask, unsigned int is_of_more) {
-  if (!current_task()) return 0;
-  int result = check_call();
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  int result = check_call_in(domain);
   if (result) return result;
-  struct vfsmount* mount = path->mnt;
-  __u64 watched = is_of_more ? number_of(mount->mnt_root) : number_of(path->dentry);
+  __u64 mount = mount_of_path(path);
+  __u64 watched = is_of_more ? (__u64)BPF_CORE_READ(path, mnt, mnt_root) : entry_of_path(path);
   struct inode* inode = BPF_CORE_READ((struct dentry*)watched, d_inode);
-  __u32 wanted = inode && is_directory(inode) ? kUseList : kUseRead;
-  return judge_use(number_of(mount), watched, wanted) ? -EPERM : 0;
+  return may_file(mount, watched, inode && is_directory(inode) ? kUseList : kUseRead);
 }
 
 // ---- Removing and moving them
 
+// Whether the current process may take an entry away.
+static __always_inline int remove(const struct path* directory, struct dentry* entry) {
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  int result = check_call_in(domain);
+  if (result) return result;
+  result = protect_pins(entry);
+  return result ? result : may_file(mount_of_path(directory), number_of(entry), kUseRemove);
+}
+
 SEC("lsm/path_unlink")
 int BPF_PROG(remove_file, const struct path* directory, struct dentry* entry) {
-  if (!current_task()) return 0;
-  int result = check_call();
-  if (!result) result = protect_pins(entry);
-  return result ? result : may_file(directory->mnt, entry, kUseRemove);
+  return remove(directory, entry);
 }
 
 SEC("lsm/path_rmdir")
 int BPF_PROG(remove_directory, const struct path* directory, struct dentry* entry) {
-  if (!current_task()) return 0;
-  int result = check_call();
-  if (!result) result = protect_pins(entry);
-  return result ? result : may_file(directory->mnt, entry, kUseRemove);
+  return remove(directory, entry);
 }
 
 // A file, and the place that it is to have.
@@ -402,19 +413,18 @@ static __always_inline int judge_place(struct Asker* asker, struct Move* move,
                                        struct inode* inode) {
   __u32 label = label_of(move->entry);
   __u32* own = own_label(inode);
-  __u32 inherited = label_of_directory(move->directory);
+  __u32 inherited = label_of(move->directory);
   __u32 later = own && inherited != kLabelUnknown ? label_in(*own) : inherited;
-  __u32 said = said_of(asker, move->mount, move->entry);
-  __u32 said_later = said_of(asker, move->mount, move->place);
-  __u32 gained = rights_of(asker->entry, later, said_later) & ~rights_of(asker->entry, label, said);
+  __u32 said = said_of(asker->word, move->mount, move->entry);
+  __u32 said_later = said_of(asker->word, move->mount, move->place);
+  __u32 rules_entry = entry_of(asker->word);
+  __u32 gained = rights_of(rules_entry, later, said_later) & ~rights_of(rules_entry, label, said);
   if (!is_directory(inode)) {
     gained &= kAllUses;
   } else if ((said | said_later) & kPathIsAboveRule) {
     gained = kAllUses;
   }
-  return gained ? refuse(asker->domain, asker->level,
-                         act_on_file(kActUseFile, gained & kAllUses, label))
-                : 0;
+  return gained ? refuse_asker(asker, act_on_file(kActUseFile, gained & kAllUses, label)) : 0;
 }
 
 // Makes an entry of a file that there is. It keeps the label that it has.
@@ -433,28 +443,26 @@ static __always_inline int may_enter(__u64 mount, __u64 entry, __u64 directory, 
 
 SEC("lsm/path_link")
 int BPF_PROG(link_file, struct dentry* entry, const struct path* directory, struct dentry* place) {
-  if (!current_task()) return 0;
-  int result = check_call();
-  return result ? result
-                : may_enter(number_of(directory->mnt), number_of(entry),
-                            number_of(directory->dentry), number_of(place));
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  int result = check_call_in(domain);
+  if (result) return result;
+  return may_enter(mount_of_path(directory), number_of(entry), entry_of_path(directory),
+                   number_of(place));
 }
 
 SEC("lsm/path_rename")
 int BPF_PROG(move_file, const struct path* directory, struct dentry* entry,
              const struct path* new_directory, struct dentry* place, unsigned int flags) {
-  if (!current_task()) return 0;
-  int result = check_call();
-  if (!result) result = protect_pins(entry);
-  if (!result) result = may_file(directory->mnt, entry, kUseRemove);
-  if (!result && place->d_inode) result = may_file(directory->mnt, place, kUseRemove);
-  if (result) return result;
-  __u64 mount = number_of(directory->mnt);
+  if (current_domain() == kNoDomain) return 0;
+  __u64 mount = mount_of_path(directory);
   __u64 from = number_of(entry);
   __u64 to = number_of(place);
-  result = may_enter(mount, from, number_of(new_directory->dentry), to);
+  int result = remove(directory, entry);
+  if (!result && BPF_CORE_READ(place, d_inode)) result = may_file(mount, to, kUseRemove);
+  if (!result) result = may_enter(mount, from, entry_of_path(new_directory), to);
   if (result || !(flags & RENAME_EXCHANGE)) return result;
-  return may_enter(mount, to, number_of(directory->dentry), from);
+  return may_enter(mount, to, entry_of_path(directory), from);
 }
 
 #endif

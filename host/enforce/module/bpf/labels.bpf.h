@@ -150,7 +150,9 @@ __noinline __u32 label_of_directory(__u64 number) {
 }
 
 // Of a file that is there. kLabelUnknown where it cannot be told.
-__noinline __u32 label_of(__u64 number) {
+__weak __noinline __u32 label_of(__u64 entry) { return kLabelUnknown; }
+
+static __always_inline __u32 find_label_of(__u64 number) {
   struct dentry* entry = (struct dentry*)number;
   struct inode* inode = BPF_CORE_READ(entry, d_inode);
   if (!inode) return kLabelUnknown;

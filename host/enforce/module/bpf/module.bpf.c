@@ -16,5 +16,7 @@
 #include "tasks.bpf.h"
 #include "unix_sockets.bpf.h"
 
+#include "shared.bpf.h"
+
 // What the helpers take.
 char taken_license[] SEC("license") = "Dual MIT/GPL";

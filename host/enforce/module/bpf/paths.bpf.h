@@ -52,31 +52,6 @@ __noinline __u64 hash_of_name(__u64 name, __u32 length) {
   return search.hash;
 }
 
-// A step from an entry towards the root.
-struct Step {
-  struct mount* mount;
-  struct dentry* entry;
-  __u64 hash;  // of its name
-};
-
-enum { kStepName, kStepMount, kStepRoot, kStepNowhere };
-
-__noinline int step(struct Step* at) {
-  if (!at) return kStepNowhere;
-  struct mount* mount = at->mount;
-  struct dentry* entry = at->entry;
-  if (entry == BPF_CORE_READ(mount, mnt.mnt_root)) {
-    at->mount = BPF_CORE_READ(mount, mnt_parent);
-    at->entry = BPF_CORE_READ(mount, mnt_mountpoint);
-    return at->mount == mount ? kStepRoot : kStepMount;
-  }
-  at->entry = BPF_CORE_READ(entry, d_parent);
-  if (at->entry == entry) return kStepNowhere;
-  __u64 name = (__u64)BPF_CORE_READ(entry, d_name.name);
-  at->hash = hash_of_name(name, BPF_CORE_READ(entry, d_name.len));
-  return kStepName;
-}
-
 static __always_inline struct mount* mount_of(__u64 mount) {
   return (struct mount*)(mount - bpf_core_field_offset(struct mount, mnt));
 }
@@ -86,80 +61,93 @@ static __always_inline struct mnt_namespace* current_namespace(void) {
   return BPF_CORE_READ(thread, nsproxy, mnt_ns);
 }
 
-// A path from its end towards the root.
-struct PathSearch {
-  struct Step at;
+// A walk from the end of a path towards the root. First it finds the hash of the path, which is of
+// what leads to it the multiple, and its last name added to that; and then the longest leading part
+// that rules name.
+struct PathWalk {
+  struct mount* mount;
+  struct dentry* entry;
   struct ModulePathKey key;
-  __u64 weight;
   __u64 basis;
   __u64 factor;  // from one part of the path to the next
+  __u64 weight;  // of the next name in the hash; 0 when that is known, and parts are looked up
   __u32 found;
-  bool is_named;
   bool is_next;  // whether this part of the path was not looked up yet
+  bool is_named;
 };
 
-// The hash of a path: of what leads to it the multiple, and its last name added to that.
-static long hash_step(__u32 index, struct PathSearch* search) {
-  int kind = step(&search->at);
-  if (kind == kStepNowhere) return kEnd;
-  search->is_named = kind == kStepRoot;
-  if (search->is_named) search->key.hash += search->basis * search->weight;
-  if (kind == kStepName) {
-    search->key.hash += search->at.hash * search->weight;
-    search->weight *= search->factor;
-  }
-  return search->is_named ? kEnd : kGoOn;
+// Whether rules name this part.
+static __always_inline bool look_up(struct PathWalk* walk, __u32 steps) {
+  __u32* said = bpf_map_lookup_elem(&paths, &walk->key);
+  if (!said) return false;
+  if (!steps) walk->found = *said & kPathIsAboveRule;
+  if (!(*said & kPathHasRule)) return false;
+  walk->found |= *said & ~kPathIsAboveRule;
+  return true;
 }
 
-// Looks for the longest leading part that rules name.
-static long look_up_step(__u32 index, struct PathSearch* search) {
-  __u32* said = search->is_next ? bpf_map_lookup_elem(&paths, &search->key) : 0;
-  if (said && !index) search->found = *said & kPathIsAboveRule;
-  if (said && *said & kPathHasRule) {
-    search->found |= *said & ~kPathIsAboveRule;
-    return kEnd;
-  }
-  int kind = step(&search->at);
-  search->is_next = kind == kStepName;
-  if (search->is_next) search->key.hash = (search->key.hash - search->at.hash) * search->factor;
-  return kind == kStepName || kind == kStepMount ? kGoOn : kEnd;
+static __always_inline long leave_mount(struct PathWalk* walk, struct mount* mount) {
+  walk->mount = BPF_CORE_READ(mount, mnt_parent);
+  walk->entry = BPF_CORE_READ(mount, mnt_mountpoint);
+  walk->is_named = walk->mount == mount;
+  if (walk->is_named) walk->key.hash += walk->basis * walk->weight;
+  return walk->is_named ? kEnd : kGoOn;
 }
 
-// Of a path from the root of the mount namespace on; 0 where it is without a name, or in another
-// namespace, unless it may be in any.
-__noinline __u64 hash_of_path(__u64 mount, __u64 entry, __u64 is_in_any) {
+static long step(__u32 steps, struct PathWalk* walk) {
+  if (walk->is_next && look_up(walk, steps)) return kEnd;
+  struct mount* mount = walk->mount;
+  struct dentry* entry = walk->entry;
+  walk->is_next = false;
+  if (entry == BPF_CORE_READ(mount, mnt.mnt_root)) return leave_mount(walk, mount);
+  walk->entry = BPF_CORE_READ(entry, d_parent);
+  if (walk->entry == entry) return kEnd;
+  __u64 name =
+      hash_of_name((__u64)BPF_CORE_READ(entry, d_name.name), BPF_CORE_READ(entry, d_name.len));
+  walk->is_next = !walk->weight;
+  walk->key.hash =
+      walk->weight ? walk->key.hash + name * walk->weight : (walk->key.hash - name) * walk->factor;
+  walk->weight *= walk->factor;
+  return kGoOn;
+}
+
+// What the rules of the entry say of a path from the root of the mount namespace on. It is without
+// a name in another namespace, unless it may be in any.
+__weak __noinline __u32 find_path(__u64 mount, __u64 entry, __u64 rules_entry, __u64 is_in_any) {
+  return NO_NAME;
+}
+
+static __always_inline __u32 look_for_path(__u64 mount, __u64 entry, __u64 rules_entry,
+                                           __u64 is_in_any) {
   struct mount* mounted = mount_of(mount);
   struct ModuleHashing* how = how_to_hash();
-  if (!how) return 0;
-  struct PathSearch search = {.at = {mounted, (struct dentry*)entry, 0},
-                              .weight = 1,
-                              .basis = how->basis,
-                              .factor = how->multiplier};
-  if (!is_in_any && BPF_CORE_READ(mounted, mnt_ns) != current_namespace()) return 0;
-  bpf_loop(MOST_STEPS, hash_step, &search, 0);
-  return search.is_named ? search.key.hash : 0;
-}
-
-// What the rules of the entry say of the path that has this hash.
-__noinline __u32 find_path(__u64 mount, __u64 entry, __u64 rules_entry, __u64 hash) {
-  struct ModuleHashing* how = how_to_hash();
-  if (!hash || !how) return NO_NAME;
-  struct PathSearch search = {.at = {mount_of(mount), (struct dentry*)entry, 0},
-                              .key = {hash, rules_entry},
-                              .factor = how->inverse,
-                              .is_next = true};
-  bpf_loop(MOST_STEPS, look_up_step, &search, 0);
-  return search.found;
+  if (!how) return NO_NAME;
+  struct PathWalk walk = {.mount = mounted,
+                          .entry = (struct dentry*)entry,
+                          .key = {0, rules_entry},
+                          .basis = how->basis,
+                          .factor = how->multiplier,
+                          .weight = 1};
+  if (!is_in_any && BPF_CORE_READ(mounted, mnt_ns) != current_namespace()) return NO_NAME;
+  bpf_loop(MOST_STEPS, step, &walk, 0);
+  if (!walk.is_named) return NO_NAME;
+  walk.mount = mounted;
+  walk.entry = (struct dentry*)entry;
+  walk.factor = how->inverse;
+  walk.weight = 0;
+  walk.is_next = true;
+  bpf_loop(MOST_STEPS, step, &walk, 0);
+  return walk.found;
 }
 
 // What the rules of the entry say of a file, or of one that is to be made.
 static __always_inline __u32 path_bits(__u64 mount, __u64 entry, __u32 rules_entry) {
-  return find_path(mount, entry, rules_entry, hash_of_path(mount, entry, 0));
+  return find_path(mount, entry, rules_entry, 0);
 }
 
 // The same of a file that is there, in whichever mount namespace.
 static __always_inline __u32 path_bits_anywhere(__u64 mount, __u64 entry, __u32 rules_entry) {
-  return find_path(mount, entry, rules_entry, hash_of_path(mount, entry, 1));
+  return find_path(mount, entry, rules_entry, 1);
 }
 
 #endif

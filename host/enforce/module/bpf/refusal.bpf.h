@@ -47,24 +47,24 @@ static __always_inline struct ModuleAct act_on_file(__u32 kind, __u32 detail, __
   return asked;
 }
 
-static __always_inline void describe(struct ModuleEvent* event, __u32 domain, __u32 level,
-                                     struct ModuleAct asked) {
+static __noinline void describe(struct ModuleEvent* event, __u32 domain, __u32 level,
+                                struct ModuleAct* asked) {
   struct task_struct* thread = bpf_get_current_task_btf();
   event->time = bpf_ktime_get_boot_ns();
   event->started = BPF_CORE_READ(thread, group_leader, start_boottime);
-  event->value = asked.value;
+  event->value = asked->value;
   event->process = bpf_get_current_pid_tgid() >> 32;
   event->parent = BPF_CORE_READ(thread, real_parent, tgid);
   event->user = (__u32)bpf_get_current_uid_gid();
   event->domain = domain;
-  event->act = asked.kind;
-  event->detail = asked.detail;
-  event->label = asked.label;
+  event->act = asked->kind;
+  event->detail = asked->detail;
+  event->label = asked->label;
   event->isRefused = is_enforced(level);
   bpf_get_current_comm(event->program, sizeof(event->program));
 }
 
-static __always_inline bool tell(__u32 domain, __u32 level, struct ModuleAct asked) {
+static __always_inline bool tell(__u32 domain, __u32 level, struct ModuleAct* asked) {
   struct ModuleEvent* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
   if (!event) return false;
   describe(event, domain, level, asked);
@@ -73,7 +73,7 @@ static __always_inline bool tell(__u32 domain, __u32 level, struct ModuleAct ask
 }
 
 // Most paths are short, and then many events have room.
-static __always_inline bool tell_path(__u32 domain, __u32 level, struct ModuleAct asked,
+static __always_inline bool tell_path(__u32 domain, __u32 level, struct ModuleAct* asked,
                                       struct path* path) {
   struct EventWithShortPath* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
   if (!event) return false;
@@ -91,25 +91,6 @@ static __always_inline bool tell_path(__u32 domain, __u32 level, struct ModuleAc
   return true;
 }
 
-// A path that is known already, of `length` bytes without its zero.
-static __always_inline bool tell_text(__u32 domain, __u32 level, struct ModuleAct asked,
-                                      const char* path, __u32 length) {
-  if (length < kBytesOfShortPath) {
-    struct EventWithShortPath* event = bpf_ringbuf_reserve(&events, sizeof(*event), 0);
-    if (!event) return false;
-    bpf_probe_read_kernel_str(event->path, sizeof(event->path), path);
-    describe(&event->event, domain, level, asked);
-    bpf_ringbuf_submit(event, 0);
-    return true;
-  }
-  struct EventWithPath* longer = bpf_ringbuf_reserve(&events, sizeof(*longer), 0);
-  if (!longer) return false;
-  bpf_probe_read_kernel_str(longer->path, sizeof(longer->path), path);
-  describe(&longer->event, domain, level, asked);
-  bpf_ringbuf_submit(longer, 0);
-  return true;
-}
-
 // What comes of an act that the rules of a domain of this level refuse.
 static __always_inline int count(__u32 domain, __u32 level, bool is_told) {
   struct ModuleRefusals* counts = bpf_map_lookup_elem(&refusals, &domain);
@@ -121,13 +102,10 @@ static __always_inline int count(__u32 domain, __u32 level, bool is_told) {
   return is_enforced(level) ? -EPERM : 0;
 }
 
-// Takes numbers of which each holds two: the kernel looks through such functions once for all that
-// call them, which is most of what it takes to start the module.
-__noinline int refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value, __u32 label) {
-  __u32 domain = domain_and_level >> 32;
-  __u32 level = domain_and_level;
-  struct ModuleAct asked = {kind_and_detail >> 32, kind_and_detail, value, label};
-  return count(domain, level, tell(domain, level, asked));
+// Takes numbers of which each holds two: there is no room for more.
+__weak __noinline int refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value,
+                                 __u32 label) {
+  return -EPERM;
 }
 
 static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct asked) {
@@ -139,24 +117,17 @@ static __always_inline int refuse(__u32 domain, __u32 level, struct ModuleAct as
 }
 
 // The same for a file, in those hooks that may ask for its path: those that the kernel lets sleep.
-static __always_inline int refuse_path(__u32 domain, __u32 level, struct ModuleAct asked,
-                                       struct path* path) {
+static __noinline int refuse_path(__u32 domain, __u32 level, struct ModuleAct* asked,
+                                  struct path* path) {
   if (level == kLevelDisabled) return 0;
   return count(domain, level, tell_path(domain, level, asked, path));
 }
 
-// The same for a path that is known already.
-static __always_inline int refuse_text(__u32 domain, __u32 level, struct ModuleAct asked,
-                                       const char* path, __u32 length) {
-  if (level == kLevelDisabled) return 0;
-  return count(domain, level, tell_text(domain, level, asked, path, length));
-}
-
 // What no rule can grant to who is in a domain.
 static __always_inline int refuse_in_any_domain(void) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
+  __u32 domain = current_domain();
+  if (domain == kNoDomain) return 0;
+  return refuse(domain, level_of(word_of(domain)), act(kActReachModule, 0, 0));
 }
 
 #endif

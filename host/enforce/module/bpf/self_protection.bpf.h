@@ -10,29 +10,6 @@ int BPF_PROG(protect_maps, int command, union bpf_attr* attributes, unsigned int
   return refuse_in_any_domain();
 }
 
-// ---- What is mounted
-
-// To unmount what is above the pinned ones unmounts them, too, and to mount over them hides them.
-// Rules about paths take them as they are in the whole machine.
-SEC("lsm/sb_umount")
-int BPF_PROG(protect_mounts, struct vfsmount* mount, int flags) { return refuse_in_any_domain(); }
-
-SEC("lsm/sb_mount")
-int BPF_PROG(protect_from_mount, const char* device, const struct path* path, const char* type,
-             unsigned long flags, void* data) {
-  return refuse_in_any_domain();
-}
-
-SEC("lsm/move_mount")
-int BPF_PROG(protect_from_moved_mount, const struct path* from, const struct path* to) {
-  return refuse_in_any_domain();
-}
-
-SEC("lsm/sb_pivotroot")
-int BPF_PROG(protect_from_new_root, const struct path* from, const struct path* to) {
-  return refuse_in_any_domain();
-}
-
 // ---- Other processes
 
 // Whoever asks in this way will not be told of a refusal, and is not counted.
@@ -45,17 +22,17 @@ static __always_inline bool is_in(__u32 domain, struct task_struct* process) {
 
 // Whoever controls a process does what its domain may do.
 static __always_inline int protect_process(struct task_struct* process) {
-  struct ModuleTask* task = current_task();
-  if (!task || is_in(task->domain, process)) return 0;
-  return refuse(task->domain, level_of(word_of(task->domain)), act(kActReachModule, 0, 0));
+  struct Asker asker = {};
+  if (!is_asked(&asker) || is_in(asker.domain, process)) return 0;
+  return refuse_asker(&asker, act(kActReachModule, 0, 0));
 }
 
 SEC("lsm/ptrace_access_check")
 int BPF_PROG(protect_from_tracing, struct task_struct* process, unsigned int mode) {
   if (!(mode & PTRACE_MODE_NOAUDIT)) return protect_process(process);
-  struct ModuleTask* task = current_task();
-  if (!task || is_in(task->domain, process)) return 0;
-  return is_enforced(level_of(word_of(task->domain))) ? -EPERM : 0;
+  struct Asker asker = {};
+  if (!is_asked(&asker) || is_in(asker.domain, process)) return 0;
+  return is_enforced(level_of(asker.word)) ? -EPERM : 0;
 }
 
 // Here it is the other one who would control this process.

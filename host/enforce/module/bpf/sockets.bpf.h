@@ -31,8 +31,7 @@
 
 #define LAST_PORT 65535
 
-static __always_inline bool has_ports(struct socket* socket) {
-  struct sock* sock = socket->sk;
+static __always_inline bool has_ports(struct sock* sock) {
   if (!sock) return false;
   int family = sock->__sk_common.skc_family;
   return family == AF_INET || family == AF_INET6 || family == AF_SMC;
@@ -62,12 +61,12 @@ static __always_inline bool is_open_to_ports(struct ModuleCheck* check) {
   return check->count == 1 && check->ranges[0].first == 0 && check->ranges[0].last >= LAST_PORT;
 }
 
-static __always_inline int protect_ports(__u32 domain, __u32 level, struct ModuleRules* granted,
+static __always_inline int protect_ports(struct Asker* asker, struct ModuleRules* granted,
                                          int family, int type) {
   if (granted && is_open_to_ports(&granted->checks[kCheckBindPort]) &&
       is_open_to_ports(&granted->checks[kCheckConnectPort]))
     return 0;
-  return refuse(domain, level, act(kActPassPorts, type, family));
+  return refuse_asker(asker, act(kActPassPorts, type, family));
 }
 
 // What addresses with a port begin with.
@@ -83,7 +82,7 @@ static __always_inline bool read_port(struct PortAddress* read, const void* addr
 
 static __always_inline int check_port(int check, const void* address, int length) {
   struct PortAddress read = {};
-  if (!current_task() || !read_port(&read, address, length)) return 0;
+  if (current_domain() == kNoDomain || !read_port(&read, address, length)) return 0;
   return check_value(check, bpf_ntohs(read.port));
 }
 
@@ -91,15 +90,14 @@ SEC("lsm/socket_create")
 int BPF_PROG(make_socket, int family, int type, int protocol, int is_of_kernel) {
   struct ModuleTask* task = current_task();
   if (!task || is_of_kernel) return 0;
-  __u32 domain = task->domain;
-  __u64 word = word_of(domain);
-  __u32 level = level_of(word);
-  struct ModuleRules* granted = rules_of(word);
-  int result = judge_call(domain, level, granted);
-  if (!result) result = judge_value(domain, level, granted, kCheckFamily, family);
-  if (!result) result = judge_value(domain, level, granted, kCheckType, type);
+  struct Asker asker = {};
+  ask_for(&asker, task->domain);
+  struct ModuleRules* granted = rules_of(asker.word);
+  int result = judge_call(&asker, granted);
+  if (!result) result = judge_value(&asker, granted, kCheckFamily, family);
+  if (!result) result = judge_value(&asker, granted, kCheckType, type);
   if (result || !goes_past_ports(family, type, protocol)) return result;
-  return protect_ports(domain, level, granted, family, type);
+  return protect_ports(&asker, granted, family, type);
 }
 
 // The family of the address does not count: the kernel takes some without one.
@@ -107,22 +105,24 @@ SEC("lsm/socket_bind")
 int BPF_PROG(bind_socket, struct socket* socket, struct sockaddr* address, int length) {
   struct sock* sock = socket->sk;
   if (sock && sock->__sk_common.skc_family == AF_UNIX) return note_unix_binding(socket, sock);
-  return has_ports(socket) ? check_port(kCheckBindPort, address, length) : 0;
+  return has_ports(sock) ? check_port(kCheckBindPort, address, length) : 0;
 }
 
 // To connect to an address without a family ends a connection.
 SEC("lsm/socket_connect")
 int BPF_PROG(connect_socket, struct socket* socket, struct sockaddr* address, int length) {
   struct PortAddress read = {};
-  if (!current_task() || !has_ports(socket) || !read_port(&read, address, length)) return 0;
-  return read.family == AF_UNSPEC ? 0 : check_value(kCheckConnectPort, bpf_ntohs(read.port));
+  struct ModuleTask* task = current_task();
+  if (!task || !has_ports(socket->sk) || !read_port(&read, address, length)) return 0;
+  if (read.family == AF_UNSPEC) return 0;
+  return check_value_in(task->domain, kCheckConnectPort, bpf_ntohs(read.port));
 }
 
 // Datagrams, and what TCP sends while it connects.
 SEC("lsm/socket_sendmsg")
 int BPF_PROG(send_by_socket, struct socket* socket, struct msghdr* message, int size) {
   void* address = message->msg_name;
-  if (!address || !has_ports(socket)) return 0;
+  if (!address || !has_ports(socket->sk)) return 0;
   return check_port(kCheckConnectPort, address, message->msg_namelen);
 }
 
@@ -130,7 +130,7 @@ int BPF_PROG(send_by_socket, struct socket* socket, struct msghdr* message, int 
 SEC("lsm/socket_listen")
 int BPF_PROG(listen_by_socket, struct socket* socket, int backlog) {
   struct sock* sock = socket->sk;
-  if (!sock || !has_ports(socket) || sock->__sk_common.skc_num) return 0;
+  if (!has_ports(sock) || sock->__sk_common.skc_num) return 0;
   return check_value(kCheckBindPort, 0);
 }
 

@@ -4,10 +4,11 @@
 
 // The signal of a child is not among the flags any more.
 static __always_inline int check_clone(__u32 domain, __u64 flags) {
-  __u64 word = word_of(domain);
-  struct ModuleRules* granted = rules_of(word);
-  int result = judge_call(domain, level_of(word), granted);
-  return result ? result : judge_flags(domain, level_of(word), granted, flags);
+  struct Asker asker = {};
+  ask_for(&asker, domain);
+  struct ModuleRules* granted = rules_of(asker.word);
+  int result = judge_call(&asker, granted);
+  return result ? result : judge_flags(&asker, granted, flags);
 }
 
 SEC("lsm/task_alloc")

@@ -9,20 +9,19 @@
 SEC("lsm/socket_setsockopt")
 int BPF_PROG(choose_option, struct socket* socket) {
   struct sock* sock = socket->sk;
-  struct ModuleTask* task = current_task();
-  if (!task || !sock || sock->__sk_common.skc_family != AF_UNIX) return 0;
-  return note_namer(sock, task->domain) ? 0 : -ENOMEM;
+  __u32 domain = current_domain();
+  if (domain == kNoDomain || !sock || sock->__sk_common.skc_family != AF_UNIX) return 0;
+  return note_namer(sock, domain) ? 0 : -ENOMEM;
 }
 
-static __always_inline int judge_reaching(struct Asker* asker, struct vfsmount* mount,
-                                          struct dentry* entry, __u64 tag) {
-  __u32 said = 0;
-  if (has_paths(asker)) said = path_bits_anywhere(number_of(mount), number_of(entry), asker->entry);
-  __u32 label = label_of(number_of(entry));
-  __u32 rights = rights_of(asker->entry, label, said);
+static __always_inline int judge_reaching(struct Asker* asker, __u64 mount, __u64 entry,
+                                          __u64 tag) {
+  __u32 rules_entry = entry_of(asker->word);
+  __u32 said = has_paths(asker->word) ? path_bits_anywhere(mount, entry, rules_entry) : 0;
+  __u32 label = label_of(entry);
+  __u32 rights = rights_of(rules_entry, label, said);
   remember_rights(tag, rights);
-  if (rights & kUseWrite) return 0;
-  return refuse(asker->domain, asker->level, act_on_file(kActUseFile, kUseWrite, label));
+  return rights & kUseWrite ? 0 : refuse_asker(asker, act_on_file(kActUseFile, kUseWrite, label));
 }
 
 // By its file, as whoever writes to that. It has the name that whoever bound it knows it by, which
@@ -33,24 +32,24 @@ static __always_inline int reach_file(struct vfsmount* mount, struct dentry* ent
   struct Asker asker = {};
   if (!is_asked(&asker)) return 0;
   __u64 tag = 0;
-  if (how && asker.granted && !has_paths(&asker))
-    tag = tag_of_file(entry, asker.entry, now, how) & ~(__u64)kAllUses;
-  return was_granted(tag, kUseWrite) ? 0 : judge_reaching(&asker, mount, entry, tag);
+  if (how && !has_paths(asker.word))
+    tag = tag_of_file(entry, entry_of(asker.word), now, how) & ~(__u64)kAllUses;
+  if (was_granted(tag, kUseWrite)) return 0;
+  return judge_reaching(&asker, number_of(mount), number_of(entry), tag);
 }
 
 // By its name alone, which no rule is about: within the domain.
 static __always_inline int reach_name(struct sock* other) {
-  struct ModuleTask* task = current_task();
-  if (!task) return 0;
-  __u64 word = word_of(task->domain);
+  struct Asker asker = {};
+  if (!is_asked(&asker)) return 0;
   __u32* namer = bpf_sk_storage_get(&namers, other, 0, 0);
-  if (namer && *namer == task->domain && level_of(word) != kLevelAbsent) return 0;
-  return refuse(task->domain, level_of(word), act(kActReachSocket, 0, 0));
+  if (namer && *namer == asker.domain && level_of(asker.word) != kLevelAbsent) return 0;
+  return refuse_asker(&asker, act(kActReachSocket, 0, 0));
 }
 
 // What has no name is reached by who was given it.
 static __always_inline int reach_socket(struct sock* other) {
-  if (!current_task()) return 0;
+  if (current_domain() == kNoDomain) return 0;
   struct unix_sock* socket = bpf_skc_to_unix_sock(other);
   if (!socket || !socket->addr) return 0;
   struct dentry* entry = socket->path.dentry;

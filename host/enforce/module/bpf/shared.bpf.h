@@ -1,0 +1,25 @@
+// What many programs call. The kernel would look through a function anew in each of them; so they
+// have one that does nothing but refuse, which is replaced by the one that is here. Programs that
+// stand after the others are loaded after them, as these have to be.
+#ifndef SHARED_BPF_H
+#define SHARED_BPF_H
+
+#include "paths.bpf.h"
+
+SEC("shared/refuse_act")
+int shared_refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value, __u32 label) {
+  __u32 domain = domain_and_level >> 32;
+  __u32 level = domain_and_level;
+  struct ModuleAct asked = {kind_and_detail >> 32, kind_and_detail, value, label};
+  return count(domain, level, tell(domain, level, &asked));
+}
+
+SEC("shared/label_of")
+__u32 shared_label_of(__u64 entry) { return find_label_of(entry); }
+
+SEC("shared/find_path")
+__u32 shared_find_path(__u64 mount, __u64 entry, __u64 rules_entry, __u64 is_in_any) {
+  return look_for_path(mount, entry, rules_entry, is_in_any);
+}
+
+#endif
