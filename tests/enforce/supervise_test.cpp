@@ -5,7 +5,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <linux/capability.h>
+#include <linux/filter.h>
 #include <linux/netlink.h>
+#include <linux/seccomp.h>
 #include <netinet/in.h>
 #include <sched.h>
 #include <signal.h>
@@ -20,14 +22,19 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstddef>
 #include <cstdint>
+#include <exception>
 #include <filesystem>
 #include <fstream>
 #include <map>
 #include <set>
 #include <string>
+#include <string_view>
+#include <system_error>
 #include <vector>
 
+#include "host/enforce/kernel.h"
 #include "host/enforce/supervise/asked.h"
 #include "host/enforce/supervise/supervisor.h"
 
@@ -109,6 +116,38 @@ TEST_F(SuperviseTest, SaysWhyThereIsNoProgram) {
   EXPECT_EQ(Watch({"true"}).startError, 0);
 }
 
+// Refuses this process the descriptors of others.
+bool GiveUpTaking() {
+  std::array<sock_filter, 4> filter = {
+      {BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+       BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, SYS_pidfd_getfd, 0, 1),
+       BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | EPERM),
+       BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW)}};
+  return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 &&
+         Enforce::Kernel::SetFilter(filter.data(), filter.size()) == 0;
+}
+
+TEST_F(SuperviseTest, EndsAProgramWhoseCallsItCannotReceive) {
+  const pid_t supervisor = fork();
+  if (supervisor == 0) {
+    if (!GiveUpTaking()) _exit(1);
+    alarm(20);
+    try {
+      Enforce::Supervise({"sleep", "100"}, {.procDirectory = Proc(),
+                                            .isKilledAlong = true,
+                                            .isNoticed = Enforce::AsksMore,
+                                            .notice = [](const Attempt&) {}});
+    } catch (const std::exception& failure) {
+      const std::string_view text = failure.what();
+      _exit(text.starts_with("cannot receive the calls of a program: ") ? 0 : 2);
+    }
+    _exit(3);
+  }
+  int status = -1;
+  waitpid(supervisor, &status, 0);
+  EXPECT_EQ(status, 0);
+}
+
 TEST_F(SuperviseTest, TellsPathsAsTheProgramMeansThem) {
   Shell(
       "echo 1 >made; cat ./made; echo 2 >>made; echo 3 >made; mkdir sub; ln -s ../made sub/link; "
@@ -171,6 +210,10 @@ class AskedTest : public SuperviseTest {
   std::string CapabilitiesOf(int number, const Arguments& arguments) const {
     const std::string own = Within("proc/" + std::to_string(getpid()));
     std::filesystem::create_directories(own);
+    for (const std::string name : {"fd", "root"}) {
+      std::error_code isThere;
+      std::filesystem::create_symlink("/proc/self/" + name, own + "/" + name, isThere);
+    }
     std::ofstream(own + "/status") << "Uid:\t0\t1\t2\t3\nGid:\t0\t1\t2\t3\n"
                                    << "CapEff:\tffffffffffffffff\n";
     const Enforce::FileDescriptor made(open(Within("proc").c_str(), O_PATH | O_CLOEXEC));
@@ -329,6 +372,7 @@ TEST_F(AskedTest, TellsCapabilitiesByTheArguments) {
        {{CLONE_FILES}, {CLONE_NEWUSER | CLONE_NEWNS}}},
       {"cap_sys_admin", SYS_clone, {{CLONE_NEWNS}}, {{SIGCHLD}}},
       {"cap_setuid", SYS_setuid, {{4}}, {{0}, {1}, {2}}},
+      {"cap_setuid", SYS_setreuid, {{0, 4}}, {{0, 1, 4}}},
       {"cap_setuid", SYS_setresuid, {{0, 1, 4}}, {{0, 1, 2}, {UINT32_MAX, 1, UINT32_MAX}}},
       {"cap_setgid", SYS_setregid, {{0, 4}}, {{0, 1, 4}}},
   };
@@ -336,6 +380,28 @@ TEST_F(AskedTest, TellsCapabilitiesByTheArguments) {
     for (const auto& each : taking) EXPECT_EQ(CapabilitiesOf(number, each), capability) << number;
     for (const auto& each : free) EXPECT_EQ(CapabilitiesOf(number, each), "") << number;
   }
+}
+
+// Newer architectures are without them.
+#ifdef SYS_lchown
+TEST_F(AskedTest, TellsLinksThatAreGivenAway) {
+  const std::string link = Within("link");
+  std::filesystem::create_symlink("nowhere", link);
+  EXPECT_EQ(CapabilitiesOf(SYS_lchown, {AddressOf(link), 4, 4}), "cap_chown");
+  EXPECT_EQ(CapabilitiesOf(SYS_chown, {AddressOf(link), 4, 4}), "");
+}
+#endif
+
+TEST_F(AskedTest, TellsNoBindThatFails) {
+  const Enforce::FileDescriptor made(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const auto number = static_cast<std::uint64_t>(made.Number());
+  sockaddr_in local = {};
+  local.sin_family = AF_INET;
+  const auto address = reinterpret_cast<std::uintptr_t>(&local);
+  EXPECT_THAT(AskedOf(SYS_bind, {number, address, sizeof local}), Contains("bind_port 0"));
+  EXPECT_THAT(AskedOf(SYS_bind, {number, 0, sizeof local}), IsEmpty());
+  const auto closed = static_cast<std::uint64_t>(-1);
+  EXPECT_THAT(AskedOf(SYS_bind, {closed, address, sizeof local}), IsEmpty());
 }
 
 TEST_F(AskedTest, TellsLimitsThatAreRaised) {

@@ -110,9 +110,8 @@ void EndWith(pid_t parent) {
                                 const sigset_t& signals) {
   sigprocmask(SIG_SETMASK, &signals, nullptr);
   int listener = InstallFilter(filter);
-  if (listener < 0 && errno == EACCES && prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0) {
-    listener = InstallFilter(filter);
-  }
+  const bool isForbidden = listener < 0 && errno == EACCES;
+  if (isForbidden && prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0) listener = InstallFilter(filter);
   Tell(channel, {.listener = listener, .error = listener < 0 ? errno : 0});
   if (listener < 0) _exit(kSignalledStatus - 1);
   Execute(path, told, arguments);

@@ -317,6 +317,16 @@ TEST(Capabilities, AreGoneForGood) {
               StrEq("has-capability=1 ok\n" + again + " ok\n"));
 }
 
+TEST_P(Entry, StartsNothingWithCapabilitiesThatItCannotRead) {
+  const std::string plan = WritePlan(tree, PlanOf(tree));
+  WithoutCalls({SYS_capget}, [&] {
+    const Outcome outcome = RunLauncher({user, {"--plan", plan}, {ProbePath()}});
+    EXPECT_EQ(WEXITSTATUS(outcome.status), 126);
+    EXPECT_THAT(outcome.errors,
+                StrEq("secpolicy-run: cannot give up capabilities: Operation not permitted\n"));
+  });
+}
+
 TEST(Capabilities, StayWithAnotherUser) {
   if (!CanBe(User::kRoot)) GTEST_SKIP() << "only root has capabilities";
   if (Lacks()) GTEST_SKIP() << Lacks();

@@ -5,11 +5,14 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
+
+#include "launch.h"
 
 namespace EnforceTest {
 namespace {
@@ -53,6 +56,11 @@ Surroundings Look() {
   const std::filesystem::directory_iterator descriptors("/proc/self/fd");
   return {namespaces, ContentOf("/proc/self/mountinfo"),
           static_cast<std::size_t>(std::distance(begin(descriptors), end(descriptors)))};
+}
+
+TEST(Features, HaveNoCapabilitiesWhereNoneCanBeRead) {
+  if (Lacks()) GTEST_SKIP() << Lacks();
+  WithoutCalls({SYS_capget}, [] { EXPECT_EQ(ProbeFeatures().capabilities, 0U); });
 }
 
 TEST(Features, AreProbedWithoutATrace) {

@@ -7,6 +7,7 @@
 #include <sched.h>
 #include <sys/mman.h>
 #include <sys/mount.h>
+#include <sys/prctl.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -114,13 +115,11 @@ const char* Lacks() {
   return nullptr;
 }
 
-void InOwnMounts(const std::function<void()>& act) {
+void InChild(const std::function<void()>& act) {
   std::fflush(stdout);
   const pid_t child = fork();
   Check(child >= 0, "fork");
   if (child == 0) {
-    EXPECT_EQ(unshare(CLONE_NEWNS), 0);
-    EXPECT_EQ(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), 0);
     act();
     std::fflush(stdout);
     _exit(testing::Test::HasFailure() ? 1 : 0);
@@ -128,6 +127,23 @@ void InOwnMounts(const std::function<void()>& act) {
   int status = -1;
   Check(waitpid(child, &status, 0) == child, "waitpid");
   EXPECT_EQ(status, 0) << "see above";
+}
+
+void InOwnMounts(const std::function<void()>& act) {
+  InChild([&] {
+    EXPECT_EQ(unshare(CLONE_NEWNS), 0);
+    EXPECT_EQ(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), 0);
+    act();
+  });
+}
+
+void WithoutCalls(const std::vector<int>& calls, const std::function<void()>& act) {
+  InChild([&] {
+    std::vector<sock_filter> filter = FilterWithout(calls);
+    EXPECT_EQ(prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0), 0);
+    EXPECT_EQ(Enforce::Kernel::SetFilter(filter.data(), filter.size()), 0);
+    act();
+  });
 }
 
 std::string NameOf(User user) { return user == User::kRoot ? "AsRoot" : "AsNobody"; }

@@ -27,6 +27,9 @@ std::string NameOf(User user);
 // here.
 void InOwnMounts(const std::function<void()>& act);
 
+// Acts in a child process that these system calls answer with EPERM. A failure there is one here.
+void WithoutCalls(const std::vector<int>& calls, const std::function<void()>& act);
+
 // A tree below which a test plays, the same at each making, all of it the user's:
 //   open/file, open/directory, kept/file, kept/directory, kept/program (a probe)
 class Tree {
