@@ -7,6 +7,8 @@
 #include <filesystem>
 
 #include "child_process.h"
+#include "host/linux/state/domain_table.h"
+#include "host/linux/state/host_state.h"
 #include "state_directory.h"
 #include "support/message_of.h"
 #include "teskctl/security.h"
@@ -43,6 +45,13 @@ class AccessInterface : public ::testing::Test {
   StateDirectory directory;
   TeskAccessInterfaceImpl access;
 };
+
+TEST_F(AccessInterface, KeepsGuestServices) {
+  const unsigned int guest = Create("guest");
+  access.AddGcomService(guest, "clipboard");
+  EXPECT_THAT(LinuxHost::HostState::Current().Domains().GuestServices(guest),
+              ElementsAre("clipboard"));
+}
 
 TEST_F(AccessInterface, CannotBeMadeOnAForeignState) {
   const std::string other = directory.Path() + "/other.db";

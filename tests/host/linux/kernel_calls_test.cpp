@@ -8,6 +8,7 @@
 
 #include <array>
 #include <cerrno>
+#include <climits>
 #include <cstring>
 #include <filesystem>
 #include <random>
@@ -214,6 +215,8 @@ TEST_F(KernelCalls, TellTheDomainOfAWorld) {
   EXPECT_EQ(id, domain);
   EXPECT_EQ(ErrorOf(kDomainOfWorld, {Widened(-1), Address(&id)}), ESRCH);
   EXPECT_EQ(ErrorOf(kDomainOfWorld, {1ULL << 40U, Address(&id)}), EINVAL);
+  EXPECT_EQ(ErrorOf(kDomainOfWorld, {INT_MAX, Address(&id)}), ESRCH);
+  EXPECT_EQ(ErrorOf(kDomainOfWorld, {INT_MAX + 1ULL, Address(&id)}), EINVAL);
   EXPECT_EQ(ErrorOf(kDomainOfWorld, {Widened(getpid()), kBadAddress}), EFAULT);
 
   ChildProcess world([] {});

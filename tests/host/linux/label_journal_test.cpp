@@ -9,6 +9,7 @@
 #include <sched.h>
 #include <sys/file.h>
 #include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -241,6 +242,21 @@ TEST_F(Journal, ThatCannotBeOpenedIsTold) {
   if (told == "(no mounts)") GTEST_SKIP() << "nothing can be mounted here";
   EXPECT_THAT(told, testing::MatchesRegex("Unable to open the journal of labels /.*/labels.undo: "
                                           "Read-only file system"));
+}
+
+TEST_F(Journal, ThatCannotBeWrittenIsTold) {
+  const std::string told = Run([]() -> std::string {
+    const NotedLabels notes(LabelNotes::kForLater);
+    LabelJournal journal(StatePath());
+    Give("tree/one", 8);
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit none = {0, RLIM_INFINITY};
+    if (setrlimit(RLIMIT_FSIZE, &none) != 0) return "no limit";
+    journal.Keep(notes);
+    return "kept";
+  });
+  EXPECT_THAT(told, testing::MatchesRegex("Unable to write the journal of labels /.*/labels.undo: "
+                                          "File too large"));
 }
 
 TEST_F(Journal, IsRefusedWhereOthersMayHaveWrittenIt) {

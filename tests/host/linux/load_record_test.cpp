@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "host/linux/common/host_error.h"
 #include "host/linux/state/host_state.h"
 #include "state_directory.h"
 
@@ -71,6 +72,20 @@ TEST_F(LoadRecordTest, IsOfTheLatestLoadAlone) {
   EXPECT_EQ(record->verb, "load-early");
   EXPECT_EQ(record->errorCount, 0U);
   EXPECT_THAT(record->errors, IsEmpty());
+}
+
+TEST_F(LoadRecordTest, KeepsTheOneBeforeWhenItCannotBeWritten) {
+  RecordLoad(HostState::Current(), FailedLoad());
+  HostState::Current().Database().Run(
+      "CREATE TEMP TRIGGER full BEFORE INSERT ON load_error BEGIN SELECT RAISE(ABORT, 'full'); "
+      "END");
+  LoadRecord next = FailedLoad();
+  next.verb = "load-early";
+  EXPECT_THROW(RecordLoad(HostState::Current(), next), LinuxHost::HostError);
+  const auto record = LatestLoad(HostState::Current());
+  ASSERT_TRUE(record.has_value());
+  EXPECT_EQ(record->verb, "load");
+  EXPECT_THAT(record->errors, ElementsAre("second", "first"));
 }
 
 TEST_F(LoadRecordTest, KeepsTheFirstOfVeryManyErrors) {

@@ -1,6 +1,8 @@
 // The attribute that carries a label: one real attribute for each state, errors as the system
 // calls give them, and the choice between the two kinds.
 
+#include "host/linux/files/security_attribute.h"
+
 #include <gtest/gtest.h>
 #include <linux/capability.h>
 #include <sys/stat.h>
@@ -103,6 +105,21 @@ TEST_F(SecurityAttribute, IsFoundThroughLinks) {
               return Told(GetXattr("file", kLabelName, nullptr, 0));
             }),
             "4");
+}
+
+TEST_F(SecurityAttribute, ReplacesTheFormerOneWhateverItHolds) {
+  const std::string left = Run([]() -> std::string {
+    const std::string attribute = LinuxHost::LabelAttribute();
+    if (attribute != "security.bpf.zorvan") return "ENODATA ENODATA";
+    std::string told;
+    for (const std::string value : {"text", ""}) {
+      if (setxattr("file", "security.zorvan", value.data(), value.size(), 0) != 0) return "unset";
+      LinuxHost::GiveFirstLabel("file", attribute);
+      told += (told.empty() ? "" : " ") + Told(getxattr("file", "security.zorvan", nullptr, 0));
+    }
+    return told;
+  });
+  EXPECT_EQ(left, "ENODATA ENODATA");
 }
 
 TEST_F(SecurityAttribute, IsTheOnlyOneThereIs) {

@@ -149,6 +149,12 @@ TEST_F(UnpackTardisks, RefusesAbsolutePath) {
             "Unable to unpack tardisk disk.tgz: " + Victim().string() + ": Path is absolute");
 }
 
+TEST_F(UnpackTardisks, RefusesAbsolutePathWhereverItLeads) {
+  TarImage image;
+  image.File("/proc/version", "owned");
+  EXPECT_EQ(Unpack(image), "Unable to unpack tardisk disk.tgz: /proc/version: Path is absolute");
+}
+
 TEST_F(UnpackTardisks, RefusesParentDirectory) {
   TarImage image;
   image.File("../victim", "owned");
