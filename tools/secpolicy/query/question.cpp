@@ -133,11 +133,16 @@ std::string RealPathOf(const std::string& path) {
   return found ? resolved.path : "";
 }
 
+std::string DirectoryOf(const std::string& path) {
+  const std::size_t slash = path.rfind('/');
+  return slash == 0 ? "/" : path.substr(0, slash);
+}
+
 // The line for the nearest directory that gave the file the label that it inherits.
 std::optional<LabelOrigin> FindOriginAbove(const FileFacts& file) {
   std::string path = file.paths.back();
   while (path.size() > 1) {
-    path.resize(std::max<std::size_t>(path.rfind('/'), 1));
+    path = DirectoryOf(path);
     auto origin = LinuxHost::FindLabelOrigin(LinuxHost::CurrentState(), path);
     if (origin && origin->label == file.label) return origin;
   }
@@ -176,10 +181,6 @@ FileFacts ExamineFile(const std::string& path, TeskAccessInterfaceImpl& access) 
 }
 
 namespace {
-
-std::string DirectoryOf(const std::string& path) {
-  return path.substr(0, std::max<std::size_t>(path.rfind('/'), 1));
-}
 
 std::string JoinPath(const std::string& directory, const std::string& name) {
   return (directory == "/" ? "" : directory) + "/" + name;
