@@ -39,6 +39,8 @@ int renameat2(int from, const char* old, int to, const char* new, unsigned flags
   return system(command) == 0 ? result : -1;
 }
 
+int flock(int file, int operation) { return Breaks("flock") ? -1 : (int)syscall(SYS_flock, file, operation); }
+
 int syncfs(int file) { return Breaks("syncfs") ? -1 : (int)syscall(SYS_syncfs, file); }
 
 // Databases sync files, and have one call more for that.

@@ -469,6 +469,8 @@ bundle       web, serial 1, "*"; not what is installed"* ]]
   takes 1
   takes 2
   remember
+  broken flock 1 37
+  refused "cannot replace /etc/zorvan/secpolicy: No locks available"
   broken syncfs 1 5
   refused "cannot write /etc/zorvan/secpolicy.new: Input/output error; nothing was installed"
   broken renameat2 1 18

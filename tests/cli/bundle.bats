@@ -58,6 +58,8 @@ refused() {
   shows "name     web"
   shows "  $(sha256sum <web/domains/appDom | cut -d' ' -f1)  domains/appDom"
   ends_with "secpolicy: bundle show: this is what it claims: it was not verified, which --key does"
+  "$SECPOLICY" bundle show good.bundle >both 2>&1
+  [[ $(tail -n 1 both) == "secpolicy: bundle show: "* ]]
   bundle show good.bundle --key public.pem --format json
   exits 0
   fits_schema bundle-show

@@ -109,7 +109,7 @@ fish_offers() {
 
 @test "where nothing can be said, nothing is: neither words nor a message" {
   local words
-  for words in "rollback" "--root $BATS_TEST_TMPDIR/none rollback" "nonsense" "why one two three four" "load --nonsense x"; do
+  for words in "rollback" "--root $BATS_TEST_TMPDIR/none rollback" "nonsense" "nonsense rollback" "why one two three four" "load --nonsense x"; do
     run --separate-stderr "$SECPOLICY" __complete $words ""
     [[ -z $stderr && $output != *scratch-night* ]]
   done
@@ -117,6 +117,20 @@ fish_offers() {
   run --separate-stderr "$SECPOLICY" __complete --root "$root" run ""
   chmod 755 "$root"
   [[ -z $stderr ]]
+}
+
+@test "behind a word that is no verb, another one is none either" {
+  boot
+  run --separate-stderr "$SECPOLICY" __complete --root "$root" nonsense run ""
+  exits 0
+  [[ $output != *monitorDom* ]]
+}
+
+@test "a root in the home directory may be written with a tilde" {
+  boot
+  HOME=$BATS_TEST_TMPDIR run --separate-stderr "$SECPOLICY" __complete --root '~/root' run ioF
+  exits 0
+  shows ioFilterDom
 }
 
 @test "names that cannot be typed as they are shown are left out" {

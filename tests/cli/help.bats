@@ -35,6 +35,33 @@ load helper
   done
 }
 
+# words_at WORD...: what is offered behind these words.
+words_at() { "$SECPOLICY" __complete "$@" "" | tail -n +2 | cut -f 1; }
+
+# every_help: what --help tells of the command, of each verb and of each kind, and 'explain' of each code.
+every_help() {
+  local verb kind
+  "$SECPOLICY" --help
+  "$SECPOLICY" explain
+  for verb in $(words_at); do
+    "$SECPOLICY" "$verb" --help
+    "$SECPOLICY" "$verb" --help | grep -q '^Usage: .* SUBCOMMAND$' || continue
+    for kind in $(words_at "$verb"); do "$SECPOLICY" "$verb" "$kind" --help; done
+  done
+}
+
+words_of() { tr -cs "A-Za-z_'" '\n' | tr '[:upper:]' '[:lower:]' | sed "s/^'*//; s/'*$//" | sort -u; }
+
+@test "no word of the help is misspelt: the documentation has it, too" {
+  every_help | words_of >"$BATS_TEST_TMPDIR/help"
+  [[ $(wc -l <"$BATS_TEST_TMPDIR/help") -gt 750 ]]
+  { find "$SOURCE"/README.md "$SOURCE"/docs "$SOURCE"/{host,policy,secpolicy,tools} -name '*.md' -o -name '*.[0-9]' -o -name '*.h' &&
+    echo "$BATS_TEST_TMPDIR/names"; } >"$BATS_TEST_TMPDIR/files"
+  echo "aligns attaching clipboard detach ioFilterData my NEW_KEY newly nightly pdf Positionals skeleton Tpdf" >"$BATS_TEST_TMPDIR/names"
+  xargs cat <"$BATS_TEST_TMPDIR/files" | words_of >"$BATS_TEST_TMPDIR/known"
+  diff /dev/null <(comm -23 "$BATS_TEST_TMPDIR/help" "$BATS_TEST_TMPDIR/known")
+}
+
 @test "help and the version need no arguments of the verb" {
   for verb in why label; do
     for words in "--help $verb" "$verb --help"; do

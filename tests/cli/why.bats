@@ -120,6 +120,18 @@ END
   exits 0
 }
 
+@test "a file inherits its label from above where it lies, not from above a link to it" {
+  boot
+  printf '%s\n' '/etc/ssh vmDisk' '/usr/sbin vmDisk' >>"$policy/fileLabels/monitor"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  touch "$root/etc/ssh/new"
+  ln -s /etc/ssh/new "$root/usr/sbin/link"
+  secpolicy why sshDom read /usr/sbin/link
+  shows "file: leads to /etc/ssh/new"
+  shows "label: vmDisk (inherited)"
+  shows "$(at fileLabels/monitor '/etc/ssh vmDisk')/etc/ssh vmDisk"
+}
+
 @test "the label that a file inherits, with the line that its directory has it from" {
   boot
   echo '/etc/ssh vmDisk' >>"$policy/fileLabels/monitor"

@@ -141,6 +141,12 @@ struct Marked {
   std::size_t length;
 };
 
+TEST_F(SourceFileTest, CountsCharactersFromTheFirstOn) {
+  const SourceFile file = Write("\xc3\xa4 x\n");
+  EXPECT_EQ(file.AtWords(Codes::kTab, 1, 1, 1, "odd").column, 3u);
+  EXPECT_EQ(file.AtBytes(Codes::kTab, 1, 4, 0, "odd").column, 4u);
+}
+
 TEST_F(SourceFileTest, MarksWordsInCharacters) {
   const SourceFile file = Write("# first\n  -a  \xc3\xa4\xc3\xb6 read  grant # why\n");
   const Marked table[] = {{0, 0, 3, 2}, {1, 1, 7, 2}, {2, 2, 10, 4}, {3, 3, 16, 5}, {0, 3, 3, 18}};
@@ -165,6 +171,8 @@ TEST_F(SourceFileTest, TellsBytesThatTheLibraryReadsOtherwise) {
       {"# a\tcomment\n-s read grant\r\n", {"carriage-return 2:14"}},
       {std::string("-s read\0 grant\n", 15), {"nul-byte 1:8"}},
       {"-s read grant\n" + std::string(1024, 'x') + "\n-s\twrite\n", {"long-line 2:1024"}},
+      {std::string(1022, 'x') + '\0' + "x\n", {"nul-byte 1:1023", "long-line 1:1024"}},
+      {std::string(1023, 'x') + '\0' + "x\n", {"long-line 1:1024"}},
       {"-s read grant\n" + std::string(1023, 'x') + "\n-s\twrite\n", {"tab 3:3"}},
   };
   for (const auto& [text, problems] : table) {

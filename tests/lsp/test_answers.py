@@ -3,7 +3,7 @@
 import subprocess
 
 import pytest
-from client import RequestFailed, span
+from client import Client, RequestFailed, span
 
 ALL_KINDS = """\
 # A domain with every kind of rule.
@@ -82,6 +82,30 @@ def test_an_offered_word_replaces_the_one_that_was_begun(client, web):
     assert sets["@start"] not in ("system call", "")
 
 
+def test_tells_kinds_of_words_by_the_numbers_of_the_protocol(client, web, policy):
+    client.open(web, "")
+
+    def kind_of(line, word):
+        client.change(web, line)
+        items = client.at("completion", web, 0, len(line))["items"]
+        return next(item["kind"] for item in items if item["label"] == word)
+
+    function, module, keyword, folder, member, constant = 3, 9, 14, 19, 20, 21
+    assert kind_of("", "-a") == keyword
+    assert kind_of("-a ", "webContent") == constant
+    assert kind_of("-a webContent ", "read") == member
+    assert kind_of("-d webProgram ", "webDom") == module
+    assert kind_of("-s ", "accept4") == function
+    assert kind_of("-r /usr/", "/usr/share") == folder
+
+
+def test_tells_when_more_may_be_offered(client, web):
+    client.open(web, "-r /usr/")
+    assert client.at("completion", web, 0, 8)["isIncomplete"] is True
+    client.change(web, "-s ")
+    assert client.at("completion", web, 0, 3)["isIncomplete"] is False
+
+
 @pytest.mark.parametrize("line, sentence", [
     (1, "`webDom` may `read` what carries the label `webContent`."),
     (2, "`webDom` holds the capability `cap_net_bind_service`."),
@@ -120,6 +144,15 @@ def test_explains_words_and_who_else_has_them(client, web, policy):
         "`/usr/share` and everything beneath it carry the label `webContent`.")
 
 
+def test_explains_a_domain_with_all_its_files(client, web, policy):
+    (policy / "domains/plugins").mkdir(exist_ok=True)
+    (policy / "domains/plugins/part").write_text("-s read grant\n-s write grant\n")
+    (policy / "domains/plugin-part").write_text("-s read grant\n")
+    client.open(web, "-d webProgram plugin-part exec grant\n")
+    assert "`plugin-part`: a domain, defined by `domains/plugin-part` (1 rule), `domains/plugins/part` (2 rules)" \
+        in client.at("hover", web, 0, 16)["contents"]["value"]
+
+
 def test_finds_where_names_are_declared_and_used(client, web, policy):
     client.open(web)
     declared = {"uri": (policy / "objects/base").as_uri(), "range": span(0, 0, 10)}
@@ -147,6 +180,21 @@ def test_renames_a_label_everywhere(client, web, policy):
     everything = "".join(file.read_text() for file in policy.rglob("*") if file.is_file())
     assert everything.count("webd ") + everything.count("webd\n") == 4
     assert "webProgram" not in everything
+
+
+@pytest.mark.parametrize("abilities, form", [
+    ({}, "changes"), ({"documentChanges": True}, "documentChanges"), ({"resourceOperations": ["rename"]}, "documentChanges")])
+def test_edits_in_the_form_that_the_editor_takes(root, web, abilities, form):
+    with Client(root, "--fresh") as client:
+        client.start(workspace={"workspaceEdit": abilities})
+        client.open(web)
+        edit = client.at("rename", web, 2, 5, newName="webd")
+        assert list(edit) == [form]
+        own = {"range": span(2, 3, 13), "newText": "webd"}
+        if form == "changes":
+            assert edit["changes"][web.as_uri()] == [own]
+        else:
+            assert [own] in [each["edits"] for each in edit["documentChanges"]]
 
 
 def test_the_edits_of_a_closed_file_are_of_no_version(client, web, policy):

@@ -81,7 +81,9 @@ def test_asks_to_be_told_of_files_that_others_change(root, web, policy):
         client.start(workspace={"didChangeWatchedFiles": {"dynamicRegistration": True}})
         request = client.receive()
         assert request["method"] == "client/registerCapability"
-        assert request["params"]["registrations"][0]["method"] == "workspace/didChangeWatchedFiles"
+        assert request["params"]["registrations"] == [{
+            "id": "files", "method": "workspace/didChangeWatchedFiles",
+            "registerOptions": {"watchers": [{"globPattern": "**/{objects,domains,fileLabels,tardisks}/**"}]}}]
         client.send(id=request["id"], result=None)
         client.open(web)
         assert [each["code"] for each in client.problems_of(web)] == ["unknown-word"]

@@ -19,6 +19,7 @@ class Walk {
   Walk(const CommandForm& command, const Enter& enterKind) : levels{command}, enter(enterKind) {}
 
   void Take(const std::string& word) {
+    if (isLost) return;
     if (expecting != nullptr) {
       TakeValue(*std::exchange(expecting, nullptr), word);
     } else if (word == "--" && !isBehindDashes) {
@@ -59,8 +60,11 @@ class Walk {
     }
     const std::vector<OfferedWord>& kinds = levels.back().kinds;
     isLost = isHelp || std::ranges::find(kinds, word, &OfferedWord::word) == kinds.end();
-    if (isLost) return;
-    path.push_back(word);
+    if (!isLost) Descend(word);
+  }
+
+  void Descend(const std::string& kind) {
+    path.push_back(kind);
     levels.push_back(enter(path));
   }
 
