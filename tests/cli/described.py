@@ -1,6 +1,6 @@
 #!/usr/bin/env python3
 """described.py COMMAND MANUAL ROOT: checks that the manual page, --help and the completions agree on the
-verbs of COMMAND, their options and their arguments, and that something is offered for every value whose
+verbs of COMMAND, their options, in one order, and their arguments, and that something is offered for every value whose
 words are known. ROOT was booted and has a saved state."""
 
 import re
@@ -28,7 +28,7 @@ class Usage:
         self.arguments = []
 
     def text(self):
-        options = " ".join(name + (f" {value}" if value else "") for name, value in sorted(self.options.items()))
+        options = " ".join(name + (f" {value}" if value else "") for name, value in self.options.items())
         return f"{options or '(no options)'}; {' '.join(self.arguments) or '(no arguments)'}"
 
 

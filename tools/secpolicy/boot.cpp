@@ -107,12 +107,12 @@ Action Define(Syntax& syntax) {
   const Option plan = syntax.AddFlag("--plan", options->plan,
                                      "Only show what would become of files; -v shows them all");
   syntax.AddFormat(options->format, "the plan", {"text", "json"}).Need(plan);
+  AddTiming(syntax, options->timing).Exclude(plan);
   syntax
       .AddList("--policy-from", options->policyFrom,
                "Let the tardisk NAME bring the policy of the host; may be repeated")
       .NameValue("NAME")
       .Offer(OfferTardisks());
-  AddTiming(syntax, options->timing).Exclude(plan);
   const Option verbose = syntax.Verbose();
   return [=] {
     options->showAll = verbose.IsGiven();

@@ -69,7 +69,6 @@ Action Define(Syntax& syntax) {
   const auto dir = std::make_shared<std::string>(SecPolicy::kPolicyRoot);
   const Option dirOption =
       syntax.AddOption("DIR", *dir, "The policy directory, as seen from the root").ShowDefault();
-  AddBundle(syntax, dirOption, options->bundle);
   const Option plan = syntax.AddFlag("--plan", options->plan,
                                      "Only show what the load would change; -v shows every file");
   syntax.AddFormat(options->planOptions.format, "the plan", {"text", "json"}).Need(plan);
@@ -79,6 +78,7 @@ Action Define(Syntax& syntax) {
       .Exclude(plan);
   AddKeep(syntax, options->keep);
   AddTiming(syntax, options->timing).Exclude(plan);
+  AddBundle(syntax, dirOption, options->bundle);
   const Option verbose = syntax.Verbose();
   return [=] {
     options->planOptions.showAll = verbose.IsGiven();
