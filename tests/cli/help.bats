@@ -57,7 +57,7 @@ words_of() { tr -cs "A-Za-z_'" '\n' | tr '[:upper:]' '[:lower:]' | sed "s/^'*//;
   [[ $(wc -l <"$BATS_TEST_TMPDIR/help") -gt 750 ]]
   { find "$SOURCE"/README.md "$SOURCE"/docs "$SOURCE"/{host,policy,secpolicy,tools} -name '*.md' -o -name '*.[0-9]' -o -name '*.h' &&
     echo "$BATS_TEST_TMPDIR/names"; } >"$BATS_TEST_TMPDIR/files"
-  echo "aligns attaching clipboard detach ioFilterData my NEW_KEY newly nightly pdf Positionals skeleton Tpdf" >"$BATS_TEST_TMPDIR/names"
+  echo "aligns attaching clipboard detach ioFilterData my NEW_KEY newly nightly pdf Positionals skeleton Subcommands Tpdf" >"$BATS_TEST_TMPDIR/names"
   xargs cat <"$BATS_TEST_TMPDIR/files" | words_of >"$BATS_TEST_TMPDIR/known"
   diff /dev/null <(comm -23 "$BATS_TEST_TMPDIR/help" "$BATS_TEST_TMPDIR/known")
 }

@@ -284,6 +284,8 @@ TEST_F(CommandLineTest, TellsItsVersionAndItsUsage) {
   for (const char* part : {"Tests.", "paint", "Carves", "--root", "The end."}) {
     EXPECT_THAT(output, HasSubstr(part));
   }
+  EXPECT_EQ(Read({"carve", "--help"}), kWell);
+  EXPECT_THAT(output, HasSubstr("\nSubcommands:\n  bowl "));
   EXPECT_EQ(Read({"carve", "bowl", "--help"}), kWell);
   EXPECT_THAT(output, HasSubstr("Bowls are round"));
   EXPECT_EQ(Read({"paint", "--help"}), kWell);

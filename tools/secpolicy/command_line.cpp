@@ -170,6 +170,7 @@ Action Syntax::AddKinds(std::span<const Kind> kinds) {
   const auto chosen = std::make_shared<Action>();
   for (const Kind& kind : kinds) {
     CLI::App* const subcommand = app.add_subcommand(kind.name, kind.summary);
+    subcommand->group("Subcommands");
     if (kind.help != nullptr) subcommand->footer(kind.help);
     Syntax syntax(*subcommand, offerings, preparations, behindDashes);
     subcommand->parse_complete_callback(
