@@ -34,12 +34,12 @@ std::optional<std::string> ReadLatestRefusals() {
   const std::string path = LatestRefusalsFile();
   struct stat status {};
   if (lstat(path.c_str(), &status) != 0 && errno == ENOENT) return std::nullopt;
-  status = RequirePrivateFile(path, kPurpose);
+  RequirePrivateFile(path, kPurpose);
+  // Another one may have taken its place meanwhile, of another size.
   const Descriptor file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+  if (!file.IsOpen() || fstat(file.Number(), &status) != 0) ThrowErrno("Unable to read ", path);
   std::string text(static_cast<std::size_t>(status.st_size), '\0');
-  const ssize_t count = file.IsOpen() ? read(file.Number(), text.data(), text.size()) : -1;
-  if (count < 0) ThrowErrno("Unable to read ", path);
-  text.resize(static_cast<std::size_t>(count));
+  if (read(file.Number(), text.data(), text.size()) < 0) ThrowErrno("Unable to read ", path);
   return text;
 }
 
