@@ -80,7 +80,7 @@ is_damaged() {
   setfattr --remove security.bpf.zorvan "$program"
   secpolicy label get /usr/sbin/sshd
   exits 1
-  ends_with 'secpolicy: label get: Unable to use the host state /run/secpolicy/host.db: it has schema 3, this program works with schema 5: it was made by another version of it. Remove the file and run "secpolicy boot", which makes a new one'
+  ends_with 'secpolicy: label get: Unable to use the host state /run/secpolicy/host.db: it has schema 3, this program works with schema 6: it was made by another version of it. Remove the file and run "secpolicy boot", which makes a new one'
   secpolicy boot
   exits 0
   secpolicy label get /usr/sbin/sshd

@@ -63,9 +63,9 @@ const std::string kChmod = ". Take that right from them (chmod go-w), or choose 
 
 const std::vector<Fault> kFaults = {
     {"ItIsOfANewerSchema",
-     [](const auto& state) { StateFile(state).Execute("PRAGMA user_version = 6"); },
+     [](const auto& state) { StateFile(state).Execute("PRAGMA user_version = 7"); },
      std::string(kUseless) +
-         "has schema 6, this program works with schema 5: it was made by another version of it" +
+         "has schema 7, this program works with schema 6: it was made by another version of it" +
          kMakeANewOne},
     {"ItWasCutOff",
      [](const auto& state) {

@@ -247,6 +247,39 @@ TEST(PlanTransitions, LeadWhereTheFirstRuleOfALabelLeads) {
   ASSERT_THAT(files.labels, testing::UnorderedElementsAre(testing::Key(7), testing::Key(8)));
   EXPECT_EQ(files.labels[7].next, 3U + 1);
   EXPECT_GT(files.labels[8].next, unsigned{Enforce::kModuleDomains} + 1);
+  EXPECT_EQ(files.labels[7].nextOfTardisk, 0U);
+}
+
+TEST(PlanTransitions, LeadByTardisksAndByLabelsOfTheirOwn) {
+  Enforce::ModuleFileRules files;
+  Enforce::PlanTransitions(
+      DomainOf({"-d both otherDom tardisk_exec grant", "-d both thirdDom exec grant",
+                "-d both thirdDom tardisk_exec grant", "-d tardisk otherDom tardisk_exec grant",
+                "-d same testDom tardisk_exec grant", "-d revoked otherDom tardisk_exec revoke"}),
+      {{"both", 7}, {"tardisk", 8}, {"same", 9}, {"revoked", 10}},
+      {{"otherDom", 3}, {"thirdDom", 4}, {"testDom", 5}}, files);
+  ASSERT_THAT(files.labels, testing::UnorderedElementsAre(testing::Key(7), testing::Key(8)));
+  EXPECT_EQ(files.labels[7].next, 4U + 1);
+  EXPECT_EQ(files.labels[7].nextOfTardisk, 3U + 1);
+  EXPECT_EQ(files.labels[8].next, 0U);
+  EXPECT_EQ(files.labels[8].nextOfTardisk, 3U + 1);
+  EXPECT_EQ(Dump(files),
+            "  label 7: nothing, to 4 tardisks:3\n"
+            "  label 8: nothing tardisks:3\n");
+}
+
+TEST(FatesByModule, TellsOfTransitionsThatGiveWay) {
+  EXPECT_THAT(
+      Told(FatesByModule(
+          DomainOf({"-d red otherDom tardisk_exec grant", "-d red thirdDom tardisk_exec grant",
+                    "-d red thirdDom exec grant", "-d red otherDom exec grant",
+                    "-d red otherDom enter grant", "-d blue otherDom tardisk_exec revoke"}),
+          kLast)),
+      ElementsAre("narrowed: -d red thirdDom tardisk_exec grant (what came from a tardisk labelled "
+                  "red enters otherDom)",
+                  "narrowed: -d red otherDom exec grant (what is labelled red enters thirdDom)",
+                  "narrowed: -d red otherDom enter grant (only services of this host enter a "
+                  "domain this way)"));
 }
 
 }  // namespace

@@ -19,6 +19,7 @@
 #include <csignal>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <optional>
 #include <random>
 #include <string>
@@ -26,6 +27,7 @@
 #include <utility>
 #include <vector>
 
+#include "host/linux/files/inode_generation.h"
 #include "policy/decision.h"
 #include "vm/module_fixture.h"
 
@@ -44,6 +46,18 @@ std::string ProgramOf(const std::string& label) { return kPlace + "/" + label + 
 void Label(const std::string& path, const std::string& label) {
   const std::uint32_t number = kLabels.at(label);
   ASSERT_EQ(lsetxattr(path.c_str(), "security.bpf.zorvan", &number, sizeof(number), 0), 0) << path;
+}
+
+// As one that came from a tardisk with this label.
+Enforce::TardiskFile Brought(const std::string& path, const std::string& label) {
+  struct stat status = {};
+  EXPECT_EQ(stat(path.c_str(), &status), 0) << path;
+  const auto generation = LinuxHost::GenerationOf(path.c_str());
+  EXPECT_TRUE(generation) << path;
+  return {.device = status.st_dev,
+          .inode = status.st_ino,
+          .generation = generation.value_or(0),
+          .label = kLabels.at(label)};
 }
 
 void WriteScript(const std::string& path, const std::string& interpreter) {
@@ -195,6 +209,7 @@ class ModuleExecutionTest : public ModuleTest {
     }
     WriteScript(kPlace + "/tool/script", "/bin/busybox sh");
     module->LearnLabels();
+    module->TellTardiskFiles({});
   }
 
   // Domains from kFirst on with these names and rules, beside which they may all but use
@@ -446,6 +461,112 @@ TEST_F(ModuleExecutionTest, RefusesProgramsThatLieNowhere) {
   EXPECT_EQ(outside.Go(), 0);
 }
 
+// ---- Tardisks
+
+// Of three domains the first one leads to the second by tardisks with the label "gear".
+class ModuleTardiskTest : public ModuleExecutionTest {
+ protected:
+  void PublishThree(std::vector<std::string> more = {}) {
+    more.emplace_back("-d gear two tardisk_exec grant");
+    Publish(Domains({{"one", more}, {"two", {}}, {"three", {}}}));
+  }
+
+  // The program with the label "toy" came from a tardisk with this one.
+  void Bring(const std::string& label) { module->TellTardiskFiles({Brought(toy, label)}); }
+
+  const std::string toy = ProgramOf("toy");
+};
+
+TEST_F(ModuleTardiskTest, EntersTheDomainThatTheTardiskLeadsTo) {
+  PublishThree();
+  Bring("gear");
+  ExpectToEnter(toy);
+  ExpectToStay(ProgramOf("tool"));
+  EXPECT_EQ(From(kFirst + 1, toy), Outcome({.domain = kFirst + 1}));
+}
+
+TEST_F(ModuleTardiskTest, KeepsLabelsOfProgramsAndOfTardisksApart) {
+  PublishThree();
+  Bring("tool");
+  ExpectToStay(toy);
+  ExpectToStay(ProgramOf("gear"));
+  Publish(Domains({{"one", {"-d gear two exec grant"}}, {"two", {}}}));
+  Bring("gear");
+  ExpectToStay(toy);
+  ExpectToEnter(ProgramOf("gear"));
+}
+
+TEST_F(ModuleTardiskTest, GoesByTheLabelOfTheProgramFirst) {
+  Bring("gear");
+  PublishThree({"-d toy three exec grant"});
+  EXPECT_EQ(From(kFirst, toy), Outcome({.domain = kFirst + 2, .isSecure = true}));
+  for (const char* const other : {"-d toy one exec grant", "-d toy three exec revoke",
+                                  "-d toy three enter grant", "-d toy three tardisk_exec grant"}) {
+    PublishThree({other});
+    ExpectToEnter(toy);
+  }
+}
+
+TEST_F(ModuleTardiskTest, FollowsTheFileAndNotItsPath) {
+  PublishThree();
+  Bring("gear");
+  std::ofstream(toy, std::ios::app) << "written in place";
+  ExpectToEnter(toy);
+  const std::string elsewhere = kPlace + "/tool/elsewhere";
+  fs::create_hard_link(toy, elsewhere);
+  PublishThree();
+  ExpectToEnter(elsewhere);
+  // Another file gets its number, where the file system gives the lowest one.
+  fs::remove(toy);
+  fs::remove(elsewhere);
+  fs::copy_file("/bin/busybox", toy);
+  ExpectToStay(toy);
+}
+
+TEST_F(ModuleTardiskTest, ForgetsWhatItIsToldNoMore) {
+  PublishThree();
+  const auto old = Brought(toy, "gear");
+  const auto other = Brought(ProgramOf("tool"), "gear");
+  module->TellTardiskFiles({old, other});
+  ExpectToEnter(toy);
+  ExpectToEnter(ProgramOf("tool"));
+  auto relabelled = old;
+  relabelled.label = kLabels.at("tool");
+  module->TellTardiskFiles({relabelled, other});
+  ExpectToStay(toy);
+  ExpectToEnter(ProgramOf("tool"));
+  auto earlier = old;
+  ++earlier.generation;
+  module->TellTardiskFiles({earlier});
+  ExpectToStay(toy);
+  ExpectToStay(ProgramOf("tool"));
+}
+
+TEST_F(ModuleTardiskTest, RefusesWhoeverIsControlledAndWhatIsNotThere) {
+  PublishThree();
+  Bring("gear");
+  ExpectToFail(toy, ExecuteTraced);
+  ExpectToFail(toy, ExecuteWithSharedDirectories);
+  ExpectToFail(toy, ExecuteWithoutNewPrivileges);
+  ExpectToFail(toy, ExecuteInUserNamespace);
+  PublishThree({"-a toy execute revoke"});
+  ExpectToFail(toy);
+  Publish(Domains({{"one", {"-d gear two tardisk_exec grant"}}}));
+  ExpectToFail(toy);
+}
+
+TEST_F(ModuleTardiskTest, EntersByAScriptThatIsExecutedByItsPath) {
+  PublishThree();
+  const std::string script = kPlace + "/toy/script";
+  WriteScript(script, "/bin/busybox sh");
+  fs::create_symlink(script, kPlace + "/link");
+  module->TellTardiskFiles({Brought(script, "gear"), Brought(ProgramOf("gear"), "gear")});
+  ExpectToEnter(script);
+  ExpectToFail(kPlace + "/link");
+  WriteScript(kPlace + "/tool/interpreted", ProgramOf("gear"));
+  ExpectToStay(kPlace + "/tool/interpreted");
+}
+
 // ---- What the rules say, held against the kernel
 
 std::vector<std::string> SomeTransitions(std::mt19937& chance) {
@@ -457,33 +578,48 @@ std::vector<std::string> SomeTransitions(std::mt19937& chance) {
     rule = chance() % 3 == 0
                ? "-a " + one({"tool", "gear", "toy"}) + " execute " + one({"grant", "revoke"})
                : "-d " + one({"tool", "gear", "toy"}) + " " + one({"d0", "d1", "d2", "gone"}) +
-                     " " + one({"exec", "exec", "exec", "enter"}) + " " +
+                     " " + one({"exec", "exec", "tardisk_exec", "tardisk_exec", "enter"}) + " " +
                      one({"grant", "grant", "revoke"});
   }
   return rules;
 }
 
-// As `secpolicy exec` finds it.
-std::optional<std::string> DomainBehind(const std::string& label, const InstalledDomain& domain) {
+// The labels of the tardisks that the programs came from; one came from none.
+const std::map<std::string, std::string> kTardiskOf = {{"tool", "gear"}, {"gear", "gear"}};
+
+std::optional<std::string> DomainBehind(const std::string& label, const std::string& kind,
+                                        const InstalledDomain& domain) {
   for (const Policy::Rule* const rule : RulesOf(domain, Policy::RuleKind::kDomainTransition)) {
-    if (rule->Grants() && rule->words[0] == label && rule->words[2] == "exec" &&
+    if (rule->Grants() && rule->words[0] == label && rule->words[2] == kind &&
         rule->words[1] != domain.name)
       return rule->words[1];
   }
   return std::nullopt;
 }
 
+std::optional<std::string> DomainBehindProgram(const std::string& label,
+                                               const InstalledDomain& domain) {
+  const auto own = DomainBehind(label, "exec", domain);
+  const auto tardisk = kTardiskOf.find(label);
+  if (own || tardisk == kTardiskOf.end()) return own;
+  return DomainBehind(tardisk->second, "tardisk_exec", domain);
+}
+
 Outcome ExpectedOf(const std::string& label, const InstalledDomain& domain) {
   const Policy::FileQuestion question = {Policy::FileAccess::kExecute, ProgramOf(label), label,
                                          false};
   if (!Decide(question, domain).IsAllowed()) return Refused();
-  const auto next = DomainBehind(label, domain);
+  const auto next = DomainBehindProgram(label, domain);
   if (!next) return {.domain = domain.id};
   if (*next == "gone") return Refused();
   return {.domain = kFirst + static_cast<unsigned int>(next->back() - '0')};
 }
 
 TEST_F(ModuleExecutionTest, EntersWhatTheRulesSay) {
+  Enforce::TardiskFiles brought;
+  for (const auto& [program, label] : kTardiskOf)
+    brought.push_back(Brought(ProgramOf(program), label));
+  module->TellTardiskFiles(brought);
   std::mt19937 chance(3);
   int entered = 0;
   int refused = 0;

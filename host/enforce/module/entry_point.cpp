@@ -15,10 +15,12 @@ class Running : public RunningModule {
  public:
   explicit Running(Module found) : module(std::move(found)) {}
 
-  void Publish(const Policy::InstalledPolicy& policy, std::uint64_t generation) override {
+  void Publish(const Policy::InstalledPolicy& policy, const TardiskFiles& files,
+               std::uint64_t generation) override {
     // What was mounted since, and what was made since.
     module.LearnLabels();
     module.WriteLabels();
+    module.TellTardiskFiles(files);
     module.Publish(PlanModule(policy.domains, LastCapability(), policy.objects), generation);
   }
   std::uint64_t Generation() const override { return module.Generation(); }

@@ -9,6 +9,7 @@
 
 #include "host/enforce/coverage.h"
 #include "host/enforce/module/map_entries.h"
+#include "host/enforce/module/tardisk_file.h"
 #include "policy/installed_policy.h"
 
 namespace Enforce {
@@ -21,7 +22,8 @@ class RunningModule {
   RunningModule& operator=(const RunningModule&) = delete;
   virtual ~RunningModule() = default;
 
-  virtual void Publish(const Policy::InstalledPolicy& policy, std::uint64_t generation) = 0;
+  virtual void Publish(const Policy::InstalledPolicy& policy, const TardiskFiles& files,
+                       std::uint64_t generation) = 0;
   virtual std::uint64_t Generation() const = 0;
   virtual bool IsRefusing() const = 0;
   virtual void Place(pid_t process, unsigned int domain) = 0;

@@ -4,11 +4,15 @@
 #include <linux/membarrier.h>
 #include <sys/random.h>
 #include <sys/syscall.h>
+#include <sys/sysmacros.h>
 #include <unistd.h>
 
+#include <map>
+#include <tuple>
 #include <vector>
 
 #include "host/enforce/module/hash_map.h"
+#include "host/enforce/module/mounts.h"
 #include "host/enforce/module/path_hash.h"
 
 namespace Enforce {
@@ -57,14 +61,28 @@ std::vector<Key> UnusedKeys(const FileDescriptor& map, const std::vector<bool>& 
   return unused;
 }
 
+template <class Key>
+void Remove(const FileDescriptor& map, const std::vector<Key>& keys, const char* failure) {
+  auto count = static_cast<__u32>(keys.size());
+  if (count == 0) return;
+  Require(bpf_map_delete_batch(map.Number(), keys.data(), &count, nullptr) == 0, failure);
+}
+
 template <class Key, class Value>
 void RemoveUnused(const FileDescriptor& map, const std::vector<bool>& used) {
-  const std::vector<Key> unused = UnusedKeys<Key, Value>(map, used);
-  auto count = static_cast<__u32>(unused.size());
-  if (count == 0) return;
-  Require(bpf_map_delete_batch(map.Number(), unused.data(), &count, nullptr) == 0,
-          "cannot remove rules");
+  Remove(map, UnusedKeys<Key, Value>(map, used), "cannot remove rules");
 }
+
+ModuleFile KeyOf(const TardiskFile& file) {
+  return {file.inode, DeviceNumber(major(file.device), minor(file.device)), file.generation};
+}
+
+struct ByNumbers {
+  bool operator()(const ModuleFile& one, const ModuleFile& other) const {
+    return std::tie(one.inode, one.device, one.generation) <
+           std::tie(other.inode, other.device, other.generation);
+  }
+};
 
 }  // namespace
 
@@ -105,6 +123,24 @@ void RemoveUnusedFileRules(const ModuleMaps& maps) {
   const std::vector<bool> used = UsedEntries(maps);
   RemoveUnused<ModuleLabelKey, ModuleLabelRules>(maps.labelRules, used);
   RemoveUnused<ModulePathKey, __u32>(maps.paths, used);
+}
+
+void WriteTardiskFiles(const ModuleMaps& maps, const TardiskFiles& files) {
+  std::map<ModuleFile, __u32, ByNumbers> missing;
+  for (const TardiskFile& file : files) missing[KeyOf(file)] = file.label;
+  std::vector<ModuleFile> others;
+  ForEach<ModuleFile, __u32>(maps.tardiskFiles, [&](const ModuleFile& file, __u32 label) {
+    const auto same = missing.find(file);
+    if (same == missing.end()) {
+      others.push_back(file);
+    } else if (same->second == label) {
+      missing.erase(same);
+    }
+  });
+  Remove(maps.tardiskFiles, others, "cannot remove files of tardisks");
+  Batch<ModuleFile, __u32> batch;
+  for (const auto& [file, label] : missing) batch.Add(file, label);
+  batch.Write(maps.tardiskFiles, "cannot write files of tardisks");
 }
 
 }  // namespace Enforce

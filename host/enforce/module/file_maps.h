@@ -2,6 +2,7 @@
 
 #include "host/enforce/module/module_maps.h"
 #include "host/enforce/module/module_plan.h"
+#include "host/enforce/module/tardisk_file.h"
 
 namespace Enforce {
 
@@ -14,5 +15,8 @@ void WriteFileRules(const ModuleMaps& maps, const ModulePlan& plan);
 
 // Removes those that no domain uses, once nobody goes by them anymore.
 void RemoveUnusedFileRules(const ModuleMaps& maps);
+
+// What Module::TellTardiskFiles() does, for these maps.
+void WriteTardiskFiles(const ModuleMaps& maps, const TardiskFiles& files);
 
 }  // namespace Enforce

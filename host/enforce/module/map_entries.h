@@ -88,6 +88,7 @@ enum {
   kMostLabelledFiles = 1 << 20,
   kMostFileSystems = 1 << 12,
   kMostKnownDirectories = 1 << 16,
+  kMostTardiskFiles = 1 << 18,
 };
 
 // A file, for as long as there is one: the number of its inode is used again, with another
@@ -114,6 +115,7 @@ struct ModuleLabelRules {
   __u32 refused;
   __u32 newLabels[kLabelledKinds];  // 0: that of the directory
   __u32 next;                       // the domain that programs lead to, one higher; 0: none
+  __u32 nextOfTardisk;              // the same of what came from tardisks with the label
 };
 
 // The hash of a path, which nobody can tell beforehand.

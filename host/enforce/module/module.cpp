@@ -46,12 +46,19 @@ struct NamedMap {
   FileDescriptor ModuleMaps::*map;
 };
 constexpr std::array kMaps = {
-    NamedMap{"domains", &ModuleMaps::domains},   NamedMap{"rules", &ModuleMaps::rules},
-    NamedMap{"tasks", &ModuleMaps::tasks},       NamedMap{"entering", &ModuleMaps::entering},
-    NamedMap{"refusals", &ModuleMaps::refusals}, NamedMap{"generation", &ModuleMaps::generation},
-    NamedMap{"events", &ModuleMaps::events},     NamedMap{"labels", &ModuleMaps::labels},
-    NamedMap{"devices", &ModuleMaps::devices},   NamedMap{"hashing", &ModuleMaps::hashing},
-    NamedMap{"paths", &ModuleMaps::paths},       NamedMap{"label_rules", &ModuleMaps::labelRules},
+    NamedMap{"domains", &ModuleMaps::domains},
+    NamedMap{"rules", &ModuleMaps::rules},
+    NamedMap{"tasks", &ModuleMaps::tasks},
+    NamedMap{"entering", &ModuleMaps::entering},
+    NamedMap{"refusals", &ModuleMaps::refusals},
+    NamedMap{"generation", &ModuleMaps::generation},
+    NamedMap{"events", &ModuleMaps::events},
+    NamedMap{"labels", &ModuleMaps::labels},
+    NamedMap{"devices", &ModuleMaps::devices},
+    NamedMap{"hashing", &ModuleMaps::hashing},
+    NamedMap{"paths", &ModuleMaps::paths},
+    NamedMap{"label_rules", &ModuleMaps::labelRules},
+    NamedMap{"tardisk_files", &ModuleMaps::tardiskFiles},
 };
 
 struct Destroy {
@@ -252,6 +259,11 @@ void Module::Publish(const ModulePlan& plan, std::uint64_t generation) {
   const __u32 only = 0;
   Require(bpf_map_update_elem(maps->generation.Number(), &only, &generation, BPF_ANY) == 0,
           "cannot write the generation");
+}
+
+void Module::TellTardiskFiles(const TardiskFiles& files) {
+  const FileDescriptor lock = LockPins();
+  WriteTardiskFiles(*maps, files);
 }
 
 std::uint64_t Module::Generation() const {

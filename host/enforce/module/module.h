@@ -11,6 +11,7 @@
 #include "host/enforce/module/map_entries.h"
 #include "host/enforce/module/module_maps.h"
 #include "host/enforce/module/module_plan.h"
+#include "host/enforce/module/tardisk_file.h"
 #include "policy/level.h"
 
 namespace Enforce {
@@ -55,6 +56,10 @@ class Module {
   // finds another one than that of the plan knows that this was not completed, and publishes anew.
   void Publish(const ModulePlan& plan, std::uint64_t generation);
   std::uint64_t Generation() const;
+
+  // Tells it all the files that lead to domains by the labels of their tardisks, in place of those
+  // that it was told before. There is room for kMostTardiskFiles.
+  void TellTardiskFiles(const TardiskFiles& files);
 
   // Tries anew whether the kernel runs the programs: a process that may nothing has to be refused.
   bool IsRefusing() const;

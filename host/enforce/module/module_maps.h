@@ -24,6 +24,7 @@ struct ModuleMaps {
   FileDescriptor hashing;
   FileDescriptor paths;
   FileDescriptor labelRules;
+  FileDescriptor tardiskFiles;
   std::uint64_t* words = nullptr;   // of the domains, as the programs see them
   ModuleHashing* hashed = nullptr;  // what is in `hashing`, likewise
 

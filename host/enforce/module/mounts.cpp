@@ -25,8 +25,12 @@ std::string Unescaped(const std::string& text) {
 
 }  // namespace
 
-std::vector<Mount> ListMounts() {
+__u32 DeviceNumber(unsigned int major, unsigned int minor) {
   constexpr unsigned int kMinorBits = 20;
+  return major << kMinorBits | minor;
+}
+
+std::vector<Mount> ListMounts() {
   std::vector<Mount> mounts;
   std::ifstream file("/proc/self/mountinfo");
   for (std::string line; std::getline(file, line);) {
@@ -40,7 +44,7 @@ std::vector<Mount> ListMounts() {
     words >> ignored >> ignored >> major >> colon >> minor >> root >> place;
     for (std::string word; words >> word && word != "-";) {
     }
-    Mount mount{major << kMinorBits | minor, Unescaped(root), Unescaped(place), {}};
+    Mount mount{DeviceNumber(major, minor), Unescaped(root), Unescaped(place), {}};
     words >> mount.type;
     const auto same = std::ranges::find(mounts, mount.device, &Mount::device);
     if (same == mounts.end()) {

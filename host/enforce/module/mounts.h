@@ -18,6 +18,9 @@ struct Mount {
   std::string type;
 };
 
+// The device as the kernel has it.
+__u32 DeviceNumber(unsigned int major, unsigned int minor);
+
 // Those of this mount namespace, one of each file system: as a whole, where it is mounted so.
 // Throws Braxo::Lib::BraxoException when they cannot be read.
 std::vector<Mount> ListMounts();

@@ -13,8 +13,8 @@ namespace Enforce {
 // The identifiers of domains by their names.
 using DomainNumbers = std::map<std::string, unsigned int>;
 
-// Adds to `files` which domain the programs with each label lead to from this one. One that is not
-// among `domains` there is not, and nobody gets there.
+// Adds to `files` which domain the programs with each label lead to from this one, and those of
+// tardisks with it. One that is not among `domains` there is not, and nobody gets there.
 void PlanTransitions(const Policy::InstalledDomain& domain, const LabelNumbers& labels,
                      const DomainNumbers& domains, ModuleFileRules& files);
 

@@ -4,6 +4,7 @@
 #include <sys/types.h>
 
 #include <cstdint>
+#include <optional>
 #include <string>
 
 namespace LinuxHost {
@@ -19,6 +20,8 @@ struct InodeOrigin {
   // What an edit changes, as they were when it was unpacked.
   std::uint64_t size = 0;
   std::int64_t modified = 0;  // nanoseconds since 1970
+  // Of a regular file, by which the kernel tells it from one that has its number later.
+  std::optional<std::uint32_t> generation = {};
 };
 
 // Fills `*status` with what statx(2) tells about `path`; a link in last place is not followed.

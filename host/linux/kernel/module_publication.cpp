@@ -16,6 +16,7 @@
 #include "host/linux/common/module_library.h"
 #include "host/linux/common/private_file.h"
 #include "host/linux/common/used_paths.h"
+#include "host/linux/kernel/tardisk_files.h"
 #include "host/linux/services/system_log.h"
 #include "host/linux/state/host_state.h"
 #include "host/linux/state/module_place.h"
@@ -64,7 +65,8 @@ void Publish(RunningModule& running) {
   // Only as a lock, which ends without a commit.
   const Transaction others(state.Database());
   const std::uint64_t generation = NewGeneration();
-  running.Publish(ReadInstalled(), generation);
+  const Policy::InstalledPolicy policy = ReadInstalled();
+  running.Publish(policy, ReadTardiskFiles(state, policy), generation);
   ReplacePrivateFile(PublishedMarkOf(StatePath()), StrCat(generation, "\n"));
 }
 

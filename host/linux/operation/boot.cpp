@@ -17,6 +17,7 @@
 #include "host/linux/common/host_error.h"
 #include "host/linux/files/directory_entry.h"
 #include "host/linux/files/first_labels.h"
+#include "host/linux/files/inode_generation.h"
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/services/system_log.h"
 #include "host/linux/state/config_database.h"
@@ -165,7 +166,8 @@ InodeOrigin OriginOf(const std::string& tardisk, const std::string& path,
           .path = "/" + path,
           .birth = BirthOf(status),
           .size = status.stx_size,
-          .modified = ModifiedOf(status)};
+          .modified = ModifiedOf(status),
+          .generation = S_ISREG(status.stx_mode) ? GenerationOf(path.c_str()) : std::nullopt};
 }
 
 void Unpack(const std::string& image, const TardiskRules& rules, AssembledRoot& root) {

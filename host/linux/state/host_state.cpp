@@ -7,6 +7,7 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <filesystem>
 
 #include "braxo/misc/strcat.h"
@@ -21,6 +22,14 @@ namespace {
 std::shared_ptr<HostState>& Connection() {
   thread_local std::shared_ptr<HostState> connection;
   return connection;
+}
+
+void RecordFile(Store& store, const InodeOrigin& origin) {
+  store.Run("DELETE FROM unpacked_file WHERE device = ?1 AND inode = ?2", origin.device,
+            origin.inode);
+  if (!origin.generation) return;
+  store.Run("INSERT INTO unpacked_file VALUES (?1, ?2, ?3, ?4)", origin.device, origin.inode,
+            *origin.generation, origin.tardisk);
 }
 
 bool IsOfUsedState(HostState* connection) {
@@ -94,6 +103,7 @@ void HostState::RecordOrigins(std::span<const InodeOrigin> origins) {
     store.Run("INSERT OR REPLACE INTO inode_origin VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7)",
               origin.device, origin.inode, origin.tardisk, origin.path, origin.birth, origin.size,
               origin.modified);
+    RecordFile(store, origin);
   }
   transaction.Commit();
 }
@@ -111,6 +121,16 @@ std::optional<InodeOrigin> HostState::FindOrigin(dev_t device, ino_t inode) {
                      .birth = rows.Integer(2),
                      .size = static_cast<std::uint64_t>(rows.Integer(3)),
                      .modified = rows.Integer(4)};
+}
+
+void HostState::ForEachUnpackedFile(const std::function<void(const UnpackedFile&)>& visit) {
+  Rows rows = Database().Select("SELECT device, inode, generation, tardisk FROM unpacked_file");
+  while (rows.Next()) {
+    visit({.device = static_cast<dev_t>(rows.Integer(0)),
+           .inode = static_cast<ino_t>(rows.Integer(1)),
+           .generation = static_cast<std::uint32_t>(rows.Integer(2)),
+           .tardisk = rows.Text(3)});
+  }
 }
 
 }  // namespace LinuxHost

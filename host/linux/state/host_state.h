@@ -2,6 +2,8 @@
 
 #include <sys/types.h>
 
+#include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <span>
@@ -18,6 +20,14 @@
 #include "host/linux/state/world_table.h"
 
 namespace LinuxHost {
+
+// A regular file that came from a tardisk.
+struct UnpackedFile {
+  dev_t device = 0;
+  ino_t inode = 0;
+  std::uint32_t generation = 0;
+  std::string tardisk;  // its bare file name
+};
 
 // What a kernel with an access-control module keeps: domains, labels, rules, file policies, worlds
 // and inode origins. One database that lives and dies with a boot, shared by all processes: each
@@ -58,6 +68,10 @@ class HostState : public StateBase, public std::enable_shared_from_this<HostStat
 
   // Where the inode came from; empty when it came from no tardisk.
   std::optional<InodeOrigin> FindOrigin(dev_t device, ino_t inode);
+
+  // Calls `visit` with each regular file that came from a tardisk and that a kernel can tell from
+  // others, whether it is still there or not.
+  void ForEachUnpackedFile(const std::function<void(const UnpackedFile&)>& visit);
 
  private:
   // Each stands on those before it.

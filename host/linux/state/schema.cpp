@@ -154,7 +154,19 @@ CREATE TABLE load_record (
   removed_domains INTEGER NOT NULL
 );
 CREATE TABLE load_error (id INTEGER PRIMARY KEY, message TEXT NOT NULL);
+CREATE TABLE loaded_bundle (digest TEXT NOT NULL);
 INSERT INTO state VALUES (1, 1, 1, '', 0);
+)sql";
+
+// The regular files among the inodes, as a kernel knows them.
+constexpr char kAddition[] = R"sql(
+CREATE TABLE unpacked_file (
+  device INTEGER NOT NULL,
+  inode INTEGER NOT NULL,
+  generation INTEGER NOT NULL,
+  tardisk TEXT NOT NULL,
+  PRIMARY KEY (device, inode)
+) WITHOUT ROWID;
 )sql";
 
 constexpr char kFirstRows[] = R"sql(
@@ -168,9 +180,9 @@ const StoreLayout kStateLayout = {
     .purpose = "host state",
     .remedy = "Remove the file and run \"secpolicy boot\", which makes a new one",
     .applicationId = 0x5a6f7276,
-    .version = 5,
+    .version = 6,
     .schema = kTables,
-    .addition = "CREATE TABLE loaded_bundle (digest TEXT NOT NULL)",
+    .addition = kAddition,
     .firstRows = kFirstRows,
     .survivesPowerLoss = false,
 };

@@ -17,7 +17,7 @@ struct StateTable {
   bool isPutBack = false;    // by a rollback, as it was saved
 };
 
-inline constexpr std::array<StateTable, 19> kStateTables = {{
+inline constexpr std::array<StateTable, 20> kStateTables = {{
     {.name = "domain", .isPutBack = true},
     {.name = "role", .isPutBack = true},
     {.name = "guest_service", .isOfDomains = true, .isPutBack = true},
@@ -32,6 +32,7 @@ inline constexpr std::array<StateTable, 19> kStateTables = {{
     {.name = "covered_file_policy", .isOfDomains = true, .isPutBack = true},
     {.name = "world", .isOfDomains = true},
     {.name = "inode_origin"},
+    {.name = "unpacked_file"},
     {.name = "rule_origin", .isPutBack = true},
     {.name = "label_origin"},
     {.name = "load_record"},

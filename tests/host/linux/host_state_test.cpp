@@ -12,6 +12,7 @@
 #include <thread>
 #include <vector>
 
+#include "braxo/misc/strcat.h"
 #include "child_process.h"
 #include "host/linux/common/inode_origin.h"
 #include "host/linux/state/schema.h"
@@ -21,6 +22,7 @@
 namespace LinuxHostTest {
 namespace {
 
+using Braxo::Misc::StrCat;
 using LinuxHost::HostState;
 using LinuxHost::InodeOrigin;
 using SecPolicyTest::MessageOf;
@@ -40,6 +42,14 @@ InodeOrigin OriginOf(dev_t device, ino_t inode, const std::string& tardisk) {
 std::string TardiskOf(dev_t device, ino_t inode) {
   const auto origin = HostState::Current().FindOrigin(device, inode);
   return origin ? origin->tardisk : std::string();
+}
+
+std::vector<std::string> UnpackedFiles() {
+  std::vector<std::string> files;
+  HostState::Current().ForEachUnpackedFile([&files](const LinuxHost::UnpackedFile& file) {
+    files.push_back(StrCat(file.device, " ", file.inode, " ", file.generation, " ", file.tardisk));
+  });
+  return files;
 }
 
 class HostStateFile : public ::testing::Test {
@@ -218,6 +228,25 @@ TEST_F(HostStateFile, RemembersWhereInodesCameFrom) {
   const InodeOrigin later = OriginOf(1, 10, "patch.tgz");
   state.RecordOrigins({&later, 1});
   EXPECT_EQ(TardiskOf(1, 10), "patch.tgz");
+}
+
+TEST_F(HostStateFile, ListsTheFilesThatAKernelCanTell) {
+  HostState& state = HostState::Current();
+  std::vector<InodeOrigin> origins = {OriginOf(1, 10, "base.tgz"), OriginOf(1, 11, "tool.tgz"),
+                                      OriginOf(1, 12, "base.tgz"), OriginOf(1, 13, "base.tgz")};
+  origins[1].generation = ~std::uint32_t{0};
+  origins[2].generation = 0;
+  origins[3].generation = 5;
+  state.RecordOrigins(origins);
+  EXPECT_THAT(UnpackedFiles(),
+              ElementsAre("1 11 4294967295 tool.tgz", "1 12 0 base.tgz", "1 13 5 base.tgz"));
+
+  origins[1].tardisk = "patch.tgz";
+  origins[2].generation.reset();
+  state.RecordOrigins(origins);
+  EXPECT_THAT(UnpackedFiles(), ElementsAre("1 11 4294967295 patch.tgz", "1 13 5 base.tgz"));
+  state.Reset();
+  EXPECT_THAT(UnpackedFiles(), ElementsAre());
 }
 
 TEST_F(HostStateFile, TakesTheGreatestInodeNumber) {

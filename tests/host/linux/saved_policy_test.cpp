@@ -291,7 +291,7 @@ TEST_F(SavedPolicy, IsRefusedWhenItIsOfAnotherSchema) {
     edited.Database().Run("PRAGMA user_version = 1");
   }
   EXPECT_EQ(MessageOf([&] { RestorePolicy(copy); }),
-            "it has schema 1, this program works with schema 5: it was saved by another version");
+            "it has schema 1, this program works with schema 6: it was saved by another version");
   EXPECT_EQ(Domains(), domains);
 }
 

@@ -1,5 +1,5 @@
 // Which domain a process enters by executing a program: that which the label of the program leads
-// to, else it stays in its own.
+// to, else that which its tardisk leads to, else it stays in its own.
 #ifndef EXECUTION_BPF_H
 #define EXECUTION_BPF_H
 
@@ -8,6 +8,15 @@
 
 #define MNT_NOSUID 0x01
 #define BYTES_OF_SCRIPT_PATH 256
+
+// The labels of the tardisks that files came from.
+struct {
+  __uint(type, BPF_MAP_TYPE_HASH);
+  __uint(map_flags, BPF_F_NO_PREALLOC);
+  __type(key, struct ModuleFile);
+  __type(value, __u32);
+  __uint(max_entries, kMostTardiskFiles);
+} tardisk_files SEC(".maps");
 
 struct TwoPaths {
   char asked[BYTES_OF_SCRIPT_PATH];
@@ -40,10 +49,18 @@ static __always_inline bool is_controlled(struct linux_binprm* program) {
          BPF_CORE_READ(thread, cred, user_ns, level);
 }
 
+static __always_inline __u32 domain_behind_tardisk(__u32 rules_entry, struct inode* inode) {
+  struct ModuleFile key = key_of(inode);
+  __u32* label = bpf_map_lookup_elem(&tardisk_files, &key);
+  struct ModuleLabelRules* rules = label ? rules_for(rules_entry, *label) : 0;
+  return rules ? rules->nextOfTardisk : 0;
+}
+
 // 0 where the program leads nowhere, else the domain, one higher.
-static __always_inline __u32 domain_behind(struct Asker* asker, __u32 label) {
-  struct ModuleLabelRules* rules = rules_for(entry_of(asker->word), label);
-  return rules ? rules->next : 0;
+static __always_inline __u32 domain_behind(__u32 rules_entry, __u32 label, struct inode* inode) {
+  struct ModuleLabelRules* rules = rules_for(rules_entry, label);
+  if (rules && rules->next) return rules->next;
+  return domain_behind_tardisk(rules_entry, inode);
 }
 
 static __always_inline struct ModuleAct entry_into(__u32 next, __u32 label) {
@@ -74,7 +91,7 @@ int BPF_PROG(choose_domain, struct linux_binprm* program) {
     int result = refuse_asker_path(&asker, asked, &file->f_path);
     if (result) return result;
   }
-  __u32 next = domain_behind(&asker, label);
+  __u32 next = domain_behind(entry_of(asker.word), label, file->f_inode);
   if (!next) return 0;
   if (level_of(word_of(next - 1)) == kLevelAbsent || is_controlled(program))
     return refuse_asker_path(&asker, entry_into(next, label), &file->f_path);
