@@ -128,6 +128,7 @@ fish_offers() {
 
 @test "a root in the home directory may be written with a tilde" {
   boot
+  # shellcheck disable=SC2088
   HOME=$BATS_TEST_TMPDIR run --separate-stderr "$SECPOLICY" __complete --root '~/root' run ioF
   exits 0
   shows ioFilterDom

@@ -49,7 +49,7 @@ ProgramLoading::ProgramLoading() {
   hooks = HooksIn(*types);
   // Once: older ones of libbpf free what they still use when the last handler is taken away.
   static const bool areHandled = HandleSections();
-  Require(areHandled, "cannot load programs");
+  Require(areHandled, "cannot load the programs");
   current = this;
 }
 
