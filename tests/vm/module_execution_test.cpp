@@ -523,6 +523,21 @@ TEST_F(ModuleTardiskTest, FollowsTheFileAndNotItsPath) {
   ExpectToStay(toy);
 }
 
+TEST_F(ModuleTardiskTest, TellsFilesInMemoryApart) {
+  const std::string place = "/tmp/memory";
+  fs::create_directories(place);
+  ASSERT_EQ(mount("none", place.c_str(), "tmpfs", 0, nullptr), 0);
+  const std::string program = place + "/cat";
+  fs::copy_file("/bin/busybox", program);
+  fs::copy_file("/bin/busybox", place + "/other");
+  module->LearnLabels();
+  PublishThree();
+  module->TellTardiskFiles({Brought(program, "gear")});
+  ExpectToEnter(program);
+  ExpectToStay(place + "/other");
+  EXPECT_EQ(umount2(place.c_str(), MNT_DETACH), 0);
+}
+
 TEST_F(ModuleTardiskTest, ForgetsWhatItIsToldNoMore) {
   PublishThree();
   const auto old = Brought(toy, "gear");

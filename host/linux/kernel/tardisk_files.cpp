@@ -9,11 +9,10 @@
 
 #include "host/linux/files/security_attribute.h"
 #include "host/linux/state/keyword_tables.h"
+#include "host/linux/state/label_table.h"
 
 namespace LinuxHost {
 namespace {
-
-constexpr std::uint32_t kNoLabel = 0;
 
 // The labels whose tardisks lead anywhere.
 std::set<std::uint32_t> LeadingLabels(const Policy::InstalledPolicy& policy) {
