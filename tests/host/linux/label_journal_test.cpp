@@ -250,8 +250,10 @@ TEST_F(Journal, ThatCannotBeWrittenIsTold) {
     LabelJournal journal(StatePath());
     Give("tree/one", 8);
     signal(SIGXFSZ, SIG_IGN);
-    const rlimit none = {0, RLIM_INFINITY};
-    if (setrlimit(RLIMIT_FSIZE, &none) != 0) return "no limit";
+    rlimit limit = {};
+    getrlimit(RLIMIT_FSIZE, &limit);
+    limit.rlim_cur = 0;
+    if (setrlimit(RLIMIT_FSIZE, &limit) != 0) return "no limit";
     journal.Keep(notes);
     return "kept";
   });
