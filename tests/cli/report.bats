@@ -45,6 +45,25 @@ data_of() { sed -n 's|^<script type="application/json" id="data">\(.*\)</script>
   [[ $checks == '["bind_port",["0","0",1,0],["1","21",0,0],["22","22",1,0],["23","18446744073709551615",0,0]]' ]]
 }
 
+@test "rules whose line is gone are marked" {
+  boot
+  sed -i '/^-c cap_setgid /d' "$policy/domains/sshDom"
+  "$SECPOLICY" --root "$root" load --keep 2>/dev/null
+  secpolicy report -o /page.html
+  [[ $(data_of "$root/page.html" | jq -c '.strings as $s | .rules as $r | [$r.gone[] | [$r.kind[.], $s[$r.words[3 * .]]]]') == \
+    "[[$(data_of "$root/page.html" | jq '[.kinds[].keyword] | index("-c")'),\"cap_setgid\"]]" ]]
+}
+
+@test "each question has what is missing, those about files for each kind of file" {
+  boot
+  secpolicy report -o /page.html
+  local questions
+  questions=$(data_of "$root/page.html" | jq .questions)
+  [[ $(jq -c 'map(has("files") != has("missing")) | unique' <<<"$questions") == '[true]' ]]
+  [[ $(jq -c '.[] | select(.action == "read").files | map(.missing)' <<<"$questions") == '[["-r {0} r"]]' ]]
+  [[ $(jq -c '.[] | select(.action == "call").missing' <<<"$questions") == '["-s {0} grant"]' ]]
+}
+
 @test "only its own script and style may run" {
   boot
   secpolicy report -o /page.html
