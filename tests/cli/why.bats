@@ -132,6 +132,16 @@ END
   shows "$(at fileLabels/monitor '/etc/ssh vmDisk')/etc/ssh vmDisk"
 }
 
+@test "what lies in the root inherits the label of the root" {
+  boot
+  echo '/ vmDisk' >>"$policy/fileLabels/monitor"
+  "$SECPOLICY" --root "$root" load 2>/dev/null
+  touch "$root/new"
+  secpolicy why sshDom read /new
+  shows "label: vmDisk (inherited)"
+  shows "$(at fileLabels/monitor '/ vmDisk')/ vmDisk"
+}
+
 @test "the label that a file inherits, with the line that its directory has it from" {
   boot
   echo '/etc/ssh vmDisk' >>"$policy/fileLabels/monitor"
