@@ -17,11 +17,14 @@
 #include <sys/uio.h>
 #include <unistd.h>
 
+#include <array>
 #include <atomic>
 #include <bit>
 #include <cstdint>
+#include <cstring>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "host/enforce/supervise/file_descriptor.h"
 #include "vm/module_fixture.h"
@@ -97,6 +100,25 @@ int ChangeMount() {
       syscall(SYS_mount_setattr, AT_FDCWD, "/mnt/over", 0, &attributes, sizeof(attributes)));
 }
 
+// By the numbers of a program for 32 bits: of texts, and a number behind three of them or one.
+int CallOf32Bits(int number, const std::vector<std::string>& texts, unsigned long last) {
+  // Below what these registers hold.
+  static char* const low = static_cast<char*>(
+      mmap(nullptr, 4096, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS | MAP_32BIT, -1, 0));
+  std::array<unsigned long, 4> words = {};
+  for (std::size_t index = 0; index < texts.size(); ++index) {
+    char* const text = low + index * 1024;
+    words.at(index) = reinterpret_cast<unsigned long>(strcpy(text, texts[index].c_str()));
+  }
+  words.at(texts.size()) = last;
+  int result = number;
+  asm volatile("int $0x80"
+               : "+a"(result)
+               : "b"(words[0]), "c"(words[1]), "d"(words[2]), "S"(words[3]), "D"(0)
+               : "memory");
+  return result < 0 ? -result : 0;
+}
+
 constexpr NamedAct kMounts[] = {
     {"bind", [] { return BindOver("/etc", "/mnt/over"); }},
     {"over the pins", [] { return BindOver("/etc", "/sys/fs/bpf"); }},
@@ -113,6 +135,17 @@ constexpr NamedAct kMounts[] = {
     {"unmount", [] { return ErrorOf(umount2("/mnt/over", MNT_DETACH)); }},
     {"open", [] { return Descriptor(syscall(SYS_fsopen, "tmpfs", 0)); }},
     {"new root", [] { return ErrorOf(syscall(SYS_pivot_root, "/mnt/over", "/mnt/over")); }},
+    {"bind by a program for 32 bits",
+     [] {
+       return CallOf32Bits(21, {"/etc", "/mnt/over", ""}, MS_BIND);
+     }},
+    {"unmount by a program for 32 bits",
+     [] { return CallOf32Bits(52, {"/mnt/over"}, MNT_DETACH); }},
+    {"unmount by its old call", [] { return CallOf32Bits(22, {"/mnt/over"}, 0); }},
+    {"new root for a program for 32 bits",
+     [] {
+       return CallOf32Bits(217, {"/mnt/over", "/mnt/over"}, 0);
+     }},
 };
 
 // Below /mnt/over, which is there.

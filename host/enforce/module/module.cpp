@@ -40,6 +40,7 @@ namespace {
 constexpr const char* kFileSystem = "/sys/fs/bpf";
 // Becomes kModulePins as a whole. That file system takes no names with dots.
 constexpr const char* kNewPins = "/sys/fs/bpf/secpolicy-new";
+constexpr const char* kPinOfProgram = "link_";
 
 struct NamedMap {
   const char* name;
@@ -121,16 +122,16 @@ void RequireNotLockedDown() {
   }
 }
 
-// The programs, and what holds functions in them that they share.
+// The programs, and what holds functions in them that they share, which they go before.
 struct Running {
-  Programs programs;
   std::unordered_map<std::string, FileDescriptor> links;
+  Programs programs;
 };
 
 Running LoadAndAttach() {
   libbpf_set_print(nullptr);
   ProgramLoading loading;
-  Running running = {.programs = Programs(module_programs__open()), .links = {}};
+  Running running = {.links = {}, .programs = Programs(module_programs__open())};
   Require(running.programs != nullptr, "cannot read the programs");
   loading.Load(*running.programs->skeleton);
   running.links = loading.Share();
@@ -176,14 +177,18 @@ void Pin(const Running& running) {
   const bpf_object_skeleton& skeleton = *programs.skeleton;
   for (int index = 0; index < skeleton.prog_cnt; ++index) {
     if (*skeleton.progs[index].link == nullptr) continue;
-    const std::string path = StrCat(kNewPins, "/link_", skeleton.progs[index].name);
+    const std::string path = StrCat(kNewPins, "/", kPinOfProgram, skeleton.progs[index].name);
     Require(bpf_link__pin(*skeleton.progs[index].link, path.c_str()) == 0, path.c_str());
   }
   Require(rename(kNewPins, kModulePins) == 0, kModulePins);
 }
 
+// Programs go before what they share: what stands in for that refuses.
 void Remove(const char* pins) {
   std::error_code error;
+  for (const auto& pin : std::filesystem::directory_iterator(pins, error)) {
+    if (pin.path().filename().string().starts_with(kPinOfProgram)) unlink(pin.path().c_str());
+  }
   std::filesystem::remove_all(pins, error);
   if (error)
     throw BraxoException(StrCat("the module: cannot remove ", pins, ": ", error.message()));
@@ -231,8 +236,10 @@ std::optional<Module> Module::FindRunning() {
 }
 
 void Module::Stop() {
+  std::optional<Module> running = FindRunning();
+  const FileDescriptor lock = running ? LockPins() : FileDescriptor();
   // The kernel ends programs a moment after nothing holds them.
-  if (std::optional<Module> running = FindRunning()) {
+  if (running) {
     running->WriteLabels();
     for (unsigned int id = 0; id < kDomainEntries; ++id)
       running->maps->WriteLevel(id, kLevelDisabled);

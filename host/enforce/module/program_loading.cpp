@@ -68,7 +68,7 @@ bool ProgramLoading::HandleSections() {
   return hook >= 0 && function >= 0;
 }
 
-void ProgramLoading::Load(const bpf_object_skeleton& skeleton) {
+void ProgramLoading::Load(bpf_object_skeleton& skeleton) {
   bpf_object* const programs = *skeleton.obj;
   loaded = programs;
   bpf_program* program = nullptr;
@@ -76,8 +76,7 @@ void ProgramLoading::Load(const bpf_object_skeleton& skeleton) {
     const bool isWanted = bpf_program__autoload(program) || hooks.contains(NameOf(program));
     bpf_program__set_autoload(program, isWanted);
   }
-  Require(bpf_object__load_skeleton(const_cast<bpf_object_skeleton*>(&skeleton)) == 0,
-          "cannot load the programs");
+  Require(bpf_object__load_skeleton(&skeleton) == 0, "cannot load the programs");
 }
 
 int ProgramLoading::PrepareHook(bpf_program* program, bpf_prog_load_opts* options, long) {
@@ -113,10 +112,10 @@ std::unordered_map<std::string, FileDescriptor> ProgramLoading::Share() const {
     options.sz = sizeof(options);
     options.target_btf_id = NumberOfFunction(*program);
     for (const bpf_program* const caller : callers.at(options.target_btf_id)) {
-      const std::string name = StrCat(NameOf(program), "_of_", bpf_program__name(caller));
+      const std::string name = StrCat(bpf_program__name(caller), "_", NameOf(program));
       FileDescriptor link(bpf_link_create(bpf_program__fd(program), bpf_program__fd(caller),
                                           static_cast<bpf_attach_type>(0), &options));
-      Require(link.IsOpen(), name.c_str());
+      Require(link.IsOpen(), "cannot attach the programs");
       links.emplace(name, std::move(link));
     }
   }

@@ -10,25 +10,26 @@
 
 namespace Enforce {
 
-/// How libbpf loads programs for hooks (sections "lsm/HOOK") and the functions that many of them
-/// call
-/// ("shared/FUNCTION"), as long as one of these lives. The kernel's types are read once for all
-/// programs, where libbpf would look through them for each. Not to be made by two threads at once.
+// How libbpf loads programs for hooks (sections "lsm/HOOK") and the functions that many of these
+// share
+// ("shared/FUNCTION"), for as long as one of these is there. The kernel's types are read once for
+// all programs, where libbpf would look through them for each. Not to be made by two threads at
+// once.
 class ProgramLoading {
  public:
-  /// Throws BraxoException where the kernel does not tell its types.
+  // Throws BraxoException where the kernel does not tell its types.
   ProgramLoading();
   ~ProgramLoading();
   ProgramLoading(const ProgramLoading&) = delete;
   ProgramLoading& operator=(const ProgramLoading&) = delete;
 
-  /// Has these loaded, which must outlive this, but those marked for hooks that some kernels lack
-  /// ("?lsm/HOOK") only where this one has them. Throws BraxoException where the kernel takes them
-  /// not.
-  void Load(const bpf_object_skeleton& programs);
+  // Has these loaded, but those marked for hooks that some kernels lack
+  // ("?lsm/HOOK") only where this one has them. Throws BraxoException where the kernel takes them
+  // not.
+  void Load(bpf_object_skeleton& programs);
 
-  /// What holds the functions in the places of those that refuse, in each program that calls them:
-  /// each by a name. Throws BraxoException where the kernel takes one not.
+  // What holds the functions in the places of those that refuse, in each program that calls them:
+  // each by a name. Throws BraxoException where the kernel takes one not.
   [[nodiscard]] std::unordered_map<std::string, FileDescriptor> Share() const;
 
  private:

@@ -6,7 +6,7 @@
 
 #define CAP_SYS_ADMIN 21
 
-// Calls that this capability is asked for before they make, change, move or remove a mount: to
+// Calls that this capability is asked for where they make, change, move or remove a mount: to
 // unmount what is above the pinned programs unmounts them, too, to mount over them hides them, and
 // rules about paths take mounts as they are in the whole machine. Newer calls have one number in
 // all tables.
@@ -44,13 +44,15 @@ int BPF_PROG(use_capability, const struct cred* cred, struct user_namespace* spa
              unsigned int options) {
   struct Asker asker = {};
   if (!is_asked(&asker)) return 0;
+  bool is_told = !(options & CAP_OPT_NOAUDIT);
+  int unheard = is_enforced(level_of(asker.word)) ? -EPERM : 0;
   if (capability == CAP_SYS_ADMIN && is_about_mounts(current_call())) {
-    int result = refuse_asker(&asker, act(kActReachModule, 0, 0));
+    int result = is_told ? refuse_asker(&asker, act(kActReachModule, 0, 0)) : unheard;
     if (result) return result;
   }
   struct ModuleRules* granted = rules_of(asker.word);
   if (granted && granted->capabilities >> (capability & 63) & 1)
-    return options & CAP_OPT_NOAUDIT ? 0 : judge_privileged_call(&asker, granted);
-  if (options & CAP_OPT_NOAUDIT) return is_enforced(level_of(asker.word)) ? -EPERM : 0;
+    return is_told ? judge_privileged_call(&asker, granted) : 0;
+  if (!is_told) return unheard;
   return refuse_asker(&asker, act(kActUseCapability, 0, capability));
 }

@@ -53,8 +53,8 @@ static __always_inline struct ModuleTask* current_task(void) {
   return task_of(bpf_get_current_task_btf());
 }
 
-// That of the current process. The kernel looks through such functions once for all that call them
-// in a program, which is most of what it takes to start the module.
+// That of the current process. The kernel looks through such a function once for all that call it
+// in a program.
 __noinline __u32 current_domain(void) {
   struct ModuleTask* task = current_task();
   return task ? task->domain : kNoDomain;

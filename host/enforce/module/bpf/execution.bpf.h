@@ -56,11 +56,12 @@ static __always_inline __u32 domain_behind_tardisk(__u32 rules_entry, struct ino
   return rules ? rules->nextOfTardisk : 0;
 }
 
-// 0 where the program leads nowhere, else the domain, one higher.
+// 0 where the program leads nowhere, else the domain, one higher. Where its own label would lead
+// cannot be told of one that nobody knows.
 static __always_inline __u32 domain_behind(__u32 rules_entry, __u32 label, struct inode* inode) {
   struct ModuleLabelRules* rules = rules_for(rules_entry, label);
   if (rules && rules->next) return rules->next;
-  return domain_behind_tardisk(rules_entry, inode);
+  return label == kLabelUnknown ? 0 : domain_behind_tardisk(rules_entry, inode);
 }
 
 static __always_inline struct ModuleAct entry_into(__u32 next, __u32 label) {

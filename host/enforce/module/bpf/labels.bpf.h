@@ -149,7 +149,8 @@ __noinline __u32 label_of_directory(__u64 number) {
   return label;
 }
 
-// Of a file that is there. kLabelUnknown where it cannot be told.
+// Of a file that is there. kLabelUnknown where it cannot be told. Stands in for the one of
+// shared.bpf.h.
 __weak __noinline __u32 label_of(__u64 entry) { return kLabelUnknown; }
 
 static __always_inline __u32 find_label_of(__u64 number) {

@@ -112,7 +112,7 @@ static long step(__u32 steps, struct PathWalk* walk) {
 }
 
 // What the rules of the entry say of a path from the root of the mount namespace on. It is without
-// a name in another namespace, unless it may be in any.
+// a name in another namespace, unless it may be in any. Stands in for the one of shared.bpf.h.
 __weak __noinline __u32 find_path(__u64 mount, __u64 entry, __u64 rules_entry, __u64 is_in_any) {
   return NO_NAME;
 }

@@ -102,7 +102,8 @@ static __always_inline int count(__u32 domain, __u32 level, bool is_told) {
   return is_enforced(level) ? -EPERM : 0;
 }
 
-// Takes numbers of which each holds two: there is no room for more.
+// Stands in for the one of shared.bpf.h. The first two numbers hold two each, as there is no room
+// for more.
 __weak __noinline int refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value,
                                  __u32 label) {
   return -EPERM;

@@ -1,6 +1,6 @@
-// What many programs call. The kernel would look through a function anew in each of them; so they
-// have one that does nothing but refuse, which is replaced by the one that is here. Programs that
-// stand after the others are loaded after them, as these have to be.
+// What many programs at hooks call. The kernel would look through a function anew in each of them,
+// so they have one that does nothing but refuse, in whose place the one that is here is put. It
+// stands behind the others, as they have to be loaded before.
 #ifndef SHARED_BPF_H
 #define SHARED_BPF_H
 
