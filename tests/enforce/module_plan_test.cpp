@@ -264,8 +264,8 @@ TEST(PlanTransitions, LeadByTardisksAndByLabelsOfTheirOwn) {
   EXPECT_EQ(files.labels[8].next, 0U);
   EXPECT_EQ(files.labels[8].nextOfTardisk, 3U + 1);
   EXPECT_EQ(Dump(files),
-            "  label 7: nothing, to 4, of a tardisk to 3\n"
-            "  label 8: nothing, of a tardisk to 3\n");
+            "  label 7: nothing, to 4, tardisks: 3\n"
+            "  label 8: nothing, tardisks: 3\n");
 }
 
 TEST(FatesByModule, TellsOfTransitionsThatGiveWay) {

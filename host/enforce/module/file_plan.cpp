@@ -154,7 +154,7 @@ std::string TextOf(const ModuleLabelRules& rules) {
       text += StrCat(", ", kFileKinds[kind].word, " as ", rules.newLabels[kind]);
   }
   if (rules.next != 0) text += StrCat(", to ", rules.next - 1);
-  if (rules.nextOfTardisk != 0) text += StrCat(", of a tardisk to ", rules.nextOfTardisk - 1);
+  if (rules.nextOfTardisk != 0) text += StrCat(", ", "tardisks: ", rules.nextOfTardisk - 1);
   return text;
 }
 
