@@ -63,7 +63,7 @@ bool ProgramLoading::HandleSections() {
   const int hook = libbpf_register_prog_handler("lsm/", BPF_PROG_TYPE_LSM, BPF_LSM_MAC, &options);
   options.prog_prepare_load_fn = &ProgramLoading::PrepareShared;
   options.prog_attach_fn = nullptr;
-  const int function = libbpf_register_prog_handler("shared/", BPF_PROG_TYPE_EXT,
+  const int function = libbpf_register_prog_handler("common/", BPF_PROG_TYPE_EXT,
                                                     static_cast<bpf_attach_type>(0), &options);
   return hook >= 0 && function >= 0;
 }

@@ -12,7 +12,7 @@ namespace Enforce {
 
 // How libbpf loads programs for hooks (sections "lsm/HOOK") and the functions that many of these
 // share
-// ("shared/FUNCTION"), for as long as one of these is there. The kernel's types are read once for
+// ("common/FUNCTION"), for as long as one of these is there. The kernel's types are read once for
 // all programs, where libbpf would look through them for each. Not to be made by two threads at
 // once.
 class ProgramLoading {

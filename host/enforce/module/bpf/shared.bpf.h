@@ -6,7 +6,7 @@
 
 #include "paths.bpf.h"
 
-SEC("shared/refuse_act")
+SEC("common/refuse_act")
 int shared_refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value, __u32 label) {
   __u32 domain = domain_and_level >> 32;
   __u32 level = domain_and_level;
@@ -14,10 +14,10 @@ int shared_refuse_act(__u64 domain_and_level, __u64 kind_and_detail, __u64 value
   return count(domain, level, tell(domain, level, &asked));
 }
 
-SEC("shared/label_of")
+SEC("common/label_of")
 __u32 shared_label_of(__u64 entry) { return find_label_of(entry); }
 
-SEC("shared/find_path")
+SEC("common/find_path")
 __u32 shared_find_path(__u64 mount, __u64 entry, __u64 rules_entry, __u64 is_in_any) {
   return look_for_path(mount, entry, rules_entry, is_in_any);
 }
